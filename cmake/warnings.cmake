@@ -1,0 +1,7 @@
+# No warning is let through in our own code.
+#  - non-virtual-dtor is left out: COM's interfaces have none, by their nature.
+#  - restrict is off: GCC 12 sees overlaps in std::string's operator+ where there are none.
+add_library(rcvlink_warnings INTERFACE)
+target_compile_options(rcvlink_warnings INTERFACE
+  -Wall -Wextra -Wpedantic -Wconversion -Wsign-conversion -Wshadow -Woverloaded-virtual
+  -Wold-style-cast -Wcast-qual -Werror -Wno-restrict)

@@ -1,0 +1,25 @@
+#ifndef SIMULATOR_FAULTS_H_
+#define SIMULATOR_FAULTS_H_
+
+#include <cstdint>
+
+namespace sim {
+
+// How often a fault happens before the receiver behaves again.
+inline constexpr uint32_t kOnce = 1;
+inline constexpr uint32_t kAlways = UINT32_MAX;
+
+// Uses up one occurrence of a fault; false when none is left.
+inline bool TakeOccurrence(uint32_t& times) {
+  if (times == 0) {
+    return false;
+  }
+  if (times != kAlways) {
+    --times;
+  }
+  return true;
+}
+
+}  // namespace sim
+
+#endif  // SIMULATOR_FAULTS_H_

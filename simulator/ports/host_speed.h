@@ -1,0 +1,14 @@
+#ifndef SIMULATOR_PORTS_HOST_SPEED_H_
+#define SIMULATOR_PORTS_HOST_SPEED_H_
+
+#include <cstdint>
+
+namespace sim {
+
+// The speed in bit/s that a terminal is set to, odd ones included; asked on either end of a pty.
+// Throws std::system_error.
+uint32_t HostSpeed(int terminal);
+
+}  // namespace sim
+
+#endif  // SIMULATOR_PORTS_HOST_SPEED_H_

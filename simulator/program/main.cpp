@@ -1,0 +1,123 @@
+#include <signal.h>
+
+#include <CLI/CLI.hpp>
+#include <cstdio>
+#include <exception>
+#include <fstream>
+#include <iostream>
+#include <stdexcept>
+#include <string>
+
+#include "simulator/files.h"
+#include "simulator/line.h"
+#include "simulator/ports/pty.h"
+#include "simulator/program/quorin_program.h"
+#include "simulator/quorin/receiver.h"
+#include "simulator/transcript.h"
+
+namespace {
+
+constexpr int kExitFailure = 2;
+constexpr const char* kPortGroup = "Port";
+
+volatile std::sig_atomic_t stop_requested = 0;
+
+void RequestStop(int) { stop_requested = 1; }
+
+// Lets the signals that end the program in only while it waits; gives the mask to wait with.
+sigset_t CatchSignals() {
+  sigset_t ending;
+  sigemptyset(&ending);
+  struct sigaction action {};
+  action.sa_handler = RequestStop;
+  for (const int number : {SIGINT, SIGTERM, SIGHUP}) {
+    sigaddset(&ending, number);
+    sigaction(number, &action, nullptr);
+  }
+  sigset_t before;
+  sigprocmask(SIG_BLOCK, &ending, &before);
+  for (const int number : {SIGINT, SIGTERM, SIGHUP}) {
+    sigdelset(&before, number);
+  }
+  return before;
+}
+
+// What is asked about the port and the files, whatever the family.
+struct PortOptions {
+  std::string folder;
+  std::string link;
+  std::string transcript;
+};
+
+void AddPortOptions(CLI::App& command, PortOptions& port, sim::LineOptions& line) {
+  command.add_option("--folder", port.folder, "the files to serve")
+      ->required()
+      ->check(CLI::ExistingDirectory)
+      ->type_name("DIR");
+  command.add_option("--transcript", port.transcript, "write down what passes")->type_name("FILE");
+  command.add_option("--link", port.link, "a symbolic link to the port, removed at the end")
+      ->type_name("PATH")
+      ->group(kPortGroup);
+  command.add_option("--speed", line.speed, "the line speed at the start, bit/s")
+      ->capture_default_str()
+      ->check(CLI::PositiveNumber)
+      ->group(kPortGroup);
+  command
+      .add_flag("--garbled", line.garbled, "at a wrong speed bytes arrive as garbage, not as none")
+      ->group(kPortGroup);
+  command.add_flag("--pace", line.paced, "send no faster than the line speed")->group(kPortGroup);
+  command.add_option("--pieces", line.piece_size, "send in pieces of so many bytes")
+      ->type_name("BYTES")
+      ->check(CLI::PositiveNumber)
+      ->group(kPortGroup);
+  command.add_option("--piece-gap", line.piece_gap_ms, "the pause between pieces, ms")
+      ->capture_default_str()
+      ->type_name("MS")
+      ->group(kPortGroup);
+}
+
+std::ofstream OpenTranscript(const std::string& path) {
+  std::ofstream file;
+  if (!path.empty()) {
+    file.open(path, std::ios::binary | std::ios::trunc);
+    if (!file) {
+      throw std::runtime_error("cannot write the transcript " + path);
+    }
+  }
+  return file;
+}
+
+void RunQuorin(const sim::QuorinOptions& options, const PortOptions& port_options) {
+  const sigset_t wait_mask = CatchSignals();
+  std::ofstream file = OpenTranscript(port_options.transcript);
+  sim::Transcript transcript = file.is_open() ? sim::Transcript(file) : sim::Transcript();
+  sim::QuorinReceiver receiver(
+      options, sim::FileStore::FromFolder(port_options.folder), &transcript);
+  sim::PtyPort port(port_options.link);
+  std::cout << port.slave_name() << std::endl;
+  port.Serve(receiver, stop_requested, wait_mask);
+}
+
+}  // namespace
+
+int main(int argc, char** argv) {
+  CLI::App app(
+      "Simulated GNSS receivers on a pseudo-terminal. The first line of the output is the "
+      "port to open; the program runs until it is interrupted.");
+  app.require_subcommand(1);
+
+  PortOptions port;
+  sim::QuorinOptions quorin;
+  CLI::App* const quorin_command = app.add_subcommand("quorin", "a Quorin receiver");
+  AddPortOptions(*quorin_command, port, quorin.line);
+  sim::AddQuorinOptions(*quorin_command, quorin);
+
+  CLI11_PARSE(app, argc, argv);
+  try {
+    RunQuorin(quorin, port);
+  } catch (const std::exception& error) {
+    std::fprintf(stderr, "rcvlink-sim: %s\n", error.what());
+    return kExitFailure;
+  }
+  return 0;
+}

@@ -1,0 +1,177 @@
+#include "simulator/program/quorin_program.h"
+
+#include <array>
+#include <functional>
+#include <stdexcept>
+#include <string>
+#include <vector>
+
+#include "simulator/quorin/fault_text.h"
+
+namespace sim {
+namespace {
+
+constexpr const char* kReceiverGroup = "Receiver";
+constexpr const char* kBlockGroup = "Block faults (BLOCK[@TIMES], blocks from 0, once unless told)";
+constexpr const char* kReplyGroup =
+    "Reply faults (COMMAND is how a command begins, 'ping' the empty line, '*' any; always unless "
+    "told)";
+constexpr const char* kOtherGroup = "Other faults";
+
+struct BlockFaultOption {
+  const char* name;
+  BlockFaultKind kind;
+  const char* help;
+};
+
+constexpr std::array<BlockFaultOption, 9> kBlockFaults = {{
+    {"--bad-crc", BlockFaultKind::kDamagedCrc, "a damaged CRC"},
+    {"--unchained-crc", BlockFaultKind::kUnchainedCrc, "a CRC not chained to the block before"},
+    {"--bad-sequence", BlockFaultKind::kWrongSequence, "a wrong sequence number"},
+    {"--bad-end", BlockFaultKind::kWrongEnd, "a wrong end byte"},
+    {"--lost-byte", BlockFaultKind::kLostByte, "one byte of the payload missing"},
+    {"--bad-type", BlockFaultKind::kUnknownType, "an unknown block type"},
+    {"--end-block", BlockFaultKind::kEndBlock, "instead of it, a block of type '#'"},
+    {"--end-byte", BlockFaultKind::kEndByte, "instead of it, '#' alone"},
+    {"--block-silence", BlockFaultKind::kSilence, "silence ahead of the block"},
+}};
+
+struct ReplyFaultOption {
+  const char* name;
+  ReplyFaultKind kind;
+  const char* form;
+  const char* help;
+};
+
+constexpr std::array<ReplyFaultOption, 7> kReplyFaults = {{
+    {"--refuse", ReplyFaultKind::kRefused, "COMMAND[@TIMES]", "answer with ER"},
+    {"--mute", ReplyFaultKind::kMute, "COMMAND[@TIMES]", "take no notice of the command"},
+    {"--reply-silence", ReplyFaultKind::kSilence, "SECONDS[:COMMAND][@TIMES]", "answer late"},
+    {"--garbage",
+     ReplyFaultKind::kGarbageBefore,
+     "BYTES[:COMMAND][@TIMES]",
+     "bytes that are no message ahead of the reply"},
+    {"--other-tag-first",
+     ReplyFaultKind::kOtherTagBefore,
+     "COMMAND[@TIMES]",
+     "a message with another tag ahead of the reply"},
+    {"--other-tag",
+     ReplyFaultKind::kOtherTagOnly,
+     "COMMAND[@TIMES]",
+     "the reply carries another tag"},
+    {"--bad-length",
+     ReplyFaultKind::kWrongLength,
+     "BYTES[:COMMAND][@TIMES]",
+     "the reply's header is off by so many bytes (write --bad-length=-3 for fewer)"},
+}};
+
+// An option that may be given several times and whose texts are handed to `take`.
+CLI::Option* AddTextOption(CLI::App& command,
+                           const std::string& name,
+                           const std::string& form,
+                           const std::string& help,
+                           std::function<void(const std::string&)> take) {
+  const auto take_all = [name, take](const std::vector<std::string>& texts) {
+    for (const std::string& text : texts) {
+      try {
+        take(text);
+      } catch (const std::invalid_argument& error) {
+        throw CLI::ValidationError(name, error.what());
+      }
+    }
+  };
+  return command.add_option_function<std::vector<std::string>>(name, take_all, help)
+      ->allow_extra_args(false)
+      ->type_name(form);
+}
+
+void AddIdentityOptions(CLI::App& command, QuorinOptions& options) {
+  QuorinIdentity& identity = options.identity;
+  command.add_option("--id", identity.id, "the receiver's identity")
+      ->capture_default_str()
+      ->group(kReceiverGroup);
+  command.add_option("--model", identity.model, "the receiver's model")
+      ->capture_default_str()
+      ->group(kReceiverGroup);
+  command.add_option("--port-letter", identity.port_letter, "the receiver's serial port, a to d")
+      ->capture_default_str()
+      ->check(CLI::IsMember({'a', 'b', 'c', 'd'}))
+      ->group(kReceiverGroup);
+  command.add_option("--port-name", identity.port_name, "what it calls the port, e.g. /dev/usb")
+      ->group(kReceiverGroup);
+  command.add_flag("--echo", options.echo, "send back what is heard until that is turned off")
+      ->group(kReceiverGroup);
+  command
+      .add_flag("--empty-last-block",
+                options.empty_last_block,
+                "a file that fills its last block is followed by an empty one")
+      ->group(kReceiverGroup);
+}
+
+void AddBlockFaults(CLI::App& command, Faults& faults) {
+  for (const BlockFaultOption& option : kBlockFaults) {
+    const BlockFaultKind kind = option.kind;
+    const bool silence = kind == BlockFaultKind::kSilence;
+    AddTextOption(command,
+                  option.name,
+                  silence ? "BLOCK:SECONDS[@TIMES]" : "BLOCK[@TIMES]",
+                  option.help,
+                  [&faults, kind](const std::string& text) {
+                    faults.blocks.push_back(ParseBlockFault(kind, text));
+                  })
+        ->group(kBlockGroup);
+  }
+  AddTextOption(
+      command,
+      "--negative-length",
+      "TIMES",
+      "a last block of negative length",
+      [&faults](const std::string& text) {
+        faults.blocks.push_back({BlockFaultKind::kNegativeLength, 0, ParseTimes(text), 0});
+      })
+      ->group(kBlockGroup);
+  command
+      .add_option("--vanish-after",
+                  faults.vanish_after_block,
+                  "hang up and end when the host has answered the block")
+      ->type_name("BLOCK")
+      ->group(kBlockGroup);
+}
+
+void AddReplyFaults(CLI::App& command, Faults& faults) {
+  for (const ReplyFaultOption& option : kReplyFaults) {
+    const ReplyFaultKind kind = option.kind;
+    AddTextOption(command,
+                  option.name,
+                  option.form,
+                  option.help,
+                  [&faults, kind](const std::string& text) {
+                    faults.replies.push_back(ParseReplyFault(kind, text));
+                  })
+        ->group(kReplyGroup);
+  }
+}
+
+void AddOtherFaults(CLI::App& command, Faults& faults) {
+  command.add_flag("--keep-speed", faults.keeps_speed, "refuse to change the line speed")
+      ->group(kOtherGroup);
+  command.add_flag("--long-names", faults.long_names, "list file names of more than 32 bytes")
+      ->group(kOtherGroup);
+  AddTextOption(command,
+                "--lie-size",
+                "NAME=SIZE",
+                "tell another size for a file than is sent",
+                [&faults](const std::string& text) { faults.sizes.push_back(ParseSizeLie(text)); })
+      ->group(kOtherGroup);
+}
+
+}  // namespace
+
+void AddQuorinOptions(CLI::App& command, QuorinOptions& options) {
+  AddIdentityOptions(command, options);
+  AddBlockFaults(command, options.faults);
+  AddReplyFaults(command, options.faults);
+  AddOtherFaults(command, options.faults);
+}
+
+}  // namespace sim

@@ -1,0 +1,46 @@
+#ifndef SIMULATOR_QUORIN_COMMAND_READER_H_
+#define SIMULATOR_QUORIN_COMMAND_READER_H_
+
+#include <cstdint>
+#include <optional>
+#include <string>
+#include <string_view>
+
+namespace sim {
+
+// A line as it came: `raw` with its end, `text` without.
+struct CommandLine {
+  std::string raw;
+  std::string text;
+};
+
+// Collects bytes into lines.
+class CommandReader {
+ public:
+  // Takes one byte; gives the line that it completes.
+  std::optional<CommandLine> Push(uint8_t byte);
+
+  // Starts a new line with a '#' that has already been acted on: it may turn out to be the first
+  // character of "#OFF#".
+  void RestartAfterHash();
+
+  const std::string& unfinished() const { return raw_; }
+
+ private:
+  std::string raw_;
+  std::string text_;
+};
+
+// A command with the tag taken off.
+struct Command {
+  std::optional<std::string> tag;
+  std::string text;
+};
+
+// Splits "%tag%text". A tag whose command never came (the host gave up in between) is replaced by
+// the one that follows it.
+Command SplitTag(std::string_view line);
+
+}  // namespace sim
+
+#endif  // SIMULATOR_QUORIN_COMMAND_READER_H_

@@ -1,0 +1,165 @@
+// Discovery: from the name of a port to a registered receiver.
+#include <array>
+#include <memory>
+#include <utility>
+
+#include "api/registry.h"
+#include "platform/api_types.h"
+#include "platform/event.h"
+#include "platform/hresult.h"
+#include "quorin/quorin_protocol.h"
+#include "receiver/abstract_receiver.h"
+#include "report/report_file.h"
+#include "transport/serial_connection.h"
+
+namespace {
+
+struct RtsTry {
+  DWORD control;
+  const wchar_t* name;
+};
+constexpr std::array<RtsTry, 3> kRtsTries = {{{RTS_CONTROL_HANDSHAKE, L"handshake"},
+                                              {RTS_CONTROL_ENABLE, L"enable"},
+                                              {RTS_CONTROL_DISABLE, L"disable"}}};
+
+constexpr DWORD kCurrentSpeed = 0;
+constexpr std::array<DWORD, 6> kSpeedTries = {
+    kCurrentSpeed, CBR_9600, CBR_115200, CBR_57600, CBR_38400, CBR_19200};
+
+constexpr BYTE kByteSize = 8;
+constexpr DWORD kRtsControlMask = 0x3;  // fRtsControl has two bits
+
+DCB SettingsOfTry(DWORD speed, DWORD rts_control) {
+  DCB settings{};
+  settings.DCBlength = sizeof(DCB);
+  settings.BaudRate = speed;
+  settings.fBinary = TRUE;
+  settings.fRtsControl = rts_control & kRtsControlMask;
+  settings.fOutxCtsFlow = rts_control == RTS_CONTROL_HANDSHAKE;
+  settings.ByteSize = kByteSize;
+  settings.Parity = NOPARITY;
+  settings.StopBits = ONESTOPBIT;
+  return settings;
+}
+
+// A probe's wait for the receiver ends at once when the host's abort event is signalled.
+class AbortWatch {
+ public:
+  AbortWatch(CIConnection* connection, HANDLE abort_event) : connection_(connection) {
+    connection_->SetAbortEvent(abort_event);
+  }
+  AbortWatch(const AbortWatch&) = delete;
+  AbortWatch& operator=(const AbortWatch&) = delete;
+  ~AbortWatch() { connection_->SetAbortEvent(nullptr); }
+
+ private:
+  CIConnection* connection_;
+};
+
+bool ProbeQuorin(CIConnection* connection, HANDLE abort_event) {
+  const AbortWatch watch(connection, abort_event);
+  return CQuorinProtocol::Probe(connection, abort_event);
+}
+
+// The driver of the family that answers, S_FALSE for none.
+HRESULT FindDriver(std::unique_ptr<CIConnection> connection,
+                   const wchar_t* port,
+                   EProtocol protocol,
+                   HANDLE abort_event,
+                   std::unique_ptr<CIProtocol>& driver) {
+  if (protocol != eProtocolVelmar) {
+    if (IsSignalled(abort_event)) return S_FALSE;
+    Trace(L"CreateReceiverOnSerial - looking for Quorin receiver [%s]\r\n", port);
+    if (ProbeQuorin(connection.get(), abort_event)) {
+      driver = std::make_unique<CQuorinProtocol>(std::move(connection));
+      Trace(L"CreateReceiverOnSerial - Quorin receiver found [%s]\r\n", port);
+      return S_OK;
+    }
+  }
+  // Velmar receivers are not recognised yet: none is found.
+  return S_FALSE;
+}
+
+}  // namespace
+
+namespace devapi {
+
+long CreateReceiverOnSerial(
+    wchar_t* port, EProtocol protocol, _DCB* settings, void* abortEvent, void** receiver) {
+  if (!port || !receiver) return E_INVALIDARG;
+  return CatchResult([&] {
+    auto connection = std::make_unique<CSerialConnection>();
+    Trace(L"CreateReceiverOnSerial - opening serial port [%s]\r\n", port);
+    ThrowIfFailed(connection->Open(port, settings));
+    std::unique_ptr<CIProtocol> driver;
+    const HRESULT found = FindDriver(std::move(connection), port, protocol, abortEvent, driver);
+    if (found != S_OK) return found;
+    auto object = std::make_shared<CAbstractReceiver>(std::move(driver));
+    void* handle = nullptr;
+    ThrowIfFailed(Receivers().Insert(port, std::move(object), &handle));
+    Trace(L"CreateReceiverOnSerial - OK [%s]\r\n", port);
+    *receiver = handle;
+    return S_OK;
+  });
+}
+
+long CreateReceiverOnUSB(wchar_t* device, EProtocol, void*, void** receiver) {
+  if (!device || !receiver) return E_INVALIDARG;
+  Trace(L"CreateReceiverOnUSB - opening USB [%s]\r\n", device);
+  // There is no USB link yet, and none is pretended.
+  return E_NOTIMPL;
+}
+
+long SearchReceiver(
+    wchar_t* port, EInstanceType type, EProtocol protocol, void* abortEvent, void** receiver) {
+  const HRESULT registered = OpenReceiver(port, receiver);
+  if (FAILED(registered)) return registered;
+  if (registered == S_OK) {
+    Trace(L"SearchReceiver - receiver already exists [%s]\r\n", port);
+    return S_OK;
+  }
+  switch (type) {
+    case eInstanceSerial:
+      return SearchReceiverOnSerial(port, protocol, abortEvent, receiver);
+    case eInstanceUSB:
+      return CreateReceiverOnUSB(port, protocol, abortEvent, receiver);
+    case eInstanceAny:
+      break;
+    default:
+      return E_UNEXPECTED;
+  }
+
+  const HRESULT on_serial = SearchReceiverOnSerial(port, protocol, abortEvent, receiver);
+  if (*receiver) return on_serial;
+  if (FAILED(on_serial)) {
+    Trace(L"SearchReceiver - SearchReceiverOnSerial failed[%s] [0x%08X]\r\n", port, on_serial);
+  }
+  const HRESULT on_usb = CreateReceiverOnUSB(port, protocol, abortEvent, receiver);
+  if (*receiver) return on_usb;
+  if (FAILED(on_usb)) {
+    Trace(L"SearchReceiver - CreateReceiverOnUSB failed[%s] [0x%08X]\r\n", port, on_usb);
+  }
+  return on_usb;
+}
+
+}  // namespace devapi
+
+long SearchReceiverOnSerial(wchar_t* port, EProtocol protocol, void* abortEvent, void** receiver) {
+  for (const RtsTry& rts : kRtsTries) {
+    for (const DWORD speed : kSpeedTries) {
+      if (speed == kCurrentSpeed) {
+        Trace(L"SearchReceiverOnSerial - try current port speed [%s]\r\n", port);
+      } else {
+        Trace(L"SearchReceiverOnSerial - try speed [%u] [%s]\r\n", speed, port);
+      }
+      Trace(L"SearchReceiverOnSerial - try RTS control is %s [%s]\r\n", rts.name, port);
+      DCB settings = SettingsOfTry(speed, rts.control);
+      const HRESULT result =
+          devapi::CreateReceiverOnSerial(port, protocol, &settings, abortEvent, receiver);
+      if (FAILED(result)) return result;
+      if (*receiver) return S_OK;
+      if (IsSignalled(abortEvent)) return S_FALSE;
+    }
+  }
+  return S_FALSE;
+}

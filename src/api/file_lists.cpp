@@ -1,0 +1,70 @@
+#include "api/file_lists.h"
+
+#include <utility>
+
+#include "api/registry.h"
+#include "platform/api_types.h"
+#include "platform/hresult.h"
+#include "report/report_file.h"
+
+void* FileLists::Insert(std::unique_ptr<CFileList> list) {
+  void* const handle = list.get();
+  lists_.emplace(handle, std::move(list));
+  return handle;
+}
+
+const CFileList* FileLists::Find(void* handle) const {
+  const auto found = lists_.find(handle);
+  return found == lists_.end() ? nullptr : found->second.get();
+}
+
+bool FileLists::Remove(void* handle) { return lists_.erase(handle) != 0; }
+
+FileLists& OpenLists() {
+  static FileLists lists;
+  return lists;
+}
+
+namespace devapi {
+
+long OpenFileList(void* receiver, void** fileList) {
+  if (!fileList) return E_INVALIDARG;
+  const std::shared_ptr<CIReceiver> found = Receivers().Find(receiver);
+  if (!found) return E_INVALIDARG;
+  return CatchResult([&] {
+    auto files = std::make_unique<CFileList>();
+    const HRESULT result = found->GetFiles(files.get());
+    if (FAILED(result)) return result;
+    *fileList = OpenLists().Insert(std::move(files));
+    return result;
+  });
+}
+
+long GetFilesCount(void* fileList, long* count) {
+  if (!count) return E_INVALIDARG;
+  const CFileList* const files = OpenLists().Find(fileList);
+  if (!files) return E_INVALIDARG;
+  *count = files->Count();
+  return S_OK;
+}
+
+long GetFileInfo(void* fileList, long index, CFileInfo* info) {
+  if (!info) return E_INVALIDARG;
+  const CFileList* const files = OpenLists().Find(fileList);
+  if (!files) return E_INVALIDARG;
+  if (index >= files->Count()) return E_INVALIDARG;
+  // A negative index goes on to the bounds check of the list: it is the host's mistake, not an
+  // answer to be had.
+  const CFileInfo& file = files->At(index);
+  *info = file;
+  info->bstrName = nullptr;
+  return CatchResult([&] {
+    info->bstrName = CopyBstr(file.bstrName).release();
+    Trace(L"GetFileInfo - [%s] [%u]\r\n", info->bstrName, info->dwSize);
+    return S_OK;
+  });
+}
+
+long CloseFileList(void* fileList) { return OpenLists().Remove(fileList) ? S_OK : E_INVALIDARG; }
+
+}  // namespace devapi

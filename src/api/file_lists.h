@@ -1,0 +1,27 @@
+// The table of open file lists. A list's handle is its address. The table has no lock: hosts do not
+// use file lists from several threads at once.
+#ifndef RCVLINK_API_FILE_LISTS_H_
+#define RCVLINK_API_FILE_LISTS_H_
+
+#include <memory>
+#include <unordered_map>
+
+#include "receiver/file_list.h"
+
+class FileLists {
+ public:
+  // Registers a list and gives its handle.
+  void* Insert(std::unique_ptr<CFileList> list);
+  // Null when the handle is unknown.
+  const CFileList* Find(void* handle) const;
+  // False when the handle is unknown.
+  bool Remove(void* handle);
+
+ private:
+  std::unordered_map<void*, std::unique_ptr<CFileList>> lists_;
+};
+
+// The process's own. It is emptied at unload.
+FileLists& OpenLists();
+
+#endif  // RCVLINK_API_FILE_LISTS_H_

@@ -1,0 +1,50 @@
+// The module's start and end.
+#include <array>
+#include <cstddef>
+#include <vector>
+
+#include "api/file_lists.h"
+#include "api/registry.h"
+#include "platform/win32.h"
+#include "report/report_file.h"
+
+namespace {
+
+// Writes the load line with the module's path and product version; nothing when a step fails. No
+// report can be open this early, so the line never shows: hosts open one through the loaded
+// library.
+void TraceModule(HMODULE module) {
+  std::array<wchar_t, MAX_PATH> path{};
+  if (GetModuleFileNameW(module, path.data(), MAX_PATH) == 0) return;
+  DWORD ignored = 0;
+  const DWORD size = GetFileVersionInfoSizeW(path.data(), &ignored);
+  if (size == 0) return;
+  std::vector<std::byte> block(size);
+  if (!GetFileVersionInfoW(path.data(), 0, size, block.data())) return;
+  VS_FIXEDFILEINFO* version = nullptr;
+  UINT version_size = 0;
+  if (!VerQueryValueW(block.data(), L"\\", reinterpret_cast<void**>(&version), &version_size)) {
+    return;
+  }
+  Trace(L"Module is loaded [%s] [%u.%u.%u.%u]\r\n",
+        path.data(),
+        HIWORD(version->dwProductVersionMS),
+        LOWORD(version->dwProductVersionMS),
+        HIWORD(version->dwProductVersionLS),
+        LOWORD(version->dwProductVersionLS));
+}
+
+}  // namespace
+
+extern "C" BOOL WINAPI DllMain(HINSTANCE module, DWORD reason, void* /*reserved*/) {
+  if (reason == DLL_PROCESS_ATTACH) {
+    // Made here, in this order, so that at unload the receivers go before the report.
+    PrepareReport();
+    Receivers();
+    OpenLists();
+    TraceModule(module);
+  } else if (reason == DLL_PROCESS_DETACH) {
+    Trace(L"Bye!\r\n");
+  }
+  return TRUE;
+}

@@ -1,0 +1,91 @@
+#include "api/registry.h"
+
+#include <mutex>
+#include <utility>
+
+#include "platform/api_types.h"
+#include "platform/hresult.h"
+#include "report/report_file.h"
+
+namespace {
+
+// Letter case counts; a null name is the same as an empty one.
+bool IsSameName(wchar_t* left, wchar_t* right) {
+  constexpr ULONG kNoFlags = 0;
+  return VarBstrCmp(left, right, LOCALE_USER_DEFAULT, kNoFlags) == static_cast<HRESULT>(VARCMP_EQ);
+}
+
+}  // namespace
+
+HRESULT ReceiverRegistry::Insert(const wchar_t* port,
+                                 std::shared_ptr<CIReceiver> receiver,
+                                 void** handle) {
+  return CatchResult([&] {
+    void* const address = receiver.get();
+    Entry entry{.port = CopyBstr(port), .receiver = std::move(receiver)};
+    const std::scoped_lock lock(lock_);
+    entries_.emplace(address, std::move(entry));
+    *handle = address;
+    return S_OK;
+  });
+}
+
+std::shared_ptr<CIReceiver> ReceiverRegistry::Find(void* handle) {
+  const std::scoped_lock lock(lock_);
+  const auto found = entries_.find(handle);
+  return found == entries_.end() ? nullptr : found->second.receiver;
+}
+
+HRESULT ReceiverRegistry::Open(const wchar_t* port, void** handle) {
+  if (!handle) return E_INVALIDARG;
+  const std::scoped_lock lock(lock_);
+  if (entries_.empty()) return S_FALSE;
+  const UniqueBstr name = CopyBstr(port);
+  for (auto& [address, entry] : entries_) {
+    if (!IsSameName(entry.port.get(), name.get())) continue;
+    ++entry.use_count;
+    Trace(L"OpenReceiver - ref [%u] [%s]\r\n", entry.use_count, port);
+    *handle = address;
+    return S_OK;
+  }
+  return S_FALSE;
+}
+
+HRESULT ReceiverRegistry::Close(void* handle) {
+  const std::scoped_lock lock(lock_);
+  const auto found = entries_.find(handle);
+  if (found == entries_.end()) {
+    Trace(L"CloseReceiver - receiver not found [0x%p]\r\n", handle);
+    return E_INVALIDARG;
+  }
+  Entry& entry = found->second;
+  if (--entry.use_count != 0) {
+    Trace(L"CloseReceiver - ref [%u] [%s]\r\n", entry.use_count, entry.port.get());
+    return S_FALSE;
+  }
+  devapi::Abort(handle);  // takes the lock again
+  Trace(L"CloseReceiver - removed [%s]\r\n", entry.port.get());
+  entries_.erase(found);
+  return S_OK;
+}
+
+HRESULT ReceiverRegistry::Destroy(const wchar_t* port) {
+  if (!port) return E_INVALIDARG;
+  const std::scoped_lock lock(lock_);
+  if (entries_.empty()) return S_FALSE;
+  const UniqueBstr name = CopyBstr(port);
+  for (auto entry = entries_.begin(); entry != entries_.end(); ++entry) {
+    if (!IsSameName(entry->second.port.get(), name.get())) continue;
+    // Every equal-named receiver that is passed loses one user, and nothing is written for it.
+    if (--entry->second.use_count != 0) continue;
+    Trace(L"DestroyReceiver - removed [%s]\r\n", port);
+    entries_.erase(entry);
+    return S_OK;
+  }
+  return S_FALSE;
+}
+
+ReceiverRegistry& Receivers() {
+  static ReceiverRegistry registry;
+  return registry;
+}

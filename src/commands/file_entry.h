@@ -1,0 +1,16 @@
+// One file of a receiver's directory, as the commands of either family read it.
+#ifndef RCVLINK_COMMANDS_FILE_ENTRY_H_
+#define RCVLINK_COMMANDS_FILE_ENTRY_H_
+
+#include <cstdint>
+#include <string>
+
+#include "platform/win32.h"
+
+struct FileEntry {
+  std::wstring name;
+  uint32_t size = 0;  // bytes
+  SYSTEMTIME time{};  // all zero when the receiver's time could not be read
+};
+
+#endif  // RCVLINK_COMMANDS_FILE_ENTRY_H_

@@ -1,0 +1,87 @@
+#include "commands/receiver_cmd.h"
+
+#include <algorithm>
+#include <cstring>
+#include <limits>
+#include <new>
+
+#include "platform/event.h"
+
+namespace {
+
+// Null when there is no memory.
+std::unique_ptr<uint8_t[]> AllocateBytes(uint32_t length) {
+  return std::unique_ptr<uint8_t[]>(new (std::nothrow) uint8_t[length]);
+}
+
+}  // namespace
+
+CReceiverCmd::CReceiverCmd(const char* text,
+                           uint32_t flags,
+                           uint32_t write_timeout_ms,
+                           uint32_t read_timeout_ms)
+    : flags_(flags), write_timeout_ms_(write_timeout_ms), read_timeout_ms_(read_timeout_ms) {
+  CReceiverCmd::SetCommand(text, static_cast<uint32_t>(std::strlen(text)));
+}
+
+bool CReceiverCmd::SetCommand(const void* bytes, uint32_t length) {
+  std::unique_ptr<uint8_t[]> copy = AllocateBytes(length);
+  if (!copy) return false;
+  std::copy_n(static_cast<const uint8_t*>(bytes), length, copy.get());
+  command_ = std::move(copy);
+  command_length_ = length;
+  return true;
+}
+
+bool CReceiverCmd::SetCommandText(const char* text) {
+  return SetCommand(text, static_cast<uint32_t>(std::strlen(text)));
+}
+
+void CReceiverCmd::SetReply(const char* text) {
+  const auto length = static_cast<uint32_t>(std::strlen(text));
+  std::unique_ptr<uint8_t[]> copy = AllocateBytes(length);
+  if (!copy) return;
+  std::copy_n(text, length, copy.get());
+  reply_ = std::move(copy);
+  reply_length_ = length;
+}
+
+void CReceiverCmd::FreeReply() { reply_.reset(); }
+
+HRESULT CReceiverCmd::AppendReply(const void* bytes, uint32_t length) {
+  if (!bytes) return E_INVALIDARG;
+  if (length == 0) return S_FALSE;
+  const uint32_t old_length = reply_ ? reply_length_ : 0;
+  if (length > std::numeric_limits<uint32_t>::max() - old_length) return E_OUTOFMEMORY;
+  std::unique_ptr<uint8_t[]> joined = AllocateBytes(old_length + length);
+  if (!joined) return E_OUTOFMEMORY;
+  uint8_t* const end = std::copy_n(reply_.get(), old_length, joined.get());
+  std::copy_n(static_cast<const uint8_t*>(bytes), length, end);
+  reply_ = std::move(joined);
+  reply_length_ = old_length + length;
+  return S_OK;
+}
+
+uint32_t CReceiverCmd::GetFlags() const { return flags_; }
+
+void CReceiverCmd::SetFlags(uint32_t flags) { flags_ = flags; }
+
+void CReceiverCmd::SetReadTimeout(uint32_t timeout_ms) { read_timeout_ms_ = timeout_ms; }
+
+uint32_t CReceiverCmd::GetWriteTimeout() const { return write_timeout_ms_; }
+
+uint32_t CReceiverCmd::GetReadTimeout() const { return read_timeout_ms_; }
+
+uint32_t CReceiverCmd::GetCommandLength() const { return command_length_; }
+
+const uint8_t* CReceiverCmd::GetCommand() const { return command_.get(); }
+
+uint32_t CReceiverCmd::GetReplyLength() const { return reply_length_; }
+
+const uint8_t* CReceiverCmd::GetReply() const { return reply_.get(); }
+
+bool CReceiverCmd::IsCancelled(HANDLE abort_event) const {
+  return cancelled_ || IsSignalled(abort_event);
+}
+
+void CReceiverCmd::Cancel() { cancelled_ = true; }

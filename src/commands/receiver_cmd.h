@@ -1,0 +1,69 @@
+// The base of every command sent to a receiver, of either family: the bytes to send, the bytes kept
+// of the reply, flags that only the family reads, two time-outs and the cancelled mark.
+#ifndef RCVLINK_COMMANDS_RECEIVER_CMD_H_
+#define RCVLINK_COMMANDS_RECEIVER_CMD_H_
+
+#include <atomic>
+#include <cstdint>
+#include <memory>
+
+#include "platform/win32.h"
+#include "transport/connection.h"
+
+// A command serves one exchange: construct, Execute, read the results, destroy. One thread drives
+// it; only Cancel may come from another.
+class CReceiverCmd {
+ public:
+  // `text` is sent without its terminating zero.
+  CReceiverCmd(const char* text,
+               uint32_t flags,
+               uint32_t write_timeout_ms,
+               uint32_t read_timeout_ms);
+  CReceiverCmd(const CReceiverCmd&) = delete;
+  CReceiverCmd& operator=(const CReceiverCmd&) = delete;
+  virtual ~CReceiverCmd() = default;
+
+  // False, with the old command kept, when the copy cannot be allocated.
+  virtual bool SetCommand(const void* bytes, uint32_t length);
+  virtual bool SetCommandText(const char* text);
+
+  // Replaces the reply by a copy of the text without its terminating zero. The old reply stays when
+  // the copy cannot be allocated.
+  virtual void SetReply(const char* text);
+  // Frees the reply; its length stays as it was and means nothing from then on.
+  virtual void FreeReply();
+  // E_INVALIDARG for null bytes, S_FALSE for none, E_OUTOFMEMORY with the reply unchanged.
+  virtual HRESULT AppendReply(const void* bytes, uint32_t length);
+
+  virtual uint32_t GetFlags() const;
+  virtual void SetFlags(uint32_t flags);
+  virtual void SetReadTimeout(uint32_t timeout_ms);
+  virtual uint32_t GetWriteTimeout() const;
+  virtual uint32_t GetReadTimeout() const;
+  virtual uint32_t GetCommandLength() const;
+  virtual const uint8_t* GetCommand() const;  // may be null
+  virtual uint32_t GetReplyLength() const;
+  virtual const uint8_t* GetReply() const;  // may be null
+
+  // Whether Cancel was called, or else the event (which may be null) is signalled; never waits.
+  virtual bool IsCancelled(HANDLE abort_event) const;
+
+  // Runs the exchange. S_OK: it ran, and the command knows the outcome; S_FALSE: cancelled; else
+  // the failure that ended it.
+  virtual HRESULT Execute(CIConnection* connection, HANDLE abort_event) = 0;
+
+  // Marks the command for good; Execute ends at its next checkpoint.
+  virtual void Cancel();
+
+ private:
+  uint32_t flags_;
+  std::unique_ptr<uint8_t[]> command_;
+  uint32_t command_length_ = 0;
+  uint32_t write_timeout_ms_;
+  uint32_t read_timeout_ms_;
+  std::unique_ptr<uint8_t[]> reply_;
+  uint32_t reply_length_ = 0;
+  std::atomic<bool> cancelled_ = false;
+};
+
+#endif  // RCVLINK_COMMANDS_RECEIVER_CMD_H_

@@ -1,0 +1,52 @@
+// One block of a Quorin download as it is on the wire, for the block length that is used:
+//
+//   offset  size
+//   0       1     type: 0x02 data, 0x04 last, 0x23 the receiver ends the transfer
+//   1       2     data: sequence number; last: payload length (signed). Little-endian.
+//   3       512   payload; a last block's is padded to its full length
+//   515     2     checksum of the 515 bytes before, carried on from the previous block
+//   517     1     0x03
+//
+// Each block is answered with one control byte.
+#ifndef RCVLINK_QUORIN_BLOCK_H_
+#define RCVLINK_QUORIN_BLOCK_H_
+
+#include <array>
+#include <cstddef>
+#include <cstdint>
+#include <optional>
+#include <span>
+
+constexpr uint8_t kAck = 0x06;            // accepted, send the next
+constexpr uint8_t kNak = 0x15;            // start; or send the current block again
+constexpr uint8_t kEndOfTransfer = 0x23;  // '#'
+
+constexpr size_t kBlockPayload = 512;
+constexpr size_t kBlockHeader = 3;
+constexpr size_t kBlockTrailer = 3;
+constexpr size_t kBlockLength = kBlockHeader + kBlockPayload + kBlockTrailer;
+
+enum class BlockType : uint8_t { kData = 0x02, kLast = 0x04, kEnd = kEndOfTransfer };
+
+class Block {
+ public:
+  uint8_t* data() { return bytes_.data(); }
+
+  BlockType Type() const { return static_cast<BlockType>(bytes_[0]); }
+  uint16_t Sequence() const { return Word(1); }
+  // How much of the payload counts; none when a last block says less than 0 or more than it holds.
+  std::optional<size_t> PayloadLength() const;
+  std::span<const uint8_t> Payload() const { return {bytes_.data() + kBlockHeader, kBlockPayload}; }
+
+  uint16_t Crc() const { return Word(kBlockHeader + kBlockPayload); }
+  bool HasEndByte() const;
+  // Whether the checksum carries on from that of the previous accepted block.
+  bool IsChainedTo(uint16_t previous_crc) const;
+
+ private:
+  uint16_t Word(size_t offset) const;
+
+  std::array<uint8_t, kBlockLength> bytes_{};
+};
+
+#endif  // RCVLINK_QUORIN_BLOCK_H_

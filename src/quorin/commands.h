@@ -1,0 +1,115 @@
+// The commands of the Quorin language. Each is built, executed once over a connection, asked for
+// its results and thrown away. A port index is the number of the receiver's serial port: 0 is port
+// a.
+//
+// The commands whose `flags` are ignored never wait for a reply.
+#ifndef RCVLINK_QUORIN_COMMANDS_H_
+#define RCVLINK_QUORIN_COMMANDS_H_
+
+#include <cstdint>
+#include <string>
+#include <vector>
+
+#include "commands/file_entry.h"
+#include "quorin/quorin_command.h"
+
+namespace QuorinCommands {
+
+// "#OFF#": stops the receiver's echo, whatever state it is in.
+class CEchoOffCmd : public CQuorinCommand {
+ public:
+  explicit CEchoOffCmd(uint32_t flags);
+};
+
+class CDisableEchoCmd : public CQuorinCommand {
+ public:
+  CDisableEchoCmd(int port_index, uint32_t flags);
+};
+
+// An empty line, which a receiver answers with an "RE" message and nothing else.
+class CPingCmd : public CQuorinCommand {
+ public:
+  explicit CPingCmd(uint32_t flags);
+  HRESULT ParseReply(const char* body, uint32_t length, ReplyKind kind, bool* done) override;
+};
+
+// Asks on which of its ports the receiver is talking.
+class CGetPortCmd : public CQuorinCommand {
+ public:
+  explicit CGetPortCmd(uint32_t flags);
+  int PortIndex() const;  // -1 when the reply names none of the ports a to d
+};
+
+class CChangeBaudRateCmd : public CQuorinCommand {
+ public:
+  CChangeBaudRateCmd(int port_index, uint32_t rate, uint32_t flags);
+};
+
+// Parity 1 odd, 2 even, any other value none.
+class CChangeParityCmd : public CQuorinCommand {
+ public:
+  CChangeParityCmd(int port_index, uint8_t parity, uint32_t flags);
+};
+
+class CChangeRTSSignalCmd : public CQuorinCommand {
+ public:
+  CChangeRTSSignalCmd(int port_index, bool on, uint32_t flags);
+};
+
+class CChangeStopbitsCmd : public CQuorinCommand {
+ public:
+  CChangeStopbitsCmd(int port_index, bool two, uint32_t flags);
+};
+
+class CGetFileListCmd : public CQuorinCommand {
+ public:
+  explicit CGetFileListCmd(uint32_t flags);
+  // One message holds one entry; done with the last.
+  HRESULT ParseReply(const char* body, uint32_t length, ReplyKind kind, bool* done) override;
+  const std::vector<FileEntry>& Entries() const { return entries_; }
+
+ private:
+  bool Append(FileEntry entry);
+
+  std::vector<FileEntry> entries_;
+};
+
+// Names are put into the commands as they are.
+class CDeleteFileCmd : public CQuorinCommand {
+ public:
+  CDeleteFileCmd(const std::string& name, uint32_t flags);
+};
+
+// Starts a block transfer.
+class CGetFileCmd : public CQuorinCommand {
+ public:
+  CGetFileCmd(const std::string& name, uint32_t block_length, uint32_t flags);
+};
+
+class CGetFileSizeCmd : public CQuorinCommand {
+ public:
+  CGetFileSizeCmd(const std::string& name, uint32_t flags);
+  int Size() const;  // 0 when the receiver did not say
+};
+
+class CGetReceiverIDCmd : public CQuorinCommand {
+ public:
+  explicit CGetReceiverIDCmd(uint32_t flags);
+  std::wstring Text() const;  // without white space in front
+};
+
+class CGetReceiverModelCmd : public CQuorinCommand {
+ public:
+  explicit CGetReceiverModelCmd(uint32_t flags);
+  std::wstring Text() const;
+};
+
+// Sets the speed of the port that the receiver is talking on, and waits for its word.
+class CSetBoudRateCmd : public CQuorinCommand {
+ public:
+  CSetBoudRateCmd(uint32_t rate, uint32_t flags);
+};
+
+}  // namespace QuorinCommands
+
+#endif  // RCVLINK_QUORIN_COMMANDS_H_

@@ -1,0 +1,32 @@
+// One message of a Quorin directory listing: "{{name,size,time}", "{name,size,time}", ...,
+// "{name,size,time}}", or "{}" for an empty directory.
+#ifndef RCVLINK_QUORIN_FILE_ENTRY_H_
+#define RCVLINK_QUORIN_FILE_ENTRY_H_
+
+#include <optional>
+#include <string_view>
+
+#include "commands/file_entry.h"
+
+namespace QuorinCommands {
+
+struct ListMessage {
+  enum class Kind {
+    kNothing,  // no more than braces and blanks
+    kEnd,      // a closing brace: the list is empty
+    kEntry
+  };
+  Kind kind = Kind::kNothing;
+  FileEntry entry;
+  bool last = false;  // the list closes behind this entry
+};
+
+// Reads one message. Raises E_INVALIDARG when the time base cannot be computed.
+ListMessage ParseListMessage(std::string_view text);
+
+// The local time so many seconds after 1988-01-01 00:00:00 local time; none when it cannot be said.
+std::optional<SYSTEMTIME> TimeFromReceiver(int64_t seconds);
+
+}  // namespace QuorinCommands
+
+#endif  // RCVLINK_QUORIN_FILE_ENTRY_H_

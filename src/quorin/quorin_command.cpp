@@ -1,0 +1,149 @@
+#include "quorin/quorin_command.h"
+
+#include <atomic>
+#include <memory>
+#include <new>
+#include <optional>
+
+#include "platform/clock.h"
+#include "platform/hresult.h"
+#include "platform/text.h"
+#include "report/report_file.h"
+#include "transport/abort_shield.h"
+
+namespace QuorinCommands {
+namespace {
+
+constexpr uint32_t kBufferLength = 65536;
+
+// The next tag of the process: a number between two percent signs.
+std::string NextTag() {
+  static std::atomic<int32_t> counter = 0;
+  return FormatText("%%%i%%", ++counter);
+}
+
+}  // namespace
+
+CQuorinCommand::CQuorinCommand(const char* text, uint32_t flags)
+    : CReceiverCmd(text, flags, kWriteTimeoutMs, kReadTimeoutMs) {}
+
+HRESULT CQuorinCommand::Execute(CIConnection* connection, HANDLE abort_event) {
+  if (!connection) return E_INVALIDARG;
+  FreeReply();
+  if (const HRESULT result = connection->Flush(); FAILED(result)) return result;
+
+  const std::string tag = GetFlags() & kTagged ? NextTag() : std::string();
+  if (const HRESULT result = Send(connection, abort_event, tag); result != S_OK) return result;
+  if (GetFlags() & kNoReply) return S_OK;
+  return ReceiveReply(connection, abort_event, tag);
+}
+
+// A write that was aborted (S_FALSE) ends the command as much as one that failed.
+HRESULT CQuorinCommand::Send(CIConnection* connection, HANDLE abort_event, std::string_view tag) {
+  std::optional<AbortShield> shield;
+  if (send_whole_) shield.emplace(connection);
+  if (!tag.empty()) {
+    const HRESULT result =
+        connection->Write(tag.data(), static_cast<DWORD>(tag.size()), GetWriteTimeout());
+    if (result != S_OK) return result;
+  }
+  if (!send_whole_ && IsCancelled(abort_event)) return S_FALSE;
+  return connection->Write(GetCommand(), GetCommandLength(), GetWriteTimeout());
+}
+
+// What has come of a reply so far, and how far it has been searched.
+class CQuorinCommand::Receiving {
+ public:
+  bool Allocate() {
+    buffer_.reset(new (std::nothrow) char[kBufferLength]);
+    return buffer_ != nullptr;
+  }
+
+  // Reads into the free end of the buffer.
+  HRESULT Read(CIConnection* connection, DWORD timeout_ms, DWORD* count) {
+    const HRESULT result = connection->Read(buffer_.get() + received_, Free(), count, timeout_ms);
+    if (result == S_OK) received_ += *count;
+    return result;
+  }
+
+  std::optional<ReplyHeader> FindHeader() {
+    return FindReplyHeader({buffer_.get(), received_}, scan_from_);
+  }
+  std::string_view Body(const ReplyHeader& header) const {
+    return {buffer_.get() + header.position + kReplyHeaderLength, header.body_length};
+  }
+  void SearchFrom(size_t position) { scan_from_ = position; }
+
+  bool IsFull() const { return Free() == 0; }
+  // How many bytes of the message are still to come.
+  size_t Missing(const ReplyHeader& header) const {
+    const size_t end = header.position + header.MessageLength();
+    return end > received_ ? end - received_ : 0;
+  }
+  bool HasRoomFor(size_t bytes) const { return Free() >= bytes; }
+
+ private:
+  DWORD Free() const { return kBufferLength - static_cast<DWORD>(received_); }
+
+  std::unique_ptr<char[]> buffer_;
+  size_t received_ = 0;
+  size_t scan_from_ = 0;
+};
+
+HRESULT CQuorinCommand::ReceiveReply(CIConnection* connection,
+                                     HANDLE abort_event,
+                                     std::string_view tag) {
+  Receiving receiving;
+  if (!receiving.Allocate()) return E_OUTOFMEMORY;
+  bool done = false;
+  const auto parse_nothing = [&] { return ParseReply("", 1, ReplyKind::kBlank, &done); };
+
+  Clock& clock = CurrentClock();
+  const DWORD start = clock.Ticks();
+  bool read_needed = true;
+  do {
+    if (IsCancelled(abort_event)) return S_FALSE;
+    if (read_needed) {
+      Trace(L"CQuorinCommand::Execute - start reading. Timeout is [%u msec]\r\n", GetReadTimeout());
+      DWORD count = 0;
+      result_ = receiving.Read(connection, GetReadTimeout(), &count);
+      if (result_ != S_OK) return S_OK;
+      if (count == 0) return parse_nothing();
+    }
+    read_needed = true;
+
+    const auto header = receiving.FindHeader();
+    if (!header) {
+      if (receiving.IsFull()) return parse_nothing();
+    } else if (const size_t missing = receiving.Missing(*header); missing != 0) {
+      if (!receiving.HasRoomFor(missing)) return kNotConnected;
+    } else if (std::string_view body = receiving.Body(*header); !body.starts_with(tag)) {
+      // An answer to somebody else's command; ours may be in the buffer already.
+      receiving.SearchFrom(header->position + 1);
+      read_needed = false;
+    } else {
+      body.remove_prefix(tag.size());
+      const HRESULT result =
+          ParseReply(body.data(), static_cast<uint32_t>(body.size()), header->kind, &done);
+      if (done) return result;
+      receiving.SearchFrom(header->position + header->MessageLength());
+      read_needed = false;
+    }
+  } while (clock.Ticks() - start <= GetReadTimeout());
+  return kNotConnected;
+}
+
+HRESULT CQuorinCommand::ParseReply(const char* body, uint32_t length, ReplyKind kind, bool* done) {
+  if (const HRESULT result = AppendReply(body, length); FAILED(result)) return result;
+  kind_ = kind;
+  *done = true;
+  result_ = kind == ReplyKind::kBlank || kind == ReplyKind::kReply ? S_OK : kNotConnected;
+  return result_;
+}
+
+std::string CQuorinCommand::ReplyText() const {
+  const uint8_t* const reply = GetReply();
+  return reply ? std::string(reply, reply + GetReplyLength()) : std::string();
+}
+
+}  // namespace QuorinCommands

@@ -1,0 +1,241 @@
+#include "quorin/quorin_protocol.h"
+
+#include <string>
+#include <utility>
+
+#include "platform/event.h"
+#include "platform/hresult.h"
+#include "platform/text.h"
+#include "quorin/commands.h"
+#include "quorin/protocol_flags.h"
+#include "quorin/settings.h"
+#include "report/report_file.h"
+
+using namespace QuorinCommands;
+
+namespace {
+
+constexpr DWORD kFeatures = 9;
+constexpr DWORD kVariantUsual = 1;
+constexpr DWORD kVariantOfNewModels = 2;
+
+// Writes the reply of a command that failed to the report.
+void DumpInvalidResponse(CIConnection* connection, const CQuorinCommand& command) {
+  const HRESULT result = command.Result();
+  if (SUCCEEDED(result)) return;
+  const std::string name = NarrowNameOf(connection);
+  const uint8_t* const reply = command.GetReply();
+  if (reply && command.GetReplyLength() != 0) {
+    const std::string text(reply, reply + command.GetReplyLength());
+    Trace("CQuorinProtocol::DumpInvalidResponse - [0x%08X] [%s] [%s]\r\n",
+          result,
+          text.c_str(),
+          name.c_str());
+  } else {
+    Trace("CQuorinProtocol::DumpInvalidResponse - [0x%08X] [%s]\r\n", result, name.c_str());
+  }
+}
+
+DWORD VariantOf(const std::wstring& model) {
+  return model.starts_with(L"HVA3") || model.starts_with(L"HVB5") ? kVariantOfNewModels
+                                                                  : kVariantUsual;
+}
+
+}  // namespace
+
+CQuorinProtocol::CQuorinProtocol(std::unique_ptr<CIConnection> connection)
+    : CAbstractProtocol(L"CQuorinProtocol", std::move(connection)),
+      download_read_timeout_ms_(ReadDownloadReadTimeout()) {}
+
+HRESULT CQuorinProtocol::ExecuteCommand(CQuorinCommand& command) {
+  const HRESULT result = ExecuteAsCurrent(command);
+  if (connection()) DumpInvalidResponse(connection(), command);
+  return FAILED(result) ? result : command.Result();
+}
+
+bool CQuorinProtocol::Probe(CIConnection* connection, HANDLE abort_event) {
+  // False ends the handshake with no receiver found.
+  const auto run = [&](CQuorinCommand& command) {
+    const HRESULT result = command.Execute(connection, abort_event);
+    DumpInvalidResponse(connection, command);
+    return SUCCEEDED(result);
+  };
+  const auto aborted = [&] { return IsSignalled(abort_event); };
+
+  CQuorinCommand line_end("\n", kNoReply);
+  if (!run(line_end)) return false;
+  CEchoOffCmd echo_off(kCommandFlags);
+  if (!run(echo_off) || aborted()) return false;
+  CQuorinCommand stop_output("dm\r\n", kNoReply);
+  if (!run(stop_output) || aborted()) return false;
+
+  CPingCmd ping(kCommandFlags);
+  if (!run(ping) || aborted()) return false;
+  if (ping.Result() != S_OK) {
+    Trace(L"CQuorinProtocol::CheckConnection - ping cmd failed [0x%08X] [%s]\r\n",
+          ping.Result(),
+          NameOf(connection).c_str());
+    return false;
+  }
+
+  CGetPortCmd get_port(kCommandFlags);
+  if (!run(get_port) || aborted() || get_port.PortIndex() < 0) return false;
+  CDisableEchoCmd disable_echo(get_port.PortIndex(), kCommandFlags);
+  return run(disable_echo);
+}
+
+HRESULT CQuorinProtocol::CheckConnection(HANDLE abort_event, short* answer) {
+  if (!answer) return E_INVALIDARG;
+  if (!connection()) return kNotConnected;
+  if (const HRESULT locked = LockConnection(abort_event); locked < 0 || locked == S_FALSE) {
+    return locked;
+  }
+  const HRESULT result = CatchResult([&] {
+    *answer = Probe(connection(), abort_event) ? VARIANT_TRUE : VARIANT_FALSE;
+    return S_OK;
+  });
+  UnlockConnection();
+  return result;
+}
+
+HRESULT CQuorinProtocol::GetReceiverInfo(HANDLE abort_event, CReceiverInfo* info) {
+  Trace(L"CQuorinProtocol::GetReceiverInfo\r\n");
+  if (!info) return E_INVALIDARG;
+  if (!connection()) return kNotConnected;
+  info->bstrReceiverId = nullptr;
+  info->bstrModel = nullptr;
+  return CatchResult([&] {
+    const HRESULT locked = LockConnection(abort_event);
+    if (locked < 0 || locked == S_FALSE) return locked;
+    // From here a failure leaves the connection locked, for the caller's UnlockConnection.
+    ReadIdentity(info);
+    Trace(L"CQuorinProtocol::GetReceiverInfo - OK\r\n");
+    return S_OK;
+  });
+}
+
+void CQuorinProtocol::ReadIdentity(CReceiverInfo* info) {
+  const auto ask = [&](auto& command) {
+    ThrowIfFailed(ExecuteCommand(command));
+    if (command.Kind() != ReplyKind::kReply) throw HResultError(S_FALSE);
+    return command.Text();
+  };
+  ReportProgress(0);
+  CGetReceiverIDCmd get_id(kCommandFlags);
+  UniqueBstr id = CopyBstr(ask(get_id).c_str());
+  ThrowIfAborted();
+  ReportProgress(50);
+  CGetReceiverModelCmd get_model(kCommandFlags);
+  const std::wstring model_text = ask(get_model);
+  UniqueBstr model = CopyBstr(model_text.c_str());
+  ThrowIfAborted();
+  UnlockConnection();
+  ReportProgress(100);
+
+  info->dwFeatures = kFeatures;
+  info->dwProtocol = eProtocolQuorin;
+  info->dwVariant = VariantOf(model_text);
+  info->bstrReceiverId = id.release();
+  info->bstrModel = model.release();
+}
+
+HRESULT CQuorinProtocol::GetFiles(CFileList* files) {
+  if (!files) return E_INVALIDARG;
+  if (!connection()) return kNotConnected;
+  return CatchResult([&] {
+    CGetFileListCmd get_list(kCommandFlags);
+    ReportProgress(0);
+    {
+      const MutexGuard guard(connection_lock_);
+      Trace(L"CQuorinProtocol::GetFiles - connection is locked [0x%p]\r\n",
+            connection_lock_.handle());
+      ThrowIfAborted();
+      ThrowIfFailed(ExecuteCommand(get_list));
+      ThrowIfFailed(get_list.Result());
+    }
+    Trace(L"CQuorinProtocol::GetFiles - connection is unlocked [0x%p]\r\n",
+          connection_lock_.handle());
+    ThrowIfAborted();
+
+    constexpr DWORD kListRead = 90;
+    constexpr DWORD kListCopying = 10;
+    ReportProgress(kListRead);
+    const auto count = static_cast<DWORD>(get_list.Entries().size());
+    DWORD i = 0;
+    for (const FileEntry& entry : get_list.Entries()) {
+      if (!files->Append(CopyBstr(entry.name.c_str()), entry.size, entry.time)) {
+        throw HResultError(E_OUTOFMEMORY);
+      }
+      ReportProgress(kListCopying * i++ / count + kListRead);
+    }
+    Trace(L"CQuorinProtocol::GetFiles - OK\r\n");
+    return S_OK;
+  });
+}
+
+HRESULT CQuorinProtocol::DeleteFile(const wchar_t* name) {
+  if (!name) return E_INVALIDARG;
+  if (!connection()) return kNotConnected;
+  return CatchResult([&] {
+    const MutexGuard guard(connection_lock_);
+    Trace(L"CQuorinProtocol::DeleteFile - connection is locked [0x%p]\r\n",
+          connection_lock_.handle());
+    ThrowIfAborted();
+    ReportProgress(0);
+    CDeleteFileCmd remove(ToNarrow(name), kCommandFlags);
+    ThrowIfFailed(ExecuteCommand(remove));
+    ThrowIfAborted();
+    ReportProgress(100);
+    Trace(L"CQuorinProtocol::DeleteFile - OK\r\n");
+    return S_OK;
+  });
+}
+
+HRESULT CQuorinProtocol::RenameFile(const wchar_t*, const wchar_t*) { return E_NOTIMPL; }
+
+// Called once, before any operation: it needs no lock.
+void CQuorinProtocol::SetCallback(CIProtocolCallback* callback) { callback_ = callback; }
+
+void CQuorinProtocol::ThrowIfAborted() {
+  if (TakeAbort()) throw HResultError(S_FALSE);
+}
+
+template <typename MakeCommand>
+HRESULT CQuorinProtocol::ChangePort(MakeCommand make_command) {
+  CGetPortCmd get_port(kCommandFlags);
+  if (const HRESULT result = ExecuteCommand(get_port); FAILED(result)) return result;
+  ThrowIfAborted();
+  const int port_index = get_port.PortIndex();
+  if (port_index < 0) return S_FALSE;
+  auto command = make_command(port_index);
+  command.SendWhole();
+  const HRESULT result = ExecuteCommand(command);
+  return FAILED(result) ? result : S_OK;
+}
+
+HRESULT CQuorinProtocol::ChangeReceiverSpeed(DWORD speed) {
+  return ChangePort([&](int port) { return CChangeBaudRateCmd(port, speed, kCommandFlags); });
+}
+
+HRESULT CQuorinProtocol::DCSetRcvBaudrate(DWORD baud_rate) {
+  return CatchResult([&] { return ChangeReceiverSpeed(baud_rate); });
+}
+
+HRESULT CQuorinProtocol::DCSetRcvRTSControl(BYTE rts) {
+  return CatchResult([&] {
+    return ChangePort([&](int port) { return CChangeRTSSignalCmd(port, rts != 0, kCommandFlags); });
+  });
+}
+
+HRESULT CQuorinProtocol::DCSetRcvParity(BYTE parity) {
+  return CatchResult([&] {
+    return ChangePort([&](int port) { return CChangeParityCmd(port, parity, kCommandFlags); });
+  });
+}
+
+HRESULT CQuorinProtocol::DCSetRcvStopbits(BYTE stop_bits) {
+  return CatchResult([&] {
+    return ChangePort(
+        [&](int port) { return CChangeStopbitsCmd(port, stop_bits != 0, kCommandFlags); });
+  });
+}

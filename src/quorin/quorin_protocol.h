@@ -1,0 +1,67 @@
+// The driver of Quorin receivers: each operation is a short sequence of Quorin commands over the
+// connection that the driver owns.
+#ifndef RCVLINK_QUORIN_QUORIN_PROTOCOL_H_
+#define RCVLINK_QUORIN_QUORIN_PROTOCOL_H_
+
+#include <cstdint>
+#include <memory>
+#include <optional>
+
+#include "quorin/quorin_command.h"
+#include "receiver/abstract_protocol.h"
+
+class CQuorinProtocol : public CAbstractProtocol {
+ public:
+  explicit CQuorinProtocol(std::unique_ptr<CIConnection> connection);
+
+  // Whether a Quorin receiver, in whatever state, answers on the connection. The abort event (may
+  // be null) is looked at between the steps.
+  static bool Probe(CIConnection* connection, HANDLE abort_event);
+
+  HRESULT CheckConnection(HANDLE abort_event, short* answer) override;
+  HRESULT GetReceiverInfo(HANDLE abort_event, CReceiverInfo* info) override;
+  HRESULT GetFiles(CFileList* files) override;
+  HRESULT DownloadFile(const wchar_t* name, IStream* stream, CProgressCallback* progress) override;
+  HRESULT DeleteFile(const wchar_t* name) override;
+  HRESULT RenameFile(const wchar_t* old_name, const wchar_t* new_name) override;
+  void SetCallback(CIProtocolCallback* callback) override;
+  HRESULT DCSetRcvBaudrate(DWORD baud_rate) override;
+  HRESULT DCSetRcvRTSControl(BYTE rts) override;
+  HRESULT DCSetRcvParity(BYTE parity) override;
+  HRESULT DCSetRcvStopbits(BYTE stop_bits) override;
+
+  // Runs one command as the current one. The failure that ended it, else the command's own result.
+  virtual HRESULT ExecuteCommand(QuorinCommands::CQuorinCommand& command);
+  // The block transfer that follows a get command, into the stream. `size` is what the receiver
+  // said (at least 1) and serves the progress only.
+  virtual HRESULT DownloadOverSerial(IStream* stream, int size);
+  virtual HRESULT DownloadOverUSB(IStream* stream, int size, DWORD block_length);
+
+ private:
+  // Asks for the receiver's port and sends it one setting. S_FALSE when it names none, or the
+  // command's failure; raises S_FALSE when an abort came before the setting was sent.
+  template <typename MakeCommand>
+  HRESULT ChangePort(MakeCommand make_command);
+  HRESULT ChangeReceiverSpeed(DWORD speed);
+
+  void ReadIdentity(CReceiverInfo* info);
+
+  // The three parts of a download.
+  DWORD RaiseSpeed();
+  HRESULT Transfer(const wchar_t* name, IStream* stream, EInstanceType link);
+  void RestoreSpeed(DWORD saved_speed);
+
+  // The steps of a block transfer; one that gives a result ends it.
+  struct Download;
+  std::optional<HRESULT> TakeSerialBlock(Download& download, IStream* stream, uint32_t size);
+  std::optional<HRESULT> AfterFailedRead(HRESULT failure, Download& download);
+  std::optional<HRESULT> AskAgain();
+  HRESULT EndCancelledDownload(const wchar_t* trace_line);
+  HRESULT WriteControl(uint8_t control);
+
+  void ThrowIfAborted();
+
+  DWORD download_read_timeout_ms_;
+};
+
+#endif  // RCVLINK_QUORIN_QUORIN_PROTOCOL_H_

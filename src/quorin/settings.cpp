@@ -1,0 +1,43 @@
+#include "quorin/settings.h"
+
+#include "platform/handle.h"
+#include "report/report_file.h"
+
+namespace {
+
+constexpr DWORD kDefaultTimeoutMs = 30000;
+constexpr wchar_t kKeyPath[] = L"Software\\Quorin\\QuorinDeviceMgr\\QuorinProtocol";
+constexpr wchar_t kValueName[] = L"DownloadReadTimeout";
+
+struct RegistryKeyTraits {
+  using Handle = HKEY;
+  static Handle Empty() { return nullptr; }
+  static void Close(Handle key) { RegCloseKey(key); }
+};
+using RegistryKey = UniqueHandle<RegistryKeyTraits>;
+
+RegistryKey OpenKey() {
+  HKEY key = nullptr;
+  RegOpenKeyExW(HKEY_CURRENT_USER, kKeyPath, 0, KEY_READ, &key);
+  return RegistryKey(key);
+}
+
+}  // namespace
+
+DWORD ReadDownloadReadTimeout() {
+  DWORD timeout_ms = kDefaultTimeoutMs;
+  const RegistryKey key = OpenKey();
+  if (!key) return timeout_ms;
+  // Four bytes of whatever type are taken as they are; only the right type is worth a line.
+  DWORD type = REG_NONE;
+  DWORD size = sizeof(timeout_ms);
+  const LSTATUS status = RegQueryValueExW(
+      key.get(), kValueName, nullptr, &type, reinterpret_cast<BYTE*>(&timeout_ms), &size);
+  if (status == ERROR_SUCCESS && type == REG_DWORD) {
+    Trace(
+        L"CQuorinProtocol::CQuorinProtocol - file download read timeout /DownloadReadTimeout/ - "
+        L"%u\r\n",
+        timeout_ms);
+  }
+  return timeout_ms;
+}

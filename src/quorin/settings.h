@@ -1,0 +1,11 @@
+// The one setting that a user can make: the registry value DownloadReadTimeout.
+#ifndef RCVLINK_QUORIN_SETTINGS_H_
+#define RCVLINK_QUORIN_SETTINGS_H_
+
+#include "platform/win32.h"
+
+// How long a download over USB waits for each read, in milliseconds: the value DownloadReadTimeout
+// (REG_DWORD) of the current user's key Software\Quorin\QuorinDeviceMgr\QuorinProtocol, or 30000.
+DWORD ReadDownloadReadTimeout();
+
+#endif  // RCVLINK_QUORIN_SETTINGS_H_

@@ -1,0 +1,59 @@
+// What the drivers of both families share: the connection they own, its lock, the command that is
+// running, the abort, and the way of progress upward. A driver speaks its family's commands only.
+#ifndef RCVLINK_RECEIVER_ABSTRACT_PROTOCOL_H_
+#define RCVLINK_RECEIVER_ABSTRACT_PROTOCOL_H_
+
+#include <memory>
+#include <string>
+
+#include "commands/receiver_cmd.h"
+#include "platform/critical_section.h"
+#include "platform/mutex.h"
+#include "receiver/protocol.h"
+#include "transport/connection.h"
+
+class CAbstractProtocol : public CIProtocol {
+ public:
+  HRESULT UploadFile(const CFileInfo* info, IStream* stream) override;
+  void Abort() override;
+  HRESULT LockConnection(HANDLE abort_event) override;
+  HRESULT UnlockConnection() override;
+
+ protected:
+  // `class_name` opens the driver's report lines and lives as long as the driver. Raises the
+  // HRESULT of the Win32 error when a lock cannot be made.
+  CAbstractProtocol(const wchar_t* class_name, std::unique_ptr<CIConnection> connection);
+
+  CIConnection* connection() const { return connection_.get(); }
+
+  // Executes a command as the current one, so that Abort reaches it.
+  HRESULT ExecuteAsCurrent(CReceiverCmd& command);
+
+  // Whether an abort came; finding it forgets it, so one abort ends one operation. A cancel of the
+  // connection that came with it and ended no wait is used up too, or it would end the first wait
+  // of what follows.
+  bool TakeAbort();
+
+  // A progress report, at most 100.
+  void ReportProgress(DWORD percent);
+
+  CriticalSection callback_lock_;  // guards callback_
+  CIProtocolCallback* callback_ = nullptr;
+  Mutex connection_lock_;  // held for a whole operation on the receiver
+
+ private:
+  void SetCurrentCommand(CReceiverCmd* command);
+  void UseUpCancel();
+
+  const wchar_t* class_name_;
+  CriticalSection command_lock_;  // guards abort_ and current_command_
+  bool abort_ = false;
+  CReceiverCmd* current_command_ = nullptr;
+  std::unique_ptr<CIConnection> connection_;  // last, so that the link goes first
+};
+
+// The name of a connection for the report, in the thread's ANSI code page; empty when it has none.
+std::string NarrowNameOf(CIConnection* connection);
+std::wstring NameOf(CIConnection* connection);
+
+#endif  // RCVLINK_RECEIVER_ABSTRACT_PROTOCOL_H_

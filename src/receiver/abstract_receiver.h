@@ -1,0 +1,50 @@
+// The receiver object behind a host's handle: it owns the driver of the family that answered,
+// traces each operation and hands it on, and carries the host's progress function to the driver.
+#ifndef RCVLINK_RECEIVER_ABSTRACT_RECEIVER_H_
+#define RCVLINK_RECEIVER_ABSTRACT_RECEIVER_H_
+
+#include <memory>
+
+#include "platform/api_types.h"
+#include "platform/critical_section.h"
+#include "receiver/protocol.h"
+#include "receiver/receiver.h"
+
+class CAbstractReceiver : public CIReceiver, public CIProtocolCallback {
+ public:
+  // Raises the HRESULT of the Win32 error when its lock cannot be made.
+  explicit CAbstractReceiver(std::unique_ptr<CIProtocol> driver);
+
+  HRESULT Reserved1() override;
+  HRESULT Reserved2() override;
+  HRESULT CheckConnection(HANDLE abort_event, short* answer) override;
+  HRESULT GetReceiverInfo(HANDLE abort_event, CReceiverInfo* info) override;
+  HRESULT GetFiles(CFileList* files) override;
+  HRESULT DownloadFile(const wchar_t* name, IStream* stream, CProgressCallback* progress) override;
+  HRESULT UploadFile(const CFileInfo* info, IStream* stream, CProgressCallback* progress) override;
+  HRESULT DeleteFile(const wchar_t* name) override;
+  HRESULT RenameFile(const wchar_t* old_name, const wchar_t* new_name) override;
+  HRESULT Abort() override;
+  HRESULT LockConnection(HANDLE abort_event) override;
+  HRESULT UnlockConnection() override;
+  HRESULT DCSetRcvBaudrate(DWORD baud_rate) override;
+  HRESULT DCSetRcvRTSControl(BYTE rts) override;
+  HRESULT DCSetRcvParity(BYTE parity) override;
+  HRESULT DCSetRcvStopbits(BYTE stop_bits) override;
+  HRESULT SetProgressCallback(ProgressFunction function, void* context) override;
+
+  void OnProgress(BYTE percent) override;
+
+ private:
+  // The bracket of a transfer: the host's progress record is in place while it runs, and never
+  // after.
+  template <typename Transfer>
+  HRESULT WithProgress(const CProgressCallback* progress, Transfer transfer);
+
+  std::unique_ptr<CIProtocol> driver_;
+  ProgressFunction progress_function_ = nullptr;
+  void* progress_context_ = nullptr;
+  CriticalSection lock_;  // guards the two fields above and each progress call
+};
+
+#endif  // RCVLINK_RECEIVER_ABSTRACT_RECEIVER_H_

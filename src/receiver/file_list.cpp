@@ -1,0 +1,31 @@
+#include "receiver/file_list.h"
+
+#include <limits>
+#include <new>
+
+CFileList::~CFileList() {
+  for (const CFileInfo& file : files_) SysFreeString(file.bstrName);
+}
+
+bool CFileList::Append(UniqueBstr name, DWORD size, const SYSTEMTIME& time) {
+  constexpr size_t kMaxFiles = std::numeric_limits<int>::max() / sizeof(CFileInfo);
+  if (files_.size() >= kMaxFiles) return false;
+  CFileInfo file{};
+  file.dwSize = size;
+  file.stTime1 = time;
+  file.stTime2 = time;
+  try {
+    files_.push_back(file);
+  } catch (const std::bad_alloc&) {
+    return false;
+  }
+  files_.back().bstrName = name.release();
+  return true;
+}
+
+const CFileInfo& CFileList::At(long index) const {
+  if (index < 0 || index >= Count()) {
+    RaiseException(EXCEPTION_ARRAY_BOUNDS_EXCEEDED, EXCEPTION_NONCONTINUABLE, 0, nullptr);
+  }
+  return files_[static_cast<size_t>(index)];
+}

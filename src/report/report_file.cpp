@@ -1,0 +1,159 @@
+#include "report/report_file.h"
+
+#include <algorithm>
+#include <array>
+#include <cstdarg>
+#include <cstdio>
+#include <mutex>
+#include <string>
+#include <string_view>
+#include <vector>
+
+#include "platform/critical_section.h"
+#include "platform/handle.h"
+#include "platform/hresult.h"
+#include "platform/text.h"
+#include "platform/win32.h"
+
+namespace {
+
+class ReportFile {
+ public:
+  void Create(const wchar_t* name);
+  void Close() { file_.Reset(); }
+
+  void WriteEntry(const char* format, va_list arguments);
+  void WriteEntry(const wchar_t* format, va_list arguments);
+
+ private:
+  void WriteStamp();
+  void Write(const char* bytes, size_t length);
+
+  CriticalSection lock_;
+  FileHandle file_;
+};
+
+ReportFile& TheReport() {
+  static ReportFile report;
+  return report;
+}
+
+void ReportFile::Create(const wchar_t* name) {
+  Close();
+  if (!name) return;
+  std::array<wchar_t, MAX_PATH> path{};
+  const DWORD folder_length = GetTempPathW(MAX_PATH, path.data());
+  // A path that does not fit, its ending zero included, is refused: reporting stays off.
+  if (folder_length == 0 || folder_length + std::wstring_view(name).size() >= path.size()) return;
+  std::ranges::copy(std::wstring_view(name), path.begin() + folder_length);
+  file_ = FileHandle(CreateFileW(path.data(),
+                                 GENERIC_WRITE,
+                                 FILE_SHARE_READ,
+                                 nullptr,
+                                 CREATE_ALWAYS,
+                                 FILE_ATTRIBUTE_HIDDEN,
+                                 nullptr));
+}
+
+void ReportFile::Write(const char* bytes, size_t length) {
+  if (!file_) return;
+  DWORD written = 0;
+  WriteFile(file_.get(), bytes, static_cast<DWORD>(length), &written, nullptr);
+}
+
+void ReportFile::WriteStamp() {
+  const std::scoped_lock lock(lock_);
+  SYSTEMTIME now;
+  GetLocalTime(&now);
+  std::array<char, 64> stamp{};
+  const int length = sprintf_s(stamp.data(),
+                               stamp.size(),
+                               "%02u:%02u:%02u.%04u %6lu ",
+                               now.wHour,
+                               now.wMinute,
+                               now.wSecond,
+                               now.wMilliseconds,
+                               GetCurrentThreadId());
+  Write(stamp.data(), static_cast<size_t>(std::max(length, 0)));
+}
+
+void ReportFile::WriteEntry(const char* format, va_list arguments) {
+  const std::scoped_lock lock(lock_);
+  WriteStamp();
+  const std::string text = FormatArguments(format, arguments);
+  Write(text.data(), text.size());
+}
+
+void ReportFile::WriteEntry(const wchar_t* format, va_list arguments) {
+  const std::scoped_lock lock(lock_);
+  WriteStamp();
+  const std::wstring text = FormatArguments(format, arguments);
+
+  // Entries are short; only a longer one needs the heap for its conversion.
+  constexpr size_t kUsualEntry = 1024;
+  std::array<char, (kUsualEntry + 1) * sizeof(wchar_t)> usual{};
+  std::vector<char> longer;
+  const size_t capacity = (text.size() + 1) * sizeof(wchar_t);
+  if (capacity > usual.size()) longer.resize(capacity);
+  char* const converted = longer.empty() ? usual.data() : longer.data();
+  if (WideCharToMultiByte(CP_THREAD_ACP,
+                          0,
+                          text.c_str(),
+                          static_cast<int>(text.size()) + 1,
+                          converted,
+                          static_cast<int>(capacity),
+                          nullptr,
+                          nullptr) == 0) {
+    return;
+  }
+  // As many bytes as the text has characters, so that reports stay byte-identical: with multi-byte
+  // characters the tail of the line is cut.
+  Write(converted, text.size());
+}
+
+}  // namespace
+
+namespace dump_hlp {
+
+void CreateReportFile(const wchar_t* name) { TheReport().Create(name); }
+
+void CreateReportFile(const char* name) {
+  constexpr int kUsualName = 128;
+  std::wstring wide(kUsualName, L'\0');
+  int length = MultiByteToWideChar(CP_THREAD_ACP, 0, name, -1, wide.data(), kUsualName);
+  if (length == 0 && GetLastError() == ERROR_INSUFFICIENT_BUFFER) {
+    length = MultiByteToWideChar(CP_THREAD_ACP, 0, name, -1, nullptr, 0);
+    wide.resize(static_cast<size_t>(length));
+    length = MultiByteToWideChar(CP_THREAD_ACP, 0, name, -1, wide.data(), length);
+  }
+  if (length == 0) throw HResultError(HResultFromError(GetLastError()));
+  CreateReportFile(wide.c_str());
+}
+
+void DumpReportString(const char* format, char* arguments) {
+  TheReport().WriteEntry(format, arguments);
+}
+
+void DumpReportString(const wchar_t* format, char* arguments) {
+  TheReport().WriteEntry(format, arguments);
+}
+
+void CloseReportFile() { TheReport().Close(); }
+
+}  // namespace dump_hlp
+
+void Trace(const wchar_t* format, ...) {
+  va_list arguments;
+  va_start(arguments, format);
+  dump_hlp::DumpReportString(format, arguments);
+  va_end(arguments);
+}
+
+void Trace(const char* format, ...) {
+  va_list arguments;
+  va_start(arguments, format);
+  dump_hlp::DumpReportString(format, arguments);
+  va_end(arguments);
+}
+
+void PrepareReport() { TheReport(); }

@@ -1,0 +1,145 @@
+#include "transport/abstract_connection.h"
+
+#include <array>
+
+#include "platform/hresult.h"
+#include "report/report_file.h"
+
+namespace {
+
+HRESULT CreateEventIfMissing(KernelHandle& event, BOOL manual_reset) {
+  if (!event) event = KernelHandle(CreateEventW(nullptr, manual_reset, FALSE, nullptr));
+  return event ? S_OK : HResultFromError(GetLastError());
+}
+
+}  // namespace
+
+HRESULT CAbstractConnection::CreateEvents() {
+  HRESULT result = CreateEventIfMissing(cancel_event_, FALSE);
+  if (SUCCEEDED(result)) result = CreateEventIfMissing(write_event_, FALSE);
+  if (SUCCEEDED(result)) result = CreateEventIfMissing(read_event_, TRUE);
+  return result;
+}
+
+HRESULT CAbstractConnection::Disconnect() {
+  Cancel();
+  if (device_) {
+    device_.Reset();
+    Trace(L"CAbstractConnection::Disconnect - disconnected [%s]\r\n", name_.get());
+  }
+  if (cancel_event_) ResetEvent(cancel_event_.get());
+  return S_OK;
+}
+
+HRESULT CAbstractConnection::Read(void* buffer, DWORD size, DWORD* bytes_read, DWORD timeout_ms) {
+  *bytes_read = 0;
+  if (!read_event_) return kNotConnected;
+  if (!ResetEvent(read_event_.get())) return HResultFromError(GetLastError());
+
+  const HANDLE handle = GetReadHandle();
+  OVERLAPPED block{};
+  block.hEvent = read_event_.get();
+  if (calls_.ReadFile(handle, buffer, size, bytes_read, &block)) return S_OK;
+  if (const DWORD error = GetLastError(); error != ERROR_IO_PENDING) {
+    Trace(L"CAbstractConnection::Read - read failed [%u] [%s]\r\n", error, name_.get());
+    return HResultFromError(error);
+  }
+
+  const HRESULT result = WaitForTransfer(handle, block, timeout_ms);
+  if (result == kTimedOut) {
+    Trace(L"CAbstractConnection::Read - wait timeout [%s]\r\n", name_.get());
+  }
+  if (result != S_OK) return result;
+  if (!calls_.GetOverlappedResult(handle, &block, bytes_read, FALSE)) {
+    const DWORD error = GetLastError();
+    Trace(L"CAbstractConnection::Read - GetOverlappedResult is failed [%u] [%s]\r\n",
+          error,
+          name_.get());
+    return HResultFromError(error);
+  }
+  return S_OK;
+}
+
+HRESULT CAbstractConnection::Write(const void* buffer, DWORD size, DWORD timeout_ms) {
+  if (!write_event_) return kNotConnected;
+  if (!ResetEvent(write_event_.get())) return HResultFromError(GetLastError());
+
+  const HANDLE handle = GetWriteHandle();
+  OVERLAPPED block{};
+  block.hEvent = write_event_.get();
+  DWORD written = 0;
+  if (calls_.WriteFile(handle, buffer, size, &written, &block)) return S_OK;
+  if (const DWORD error = GetLastError(); error != ERROR_IO_PENDING) {
+    Trace(L"CAbstractConnection::Write - write failed [%u] [%s]\r\n", error, name_.get());
+    return HResultFromError(error);
+  }
+
+  if (timeout_ms != 0) {
+    const HRESULT result = WaitForTransfer(handle, block, timeout_ms);
+    if (result == kTimedOut) {
+      Trace(L"CAbstractConnection::Write - wait timeout [0x%08X] [%s]\r\n", result, name_.get());
+    }
+    if (result != S_OK) return result;
+  }
+  if (!calls_.GetOverlappedResult(handle, &block, &written, FALSE)) {
+    const DWORD error = GetLastError();
+    // A write nobody waited for is still under way; it must not outlive the caller's buffer.
+    if (error == ERROR_IO_INCOMPLETE) CancelTransfer(handle, block);
+    Trace(L"CAbstractConnection::Write - GetOverlappedResult is failed [%u] [%s]\r\n",
+          error,
+          name_.get());
+    return HResultFromError(error);
+  }
+  return S_OK;
+}
+
+HRESULT CAbstractConnection::WaitForTransfer(HANDLE handle, OVERLAPPED& block, DWORD timeout_ms) {
+  // The abort comes first, so it wins when both are signalled.
+  const std::array<HANDLE, 2> events = {GetAbortEvent(), block.hEvent};
+  const DWORD ended =
+      calls_.WaitForMultipleObjects(static_cast<DWORD>(events.size()), events.data(), timeout_ms);
+  if (ended == WAIT_OBJECT_0 + 1) return S_OK;
+
+  HRESULT result = S_FALSE;
+  if (ended == WAIT_TIMEOUT) {
+    result = kTimedOut;
+  } else if (ended != WAIT_OBJECT_0) {
+    result = HResultFromError(GetLastError());
+  }
+  CancelTransfer(handle, block);
+  return result;
+}
+
+void CAbstractConnection::CancelTransfer(HANDLE handle, OVERLAPPED& block) {
+  calls_.CancelIo(handle);
+  // Until the device has let go of it, the transfer may still write to the block and the buffer.
+  DWORD bytes = 0;
+  calls_.GetOverlappedResult(handle, &block, &bytes, TRUE);
+}
+
+HRESULT CAbstractConnection::Flush() { return S_FALSE; }
+
+void CAbstractConnection::Cancel() {
+  if (!cancel_event_) return;
+  Trace(L"CAbstractConnection::Cancel [%s]\r\n", name_ ? name_.get() : L"");
+  SetEvent(cancel_event_.get());
+}
+
+HRESULT CAbstractConnection::GetName(BSTR* name) {
+  if (!name) return E_POINTER;
+  *name = nullptr;
+  return CatchResult([&] {
+    *name = CopyBstr(name_.get()).release();
+    return S_OK;
+  });
+}
+
+void CAbstractConnection::SetAbortEvent(HANDLE event) { abort_event_ = event; }
+
+HANDLE CAbstractConnection::GetWriteHandle() { return device_.get(); }
+
+HANDLE CAbstractConnection::GetReadHandle() { return device_.get(); }
+
+HANDLE CAbstractConnection::GetAbortEvent() {
+  return abort_event_ ? abort_event_ : cancel_event_.get();
+}

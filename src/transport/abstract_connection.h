@@ -1,0 +1,49 @@
+// What serial and USB links share: the device, its name, three events, and overlapped transfers
+// with a time-out and an abort.
+#ifndef RCVLINK_TRANSPORT_ABSTRACT_CONNECTION_H_
+#define RCVLINK_TRANSPORT_ABSTRACT_CONNECTION_H_
+
+#include "platform/handle.h"
+#include "platform/text.h"
+#include "transport/connection.h"
+#include "transport/device_calls.h"
+
+class CAbstractConnection : public CIConnection {
+ public:
+  HRESULT Disconnect() override;
+  HRESULT Read(void* buffer, DWORD size, DWORD* bytes_read, DWORD timeout_ms) override;
+  HRESULT Write(const void* buffer, DWORD size, DWORD timeout_ms) override;
+  HRESULT Flush() override;
+  void Cancel() override;
+  HRESULT GetName(BSTR* name) override;
+  void SetAbortEvent(HANDLE event) override;
+
+  // The handles that Write writes to and Read reads from.
+  virtual HANDLE GetWriteHandle();
+  virtual HANDLE GetReadHandle();
+  // What ends a wait early: the outside abort event, else the connection's own cancel event.
+  virtual HANDLE GetAbortEvent();
+
+ protected:
+  explicit CAbstractConnection(DeviceCalls& calls) : calls_(calls) {}
+
+  // Makes the events that do not exist yet; they outlive re-opening. S_OK or the Win32 error.
+  HRESULT CreateEvents();
+
+  DeviceCalls& calls_;
+  FileHandle device_;
+  UniqueBstr name_;
+
+ private:
+  // Waits for a pending transfer. `finished` is its event; whatever ends the wait, the transfer is
+  // over when this returns, so its block and buffer may go. S_OK only when it was `finished`.
+  HRESULT WaitForTransfer(HANDLE handle, OVERLAPPED& block, DWORD timeout_ms);
+  void CancelTransfer(HANDLE handle, OVERLAPPED& block);
+
+  KernelHandle write_event_;      // auto-reset
+  KernelHandle read_event_;       // manual-reset
+  KernelHandle cancel_event_;     // auto-reset: one Cancel ends one wait
+  HANDLE abort_event_ = nullptr;  // the caller's
+};
+
+#endif  // RCVLINK_TRANSPORT_ABSTRACT_CONNECTION_H_

@@ -1,0 +1,50 @@
+#include "transport/device_calls.h"
+
+HANDLE DeviceCalls::CreateFile(const wchar_t* path, DWORD access, DWORD share, DWORD flags) {
+  return CreateFileW(path, access, share, nullptr, OPEN_EXISTING, flags, nullptr);
+}
+
+BOOL DeviceCalls::ReadFile(
+    HANDLE device, void* buffer, DWORD size, DWORD* read, OVERLAPPED* block) {
+  return ::ReadFile(device, buffer, size, read, block);
+}
+
+BOOL DeviceCalls::WriteFile(
+    HANDLE device, const void* buffer, DWORD size, DWORD* written, OVERLAPPED* block) {
+  return ::WriteFile(device, buffer, size, written, block);
+}
+
+BOOL DeviceCalls::GetOverlappedResult(HANDLE device, OVERLAPPED* block, DWORD* bytes, BOOL wait) {
+  return ::GetOverlappedResult(device, block, bytes, wait);
+}
+
+BOOL DeviceCalls::CancelIo(HANDLE device) { return ::CancelIo(device); }
+
+DWORD DeviceCalls::WaitForMultipleObjects(DWORD count, const HANDLE* handles, DWORD timeout_ms) {
+  return ::WaitForMultipleObjects(count, handles, FALSE, timeout_ms);
+}
+
+BOOL DeviceCalls::SetCommMask(HANDLE device, DWORD mask) { return ::SetCommMask(device, mask); }
+
+BOOL DeviceCalls::SetupComm(HANDLE device, DWORD input_queue, DWORD output_queue) {
+  return ::SetupComm(device, input_queue, output_queue);
+}
+
+BOOL DeviceCalls::GetCommState(HANDLE device, DCB* block) { return ::GetCommState(device, block); }
+
+BOOL DeviceCalls::SetCommState(HANDLE device, DCB* block) { return ::SetCommState(device, block); }
+
+BOOL DeviceCalls::SetCommTimeouts(HANDLE device, COMMTIMEOUTS* timeouts) {
+  return ::SetCommTimeouts(device, timeouts);
+}
+
+BOOL DeviceCalls::ClearCommError(HANDLE device, DWORD* errors, COMSTAT* status) {
+  return ::ClearCommError(device, errors, status);
+}
+
+BOOL DeviceCalls::PurgeComm(HANDLE device, DWORD flags) { return ::PurgeComm(device, flags); }
+
+DeviceCalls& SystemCalls() {
+  static DeviceCalls calls;
+  return calls;
+}

@@ -1,0 +1,34 @@
+// The Win32 calls that connections make, in one place, so that tests can answer them.
+#ifndef RCVLINK_TRANSPORT_DEVICE_CALLS_H_
+#define RCVLINK_TRANSPORT_DEVICE_CALLS_H_
+
+#include "platform/win32.h"
+
+// Each operation is the Win32 function of its name; failures leave their reason in the thread's
+// last error.
+class DeviceCalls {
+ public:
+  virtual ~DeviceCalls() = default;
+
+  virtual HANDLE CreateFile(const wchar_t* path, DWORD access, DWORD share, DWORD flags);
+  virtual BOOL ReadFile(HANDLE device, void* buffer, DWORD size, DWORD* read, OVERLAPPED* block);
+  virtual BOOL WriteFile(
+      HANDLE device, const void* buffer, DWORD size, DWORD* written, OVERLAPPED* block);
+  virtual BOOL GetOverlappedResult(HANDLE device, OVERLAPPED* block, DWORD* bytes, BOOL wait);
+  virtual BOOL CancelIo(HANDLE device);
+  // Waits for any of `count` handles.
+  virtual DWORD WaitForMultipleObjects(DWORD count, const HANDLE* handles, DWORD timeout_ms);
+
+  virtual BOOL SetCommMask(HANDLE device, DWORD mask);
+  virtual BOOL SetupComm(HANDLE device, DWORD input_queue, DWORD output_queue);
+  virtual BOOL GetCommState(HANDLE device, DCB* block);
+  virtual BOOL SetCommState(HANDLE device, DCB* block);
+  virtual BOOL SetCommTimeouts(HANDLE device, COMMTIMEOUTS* timeouts);
+  virtual BOOL ClearCommError(HANDLE device, DWORD* errors, COMSTAT* status);
+  virtual BOOL PurgeComm(HANDLE device, DWORD flags);
+};
+
+// The system's own.
+DeviceCalls& SystemCalls();
+
+#endif  // RCVLINK_TRANSPORT_DEVICE_CALLS_H_

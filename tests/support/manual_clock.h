@@ -1,0 +1,17 @@
+// A clock that a test moves by hand.
+#ifndef RCVLINK_TESTS_SUPPORT_MANUAL_CLOCK_H_
+#define RCVLINK_TESTS_SUPPORT_MANUAL_CLOCK_H_
+
+#include "platform/clock.h"
+
+class ManualClock : public Clock {
+ public:
+  DWORD Ticks() override { return now; }
+
+  DWORD now = 0;
+
+ private:
+  ClockOverride override_{*this};  // in force while this lives
+};
+
+#endif  // RCVLINK_TESTS_SUPPORT_MANUAL_CLOCK_H_
