@@ -86,7 +86,7 @@ namespace devapi {
 
 long CreateReceiverOnSerial(
     wchar_t* port, EProtocol protocol, _DCB* settings, void* abortEvent, void** receiver) {
-  if (!port || !receiver) return E_INVALIDARG;
+  if (!port || !settings || !receiver) return E_INVALIDARG;
   return CatchResult([&] {
     auto connection = std::make_unique<CSerialConnection>();
     Trace(L"CreateReceiverOnSerial - opening serial port [%s]\r\n", port);

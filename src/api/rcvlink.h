@@ -181,12 +181,12 @@ RCVLINK_API long SearchReceiver(
 /// One try on a serial port with settings that the host knows. Parameters as in `SearchReceiver`;
 /// an already registered receiver is not looked for, so two calls make two receivers where the
 /// port can be opened twice.
-/// @param settings Win32's DCB; must not be null. Its baud rate (0 keeps the port's speed), byte
+/// @param settings Win32's DCB. Its baud rate (0 keeps the port's speed), byte
 ///                 size, parity, stop bits and the flags fBinary, fParity, fOutxCtsFlow,
 ///                 fOutxDsrFlow, fDtrControl, fDsrSensitivity, fRtsControl, fAbortOnError are used.
 /// @retval S_OK          found; *receiver holds the handle
 /// @retval S_FALSE       no receiver answered, or aborted
-/// @retval E_INVALIDARG  `port` or `receiver` is null
+/// @retval E_INVALIDARG  `port`, `settings` or `receiver` is null
 /// @retval E_OUTOFMEMORY an allocation failed
 /// @return otherwise why the port could not be opened
 RCVLINK_API long CreateReceiverOnSerial(
