@@ -1,0 +1,38 @@
+#include "file_report.h"
+
+#include <utility>
+
+#include "text.h"
+
+namespace cli {
+
+FileReport::FileReport(Context& context)
+    : context_(context),
+      document_({{"port", ToUtf8(context.arguments.port)}, {"files", Json::array()}}) {}
+
+void FileReport::AddDone(const std::wstring& name, const Json& details) {
+  Json entry = {{"name", ToUtf8(name)}};
+  entry.update(details);
+  document_["files"].push_back(entry);
+}
+
+void FileReport::AddFailed(const std::wstring& name, Failure failure) {
+  failure.port = Printable(context_.arguments.port);
+  context_.Complain(failure);
+  document_["files"].push_back({{"name", ToUtf8(name)}, {"error", ToJson(failure)}});
+  if (!failure_ || failure.exit == ExitCode::kCancelled) failure_ = std::move(failure);
+}
+
+void FileReport::AddUntried(std::size_t count) {
+  if (count == 0) return;
+  const std::string files = count == 1 ? " more file was" : " more files were";
+  context_.Note("  " + std::to_string(count) + files + " not tried.\n");
+  document_["untried"] = count;
+}
+
+Outcome FileReport::Finish() && {
+  if (failure_) document_["error"] = ToJson(*failure_);
+  return {.exit = failure_ ? failure_->exit : ExitCode::kDone, .document = std::move(document_)};
+}
+
+}  // namespace cli

@@ -1,0 +1,38 @@
+/// @file file_report.h
+/// The end of a command that handles several files, of which some may fail.
+#ifndef RCVLINK_CLI_COMMANDS_FILE_REPORT_H_
+#define RCVLINK_CLI_COMMANDS_FILE_REPORT_H_
+
+#include <optional>
+#include <string>
+
+#include "context.h"
+
+namespace cli {
+
+class FileReport {
+ public:
+  explicit FileReport(Context& context);
+
+  /// Records a file that worked.
+  /// @param details what JSON says of it besides its name
+  void AddDone(const std::wstring& name, const Json& details);
+
+  /// Records a file that failed, and tells the user.
+  void AddFailed(const std::wstring& name, Failure failure);
+
+  /// Records that the command ended early.
+  void AddUntried(std::size_t count);
+
+  /// The command's end: that of the first failure, or of the cancellation.
+  Outcome Finish() &&;
+
+ private:
+  Context& context_;
+  Json document_;
+  std::optional<Failure> failure_;
+};
+
+}  // namespace cli
+
+#endif  // RCVLINK_CLI_COMMANDS_FILE_REPORT_H_

@@ -1,0 +1,54 @@
+#include "commands.h"
+#include "receiver.h"
+#include "text.h"
+
+namespace cli {
+namespace {
+
+void Rename(Receiver& receiver,
+            const std::wstring& old_name,
+            const std::wstring& new_name,
+            const std::string& tried) {
+  std::wstring from = old_name;
+  std::wstring to = new_name;
+  receiver.ThrowIfCancelled(tried);
+  const long code = devapi::RenameFile(receiver.handle(), from.data(), to.data());
+  if (code != S_OK) throw receiver.FailureOf(tried, code);
+  // The receiver may refuse and the library not know it: its directory tells.
+  const std::vector<RemoteFile> files = receiver.ListFiles();
+  if (!HasFile(files, new_name) || HasFile(files, old_name)) {
+    throw receiver.FailureOf(
+        tried, code, "the receiver was asked to, but its directory does not show it");
+  }
+}
+
+}  // namespace
+
+Outcome RunMove(Context& context) {
+  const Arguments& arguments = context.arguments;
+  const std::wstring& old_name = arguments.names.front();
+  const std::wstring& new_name = arguments.names.back();
+  const std::string tried = "rename " + Printable(old_name) + " to " + Printable(new_name);
+  Receiver receiver(context);
+  const Identity identity = receiver.Identify();
+  if (!identity.offers_renaming()) {
+    throw Failure{
+        .tried = tried,
+        .code = E_NOTIMPL,
+        .meaning = "a " + FamilyName(identity.family) + " receiver does not offer renaming"};
+  }
+  const std::vector<RemoteFile> files = receiver.ListFiles();
+  FindFile(files, old_name, tried);
+  if (HasFile(files, new_name)) {
+    throw Failure{.tried = tried,
+                  .code = ResultOfWin32(ERROR_FILE_EXISTS),
+                  .meaning = "the receiver has a file of the new name already"};
+  }
+  Rename(receiver, old_name, new_name, tried);
+  context.Tell(Printable(old_name) + " is now " + Printable(new_name) + "\n");
+  return {.document = {{"port", ToUtf8(arguments.port)},
+                       {"old", ToUtf8(old_name)},
+                       {"new", ToUtf8(new_name)}}};
+}
+
+}  // namespace cli

@@ -1,0 +1,81 @@
+#include <map>
+#include <optional>
+
+#include "commands.h"
+#include "file_report.h"
+#include "receiver.h"
+#include "text.h"
+
+namespace cli {
+namespace {
+
+std::string Tried(const std::wstring& name) { return "delete " + Printable(name); }
+
+/// The receiver may refuse and the library not know it: its directory tells.
+std::optional<Failure> WhyStillThere(const std::vector<RemoteFile>& files,
+                                     const std::wstring& name) {
+  if (!HasFile(files, name)) return std::nullopt;
+  return Failure{.tried = Tried(name),
+                 .code = S_OK,
+                 .meaning = "the receiver was asked to, but still has the file"};
+}
+
+/// Asks for each file; stops when cancelled.
+/// @return the names that were asked for with success
+std::vector<std::wstring> RemoveAll(Context& context, Receiver& receiver, FileReport& report) {
+  const std::vector<std::wstring>& names = context.arguments.names;
+  std::vector<std::wstring> removed;
+  for (std::size_t i = 0; i < names.size(); ++i) {
+    std::wstring name = names[i];
+    const bool cancelled = context.interrupt.requested();
+    const long code = cancelled ? ResultOfWin32(ERROR_CANCELLED)
+                                : devapi::DeleteFileW(receiver.handle(), name.data());
+    if (code == S_OK) {
+      removed.push_back(name);
+      continue;
+    }
+    const Failure failure = receiver.FailureOf(Tried(name), code);
+    report.AddFailed(name, failure);
+    if (failure.exit != ExitCode::kCancelled) continue;
+    report.AddUntried(names.size() - i - 1);
+    break;
+  }
+  return removed;
+}
+
+void Verify(Context& context,
+            Receiver& receiver,
+            const std::vector<std::wstring>& removed,
+            FileReport& report) {
+  if (removed.empty()) return;
+  std::vector<RemoteFile> files;
+  std::optional<Failure> unread;
+  try {
+    files = receiver.ListFiles();
+  } catch (const Failure& failure) {
+    unread = failure;
+  }
+  for (const std::wstring& name : removed) {
+    if (unread) unread->tried = "verify that " + Printable(name) + " is deleted";
+    if (const auto failure = unread ? unread : WhyStillThere(files, name)) {
+      report.AddFailed(name, *failure);
+    } else {
+      context.Tell(Printable(name) + ": deleted\n");
+      report.AddDone(name, {{"deleted", true}});
+    }
+  }
+}
+
+}  // namespace
+
+Outcome RunRemove(Context& context) {
+  Receiver receiver(context);
+  const std::vector<RemoteFile> files = receiver.ListFiles();
+  for (const std::wstring& name : context.arguments.names) FindFile(files, name, Tried(name));
+  FileReport report(context);
+  const std::vector<std::wstring> removed = RemoveAll(context, receiver, report);
+  Verify(context, receiver, removed, report);
+  return std::move(report).Finish();
+}
+
+}  // namespace cli

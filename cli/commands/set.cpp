@@ -1,0 +1,78 @@
+#include <algorithm>
+
+#include "commands.h"
+#include "receiver.h"
+#include "text.h"
+
+namespace cli {
+namespace {
+
+/// Keeps the receiver for this thread.
+class ReceiverLock {
+ public:
+  /// @throws Failure when it cannot be had
+  ReceiverLock(const Context& context, Receiver& receiver, const std::string& tried)
+      : receiver_(receiver.handle()) {
+    const long code = devapi::LockConnection(receiver_, context.interrupt.event());
+    if (code != S_OK) throw receiver.FailureOf(tried, code);
+  }
+  ~ReceiverLock() { devapi::UnlockConnection(receiver_); }
+  ReceiverLock(const ReceiverLock&) = delete;
+  ReceiverLock& operator=(const ReceiverLock&) = delete;
+
+ private:
+  void* receiver_;
+};
+
+long Send(void* receiver, Setting setting, unsigned long number) {
+  const auto byte = static_cast<unsigned char>(number);
+  switch (setting) {
+    case Setting::kBaud:
+      return devapi::DCSetRcvBaudrate(receiver, number);
+    case Setting::kParity:
+      return devapi::DCSetRcvParity(receiver, byte);
+    case Setting::kStopBits:
+      return devapi::DCSetRcvStopbits(receiver, byte);
+    case Setting::kRts:
+      return devapi::DCSetRcvRTSControl(receiver, byte);
+  }
+  return E_UNEXPECTED;
+}
+
+std::string Advice(const SettingChange& change) {
+  if (change.setting == Setting::kBaud) {
+    return "  Open it with --speed " + std::to_string(change.value) + " from now on.\n";
+  }
+  return "  Open its port with this setting from now on. (--speed and --rts mean no parity and one "
+         "stop bit.)\n";
+}
+
+}  // namespace
+
+Outcome RunSet(Context& context) {
+  const Arguments& arguments = context.arguments;
+  const SettingChange& change = arguments.change;
+  const std::string name = SettingName(change.setting);
+  const std::string tried = "set the receiver's " + name + " to " + ValueWord(change);
+  Receiver receiver(context);
+  const Identity identity = receiver.Identify();
+  const auto family = static_cast<EProtocol>(identity.family);
+  const auto number = FamilyNumber(change, family);
+  if (!number) {
+    throw Failure{.tried = tried,
+                  .code = E_NOTIMPL,
+                  .meaning = "a " + FamilyName(identity.family) +
+                             " receiver does not offer to control its " + name};
+  }
+  const ReceiverLock lock(context, receiver, tried);
+  receiver.ThrowIfCancelled(tried);
+  const long code = Send(receiver.handle(), change.setting, *number);
+  if (code != S_OK) throw receiver.FailureOf(tried, code);
+  context.Tell(Printable(arguments.port) + ": the receiver's " + name + " was set to " +
+               ValueWord(change) + "; it does not confirm that.\n" + Advice(change));
+  return {.document = {{"port", ToUtf8(arguments.port)},
+                       {"setting", SettingWord(change.setting)},
+                       {"value", ValueWord(change)}}};
+}
+
+}  // namespace cli

@@ -1,0 +1,56 @@
+/// @file context.h
+/// What every command is given, and what it gives back.
+#ifndef RCVLINK_CLI_CONTEXT_H_
+#define RCVLINK_CLI_CONTEXT_H_
+
+#include <nlohmann/json.hpp>
+#include <string>
+
+#include "arguments.h"
+#include "interrupt.h"
+#include "output.h"
+#include "results.h"
+
+namespace cli {
+
+using Json = nlohmann::ordered_json;
+
+struct Context {
+  const Arguments& arguments;
+  const Interrupt& interrupt;
+  Output& out;
+  Output& err;
+
+  /// Prints what was asked for, unless it is asked for as JSON.
+  void Say(const std::string& text) {
+    if (!arguments.json) out.Write(text);
+  }
+
+  /// Prints that something was done.
+  void Tell(const std::string& text) {
+    if (!arguments.quiet) Say(text);
+  }
+
+  /// Tells what is going on besides.
+  void Note(const std::string& text) {
+    if (!arguments.quiet && !arguments.json) err.Write(text);
+  }
+
+  /// Reports a failure after which the command goes on; JSON has it in its document.
+  void Complain(const Failure& failure) {
+    if (!arguments.json) err.Write(Describe(failure));
+  }
+};
+
+/// A command's end. A command that could do nothing throws its `Failure` instead.
+struct Outcome {
+  ExitCode exit = ExitCode::kDone;
+  Json document{};  ///< printed for --json
+};
+
+/// {"tried", "port", "code", "meaning", "hint", "exit"}
+Json ToJson(const Failure& failure);
+
+}  // namespace cli
+
+#endif  // RCVLINK_CLI_CONTEXT_H_

@@ -1,0 +1,73 @@
+/// @file file_stream.h
+/// A download's way from the library into its file.
+#ifndef RCVLINK_CLI_FILE_STREAM_H_
+#define RCVLINK_CLI_FILE_STREAM_H_
+
+#include <windows.h>
+
+#include <objidl.h>
+
+#include <atomic>
+#include <cstdint>
+#include <memory>
+
+#include "part_file.h"
+
+namespace cli {
+
+struct ComReleaser {
+  void operator()(IUnknown* object) const { object->Release(); }
+};
+
+// COM's interfaces have no virtual destructor: objects end in Release, never through a base.
+#pragma GCC diagnostic push
+#pragma GCC diagnostic ignored "-Wnon-virtual-dtor"
+
+/// A COM stream that only takes bytes. It counts them, and remembers its own first failure, since
+/// the library does not always tell of it. The counts may be read from any thread.
+class FileStream final : public IStream {
+ public:
+  /// @param file outlives the stream, or is taken away with `Detach`
+  static std::unique_ptr<FileStream, ComReleaser> Make(PartFile& file);
+
+  std::uint64_t received() const { return received_; }
+
+  /// Win32 error of the first write that failed; ERROR_SUCCESS for none.
+  DWORD first_error() const { return first_error_; }
+
+  /// From now on the stream takes nothing, whoever still holds it.
+  void Detach() { file_ = nullptr; }
+
+  STDMETHODIMP QueryInterface(REFIID id, void** object) override;
+  STDMETHODIMP_(ULONG) AddRef() override;
+  STDMETHODIMP_(ULONG) Release() override;
+  STDMETHODIMP Read(void* data, ULONG size, ULONG* read) override;
+  STDMETHODIMP Write(const void* data, ULONG size, ULONG* written) override;
+  STDMETHODIMP Seek(LARGE_INTEGER move, DWORD origin, ULARGE_INTEGER* position) override;
+  STDMETHODIMP SetSize(ULARGE_INTEGER size) override;
+  STDMETHODIMP CopyTo(IStream* stream,
+                      ULARGE_INTEGER size,
+                      ULARGE_INTEGER* read,
+                      ULARGE_INTEGER* written) override;
+  STDMETHODIMP Commit(DWORD flags) override;
+  STDMETHODIMP Revert() override;
+  STDMETHODIMP LockRegion(ULARGE_INTEGER offset, ULARGE_INTEGER size, DWORD type) override;
+  STDMETHODIMP UnlockRegion(ULARGE_INTEGER offset, ULARGE_INTEGER size, DWORD type) override;
+  STDMETHODIMP Stat(STATSTG* stat, DWORD flags) override;
+  STDMETHODIMP Clone(IStream** stream) override;
+
+ private:
+  explicit FileStream(PartFile& file) : file_(&file) {}
+  virtual ~FileStream() = default;
+
+  std::atomic<ULONG> references_{1};
+  std::atomic<PartFile*> file_;
+  std::atomic<std::uint64_t> received_{0};
+  std::atomic<DWORD> first_error_{ERROR_SUCCESS};
+};
+
+#pragma GCC diagnostic pop
+
+}  // namespace cli
+
+#endif  // RCVLINK_CLI_FILE_STREAM_H_

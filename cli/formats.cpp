@@ -1,0 +1,112 @@
+#include "formats.h"
+
+#include <algorithm>
+#include <array>
+
+#include "text.h"
+
+namespace cli {
+namespace {
+
+constexpr std::uint64_t kMsPerSecond = 1000;
+constexpr std::uint64_t kSecondsPerMinute = 60;
+constexpr std::uint64_t kMinutesPerHour = 60;
+constexpr std::uint64_t kFullPercent = 100;
+
+std::string Number(std::uint64_t value, std::size_t digits) {
+  std::string text = std::to_string(value);
+  return std::string(digits - std::min(digits, text.size()), '0') + text;
+}
+
+std::string TwoDigits(std::uint64_t value) {
+  constexpr std::size_t kDigits = 2;
+  return Number(value, kDigits);
+}
+
+std::string TimeLeft(const TransferState& state) {
+  const std::uint64_t rate = RateOf(state);
+  if (rate == 0) return "--";
+  const std::uint64_t rest = state.total - std::min(state.done, state.total);
+  return FormatDuration((rest + rate - 1) / rate);
+}
+
+/// Fields of fixed width, so that the line does not jump while it changes.
+std::string Figures(const TransferState& state) {
+  constexpr std::size_t kPercentWidth = 3;
+  constexpr std::size_t kSizeWidth = 8;
+  constexpr std::size_t kLeftWidth = 11;
+  return PadLeft(std::to_string(PercentOf(state)), kPercentWidth) + " %  " +
+         PadLeft(FormatBytes(state.done), kSizeWidth) + " of " + FormatBytes(state.total) + "  " +
+         PadLeft(FormatBytes(RateOf(state)), kSizeWidth) + "/s  " +
+         PadLeft(TimeLeft(state), kLeftWidth) + " left";
+}
+
+std::string Bar(unsigned percent) {
+  constexpr std::size_t kBarWidth = 20;
+  const std::size_t filled = percent * kBarWidth / kFullPercent;
+  return PadRight(std::string(filled, '#'), kBarWidth);
+}
+
+}  // namespace
+
+std::string FormatBytes(std::uint64_t bytes) {
+  constexpr std::uint64_t kThousand = 1000;
+  constexpr std::uint64_t kTenth = 100;  // of a thousand
+  constexpr std::array<const char*, 3> kUnits = {" kB", " MB", " GB"};
+  if (bytes < kThousand) return std::to_string(bytes) + " B";
+  std::size_t unit = 0;
+  while (bytes >= kThousand * kThousand && unit + 1 < kUnits.size()) {
+    bytes /= kThousand;
+    ++unit;
+  }
+  return std::to_string(bytes / kThousand) + "." + std::to_string(bytes % kThousand / kTenth) +
+         kUnits[unit];
+}
+
+std::string FormatDuration(std::uint64_t seconds) {
+  const std::uint64_t minutes = seconds / kSecondsPerMinute;
+  if (minutes == 0) return std::to_string(seconds) + " s";
+  if (minutes < kMinutesPerHour) {
+    return std::to_string(minutes) + " min " + TwoDigits(seconds % kSecondsPerMinute) + " s";
+  }
+  return std::to_string(minutes / kMinutesPerHour) + " h " + TwoDigits(minutes % kMinutesPerHour) +
+         " min";
+}
+
+std::string FormatTime(const SYSTEMTIME& time, char separator) {
+  constexpr std::size_t kYearDigits = 4;
+  const bool empty = time.wYear == 0 && time.wMonth == 0 && time.wDay == 0 && time.wHour == 0 &&
+                     time.wMinute == 0 && time.wSecond == 0;
+  if (empty) return "-";
+  return Number(time.wYear, kYearDigits) + "-" + TwoDigits(time.wMonth) + "-" +
+         TwoDigits(time.wDay) + separator + TwoDigits(time.wHour) + ":" + TwoDigits(time.wMinute) +
+         ":" + TwoDigits(time.wSecond);
+}
+
+unsigned PercentOf(const TransferState& state) {
+  if (state.done >= state.total) return kFullPercent;
+  return static_cast<unsigned>(state.done * kFullPercent / state.total);
+}
+
+std::uint64_t RateOf(const TransferState& state) {
+  return state.elapsed_ms == 0 ? 0 : state.done * kMsPerSecond / state.elapsed_ms;
+}
+
+std::string ProgressBar(const TransferState& state, std::size_t width) {
+  const std::string figures = Figures(state);
+  std::string line = "[";
+  line.append(Bar(PercentOf(state))).append("] ").append(figures);
+  if (line.size() > width) return figures.substr(0, width);
+  constexpr std::string_view kGap = "  ";
+  if (line.size() + kGap.size() >= width) return line;
+  const std::size_t room = width - line.size() - kGap.size();
+  return line.append(kGap) + Printable(std::wstring_view(state.name).substr(0, room));
+}
+
+std::string ProgressLine(const TransferState& state) {
+  return Printable(state.name) + ": " + std::to_string(PercentOf(state)) + " %, " +
+         FormatBytes(state.done) + " of " + FormatBytes(state.total) + ", " +
+         FormatBytes(RateOf(state)) + "/s, " + TimeLeft(state) + " left";
+}
+
+}  // namespace cli

@@ -1,0 +1,38 @@
+/// @file output.h
+/// Standard output and standard error, in UTF-8 whatever they are.
+#ifndef RCVLINK_CLI_OUTPUT_H_
+#define RCVLINK_CLI_OUTPUT_H_
+
+#include <windows.h>
+
+#include <string_view>
+
+namespace cli {
+
+/// One of the process's two output handles, which the process owns. Used by one thread at a time.
+class Output {
+ public:
+  /// @param stream STD_OUTPUT_HANDLE or STD_ERROR_HANDLE
+  explicit Output(DWORD stream);
+
+  bool is_terminal() const { return is_terminal_; }
+
+  /// Characters of a terminal's line; a usual number when it does not tell.
+  std::size_t Width() const;
+
+  void Write(std::string_view utf8);
+
+  /// Win32 error of the first write that failed; 0 for none.
+  DWORD first_error() const { return first_error_; }
+
+ private:
+  void WriteBytes(std::string_view bytes);
+
+  HANDLE handle_;
+  bool is_terminal_;
+  DWORD first_error_ = ERROR_SUCCESS;
+};
+
+}  // namespace cli
+
+#endif  // RCVLINK_CLI_OUTPUT_H_

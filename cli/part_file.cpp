@@ -1,0 +1,70 @@
+#include "part_file.h"
+
+#include <utility>
+
+#include "names.h"
+#include "paths.h"
+#include "text.h"
+
+namespace cli {
+
+PartFile::PartFile(std::filesystem::path target, bool overwrite)
+    : target_(std::move(target)),
+      part_(target_.native() + std::wstring(kPartSuffix)),
+      overwrite_(overwrite) {
+  const HANDLE file = CreateFileW(part_.c_str(),
+                                  GENERIC_WRITE | DELETE,
+                                  0,
+                                  nullptr,
+                                  overwrite ? CREATE_ALWAYS : CREATE_NEW,
+                                  FILE_ATTRIBUTE_NORMAL,
+                                  nullptr);
+  const DWORD error = GetLastError();
+  if (file == INVALID_HANDLE_VALUE) {
+    Failure failure = LocalFailure("create " + Printable(part_.native()), error);
+    if (error == ERROR_FILE_EXISTS) {
+      failure.hint =
+          "A download that was cut off left it, or another one is writing it; --force "
+          "replaces it.";
+    }
+    throw failure;
+  }
+  file_.reset(file);
+  SetVanishing(true);
+}
+
+PartFile::~PartFile() {
+  if (kept_) return;
+  file_.reset();
+  DeleteFileW(part_.c_str());  // for file systems that do not know of vanishing files
+}
+
+bool PartFile::SetVanishing(bool vanishing) {
+  FILE_DISPOSITION_INFO info{};
+  info.DeleteFile = vanishing ? TRUE : FALSE;
+  return SetFileInformationByHandle(file_.get(), FileDispositionInfo, &info, sizeof(info)) != FALSE;
+}
+
+DWORD PartFile::Write(const void* data, DWORD size) {
+  DWORD written = 0;
+  if (WriteFile(file_.get(), data, size, &written, nullptr) == FALSE) return GetLastError();
+  return written == size ? ERROR_SUCCESS : ERROR_DISK_FULL;
+}
+
+void PartFile::Keep() {
+  if (FlushFileBuffers(file_.get()) == FALSE) throw FailureOf(GetLastError());
+  SetVanishing(false);
+  file_.reset();
+  const DWORD replace = overwrite_ ? MOVEFILE_REPLACE_EXISTING : 0;
+  if (MoveFileExW(part_.c_str(), target_.c_str(), replace | MOVEFILE_WRITE_THROUGH) == FALSE) {
+    const DWORD error = GetLastError();
+    throw LocalFailure("rename " + Printable(part_.native()), error);
+  }
+  kept_ = true;
+}
+
+Failure PartFile::FailureOf(DWORD error) const {
+  return LocalFailure("write " + Printable(part_.native()), error);
+}
+
+}  // namespace cli

@@ -1,0 +1,126 @@
+#include "receiver.h"
+
+#include <oleauto.h>
+
+#include <algorithm>
+#include <utility>
+
+#include "discovery.h"
+#include "names.h"
+#include "text.h"
+
+namespace cli {
+namespace {
+
+constexpr unsigned kRenameFeature = 4;
+
+struct ListCloser {
+  void operator()(void* list) const { devapi::CloseFileList(list); }
+};
+using UniqueList = std::unique_ptr<void, ListCloser>;
+
+struct StringFreer {
+  void operator()(wchar_t* string) const { SysFreeString(string); }
+};
+
+/// Takes over a string of the library.
+std::wstring Take(wchar_t* string) {
+  const std::unique_ptr<wchar_t, StringFreer> owner(string);
+  return {string, SysStringLen(string)};
+}
+
+/// @returns S_OK or the library's result
+long ReadEntry(void* list, long index, RemoteFile& file) {
+  CFileInfo info{};
+  const long result = devapi::GetFileInfo(list, index, &info);
+  if (result != S_OK) return result;
+  file = {.name = Take(info.bstrName), .size = info.dwSize, .time = info.stTime1};
+  return S_OK;
+}
+
+}  // namespace
+
+bool Identity::offers_renaming() const { return (features & kRenameFeature) != 0; }
+
+void Aborter::Tick() {
+  constexpr unsigned kTicksPerAbort = std::chrono::seconds(1) / kInterval;
+  if (ticks_++ % kTicksPerAbort == 0) devapi::Abort(receiver_);
+}
+
+Receiver::Receiver(Context& context)
+    : interrupt_(context.interrupt),
+      handle_(FindReceiver(context)),
+      cancel_watch_(Aborter::kInterval, [this, aborter = Aborter(handle())]() mutable {
+        if (interrupt_.requested()) aborter.Tick();
+      }) {}
+
+Identity Receiver::Identify() {
+  constexpr const char* kTried = "read the receiver's identity";
+  ThrowIfCancelled(kTried);
+  CReceiverInfo info{};
+  const long result = devapi::GetReceiverInfo(handle(), interrupt_.event(), &info);
+  if (result != S_OK) {
+    devapi::UnlockConnection(handle());  // a failure may have left the receiver locked
+    throw FailureOf(
+        kTried, result, result == S_FALSE ? "the receiver did not answer with its identity" : "");
+  }
+  return {.id = Take(info.bstrReceiverId),
+          .model = Take(info.bstrModel),
+          .family = info.dwProtocol,
+          .variant = info.dwVariant,
+          .features = info.dwFeatures};
+}
+
+std::vector<RemoteFile> Receiver::ListFiles() {
+  constexpr const char* kTried = "list the receiver's files";
+  ThrowIfCancelled(kTried);
+  void* opened = nullptr;
+  const long result = devapi::OpenFileList(handle(), &opened);
+  const UniqueList list(opened);
+  if (result != S_OK) throw FailureOf(kTried, result);
+  long count = 0;
+  if (const long counted = devapi::GetFilesCount(list.get(), &count); counted != S_OK) {
+    throw FailureOf(kTried, counted);
+  }
+  std::vector<RemoteFile> files(static_cast<std::size_t>(count));
+  for (long i = 0; i < count; ++i) {
+    const long read = ReadEntry(list.get(), i, files[static_cast<std::size_t>(i)]);
+    if (read != S_OK) throw FailureOf(kTried, read);
+  }
+  return files;
+}
+
+Failure Receiver::FailureOf(std::string tried, long code, std::string meaning) const {
+  Failure failure{.tried = std::move(tried), .code = code, .meaning = std::move(meaning)};
+  if (interrupt_.requested()) {
+    failure.exit = ExitCode::kCancelled;
+    failure.meaning = "ended by Ctrl-C";
+  }
+  return failure;
+}
+
+void Receiver::ThrowIfCancelled(const std::string& tried) const {
+  if (interrupt_.requested()) throw FailureOf(tried, ResultOfWin32(ERROR_CANCELLED));
+}
+
+bool HasFile(const std::vector<RemoteFile>& files, const std::wstring& name) {
+  return std::any_of(files.begin(), files.end(), [&](const auto& f) { return f.name == name; });
+}
+
+const RemoteFile& FindFile(const std::vector<RemoteFile>& files,
+                           const std::wstring& name,
+                           const std::string& tried) {
+  const auto exact =
+      std::find_if(files.begin(), files.end(), [&](const auto& f) { return f.name == name; });
+  if (exact != files.end()) return *exact;
+  const auto similar = std::find_if(
+      files.begin(), files.end(), [&](const auto& f) { return SameLocalName(f.name, name); });
+  throw Failure{.tried = tried,
+                .code = ResultOfWin32(ERROR_FILE_NOT_FOUND),
+                .meaning = "the receiver has no file of the name " + Printable(name),
+                .hint = similar == files.end()
+                            ? "`rcvlink-cli ls` shows what it has; nothing was done."
+                            : "It has " + Printable(similar->name) + "; nothing was done."};
+}
+
+}  // namespace cli

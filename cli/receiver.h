@@ -1,0 +1,95 @@
+/// @file receiver.h
+/// The receiver at the other end of the cable.
+#ifndef RCVLINK_CLI_RECEIVER_H_
+#define RCVLINK_CLI_RECEIVER_H_
+
+#include <windows.h>
+
+#include <cstdint>
+#include <memory>
+#include <string>
+#include <vector>
+
+#include "context.h"
+#include "rcvlink.h"
+#include "ticker.h"
+
+namespace cli {
+
+/// Who a receiver is.
+struct Identity {
+  std::wstring id{};
+  std::wstring model{};
+  unsigned family = 0;  ///< a number of EProtocol
+  unsigned variant = 0;
+  unsigned features = 0;
+
+  bool offers_renaming() const;
+};
+
+/// One file of the receiver.
+struct RemoteFile {
+  std::wstring name{};
+  std::uint64_t size = 0;
+  SYSTEMTIME time{};
+};
+
+/// Asks the library once a second to end what it is doing: a request may fall between two steps
+/// and be lost.
+class Aborter {
+ public:
+  /// How often `Tick` is to be called.
+  static constexpr std::chrono::milliseconds kInterval{100};
+
+  explicit Aborter(void* receiver) : receiver_(receiver) {}
+  void Tick();
+
+ private:
+  void* receiver_;
+  unsigned ticks_ = 0;
+};
+
+/// A receiver that was found. Ctrl-C ends whatever is being done with it.
+class Receiver {
+ public:
+  /// Finds the receiver that the command line names.
+  /// @throws Failure when there is none
+  explicit Receiver(Context& context);
+
+  void* handle() const { return handle_.get(); }
+
+  /// @throws Failure
+  Identity Identify();
+
+  /// Reads the receiver's directory.
+  /// @throws Failure
+  std::vector<RemoteFile> ListFiles();
+
+  /// What a result other than S_OK makes: a cancellation after Ctrl-C, else a failure.
+  Failure FailureOf(std::string tried, long code, std::string meaning = "") const;
+
+  /// @throws Failure when Ctrl-C was pressed
+  void ThrowIfCancelled(const std::string& tried) const;
+
+ private:
+  struct Closer {
+    void operator()(void* handle) const { devapi::CloseReceiver(handle); }
+  };
+
+  const Interrupt& interrupt_;
+  std::unique_ptr<void, Closer> handle_;
+  Ticker cancel_watch_;  // ends before the handle does
+};
+
+/// The file of that name in a receiver's directory.
+/// @throws Failure when there is none
+const RemoteFile& FindFile(const std::vector<RemoteFile>& files,
+                           const std::wstring& name,
+                           const std::string& tried);
+
+/// Whether a receiver's directory has a file of that name.
+bool HasFile(const std::vector<RemoteFile>& files, const std::wstring& name);
+
+}  // namespace cli
+
+#endif  // RCVLINK_CLI_RECEIVER_H_

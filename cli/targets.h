@@ -1,0 +1,39 @@
+/// @file targets.h
+/// Where downloads go.
+#ifndef RCVLINK_CLI_TARGETS_H_
+#define RCVLINK_CLI_TARGETS_H_
+
+#include <filesystem>
+#include <string>
+#include <vector>
+
+#include "arguments.h"
+
+namespace cli {
+
+/// Chooses the local file of each download, and refuses those that would do harm.
+class Targets {
+ public:
+  explicit Targets(const Arguments& arguments);
+
+  /// The file for a name of the receiver.
+  /// @throws Failure when the name is impossible, the file exists already and may not be
+  ///         overwritten, or an earlier name has taken it
+  std::filesystem::path Choose(const std::wstring& name);
+
+  /// The folder of all targets; empty for that of a single target named by the user.
+  const std::filesystem::path& folder() const { return folder_; }
+
+ private:
+  std::filesystem::path PathOf(const std::wstring& name) const;
+  bool IsTaken(const std::filesystem::path& target) const;
+
+  bool force_;
+  std::filesystem::path file_;  // of a single download; else empty
+  std::filesystem::path folder_;
+  std::vector<std::filesystem::path> chosen_;
+};
+
+}  // namespace cli
+
+#endif  // RCVLINK_CLI_TARGETS_H_

@@ -1,0 +1,90 @@
+#include "text.h"
+
+#include <windows.h>
+
+#include <algorithm>
+#include <cctype>
+#include <charconv>
+
+namespace cli {
+namespace {
+
+constexpr int kHexBase = 16;
+constexpr std::size_t kCodeDigits = 8;
+
+bool IsBetween(wchar_t character, wchar_t first, wchar_t last) {
+  return character >= first && character <= last;
+}
+
+}  // namespace
+
+std::string ToUtf8(std::wstring_view text) {
+  const int length = static_cast<int>(text.size());
+  const int size =
+      WideCharToMultiByte(CP_UTF8, 0, text.data(), length, nullptr, 0, nullptr, nullptr);
+  std::string utf8(static_cast<std::size_t>(size), '\0');
+  WideCharToMultiByte(CP_UTF8, 0, text.data(), length, utf8.data(), size, nullptr, nullptr);
+  return utf8;
+}
+
+std::wstring ToUtf16(std::string_view text) {
+  const int length = static_cast<int>(text.size());
+  const int size = MultiByteToWideChar(CP_UTF8, 0, text.data(), length, nullptr, 0);
+  std::wstring utf16(static_cast<std::size_t>(size), L'\0');
+  MultiByteToWideChar(CP_UTF8, 0, text.data(), length, utf16.data(), size);
+  return utf16;
+}
+
+bool IsControl(wchar_t character) {
+  return IsBetween(character, L'\0', L'\x1F') || IsBetween(character, L'\x7F', L'\x9F') ||
+         IsBetween(character, L'\x200E', L'\x200F') ||  // marks of the direction of writing
+         IsBetween(character, L'\x2028', L'\x202E') ||  // line separators, direction overrides
+         IsBetween(character, L'\x2066', L'\x2069');    // direction isolates
+}
+
+std::string Printable(std::wstring_view text) {
+  constexpr std::size_t kByteDigits = 2;
+  constexpr std::size_t kUnitDigits = 4;
+  constexpr wchar_t kLastByte = L'\xFF';
+  std::wstring shown;
+  for (const wchar_t character : text) {
+    if (!IsControl(character)) {
+      shown += character;
+    } else if (character <= kLastByte) {
+      shown += L"\\x" + ToUtf16(Hex(character, kByteDigits));
+    } else {
+      shown += L"\\u" + ToUtf16(Hex(character, kUnitDigits));
+    }
+  }
+  return ToUtf8(shown);
+}
+
+std::string HexCode(long code) { return "0x" + Hex(static_cast<unsigned long>(code), kCodeDigits); }
+
+std::string Hex(unsigned long value, std::size_t digits) {
+  char buffer[kCodeDigits];
+  const auto end = std::to_chars(buffer, buffer + kCodeDigits, value, kHexBase).ptr;
+  std::string text(buffer, end);
+  std::transform(text.begin(), text.end(), text.begin(), [](char digit) {
+    return static_cast<char>(std::toupper(static_cast<unsigned char>(digit)));
+  });
+  return std::string(digits - std::min(digits, text.size()), '0') + text;
+}
+
+std::string PadLeft(std::string text, std::size_t width) {
+  text.insert(0, width - std::min(width, text.size()), ' ');
+  return text;
+}
+
+std::string PadRight(std::string text, std::size_t width) {
+  text.append(width - std::min(width, text.size()), ' ');
+  return text;
+}
+
+std::string Redrawn(const std::string& line, std::size_t width) {
+  return std::string("\r").append(PadRight(line, width));
+}
+
+std::string Erased(std::size_t width) { return Redrawn("", width).append("\r"); }
+
+}  // namespace cli

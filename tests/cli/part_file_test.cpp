@@ -1,0 +1,86 @@
+#include "part_file.h"
+
+#include <gtest/gtest.h>
+
+#include "paths.h"
+#include "temporary_folder.h"
+
+namespace cli {
+namespace {
+
+class PartFileTest : public testing::Test {
+ protected:
+  std::filesystem::path Target() const { return folder_.path() / L"a"; }
+
+  TemporaryFolder folder_;
+};
+
+TEST_F(PartFileTest, GetsItsNameWhenItIsKept) {
+  {
+    PartFile part(Target(), false);
+    EXPECT_TRUE(folder_.Has(L"a.part"));
+    EXPECT_EQ(part.Write("hello", 5), DWORD{ERROR_SUCCESS});
+    EXPECT_FALSE(folder_.Has(L"a"));
+    part.Keep();
+  }
+  EXPECT_EQ(folder_.Read(L"a"), "hello");
+  EXPECT_FALSE(folder_.Has(L"a.part"));
+}
+
+TEST_F(PartFileTest, VanishesUnlessItIsKept) {
+  {
+    PartFile part(Target(), false);
+    part.Write("hello", 5);
+  }
+  EXPECT_FALSE(folder_.Has(L"a"));
+  EXPECT_FALSE(folder_.Has(L"a.part"));
+}
+
+TEST_F(PartFileTest, OverwritesOnlyWhenItMay) {
+  folder_.Write(L"a", "precious");
+  {
+    PartFile part(Target(), false);
+    EXPECT_THROW(part.Keep(), Failure);
+  }
+  EXPECT_EQ(folder_.Read(L"a"), "precious");
+  EXPECT_FALSE(folder_.Has(L"a.part"));
+  {
+    PartFile part(Target(), true);
+    part.Write("new", 3);
+    part.Keep();
+  }
+  EXPECT_EQ(folder_.Read(L"a"), "new");
+}
+
+TEST_F(PartFileTest, LeavesAnothersPartAlone) {
+  folder_.Write(L"a.part", "another's");
+  EXPECT_THROW(PartFile(Target(), false), Failure);
+  EXPECT_EQ(folder_.Read(L"a.part"), "another's");
+}
+
+TEST_F(PartFileTest, TwoDownloadsCannotShareAPart) {
+  const PartFile first(Target(), false);
+  EXPECT_THROW(PartFile(Target(), true), Failure);
+}
+
+TEST_F(PartFileTest, SaysWhyItCannotBeMade) {
+  try {
+    const PartFile part(folder_.path() / L"none" / L"a", false);
+    ADD_FAILURE() << "was made";
+  } catch (const Failure& failure) {
+    EXPECT_EQ(failure.exit, ExitCode::kLocalFile);
+    EXPECT_EQ(failure.code, ResultOfWin32(ERROR_PATH_NOT_FOUND));
+  }
+}
+
+TEST_F(PartFileTest, FoldersAreMadeWithThoseAbove) {
+  const std::filesystem::path deep = folder_.path() / L"b" / L"c";
+  MakeFolder(deep);
+  EXPECT_TRUE(IsFolder(deep));
+  MakeFolder(deep);
+  folder_.Write(L"file", "");
+  EXPECT_THROW(MakeFolder(folder_.path() / L"file"), Failure);
+}
+
+}  // namespace
+}  // namespace cli

@@ -1,0 +1,82 @@
+#include "results.h"
+
+#include <gtest/gtest.h>
+#include <windows.h>
+
+#include "context.h"
+
+namespace cli {
+namespace {
+
+TEST(ResultsTest, EveryCodeOfTheLibraryHasItsOwnWords) {
+  EXPECT_EQ(MeaningOf(S_OK), "done");
+  EXPECT_EQ(MeaningOf(S_FALSE),
+            "nothing was done: nothing found, aborted, or ended by the receiver");
+  EXPECT_EQ(MeaningOf(E_INVALIDARG), "an argument is not valid");
+  EXPECT_EQ(MeaningOf(E_OUTOFMEMORY), "this computer is out of memory");
+  EXPECT_EQ(MeaningOf(E_NOTIMPL), "not offered by this receiver's family, or not by this version");
+  EXPECT_EQ(MeaningOf(E_FAIL), "internal failure");
+  EXPECT_EQ(MeaningOf(E_UNEXPECTED), "unexpected kind of link");
+  EXPECT_EQ(MeaningOf(static_cast<long>(0x8007048F)),
+            "no connection, no complete reply, or the receiver refused the command");
+  EXPECT_EQ(MeaningOf(static_cast<long>(0x800705B4)), "the receiver stayed silent");
+  EXPECT_EQ(MeaningOf(static_cast<long>(0x80070002)), "it does not exist");
+  EXPECT_EQ(MeaningOf(static_cast<long>(0x80070005)), "access denied: in use, or not allowed");
+}
+
+TEST(ResultsTest, WindowsHasWordsForTheOthers) {
+  const std::string text = MeaningOf(ResultOfWin32(ERROR_DISK_FULL));
+  EXPECT_FALSE(text.empty());
+  EXPECT_EQ(text.find_first_of("\r\n"), std::string::npos);
+  EXPECT_EQ(MeaningOf(static_cast<long>(0x8007FFF0)), "a result that Windows has no words for");
+}
+
+TEST(ResultsTest, ExitCodesDiffer) {
+  EXPECT_EQ(static_cast<int>(ExitCode::kDone), 0);
+  EXPECT_EQ(static_cast<int>(ExitCode::kFailed), 1);
+  EXPECT_EQ(static_cast<int>(ExitCode::kUsage), 2);
+  EXPECT_EQ(static_cast<int>(ExitCode::kNoReceiver), 3);
+  EXPECT_EQ(static_cast<int>(ExitCode::kCancelled), 4);
+  EXPECT_EQ(static_cast<int>(ExitCode::kLocalFile), 5);
+  for (const char* line : {"  0  ", "  1  ", "  2  ", "  3  ", "  4  ", "  5  "}) {
+    EXPECT_NE(ExitCodeTable().find(line), std::string::npos) << line;
+  }
+}
+
+TEST(ResultsTest, AFailureTellsWhatWhereCodeAndMeaning) {
+  const Failure failure{.tried = "download A.DAT",
+                        .port = "COM7",
+                        .code = ResultOfWin32(ERROR_TIMEOUT),
+                        .hint = "Try again."};
+  EXPECT_EQ(Describe(failure),
+            "rcvlink-cli: COM7: could not download A.DAT: 0x800705B4, the receiver stayed silent\n"
+            "  Try again.\n");
+}
+
+TEST(ResultsTest, ACancellationIsNoFailure) {
+  const Failure failure{.exit = ExitCode::kCancelled,
+                        .tried = "download A.DAT",
+                        .port = "COM7",
+                        .code = S_FALSE,
+                        .meaning = "ended by Ctrl-C"};
+  EXPECT_EQ(Describe(failure),
+            "rcvlink-cli: COM7: cancelled: did not download A.DAT: 0x00000001, ended by Ctrl-C\n");
+}
+
+TEST(ResultsTest, AFailureIsAlsoJson) {
+  const Failure failure{.exit = ExitCode::kNoReceiver,
+                        .tried = "find a receiver",
+                        .port = "COM7",
+                        .code = S_FALSE,
+                        .meaning = "no receiver answered"};
+  const Json expected = {{"tried", "find a receiver"},
+                         {"port", "COM7"},
+                         {"code", "0x00000001"},
+                         {"meaning", "no receiver answered"},
+                         {"exit", 3}};
+  EXPECT_EQ(ToJson(failure), expected);
+  EXPECT_TRUE(ToJson(Failure{})["port"].is_null());
+}
+
+}  // namespace
+}  // namespace cli
