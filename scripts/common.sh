@@ -1,0 +1,45 @@
+# shellcheck shell=bash
+# Sourced by ./test and ./demo, which set `root` to the repository's folder first.
+
+build="${root:?}/build"
+mkdir -p "$build"
+
+die() {
+  echo "$*" >&2
+  exit 1
+}
+
+# One run at a time in a build folder: the Wine prefix and the ports are shared. What may outlive
+# this script must not inherit the lock, so commands are started through `unlocked`.
+take_lock() {
+  exec {lock_fd}>"$build/.lock"
+  if ! flock -n "$lock_fd"; then
+    echo "waiting for another run in this folder to end ..."
+    flock "$lock_fd"
+  fi
+}
+
+unlocked() {
+  "$@" {lock_fd}>&-
+}
+
+# logged LOG COMMAND...: keeps the output in a file, and shows its end only when the command fails.
+logged() {
+  local log="$1"
+  shift
+  if ! unlocked "$@" >>"$log" 2>&1 </dev/null; then
+    tail -n 120 "$log" >&2
+    die "failed: $* (the whole output is in ${log#"$root"/})"
+  fi
+}
+
+# build_preset LOG PRESET WITH_TESTS [TARGET...]: all targets when none is named.
+build_preset() {
+  local log="$1" preset="$2" with_tests="$3"
+  shift 3
+  (
+    cd "$root" || exit
+    logged "$log" cmake --preset "$preset" -DBUILD_TESTING="$with_tests"
+    logged "$log" cmake --build --preset "$preset" -j "$(nproc)" ${1:+--target "$@"}
+  )
+}

@@ -1,0 +1,430 @@
+#!/usr/bin/env python3
+"""The Unix side of the test bed: starts what Windows test programs under Wine ask for.
+
+Prints "listening HOST:PORT" as its first line. A client connects and sends requests, each a JSON
+object on a line of its own; each is answered by one line, {"ok": true, ...} or {"ok": false,
+"error": TEXT}. Whatever a connection has started is stopped when that connection closes, and its
+folders are removed, so a test that crashed leaves nothing behind.
+
+Simulated receivers, by port name ("COM12"):
+  {"do": "start", "port": P, "arguments": [...]}     starts rcvlink-sim; answers when P can be opened
+  {"do": "stop", "port": P}                          ends it in peace -> {"status": exit status}
+  {"do": "kill", "port": P}                          SIGKILL: its port is gone without a word
+  {"do": "pause", "port": P}, {"do": "resume", "port": P}     SIGSTOP, SIGCONT
+  {"do": "status", "port": P}                        -> {"status": exit status, null while it runs}
+
+Windows programs (paths relative to the folder of the release build's programs):
+  {"do": "run", "program": "rcvlink-cli.exe", "arguments": [...], "terminal": false, "folder": DIR}
+      -> {"job": N}. DIR, the folder to run in, may be left out. With "terminal" the program has a
+      console (a pseudo-terminal of 100 columns), otherwise its output is a pipe.
+  {"do": "expect", "job": N, "text": T, "seconds": S}
+      waits until the output holds T; fails when the program ends without, or after S seconds
+  {"do": "interrupt", "job": N}                      Ctrl-C
+  {"do": "finish", "job": N, "seconds": S}
+      waits for the end -> {"status": exit status, "output": TEXT, "errors": TEXT, "history": [...]}
+      On a terminal, "output" is what stands on the screen at the end and "history" each thing that
+      a line of it showed in turn; "errors" is empty, as a terminal does not keep them apart.
+
+  {"do": "folder"}                                   -> {"path": a new, empty folder}
+"""
+
+import argparse
+import fcntl
+import json
+import os
+import pty
+import re
+import shutil
+import signal
+import socket
+import socketserver
+import struct
+import subprocess
+import sys
+import tempfile
+import termios
+import threading
+import time
+
+from screen import Screen
+
+ROOT = os.path.realpath(os.path.join(os.path.dirname(os.path.abspath(__file__)), "..", ".."))
+BUILD = os.path.join(ROOT, "build")
+START_SECONDS = 20
+STOP_SECONDS = 20
+TERMINAL_ROWS = 50
+TERMINAL_COLUMNS = 100
+
+
+class Refused(Exception):
+    """A request that cannot be met; its text goes to the client."""
+
+
+def bound_to_this_process(command):
+    """The same command, ended by the system if this process dies without ending it."""
+    return ["setpriv", "--pdeathsig", "TERM", *command]
+
+
+def without_preload():
+    return {name: value for name, value in os.environ.items() if name != "LD_PRELOAD"}
+
+
+class Simulator:
+    """One rcvlink-sim on one port."""
+
+    def __init__(self, program, link, arguments):
+        self._link = link
+        self._process = subprocess.Popen(
+            bound_to_this_process([program, *arguments, "--link", link]),
+            stdin=subprocess.DEVNULL,
+            stdout=subprocess.PIPE,
+            stderr=subprocess.PIPE,
+            env=without_preload(),
+            start_new_session=True,
+        )
+        self._errors = []
+        self._error_reader = threading.Thread(target=self._read_errors, daemon=True)
+        self._error_reader.start()
+        self._wait_until_open()
+
+    def _read_errors(self):
+        for line in self._process.stderr:
+            self._errors.append(line.decode(errors="replace"))
+
+    def _wait_until_open(self):
+        timer = threading.Timer(START_SECONDS, self._process.kill)
+        timer.start()
+        name = self._process.stdout.readline()
+        timer.cancel()
+        if not name:
+            status = self._process.wait()
+            self._error_reader.join()
+            self._remove_link()
+            raise Refused(f"the simulator ended with {status}: {''.join(self._errors).strip()}")
+
+    def _remove_link(self):
+        if os.path.islink(self._link):
+            os.unlink(self._link)
+
+    def pause(self):
+        self._process.send_signal(signal.SIGSTOP)
+        while self._process.poll() is None and self._state() != "T":
+            time.sleep(0.001)
+
+    def _state(self):
+        with open(f"/proc/{self._process.pid}/stat", encoding="utf-8") as file:
+            return file.read().rpartition(")")[2].split()[0]
+
+    def resume(self):
+        self._process.send_signal(signal.SIGCONT)
+
+    def status(self):
+        return self._process.poll()
+
+    def stop(self):
+        self.resume()
+        self._process.terminate()
+        try:
+            status = self._process.wait(STOP_SECONDS)
+        except subprocess.TimeoutExpired:
+            status = self.kill()
+        self._close()
+        return status
+
+    def kill(self):
+        self._process.kill()
+        status = self._process.wait()
+        self._close()
+        return status
+
+    def _close(self):
+        self._remove_link()
+        self._error_reader.join()
+        self._process.stdout.close()
+        self._process.stderr.close()
+
+
+class Job:
+    """A Windows program with its output on pipes."""
+
+    def __init__(self, command, folder):
+        self._condition = threading.Condition()
+        self._chunks = {"output": [], "errors": []}
+        self._open_streams = 2
+        self._process = subprocess.Popen(
+            bound_to_this_process(command),
+            cwd=folder,
+            stdin=subprocess.DEVNULL,
+            stdout=subprocess.PIPE,
+            stderr=subprocess.PIPE,
+            start_new_session=True,
+        )
+        for name, stream in (("output", self._process.stdout), ("errors", self._process.stderr)):
+            threading.Thread(target=self._read, args=(name, stream), daemon=True).start()
+
+    def _read(self, name, stream):
+        while chunk := os.read(stream.fileno(), 4096):
+            with self._condition:
+                self._chunks[name].append(chunk)
+                self._condition.notify_all()
+        with self._condition:
+            self._open_streams -= 1
+            self._condition.notify_all()
+
+    def _text(self, name):
+        return b"".join(self._chunks[name]).decode(errors="replace").replace("\r\n", "\n")
+
+    def _has_shown(self, text):
+        return text in self._text("output") or text in self._text("errors")
+
+    def expect(self, text, seconds):
+        with self._condition:
+            self._condition.wait_for(
+                lambda: self._open_streams == 0 or self._has_shown(text), seconds
+            )
+            if not self._has_shown(text):
+                raise Refused(f"no {text!r} in the output: {self._text('output')!r}")
+
+    def interrupt(self):
+        self._process.send_signal(signal.SIGINT)
+
+    def finish(self, seconds):
+        with self._condition:
+            ended = self._condition.wait_for(lambda: self._open_streams == 0, seconds)
+        if not ended:
+            self.kill()
+            raise Refused(f"the program did not end: {self._text('output')!r}")
+        return {
+            "status": self._process.wait(),
+            "output": self._text("output"),
+            "errors": self._text("errors"),
+            "history": [],
+        }
+
+    def kill(self):
+        self._process.kill()
+        self._process.wait()
+
+
+class TerminalJob:
+    """A Windows program that has a console."""
+
+    def __init__(self, command, folder):
+        self._condition = threading.Condition()
+        self._screen = Screen(TERMINAL_ROWS, TERMINAL_COLUMNS)
+        self._open = True
+        self._master, slave = pty.openpty()
+        size = struct.pack("HHHH", TERMINAL_ROWS, TERMINAL_COLUMNS, 0, 0)
+        fcntl.ioctl(slave, termios.TIOCSWINSZ, size)
+        self._process = subprocess.Popen(
+            # setsid --ctty makes the pseudo-terminal the controlling one, as a console needs.
+            bound_to_this_process(["setsid", "--ctty", *command]),
+            cwd=folder,
+            stdin=slave,
+            stdout=slave,
+            stderr=slave,
+        )
+        os.close(slave)
+        threading.Thread(target=self._read, daemon=True).start()
+
+    def _read(self):
+        while True:
+            try:
+                chunk = os.read(self._master, 4096)
+            except OSError:  # what a pseudo-terminal gives when the other side has closed it
+                chunk = b""
+            with self._condition:
+                self._screen.feed(chunk)
+                if not chunk:
+                    self._open = False
+                    os.close(self._master)
+                self._condition.notify_all()
+                if not self._open:
+                    return
+
+    def expect(self, text, seconds):
+        with self._condition:
+            self._condition.wait_for(lambda: not self._open or self._screen.has_shown(text), seconds)
+            if not self._screen.has_shown(text):
+                raise Refused(f"no {text!r} on the screen: {self._screen.text()!r}")
+
+    def interrupt(self):
+        with self._condition:
+            if not self._open:
+                raise Refused("the program has ended")
+            os.write(self._master, b"\x03")
+
+    def finish(self, seconds):
+        with self._condition:
+            ended = self._condition.wait_for(lambda: not self._open, seconds)
+        if not ended:
+            self.kill()
+            raise Refused(f"the program did not end: {self._screen.text()!r}")
+        status = self._process.wait()
+        return {
+            "status": status,
+            "output": self._screen.text(),
+            "errors": "",
+            "history": self._screen.history(),
+        }
+
+    def kill(self):
+        self._process.kill()
+        self._process.wait()
+
+
+class Connection(socketserver.StreamRequestHandler):
+    """The requests of one client, and what it has started."""
+
+    def setup(self):
+        super().setup()
+        self._simulators = {}
+        self._jobs = {}
+        self._folders = []
+
+    def handle(self):
+        for line in self.rfile:
+            try:
+                answer = self._answer(json.loads(line))
+                answer["ok"] = True
+            except Refused as refusal:
+                answer = {"ok": False, "error": str(refusal)}
+            except (KeyError, TypeError, ValueError, OSError) as error:
+                answer = {"ok": False, "error": f"{type(error).__name__}: {error}"}
+            self.wfile.write(json.dumps(answer).encode() + b"\n")
+
+    def finish(self):
+        for simulator in self._simulators.values():
+            simulator.stop()
+        for job in self._jobs.values():
+            job.kill()
+        for folder in self._folders:
+            shutil.rmtree(folder, ignore_errors=True)
+        super().finish()
+
+    def _answer(self, request):
+        actions = {
+            "start": self._start,
+            "stop": self._stop,
+            "kill": self._kill,
+            "pause": self._pause,
+            "resume": self._resume,
+            "status": self._status,
+            "run": self._run,
+            "expect": self._expect,
+            "interrupt": self._interrupt,
+            "finish": self._finish,
+            "folder": self._folder,
+        }
+        if request["do"] not in actions:
+            raise Refused(f"unknown request {request['do']!r}")
+        return actions[request["do"]](request) or {}
+
+    def _simulator(self, request):
+        if request["port"] not in self._simulators:
+            raise Refused(f"nothing was started on {request['port']}")
+        return self._simulators[request["port"]]
+
+    def _start(self, request):
+        port = request["port"]
+        if not re.fullmatch(r"COM\d+", port):
+            raise Refused(f"{port!r} is no port")
+        link = os.path.join(BUILD, "ports", port.lower())
+        if os.path.islink(link):
+            raise Refused(f"{port} is in use")
+        program = self.server.simulator
+        self._simulators[port] = Simulator(program, link, request["arguments"])
+
+    def _stop(self, request):
+        status = self._simulator(request).stop()
+        del self._simulators[request["port"]]
+        return {"status": status}
+
+    def _kill(self, request):
+        self._simulator(request).kill()
+        del self._simulators[request["port"]]
+
+    def _pause(self, request):
+        self._simulator(request).pause()
+
+    def _resume(self, request):
+        self._simulator(request).resume()
+
+    def _status(self, request):
+        return {"status": self._simulator(request).status()}
+
+    def _run(self, request):
+        program = os.path.join(BUILD, "release", "bin", request["program"])
+        if not os.path.exists(program):
+            raise Refused(f"there is no {program}")
+        kind = TerminalJob if request.get("terminal") else Job
+        number = len(self._jobs) + 1
+        command = ["wine", program, *request["arguments"]]
+        self._jobs[number] = kind(command, request.get("folder"))
+        return {"job": number}
+
+    def _expect(self, request):
+        self._jobs[request["job"]].expect(request["text"], request["seconds"])
+
+    def _interrupt(self, request):
+        self._jobs[request["job"]].interrupt()
+
+    def _finish(self, request):
+        return self._jobs[request["job"]].finish(request["seconds"])
+
+    def _folder(self, _request):
+        parent = os.path.join(BUILD, "tmp")
+        os.makedirs(parent, exist_ok=True)
+        folder = tempfile.mkdtemp(dir=parent)
+        self._folders.append(folder)
+        return {"path": folder}
+
+
+class Bed(socketserver.ThreadingTCPServer):
+    daemon_threads = False
+    allow_reuse_address = True
+
+    def __init__(self, simulator):
+        super().__init__(("127.0.0.1", 0), Connection)
+        self.simulator = simulator
+        self._lock = threading.Lock()
+        self._requests = set()
+
+    def process_request(self, request, client_address):
+        with self._lock:
+            self._requests.add(request)
+        super().process_request(request, client_address)
+
+    def shutdown_request(self, request):
+        with self._lock:
+            self._requests.discard(request)
+        super().shutdown_request(request)
+
+    def close_connections(self):
+        """Ends every connection as if its client had closed it."""
+        with self._lock:
+            for request in self._requests:
+                try:
+                    request.shutdown(socket.SHUT_RDWR)
+                except OSError:  # the client was quicker
+                    pass
+
+
+def main():
+    parser = argparse.ArgumentParser(description=__doc__.splitlines()[0])
+    parser.add_argument(
+        "--simulator", default=os.path.join(BUILD, "native", "bin", "rcvlink-sim"), metavar="PROGRAM"
+    )
+    bed = Bed(parser.parse_args().simulator)
+    # shutdown() waits for serve_forever(), which the handler has interrupted: so, on a thread.
+    for number in (signal.SIGTERM, signal.SIGINT):
+        signal.signal(number, lambda *_: threading.Thread(target=bed.shutdown).start())
+    print("listening {}:{}".format(*bed.server_address), flush=True)
+    bed.serve_forever()
+    bed.close_connections()
+    bed.server_close()  # waits for the connections' threads
+    return 0
+
+
+if __name__ == "__main__":
+    sys.exit(main())

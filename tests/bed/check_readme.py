@@ -1,0 +1,24 @@
+#!/usr/bin/env python3
+"""The README's host program is the one that the build compiles, examples/download.cpp."""
+
+import os
+import sys
+
+ROOT = os.path.realpath(os.path.join(os.path.dirname(os.path.abspath(__file__)), "..", ".."))
+
+
+def read(path):
+    with open(os.path.join(ROOT, path), encoding="utf-8") as file:
+        return file.read()
+
+
+def main():
+    example = read("examples/download.cpp")
+    if f"```cpp\n{example}```\n" not in read("README.md"):
+        print("README.md does not show examples/download.cpp as it is")
+        return 1
+    return 0
+
+
+if __name__ == "__main__":
+    sys.exit(main())

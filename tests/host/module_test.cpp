@@ -1,0 +1,122 @@
+// The library loaded and unloaded while the test looks on: a copy of it under another name.
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+#include <windows.h>
+
+#include <filesystem>
+#include <string>
+
+#include "rcvlink.h"
+#include "tests/host/support/receiver.h"
+#include "tests/host/support/report.h"
+
+using testing::ElementsAre;
+using testing::HasSubstr;
+using testing::Not;
+
+namespace {
+
+DWORD HandleCount() {
+  DWORD count = 0;
+  EXPECT_TRUE(GetProcessHandleCount(GetCurrentProcess(), &count));
+  return count;
+}
+
+// A second copy of the library, with a state of its own.
+class Copy {
+ public:
+  Copy() {
+    std::wstring original(MAX_PATH, L'\0');
+    original.resize(
+        GetModuleFileNameW(GetModuleHandleW(L"rcvlink.dll"), original.data(), MAX_PATH));
+    const std::filesystem::path copy = folder_ / "another.dll";
+    std::filesystem::copy_file(original, copy);
+    module_ = LoadLibraryW(copy.c_str());
+  }
+  Copy(const Copy&) = delete;
+  Copy& operator=(const Copy&) = delete;
+  ~Copy() { Unload(); }
+
+  bool IsLoaded() const { return module_ != nullptr; }
+  void Unload() {
+    if (module_ != nullptr) FreeLibrary(module_);
+    module_ = nullptr;
+  }
+
+  template <typename Function>
+  Function* Find(const char* name) const {
+    return reinterpret_cast<Function*>(reinterpret_cast<void*>(GetProcAddress(module_, name)));
+  }
+
+  void CreateReport(const std::wstring& name) const {
+    Find<void(const wchar_t*)>("_ZN8dump_hlp16CreateReportFileEPKw")(name.c_str());
+  }
+  long CreateReceiver(const std::wstring& port, void** handle) const {
+    std::wstring name = port;
+    DCB settings = host::Settings(CBR_9600);
+    return Find<long(wchar_t*, EProtocol, DCB*, void*, void**)>(
+        "_ZN6devapi22CreateReceiverOnSerialEPw9EProtocolP4_DCBPvPS4_")(
+        name.data(), eProtocolQuorin, &settings, nullptr, handle);
+  }
+
+ private:
+  bed::TempFolder folder_;
+  HMODULE module_ = nullptr;
+};
+
+TEST(ApiModule, LoadLineNeverShows) {
+  const host::Report report;
+  Copy copy;
+  ASSERT_TRUE(copy.IsLoaded());
+  const std::wstring name = host::NewReportName();
+  copy.CreateReport(name);
+  copy.Unload();
+
+  const std::string text = host::ReadReport(host::ReportPath(name));
+  EXPECT_THAT(text, testing::EndsWith("Bye!\r\n"));
+  EXPECT_THAT(text, Not(HasSubstr("Module is loaded")));
+  EXPECT_TRUE(report.Lines().empty()) << "the copy wrote into the report of the original";
+  DeleteFileW(host::ReportPath(name).c_str());
+}
+
+TEST(ApiModule, SaysGoodbyeInItsReportOnly) {
+  const std::wstring name = host::NewReportName();
+  {
+    Copy copy;
+    ASSERT_TRUE(copy.IsLoaded());
+    copy.CreateReport(name);
+  }
+  EXPECT_THAT(host::ReportLines(host::ReportPath(name)), ElementsAre("Bye!"));
+  DeleteFileW(host::ReportPath(name).c_str());
+}
+
+TEST(ApiModule, LetsGoOfReceiversWhenItIsUnloaded) {
+  const bed::SimulatedPort port({"quorin"});
+  const std::wstring name = host::NewReportName();
+  const std::wstring path = host::ReportPath(name);
+  const std::string port_name(port.name().begin(), port.name().end());
+  const DWORD before = HandleCount();
+  {
+    Copy copy;
+    ASSERT_TRUE(copy.IsLoaded());
+    copy.CreateReport(name);
+    void* handle = nullptr;
+    ASSERT_EQ(copy.CreateReceiver(port.name(), &handle), S_OK);
+    EXPECT_GT(HandleCount(), before) << "handles are not counted here";
+  }
+  EXPECT_LE(HandleCount(), before);
+
+  std::vector<std::string> lines = host::ReportLines(path);
+  const auto bye = std::find(lines.begin(), lines.end(), "Bye!");
+  lines.erase(lines.begin(), bye);
+  EXPECT_THAT(lines,
+              ElementsAre("Bye!",
+                          "CAbstractConnection::Cancel [" + port_name + "]",
+                          "CAbstractConnection::Disconnect - disconnected [" + port_name + "]"));
+  EXPECT_TRUE(DeleteFileW(path.c_str())) << "the report is still open";
+
+  const host::Receiver again(port);
+  EXPECT_NE(again.get(), nullptr);
+}
+
+}  // namespace

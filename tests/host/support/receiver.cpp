@@ -1,0 +1,81 @@
+#include "tests/host/support/receiver.h"
+
+#include <algorithm>
+
+namespace host {
+namespace {
+
+// The last that a host says in its greeting, as the receiver takes it.
+constexpr const char* kEndOfGreeting = " echo /dev/null\n";
+
+std::wstring TakeText(wchar_t* text) {
+  std::wstring copy = text == nullptr ? L"" : text;
+  SysFreeString(text);
+  return copy;
+}
+
+}  // namespace
+
+DCB Settings(DWORD speed) {
+  DCB settings{};
+  settings.DCBlength = sizeof(DCB);
+  settings.BaudRate = speed;
+  settings.fBinary = TRUE;
+  settings.ByteSize = 8;
+  settings.Parity = NOPARITY;
+  settings.StopBits = ONESTOPBIT;
+  return settings;
+}
+
+Event::Event(bool signalled) : handle_(CreateEventW(nullptr, TRUE, signalled, nullptr)) {}
+
+Receiver::Receiver(const bed::SimulatedPort& port, DWORD speed) : port_(port) {
+  std::wstring name = port.name();
+  DCB settings = Settings(speed);
+  const long result =
+      devapi::CreateReceiverOnSerial(name.data(), eProtocolQuorin, &settings, nullptr, &handle_);
+  if (result != S_OK) {
+    throw bed::Error("no receiver answers, " + std::to_string(result) + ":\n" + port.Transcript());
+  }
+  port.WaitForTranscript(kEndOfGreeting);
+  greeting_ = WireLines(port.Transcript()).size();
+}
+
+Receiver::~Receiver() {
+  if (handle_ != nullptr) devapi::CloseReceiver(handle_);
+}
+
+HRESULT Receiver::Download(const std::wstring& name, IStream& stream, Progress* progress) const {
+  std::wstring file = name;
+  return devapi::DownloadFile(
+      handle_, file.data(), &stream, progress == nullptr ? nullptr : progress->record());
+}
+
+Identity Receiver::Identify() const {
+  CReceiverInfo info{};
+  Identity identity;
+  identity.result = devapi::GetReceiverInfo(handle_, nullptr, &info);
+  // A failure leaves the receiver locked.
+  if (identity.result != S_OK) devapi::UnlockConnection(handle_);
+  identity.id = TakeText(info.bstrReceiverId);
+  identity.model = TakeText(info.bstrModel);
+  return identity;
+}
+
+long Receiver::Check() const {
+  short answer = 7;
+  const long result = devapi::CheckConnection(handle_, nullptr, &answer);
+  return result == S_OK ? answer : result;
+}
+
+std::string Content(size_t size) {
+  std::string content(size, '\0');
+  unsigned state = 12345;
+  std::ranges::generate(content, [&] {
+    state = state * 1103515245U + 12345U;
+    return static_cast<char>(state >> 16);
+  });
+  return content;
+}
+
+}  // namespace host

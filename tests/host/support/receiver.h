@@ -1,0 +1,88 @@
+// Receivers opened through the library's exports.
+#ifndef RCVLINK_TESTS_HOST_SUPPORT_RECEIVER_H_
+#define RCVLINK_TESTS_HOST_SUPPORT_RECEIVER_H_
+
+#include <windows.h>
+
+#include <functional>
+#include <future>
+#include <string>
+#include <utility>
+
+#include "rcvlink.h"
+#include "tests/host/support/memory_stream.h"
+#include "tests/host/support/progress.h"
+#include "tests/host/support/simulated_port.h"
+#include "tests/host/support/wire.h"
+
+namespace host {
+
+inline constexpr HRESULT kNotConnected = static_cast<HRESULT>(0x8007048FU);
+inline constexpr HRESULT kTimedOut = static_cast<HRESULT>(0x800705B4U);
+inline constexpr HRESULT kFileNotFound = static_cast<HRESULT>(0x80070002U);
+
+// Eight data bits, no parity, one stop bit, no flow control.
+DCB Settings(DWORD speed);
+
+// A Win32 event that stays signalled once it is.
+class Event {
+ public:
+  explicit Event(bool signalled = false);
+  Event(const Event&) = delete;
+  Event& operator=(const Event&) = delete;
+  ~Event() { CloseHandle(handle_); }
+
+  HANDLE get() const { return handle_; }
+  void Set() { SetEvent(handle_); }
+
+ private:
+  HANDLE handle_;
+};
+
+// A call that runs on a thread of its own.
+template <typename Function>
+auto OnThread(Function function) {
+  return std::async(std::launch::async, std::move(function));
+}
+
+// What GetReceiverInfo says, its strings freed.
+struct Identity {
+  HRESULT result = S_OK;
+  std::wstring id;
+  std::wstring model;
+};
+
+// The receiver on a simulated port, closed at the end.
+class Receiver {
+ public:
+  // Raises bed::Error when it does not answer. Returns when the whole greeting has passed.
+  explicit Receiver(const bed::SimulatedPort& port, DWORD speed = CBR_9600);
+  Receiver(const Receiver&) = delete;
+  Receiver& operator=(const Receiver&) = delete;
+  ~Receiver();
+
+  void* get() const { return handle_; }
+  // Gives the handle away.
+  void* Release() { return std::exchange(handle_, nullptr); }
+
+  // What has passed since the greeting.
+  Lines WireSince() const { return WireLines(port_.Transcript(), greeting_); }
+  Lines SentSince() const { return SentByHost(port_.Transcript(), greeting_); }
+
+  HRESULT Download(const std::wstring& name, IStream& stream, Progress* progress = nullptr) const;
+  Identity Identify() const;
+  // The answer of CheckConnection, or its result when that is not S_OK.
+  long Check() const;
+
+ private:
+  const bed::SimulatedPort& port_;
+  void* handle_ = nullptr;
+  size_t greeting_ = 0;  // how many lines of the transcript it took
+};
+
+// Bytes of which no two blocks look alike.
+std::string Content(size_t size);
+
+}  // namespace host
+
+#endif  // RCVLINK_TESTS_HOST_SUPPORT_RECEIVER_H_

@@ -1,0 +1,89 @@
+// A simulated receiver's connection that lets an abort come at any of its calls, and cancels one
+// wait as a device does.
+#ifndef RCVLINK_TESTS_QUORIN_ABORTING_CONNECTION_H_
+#define RCVLINK_TESTS_QUORIN_ABORTING_CONNECTION_H_
+
+#include <cstddef>
+#include <cstdint>
+#include <functional>
+#include <utility>
+
+#include "tests/support/simulated_connection.h"
+
+// What a cancel makes of a write.
+enum class CancelledWrite {
+  kCompletes,        // it was through at once and did not wait
+  kIsLost,           // it waited, and nothing was sent
+  kIsSentAllTheSame  // it waited, and everything had left already
+};
+
+class AbortingConnection : public CIConnection {
+ public:
+  AbortingConnection(sim::Receiver& receiver, CancelledWrite cancelled_write)
+      : inner_(receiver), cancelled_write_(cancelled_write) {}
+
+  // The abort comes as the call of this number begins, or as it ends. Reads of no wait are not
+  // counted: they belong to an abort.
+  std::function<void()> abort;
+  size_t abort_at = SIZE_MAX;
+  bool at_end = false;
+  size_t calls = 0;
+
+  HRESULT Disconnect() override { return inner_.Disconnect(); }
+  HRESULT Read(void* buffer, DWORD size, DWORD* bytes_read, DWORD timeout_ms) override {
+    *bytes_read = 0;
+    const auto read = [&] {
+      if (TakeCancel()) return S_FALSE;
+      return inner_.Read(buffer, size, bytes_read, timeout_ms);
+    };
+    return timeout_ms == 0 ? read() : Call(read);
+  }
+  HRESULT Write(const void* buffer, DWORD size, DWORD timeout_ms) override {
+    return Call([&] {
+      const bool cancelled = cancelled_write_ != CancelledWrite::kCompletes && TakeCancel();
+      if (!cancelled || cancelled_write_ == CancelledWrite::kIsSentAllTheSame) {
+        inner_.Write(buffer, size, timeout_ms);
+      }
+      return cancelled ? S_FALSE : S_OK;
+    });
+  }
+  HRESULT Flush() override {
+    return Call([&] { return inner_.Flush(); });
+  }
+  void Cancel() override { cancelled_ = true; }
+  HRESULT GetInstanceType(EInstanceType* type) override {
+    return Call([&] { return inner_.GetInstanceType(type); });
+  }
+  HRESULT GetName(BSTR* name) override { return inner_.GetName(name); }
+  HRESULT GetSpeed(DWORD* speed) override {
+    return Call([&] { return inner_.GetSpeed(speed); });
+  }
+  void SetAbortEvent(HANDLE event) override { abort_event_ = event; }
+  HRESULT SetSpeed(DWORD speed) override {
+    return Call([&] { return inner_.SetSpeed(speed); });
+  }
+
+  DWORD Speed() {
+    DWORD speed = 0;
+    inner_.GetSpeed(&speed);
+    return speed;
+  }
+
+ private:
+  template <typename Operation>
+  HRESULT Call(Operation operation) {
+    const bool due = calls++ == abort_at;
+    if (due && !at_end) abort();
+    const HRESULT result = operation();
+    if (due && at_end) abort();
+    return result;
+  }
+  bool TakeCancel() { return !abort_event_ && std::exchange(cancelled_, false); }
+
+  SimulatedConnection inner_;
+  CancelledWrite cancelled_write_;
+  bool cancelled_ = false;
+  HANDLE abort_event_ = nullptr;
+};
+
+#endif  // RCVLINK_TESTS_QUORIN_ABORTING_CONNECTION_H_

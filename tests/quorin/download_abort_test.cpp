@@ -1,0 +1,142 @@
+// An abort at each call of a whole download, against the simulated receiver.
+#include <gtest/gtest.h>
+
+#include <memory>
+#include <sstream>
+#include <string>
+#include <tuple>
+#include <vector>
+
+#include "platform/hresult.h"
+#include "simulator/quorin/receiver.h"
+#include "tests/quorin/aborting_connection.h"
+#include "tests/quorin/block_stream.h"
+#include "tests/quorin/quorin_driver.h"
+#include "tests/support/memory_stream.h"
+
+namespace {
+
+constexpr char kName[] = "A0101.log";
+constexpr size_t kSize = 1300;
+
+sim::FileStore OneFile() {
+  sim::FileStore files;
+  files.Add(kName, sim::ToBytes(TestContent(kSize)), 600000000);
+  return files;
+}
+
+// A driver, its link and the receiver at the other end.
+struct Bench {
+  explicit Bench(CancelledWrite cancelled_write, const sim::QuorinOptions& options = {})
+      : receiver(options, OneFile(), &transcript),
+        connection(new AbortingConnection(receiver, cancelled_write)),
+        driver(std::unique_ptr<CIConnection>(connection)) {
+    connection->abort = [this] { driver.Abort(); };
+  }
+
+  HRESULT Download() { return driver.DownloadFile(L"A0101.log", &stream, nullptr); }
+  std::vector<std::string> Lines() const {
+    std::vector<std::string> lines;
+    std::istringstream in(log.str());
+    for (std::string line; std::getline(in, line);) lines.push_back(line);
+    return lines;
+  }
+
+  std::ostringstream log;
+  sim::Transcript transcript{log};
+  sim::QuorinReceiver receiver;
+  AbortingConnection* connection;  // the driver's
+  QuorinDriver driver;
+  MemoryStream stream;
+};
+
+bool IsControl(const std::string& line) {
+  return line == "> \\x06" || line == "> \\x15" || line == "> #";
+}
+
+// Whether nothing of the transfer is left open: the last control byte ends it, and comes before
+// the speed is put back.
+void ExpectTransferEnded(const Bench& bench) {
+  std::string last_control = "> #";
+  for (const std::string& line : bench.Lines()) {
+    if (line.find("set,cur/term/rate,9600") != std::string::npos) break;
+    if (IsControl(line)) last_control = line;
+  }
+  EXPECT_EQ(last_control, "> #");
+  EXPECT_FALSE(bench.receiver.in_transfer());
+}
+
+class QuorinDownloadAbort
+    : public testing::TestWithParam<std::tuple<CancelledWrite, bool /*at the end of the call*/>> {
+ protected:
+  CancelledWrite HowWritesAreCancelled() const { return std::get<0>(GetParam()); }
+
+  // How many calls a download has when nothing comes between.
+  size_t CountCalls() const {
+    Bench bench(HowWritesAreCancelled());
+    EXPECT_EQ(bench.Download(), S_OK);
+    EXPECT_EQ(bench.stream.bytes, TestContent(kSize));
+    return bench.connection->calls;
+  }
+};
+
+TEST_P(QuorinDownloadAbort, EndsItInOrderAtAnyCall) {
+  const size_t calls = CountCalls();
+  ASSERT_GT(calls, 30U);
+  for (size_t call = 0; call < calls; ++call) {
+    SCOPED_TRACE("abort at call " + std::to_string(call));
+    Bench bench(HowWritesAreCancelled());
+    bench.connection->abort_at = call;
+    bench.connection->at_end = std::get<1>(GetParam());
+    EXPECT_EQ(bench.Download(), S_FALSE);
+    ExpectTransferEnded(bench);
+    EXPECT_EQ(bench.receiver.speed(), 9600U);
+    EXPECT_EQ(bench.connection->Speed(), 9600U);
+    EXPECT_TRUE(IsFreeForOthers(bench.driver));
+    // Whatever came is the file's beginning.
+    EXPECT_TRUE(TestContent(kSize).starts_with(bench.stream.bytes));
+    if (testing::Test::HasFailure()) FAIL() << bench.log.str();
+  }
+}
+
+TEST_P(QuorinDownloadAbort, DoesNotDisturbWhatFollows) {
+  const size_t calls = CountCalls();
+  for (size_t call = 0; call < calls; ++call) {
+    SCOPED_TRACE("abort at call " + std::to_string(call));
+    Bench bench(HowWritesAreCancelled());
+    bench.connection->abort_at = call;
+    bench.connection->at_end = std::get<1>(GetParam());
+    bench.Download();
+    bench.stream.bytes.clear();
+    EXPECT_EQ(bench.Download(), S_OK);
+    EXPECT_EQ(bench.stream.bytes, TestContent(kSize));
+    EXPECT_EQ(bench.driver.DeleteFile(L"A0101.log"), S_OK);
+    if (testing::Test::HasFailure()) FAIL() << bench.log.str();
+  }
+}
+
+TEST_P(QuorinDownloadAbort, EndsItInOrderAtASpeedThatWasNotRaised) {
+  sim::QuorinOptions options;
+  options.identity.port_name = "ttyX";
+  Bench counting(HowWritesAreCancelled(), options);
+  ASSERT_EQ(counting.Download(), S_OK);
+  for (size_t call = 0; call < counting.connection->calls; ++call) {
+    SCOPED_TRACE("abort at call " + std::to_string(call));
+    Bench bench(HowWritesAreCancelled(), options);
+    bench.connection->abort_at = call;
+    bench.connection->at_end = std::get<1>(GetParam());
+    EXPECT_EQ(bench.Download(), S_FALSE);
+    EXPECT_EQ(bench.driver.DeleteFile(L"A0101.log"), S_OK);
+    EXPECT_EQ(bench.connection->Speed(), 9600U);
+    if (testing::Test::HasFailure()) FAIL() << bench.log.str();
+  }
+}
+
+INSTANTIATE_TEST_SUITE_P(All,
+                         QuorinDownloadAbort,
+                         testing::Combine(testing::Values(CancelledWrite::kCompletes,
+                                                          CancelledWrite::kIsLost,
+                                                          CancelledWrite::kIsSentAllTheSame),
+                                          testing::Bool()));
+
+}  // namespace

@@ -1,0 +1,392 @@
+// A whole download on a scripted connection: what is said around the block transfer.
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <algorithm>
+#include <string>
+#include <vector>
+
+#include "platform/hresult.h"
+#include "tests/quorin/block_stream.h"
+#include "tests/quorin/quorin_driver.h"
+#include "tests/support/memory_stream.h"
+#include "tests/support/report_capture.h"
+
+using testing::Contains;
+using testing::ElementsAre;
+using testing::ElementsAreArray;
+using testing::IsEmpty;
+using testing::Not;
+
+namespace {
+
+constexpr char kGetPort[] = "print,/cur/term\r\n";
+constexpr char kRaise[] = "set,/par/dev/ser/b/rate,115200\r\n";
+constexpr char kGetSize[] = "print,/log/A0101.log&size\r\n";
+constexpr char kGetFile[] = "get,\"A0101.log\":{500,512}\r\n";
+constexpr char kPutBack[] = "set,cur/term/rate,9600\r\n";
+
+// What is said in each part of a download of two blocks.
+const std::vector<std::string> kSpeedUp = {"%%print,/cur/term\r\n", kRaise, "speed 115200"};
+const std::vector<std::string> kStart = {
+    "%%\n", "%%print,/log/A0101.log&size\r\n", "%%get,\"A0101.log\":{500,512}\r\n", "\x15"};
+const std::vector<std::string> kBlocks = {"\x06", "#"};
+const std::vector<std::string> kRestore = {"%%set,cur/term/rate,9600\r\n", "speed 9600"};
+
+std::vector<std::string> Joined(std::initializer_list<std::vector<std::string>> parts) {
+  std::vector<std::string> all;
+  for (const auto& part : parts) all.insert(all.end(), part.begin(), part.end());
+  return all;
+}
+
+class QuorinDownload : public QuorinDriverTest {
+ protected:
+  QuorinDownload() {
+    receiver.Reply(kGetPort, "/dev/ser/b");
+    receiver.Reply("\n", "");
+    receiver.Reply(kGetSize, "600");
+    receiver.Reply(kGetFile, "");
+    receiver.Reply(kPutBack, "");
+    receiver.On("\x15", [this](const std::string&) {
+      BlockStream blocks;
+      connection->GiveRead(blocks.Data(0, content.substr(0, 512)));
+      connection->GiveRead(blocks.Last(content.substr(512)));
+    });
+  }
+
+  HRESULT Download() { return driver.DownloadFile(L"A0101.log", &stream, nullptr); }
+  void ExpectSaid(std::initializer_list<std::vector<std::string>> parts) {
+    EXPECT_THAT(Said(), ElementsAreArray(Joined(parts)));
+  }
+
+  const std::string content = TestContent(600);
+  MemoryStream stream;
+  const ReportCapture report;
+};
+
+TEST_F(QuorinDownload, RaisesTheSpeedGetsTheFileAndPutsTheSpeedBack) {
+  EXPECT_EQ(Download(), S_OK);
+  EXPECT_EQ(stream.bytes, content);
+  ExpectSaid({kSpeedUp, kStart, kBlocks, kRestore});
+  EXPECT_EQ(connection->speed, 9600U);
+  EXPECT_TRUE(IsFreeForOthers(driver));
+}
+
+TEST_F(QuorinDownload, ReportsProgress) {
+  Download();
+  // 512 * 99 / 600 + 1
+  EXPECT_THAT(progress.percents, ElementsAre(0, 1, 85, 100));
+}
+
+TEST_F(QuorinDownload, EmptiesTheLineBeforeItStartsTheTransfer) {
+  Download();
+  const auto& calls = connection->calls;
+  const auto start = std::ranges::find(calls, "write \x15");
+  ASSERT_NE(start, calls.end());
+  EXPECT_EQ(*(start - 1), "flush");
+  EXPECT_THAT(*(start - 2), testing::StartsWith("read "));
+}
+
+TEST_F(QuorinDownload, IsTraced) {
+  Download();
+  EXPECT_TRUE(
+      report.Has("CQuorinProtocol::DownloadFile - connection is locked " + driver.LockText()));
+  EXPECT_TRUE(report.Has("CQuorinProtocol::DownloadFile - file size [A0101.log] is 600 bytes"));
+  EXPECT_FALSE(report.HasStart("CQuorinProtocol::DownloadFile - download"));
+}
+
+TEST_F(QuorinDownload, HoldsTheConnectionMeanwhile) {
+  std::vector<bool> free;
+  progress.on_progress = [&](BYTE) { free.push_back(IsFreeForOthers(driver)); };
+  Download();
+  EXPECT_THAT(free, ElementsAre(false, false, false, false));
+}
+
+TEST_F(QuorinDownload, LeavesTheReferencesOfTheStream) {
+  Download();
+  EXPECT_EQ(stream.references, 1U);
+}
+
+TEST_F(QuorinDownload, SendsTheNameInTheCodePageOfTheThread) {
+  char name[16] = {};
+  WideCharToMultiByte(CP_THREAD_ACP, 0, L"\u00C4 b", -1, name, 16, nullptr, nullptr);
+  const std::string narrow = name;
+  receiver.Reply("print,/log/" + narrow + "&size\r\n", "600");
+  driver.DownloadFile(L"\u00C4 b", &stream, nullptr);
+  EXPECT_THAT(Said(), Contains("%%get,\"" + narrow + "\":{500,512}\r\n"));
+}
+
+// The speed.
+class QuorinDownloadAtSpeed : public QuorinDownload, public testing::WithParamInterface<DWORD> {};
+
+TEST_P(QuorinDownloadAtSpeed, IsNotReconfigured) {
+  connection->speed = GetParam();
+  EXPECT_EQ(Download(), S_OK);
+  ExpectSaid({kStart, kBlocks});
+}
+
+INSTANTIATE_TEST_SUITE_P(Fast, QuorinDownloadAtSpeed, testing::Values(115200, 115201, 460800));
+
+TEST_F(QuorinDownload, RaisesASpeedJustBelow) {
+  connection->speed = 115199;
+  receiver.Reply("set,cur/term/rate,115199\r\n", "");
+  EXPECT_EQ(Download(), S_OK);
+  ExpectSaid({kSpeedUp, kStart, kBlocks, {"%%set,cur/term/rate,115199\r\n", "speed 115199"}});
+}
+
+TEST_F(QuorinDownload, EndsWhenTheKindOfLinkIsNotKnown) {
+  connection->instance_type_result = E_HANDLE;
+  EXPECT_EQ(Download(), E_HANDLE);
+  EXPECT_THAT(Said(), IsEmpty());
+  EXPECT_THAT(progress.percents, ElementsAre(0));
+  EXPECT_TRUE(IsFreeForOthers(driver));
+}
+
+TEST_F(QuorinDownload, EndsWhenTheSpeedIsNotKnown) {
+  connection->speed_result = E_HANDLE;
+  EXPECT_EQ(Download(), E_HANDLE);
+  EXPECT_THAT(Said(), IsEmpty());
+  EXPECT_TRUE(IsFreeForOthers(driver));
+}
+
+TEST_F(QuorinDownload, GoesOnSlowlyWhenTheReceiverRefusesItsPort) {
+  receiver.Reply(kGetPort, "{no}", "ER");
+  EXPECT_EQ(Download(), S_OK);
+  EXPECT_EQ(stream.bytes, content);
+  ExpectSaid({{"%%print,/cur/term\r\n"}, kStart, kBlocks});
+  EXPECT_TRUE(
+      report.Has("CQuorinProtocol::DownloadFile - receiver speed up is failed [0x8007048F]"));
+}
+
+TEST_F(QuorinDownload, GoesOnSlowlyWhenTheReceiverCannotBeTold) {
+  receiver.FailWriteOf(kRaise, E_HANDLE);
+  EXPECT_EQ(Download(), S_OK);
+  ExpectSaid({{"%%print,/cur/term\r\n", kRaise}, kStart, kBlocks});
+  EXPECT_TRUE(
+      report.Has("CQuorinProtocol::DownloadFile - receiver speed up is failed [0x80070006]"));
+}
+
+TEST_F(QuorinDownload, GoesOnSlowlyWhenTheReceiverNamesNoPort) {
+  receiver.Reply(kGetPort, "usb");
+  EXPECT_EQ(Download(), S_OK);
+  ExpectSaid({{"%%print,/cur/term\r\n"}, kStart, kBlocks});
+  EXPECT_TRUE(
+      report.Has("CQuorinProtocol::DownloadFile - receiver speed up is failed [0x00000001]"));
+}
+
+TEST_F(QuorinDownload, SlowsTheReceiverDownAgainWhenTheHostCannotFollow) {
+  connection->set_speed_result = E_HANDLE;
+  EXPECT_EQ(Download(), S_OK);
+  EXPECT_EQ(stream.bytes, content);
+  ExpectSaid(
+      {kSpeedUp, {"%%print,/cur/term\r\n", "set,/par/dev/ser/b/rate,9600\r\n"}, kStart, kBlocks});
+  EXPECT_TRUE(report.Has("CQuorinProtocol::DownloadFile - host speed up is failed [0x80070006]"));
+}
+
+TEST_F(QuorinDownload, TakesAHostThatHadNothingToChange) {
+  connection->set_speed_result = S_FALSE;
+  EXPECT_EQ(Download(), S_OK);
+  ExpectSaid({kSpeedUp, kStart, kBlocks, kRestore});
+}
+
+TEST_F(QuorinDownload, DoesNotRaiseAnythingOverUsb) {
+  connection->instance_type = eInstanceUSB;
+  Download();
+  EXPECT_EQ(Said().front(), "%%\n");
+  EXPECT_THAT(Said(), Not(Contains("speed 115200")));
+  EXPECT_THAT(Said(), Not(Contains("speed 9600")));
+}
+
+// The speed is put back after every failure, and the failure is the result.
+class QuorinFailedDownload : public QuorinDownload {
+ protected:
+  void ExpectFailure(HRESULT failure, std::initializer_list<std::vector<std::string>> said) {
+    EXPECT_EQ(Download(), failure);
+    ExpectSaid(said);
+    EXPECT_EQ(connection->speed, 9600U);
+    EXPECT_TRUE(IsFreeForOthers(driver));
+    char code[16] = {};
+    std::snprintf(code, sizeof(code), "[0x%08X]", static_cast<unsigned>(failure));
+    EXPECT_TRUE(report.Has("CQuorinProtocol::DownloadFile - download [A0101.log] is failed " +
+                           std::string(code)));
+  }
+  static std::vector<std::string> Start(size_t count) {
+    return {kStart.begin(), kStart.begin() + static_cast<std::ptrdiff_t>(count)};
+  }
+};
+
+TEST_F(QuorinFailedDownload, OfAReceiverThatDoesNotAnswer) {
+  receiver.On("\n", [](const std::string&) {});
+  ExpectFailure(kTimedOut, {kSpeedUp, Start(1), kRestore});
+}
+
+TEST_F(QuorinFailedDownload, OfASizeThatIsRefused) {
+  receiver.Reply(kGetSize, "{no such file}", "ER");
+  ExpectFailure(kNotConnected, {kSpeedUp, Start(2), kRestore});
+  EXPECT_THAT(progress.percents, ElementsAre(0));
+}
+
+TEST_F(QuorinFailedDownload, OfAFileOfSizeZero) {
+  receiver.Reply(kGetSize, "0");
+  ExpectFailure(E_FAIL, {kSpeedUp, Start(2), kRestore});
+  EXPECT_TRUE(report.Has("CQuorinProtocol::DownloadFile - file [A0101.log] size is zero"));
+  EXPECT_EQ(stream.writes, 0U);
+}
+
+TEST_F(QuorinFailedDownload, OfAFileWithoutASize) {
+  receiver.Reply(kGetSize, "");
+  ExpectFailure(E_FAIL, {kSpeedUp, Start(2), kRestore});
+  EXPECT_TRUE(report.Has("CQuorinProtocol::DownloadFile - file [A0101.log] size is zero"));
+}
+
+TEST_F(QuorinFailedDownload, OfAFileOfNegativeSize) {
+  receiver.Reply(kGetSize, "-5");
+  ExpectFailure(E_INVALIDARG, {kSpeedUp, kStart, {"#"}, kRestore});
+  EXPECT_TRUE(report.Has("CQuorinProtocol::DownloadFile - file size [A0101.log] is -5 bytes"));
+}
+
+TEST_F(QuorinFailedDownload, OfAFileThatIsRefused) {
+  receiver.Reply(kGetFile, "{no}", "ER");
+  ExpectFailure(kNotConnected, {kSpeedUp, Start(3), kRestore});
+  EXPECT_THAT(progress.percents, ElementsAre(0));
+}
+
+TEST_F(QuorinFailedDownload, OfATransferThatCannotBeStarted) {
+  receiver.FailWriteOf("\x15", E_HANDLE);
+  ExpectFailure(E_HANDLE, {kSpeedUp, kStart, kRestore});
+  EXPECT_THAT(progress.percents, ElementsAre(0, 1));
+}
+
+TEST_F(QuorinFailedDownload, OfATransferThatStaysSilent) {
+  receiver.On("\x15", [](const std::string&) {});
+  ExpectFailure(kTimedOut, {kSpeedUp, kStart, {"\x15", "\x15", "\x15", "#"}, kRestore});
+}
+
+TEST_F(QuorinFailedDownload, OfALastBlockOfNegativeLength) {
+  receiver.On("\x15", [this](const std::string&) {
+    connection->GiveRead(BlockStream::Make(0x04, 0xFFFF, "", 0).substr(0, 3));
+  });
+  ExpectFailure(kNotConnected, {kSpeedUp, kStart, {"#"}, kRestore});
+}
+
+TEST_F(QuorinFailedDownload, IsThatOfTheTransferThoughTheEndCannotBeWritten) {
+  receiver.On("\x15", [](const std::string&) {});
+  receiver.FailWriteOf("#", E_HANDLE);
+  ExpectFailure(kTimedOut, {kSpeedUp, kStart, {"\x15", "\x15", "\x15", "#"}, kRestore});
+}
+
+TEST_F(QuorinFailedDownload, AtASpeedThatWasNotRaisedPutsNothingBack) {
+  connection->speed = 115200;
+  receiver.Reply(kGetSize, "0");
+  EXPECT_EQ(Download(), E_FAIL);
+  ExpectSaid({Start(2)});
+}
+
+TEST_F(QuorinDownload, OverALinkOfNoKnownKindIsUnexpected) {
+  connection->instance_type = static_cast<EInstanceType>(3);
+  EXPECT_EQ(Download(), E_UNEXPECTED);
+  ExpectSaid({kStart, {"#"}});
+  EXPECT_TRUE(
+      report.Has("CQuorinProtocol::DownloadFile - download [A0101.log] is failed [0x8000FFFF]"));
+}
+
+TEST_F(QuorinDownload, IsNotDoneWhenTheReceiverEndsIt) {
+  receiver.On("\x15", [this](const std::string&) { connection->GiveRead({'#', 0, 0}); });
+  EXPECT_EQ(Download(), S_FALSE);
+  ExpectSaid({kSpeedUp, kStart, kRestore});
+  EXPECT_FALSE(report.HasStart("CQuorinProtocol::DownloadFile - download"));
+}
+
+TEST_F(QuorinDownload, SucceedsThoughTheStreamFails) {
+  stream.fail_at_write = 0;
+  EXPECT_EQ(Download(), S_OK);
+  ExpectSaid({kSpeedUp, kStart, {"#"}, kRestore});
+}
+
+// Failures of putting the speed back.
+TEST_F(QuorinDownload, FailsWhenTheReceiverRefusesTheOldSpeed) {
+  receiver.Reply(kPutBack, "{no}", "ER");
+  EXPECT_EQ(Download(), kNotConnected);
+  EXPECT_EQ(stream.bytes, content);
+  ExpectSaid({kSpeedUp, kStart, kBlocks, {kRestore[0]}});
+  EXPECT_TRUE(IsFreeForOthers(driver));
+}
+
+TEST_F(QuorinDownload, FailsWhenTheHostCannotGoBack) {
+  receiver.On(kPutBack, [this](const std::string& tag) {
+    connection->set_speed_result = E_HANDLE;
+    connection->GiveRead(Message("RE", tag));
+  });
+  EXPECT_EQ(Download(), E_HANDLE);
+  EXPECT_EQ(stream.bytes, content);
+  EXPECT_TRUE(IsFreeForOthers(driver));
+}
+
+TEST_F(QuorinDownload, FailsWithTheWayBackRatherThanWithTheTransfer) {
+  receiver.Reply(kGetSize, "0");
+  receiver.FailWriteOf(kPutBack, E_HANDLE);
+  EXPECT_EQ(Download(), E_HANDLE);
+}
+
+TEST_F(QuorinDownload, SaysTheOldSpeedWhole) {
+  bool shielded = false;
+  receiver.on_hear = [&](const std::string& command) {
+    if (command == kPutBack) shielded = connection->abort_event != nullptr;
+  };
+  Download();
+  EXPECT_TRUE(shielded);
+  EXPECT_EQ(connection->abort_event, nullptr);
+}
+
+// Aborts at points of their own; every other point has its sweep.
+TEST_F(QuorinDownload, DoesNothingAfterAnAbort) {
+  driver.Abort();
+  EXPECT_EQ(Download(), S_FALSE);
+  EXPECT_THAT(Said(), IsEmpty());
+  EXPECT_THAT(progress.percents, IsEmpty());
+  EXPECT_TRUE(IsFreeForOthers(driver));
+  EXPECT_EQ(Download(), S_OK);
+}
+
+TEST_F(QuorinDownload, RaisesNothingWhenAbortedDuringThePortQuery) {
+  receiver.On(kGetPort, [this](const std::string& tag) {
+    connection->Give({S_OK, Message("RE", tag + "/dev/ser/b"), [this] { driver.Abort(); }});
+  });
+  EXPECT_EQ(Download(), S_FALSE);
+  ExpectSaid({{"%%print,/cur/term\r\n"}});
+  EXPECT_EQ(connection->speed, 9600U);
+}
+
+TEST_F(QuorinDownload, RaisesBothOrNoneWhenAbortedDuringTheSetting) {
+  receiver.On(kRaise, [this](const std::string&) { driver.Abort(); });
+  EXPECT_EQ(Download(), S_FALSE);
+  ExpectSaid({kSpeedUp, kRestore});
+}
+
+TEST_F(QuorinDownload, IsAbortedDuringTheSizeQuery) {
+  receiver.On(kGetSize, [this](const std::string& tag) {
+    connection->Give({S_OK, Message("RE", tag + "600"), [this] { driver.Abort(); }});
+  });
+  EXPECT_EQ(Download(), S_FALSE);
+  ExpectSaid({kSpeedUp, {kStart[0], kStart[1]}, kRestore});
+}
+
+TEST_F(QuorinDownload, IsAbortedBeforeTheTransferStarts) {
+  receiver.On(kGetFile, [this](const std::string& tag) {
+    connection->Give({S_OK, Message("RE", tag), [this] { driver.Abort(); }});
+  });
+  EXPECT_EQ(Download(), S_FALSE);
+  EXPECT_THAT(Said(), Not(Contains("\x15")));
+  EXPECT_EQ(connection->speed, 9600U);
+}
+
+TEST_F(QuorinDownload, IsAbortedThoughItIsComplete) {
+  receiver.On("#", [this](const std::string&) { driver.Abort(); });
+  EXPECT_EQ(Download(), S_FALSE);
+  EXPECT_EQ(stream.bytes, content);
+  ExpectSaid({kSpeedUp, kStart, kBlocks, kRestore});
+  receiver.On("#", [](const std::string&) {});
+  EXPECT_EQ(Download(), S_OK);
+}
+
+}  // namespace
