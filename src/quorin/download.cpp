@@ -116,7 +116,7 @@ HRESULT CQuorinProtocol::Transfer(const wchar_t* name, IStream* stream, EInstanc
   HRESULT result = E_UNEXPECTED;
   if (link == eInstanceSerial) result = DownloadOverSerial(stream, size);
   if (link == eInstanceUSB) result = DownloadOverUSB(stream, size, kBlockPayload);
-  if (FAILED(result)) WriteControl(kEndOfTransfer);
+  if (FAILED(result)) EndTransfer();
   return result;
 }
 
@@ -131,11 +131,15 @@ std::optional<HRESULT> CQuorinProtocol::AskAgain() {
   return FAILED(result) ? std::optional(result) : std::nullopt;
 }
 
+// The receiver must hear that it is over, whatever cancels are on their way.
+HRESULT CQuorinProtocol::EndTransfer() {
+  const AbortShield shield(connection());
+  return WriteControl(kEndOfTransfer);
+}
+
 HRESULT CQuorinProtocol::EndCancelledDownload(const wchar_t* trace_line) {
   Trace(trace_line);
-  // The receiver must hear that it is over, whatever cancels more are on their way.
-  const AbortShield shield(connection());
-  const HRESULT result = WriteControl(kEndOfTransfer);
+  const HRESULT result = EndTransfer();
   return FAILED(result) ? result : S_FALSE;
 }
 
@@ -195,7 +199,7 @@ std::optional<HRESULT> CQuorinProtocol::TakeSerialBlock(Download& download,
   download.crc = block.Crc();
   if (FAILED(WriteToStream(stream, block.Payload().first(*payload_length)))) {
     // The serial transfer keeps a failure of the host's stream to itself; the host knows it.
-    WriteControl(kEndOfTransfer);
+    EndTransfer();
     return S_OK;
   }
   download.delivered += static_cast<uint32_t>(*payload_length);
@@ -203,11 +207,14 @@ std::optional<HRESULT> CQuorinProtocol::TakeSerialBlock(Download& download,
   if (percent != download.percent) ReportProgress(download.percent = percent);
 
   if (block.Type() == BlockType::kLast) {
-    WriteControl(kEndOfTransfer);
+    EndTransfer();
     return S_OK;
   }
   if (TakeAbort()) return EndCancelledDownload(kCancelled);
-  if (const HRESULT sent = WriteControl(kAck); sent != S_OK) return FAILED(sent) ? sent : S_OK;
+  const HRESULT sent = WriteControl(kAck);
+  if (FAILED(sent)) return sent;
+  // Cut off by an abort: the receiver still waits for its answer, and must hear that it is over.
+  if (sent != S_OK) return TakeAbort() ? EndCancelledDownload(kCancelled) : S_OK;
   ++download.expected_sequence;
   download.timeouts = 0;
   return std::nullopt;

@@ -56,6 +56,7 @@ class CQuorinProtocol : public CAbstractProtocol {
   std::optional<HRESULT> TakeSerialBlock(Download& download, IStream* stream, uint32_t size);
   std::optional<HRESULT> AfterFailedRead(HRESULT failure, Download& download);
   std::optional<HRESULT> AskAgain();
+  HRESULT EndTransfer();
   HRESULT EndCancelledDownload(const wchar_t* trace_line);
   HRESULT WriteControl(uint8_t control);
 

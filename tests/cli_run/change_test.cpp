@@ -1,0 +1,65 @@
+// The commands that change the receiver: rm, mv, set.
+#include <nlohmann/json.hpp>
+
+#include "tests/cli_run/cli.h"
+
+namespace cli_run {
+namespace {
+
+using testing::HasSubstr;
+
+TEST_F(Cli, RemoveDeletesEachFile) {
+  const bed::SimulatedPort receiver({"quorin"}, {{"a.jps", "a"}, {"b.jps", "b"}, {"c.jps", "c"}});
+  const auto result = RunOn(receiver, {"rm", "a.jps", "c.jps"});
+  EXPECT_EQ(result.status, kDone) << result.errors;
+  const auto files = nlohmann::json::parse(RunOn(receiver, {"ls", "--json"}).output);
+  ASSERT_EQ(files.size(), 1u);
+  EXPECT_EQ(files[0].at("name"), "b.jps");
+}
+
+TEST_F(Cli, RemoveThatIsRefusedFailsInHexAndWords) {
+  const bed::SimulatedPort receiver({"quorin", "--refuse", "remove"}, {{"a.jps", "a"}});
+  const auto result = RunOn(receiver, {"rm", "a.jps"});
+  EXPECT_EQ(result.status, kFailed);
+  EXPECT_THAT(result.errors, HasSubstr("a.jps"));
+  EXPECT_THAT(result.errors, HasSubstr("0x8007048F"));
+}
+
+TEST_F(Cli, MoveIsRefusedWithASentence) {
+  const bed::SimulatedPort receiver({"quorin"}, {{"a.jps", "a"}});
+  const auto result = RunOn(receiver, {"mv", "a.jps", "b.jps"});
+  EXPECT_EQ(result.status, kFailed);
+  EXPECT_THAT(result.errors, HasSubstr("does not offer renaming"));
+}
+
+TEST_F(Cli, SettingsReachTheReceiverInItsOwnWords) {
+  bed::SimulatedPort receiver({"quorin", "--port-letter", "c"});
+  EXPECT_EQ(RunOn(receiver, {"set", "parity", "odd"}).status, kDone);
+  EXPECT_EQ(RunOn(receiver, {"set", "stopbits", "2"}).status, kDone);
+  EXPECT_EQ(RunOn(receiver, {"set", "rts", "off"}).status, kDone);
+  EXPECT_EQ(RunOn(receiver, {"set", "parity", "even"}).status, kDone);
+  EXPECT_EQ(RunOn(receiver, {"set", "parity", "none"}).status, kDone);
+  EXPECT_EQ(RunOn(receiver, {"set", "baud", "57600"}).status, kDone);
+  const std::string transcript = receiver.Transcript();
+  size_t from = 0;
+  for (const char* line : {"set,/par/dev/ser/c/parity,odd",
+                           "set,/par/dev/ser/c/stops,2",
+                           "set,/par/dev/ser/c/rts,off",
+                           "set,/par/dev/ser/c/parity,even",
+                           "set,/par/dev/ser/c/parity,N",
+                           "set,/par/dev/ser/c/rate,57600"}) {
+    from = transcript.find(line, from);
+    ASSERT_NE(from, std::string::npos) << line << "\n" << transcript;
+  }
+}
+
+// The receiver answers no such command, whatever becomes of it.
+TEST_F(Cli, ASettingIsNotConfirmedAndSaidToBeSo) {
+  const bed::SimulatedPort receiver({"quorin"});
+  const auto result = RunOn(receiver, {"set", "parity", "odd"});
+  EXPECT_EQ(result.status, kDone);
+  EXPECT_THAT(result.output, HasSubstr("does not confirm"));
+}
+
+}  // namespace
+}  // namespace cli_run

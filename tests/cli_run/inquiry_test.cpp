@@ -1,0 +1,145 @@
+// The commands that ask: find, info, ls, check, ports; and what is said when nobody answers.
+#include <nlohmann/json.hpp>
+
+#include "tests/cli_run/cli.h"
+
+namespace cli_run {
+namespace {
+
+using nlohmann::json;
+using testing::HasSubstr;
+
+TEST_F(Cli, FindNamesTheReceiver) {
+  const bed::SimulatedPort receiver({"quorin", "--id", "QR7", "--model", "HVB5x"});
+  const auto result = RunOn(receiver, {"find"});
+  EXPECT_EQ(result.status, kDone) << result.errors;
+  EXPECT_THAT(result.output, HasSubstr("Quorin"));
+  EXPECT_THAT(result.output, HasSubstr("HVB5x"));
+  EXPECT_THAT(result.output, HasSubstr("QR7"));
+}
+
+TEST_F(Cli, FindSweepsWithoutASpeed) {
+  const bed::SimulatedPort receiver({"quorin", "--speed", "9600", "--id", "QR8"});
+  const std::wstring port = receiver.name();
+  const auto result = Run({"find", std::string(port.begin(), port.end())});
+  EXPECT_EQ(result.status, kDone) << result.errors;
+  EXPECT_THAT(result.output, HasSubstr("QR8"));
+}
+
+TEST_F(Cli, InfoAsJsonHoldsTheRecord) {
+  const bed::SimulatedPort receiver({"quorin", "--id", "QR7", "--model", "HVA3-G3T"});
+  const auto result = RunOn(receiver, {"info", "--json"});
+  ASSERT_EQ(result.status, kDone) << result.errors;
+  const json info = json::parse(result.output);
+  EXPECT_EQ(info.at("id"), "QR7");
+  EXPECT_EQ(info.at("model"), "HVA3-G3T");
+  EXPECT_EQ(info.at("protocol"), "quorin");
+  EXPECT_EQ(info.at("variant"), 2);
+}
+
+TEST_F(Cli, ListShowsNamesSizesAndTotal) {
+  const bed::SimulatedPort receiver({"quorin"}, {{"a.jps", Content(700)}, {"b.jps", Content(30)}});
+  const auto result = RunOn(receiver, {"ls"});
+  EXPECT_EQ(result.status, kDone) << result.errors;
+  EXPECT_THAT(result.output, HasSubstr("a.jps"));
+  EXPECT_THAT(result.output, HasSubstr("700"));
+  EXPECT_THAT(result.output, HasSubstr("2 files, 730 bytes"));
+}
+
+TEST_F(Cli, ListAsJsonIsAnArrayAlsoWhenEmpty) {
+  const bed::SimulatedPort receiver({"quorin"}, {{"a.jps", Content(700)}});
+  const auto result = RunOn(receiver, {"ls", "--json"});
+  ASSERT_EQ(result.status, kDone) << result.errors;
+  const json files = json::parse(result.output);
+  ASSERT_EQ(files.size(), 1u);
+  EXPECT_EQ(files[0].at("name"), "a.jps");
+  EXPECT_EQ(files[0].at("size"), 700);
+
+  const bed::SimulatedPort empty({"quorin"});
+  EXPECT_EQ(json::parse(RunOn(empty, {"ls", "--json"}).output), json::array());
+}
+
+TEST_F(Cli, CheckTellsThatTheReceiverAnswers) {
+  const bed::SimulatedPort receiver({"quorin"});
+  EXPECT_EQ(RunOn(receiver, {"check"}).status, kDone);
+}
+
+TEST_F(Cli, SilenceIsNoReceiver) {
+  const bed::SimulatedPort receiver({"quorin", "--mute", "ping"});
+  const auto result = RunOn(receiver, {"find"});
+  EXPECT_EQ(result.status, kNoReceiver);
+  EXPECT_EQ(result.output, "");
+  EXPECT_THAT(result.errors, HasSubstr("0x00000001"));
+}
+
+TEST_F(Cli, AMissingPortIsNoReceiver) {
+  const auto result = Run({"find", "COM99"});
+  EXPECT_EQ(result.status, kNoReceiver);
+  EXPECT_THAT(result.errors, HasSubstr("COM99"));
+  EXPECT_THAT(result.errors, HasSubstr("0x80070002"));
+  EXPECT_THAT(result.errors, HasSubstr("does not exist"));
+}
+
+TEST_F(Cli, ErrorsAsJsonTellAll) {
+  const auto result = Run({"ls", "COM99", "--json"});
+  EXPECT_EQ(result.status, kNoReceiver);
+  const json error = json::parse(result.output).at("error");
+  EXPECT_EQ(error.at("port"), "COM99");
+  EXPECT_EQ(error.at("code"), "0x80070002");
+  EXPECT_EQ(error.at("exit"), kNoReceiver);
+  EXPECT_FALSE(error.at("tried").get<std::string>().empty());
+  EXPECT_FALSE(error.at("meaning").get<std::string>().empty());
+}
+
+TEST_F(Cli, UsbIsRefusedWithASentence) {
+  const auto result = Run({"find", "COM99", "--link", "usb"});
+  EXPECT_NE(result.status, kDone);
+  EXPECT_THAT(result.errors, HasSubstr("USB"));
+}
+
+TEST_F(Cli, PortsAreAnArrayInJson) {
+  const auto result = Run({"ports", "--json"});
+  EXPECT_EQ(result.status, kDone);
+  EXPECT_TRUE(json::parse(result.output).is_array());
+}
+
+TEST_F(Cli, WrongCommandLinesAreUsageErrors) {
+  for (const std::vector<std::string>& line :
+       std::vector<std::vector<std::string>>{{"ls"},
+                                             {"dance", "COM99"},
+                                             {"ls", "COM99", "--speed", "fast"},
+                                             {"get", "COM99"},
+                                             {"set", "COM99", "parity", "sometimes"},
+                                             {"rm", "COM99", "a\"b"},
+                                             {"rm", "COM99", "a\tb"},
+                                             {"find", "COM99", "--link", "air"}}) {
+    const auto result = Run(line);
+    EXPECT_EQ(result.status, kUsage) << line[0] << ": " << result.errors;
+    EXPECT_EQ(result.output, "");
+    EXPECT_NE(result.errors, "");
+  }
+}
+
+TEST_F(Cli, HelpTellsTheExitCodes) {
+  const auto result = Run({"--help"});
+  EXPECT_EQ(result.status, kDone);
+  for (const char* text : {"ports", "find", "info", "ls", "get", "rm", "mv", "set", "check"}) {
+    EXPECT_THAT(result.output, HasSubstr(text));
+  }
+  EXPECT_THAT(result.output, HasSubstr("Exit codes"));
+}
+
+TEST_F(Cli, TheReportIsWritten) {
+  const bed::SimulatedPort receiver({"quorin"});
+  const std::string name =
+      "cli-run-" + folder.unix_path().substr(folder.unix_path().rfind('/') + 1);
+  const auto result = RunOn(receiver, {"find", "--report", name + ".txt"});
+  EXPECT_EQ(result.status, kDone) << result.errors;
+  const auto report = std::filesystem::temp_directory_path() / (name + ".txt");
+  EXPECT_TRUE(std::filesystem::exists(report));
+  EXPECT_GT(std::filesystem::file_size(report), 100u);
+  std::filesystem::remove(report);
+}
+
+}  // namespace
+}  // namespace cli_run
