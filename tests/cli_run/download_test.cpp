@@ -84,6 +84,7 @@ TEST_F(Cli, AFolderThatCannotBeMadeIsALocalError) {
 
 // Names that would climb out of the folder or open a device are kept inside, under another name.
 TEST_F(Cli, NamesOfTheReceiverStayInTheFolder) {
+  std::filesystem::create_directory(folder / "in");
   folder.Write("in/keep", "");
   const bed::SimulatedPort receiver(
       {"quorin"},

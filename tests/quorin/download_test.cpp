@@ -344,6 +344,7 @@ TEST_F(QuorinDownload, DoesNothingAfterAnAbort) {
   EXPECT_EQ(Download(), S_FALSE);
   EXPECT_THAT(Said(), IsEmpty());
   EXPECT_THAT(progress.percents, IsEmpty());
+  EXPECT_FALSE(report.HasStart("CQuorinProtocol::DownloadFile"));
   EXPECT_TRUE(IsFreeForOthers(driver));
   EXPECT_EQ(Download(), S_OK);
 }

@@ -182,6 +182,8 @@ TEST_P(QuorinHandshakeStep, IsTheLastOnceTheEventIsSignalled) {
   const bool last = GetParam() + 1 == kWholeHandshake.size();
   EXPECT_EQ(Check(), last ? -1 : 0);
   EXPECT_THAT(Said(), ElementsAreArray(First(GetParam() + 1)));
+  // Nobody looks behind the first either, until the next has emptied the line.
+  EXPECT_EQ(connection->calls.back(), GetParam() == 0 ? "flush" : "write " + Command(GetParam()));
 }
 
 INSTANTIATE_TEST_SUITE_P(All, QuorinHandshakeStep, testing::Range(size_t{0}, size_t{6}));

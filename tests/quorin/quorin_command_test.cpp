@@ -10,6 +10,7 @@
 #include "platform/handle.h"
 #include "platform/hresult.h"
 #include "tests/quorin/quorin_responder.h"
+#include "tests/quorin/timed_writes.h"
 #include "tests/support/report_capture.h"
 #include "tests/support/scripted_connection.h"
 
@@ -233,17 +234,6 @@ TEST_F(QuorinCommandSending, IsNotShieldedOtherwise) {
   command.Execute(&connection, nullptr);
   EXPECT_EQ(event_at_write, nullptr);
 }
-
-// The scripted connection with the time-outs of its writes.
-class TimedWrites : public ScriptedConnection {
- public:
-  std::vector<DWORD> timeouts;
-
-  HRESULT Write(const void* buffer, DWORD size, DWORD timeout_ms) override {
-    timeouts.push_back(timeout_ms);
-    return ScriptedConnection::Write(buffer, size, timeout_ms);
-  }
-};
 
 TEST(QuorinCommandTimeouts, AreThreeSecondsForEachWrite) {
   TimedWrites connection;

@@ -2,11 +2,14 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include <memory>
 #include <string>
+#include <utility>
 #include <vector>
 
 #include "platform/hresult.h"
 #include "tests/quorin/serial_download_fixture.h"
+#include "tests/quorin/timed_writes.h"
 #include "tests/support/report_capture.h"
 
 using testing::Contains;
@@ -141,6 +144,20 @@ TEST_F(QuorinSerialDownloadEnd, SaysTheEndWholeAfterAnAbort) {
   Download();
   EXPECT_TRUE(shielded);
   EXPECT_EQ(connection->abort_event, nullptr);
+}
+
+TEST(QuorinControlBytes, AreEachGivenThreeSeconds) {
+  auto owned = std::make_unique<TimedWrites>();
+  TimedWrites* const connection = owned.get();
+  QuorinDriver driver(std::move(owned));
+  MemoryStream stream;
+  BlockStream blocks;
+  connection->GiveRead("?");
+  connection->GiveRead(blocks.Data(0, ""));
+  connection->GiveRead(blocks.Last(""));
+  EXPECT_EQ(driver.DownloadOverSerial(&stream, 512), S_OK);
+  EXPECT_EQ(connection->Written(), "\x15\x06#");
+  EXPECT_THAT(connection->timeouts, ElementsAre(3000, 3000, 3000));
 }
 
 // Progress.

@@ -16,6 +16,12 @@ std::wstring TakeText(wchar_t* text) {
 
 }  // namespace
 
+std::string Narrow(const std::wstring& text) {
+  std::string narrow;
+  for (const wchar_t character : text) narrow += static_cast<char>(character);
+  return narrow;
+}
+
 DCB Settings(DWORD speed) {
   DCB settings{};
   settings.DCBlength = sizeof(DCB);

@@ -21,6 +21,9 @@ inline constexpr HRESULT kNotConnected = static_cast<HRESULT>(0x8007048FU);
 inline constexpr HRESULT kTimedOut = static_cast<HRESULT>(0x800705B4U);
 inline constexpr HRESULT kFileNotFound = static_cast<HRESULT>(0x80070002U);
 
+// The same text in both widths, for ASCII.
+std::string Narrow(const std::wstring& text);
+
 // Eight data bits, no parity, one stop bit, no flow control.
 DCB Settings(DWORD speed);
 

@@ -1,0 +1,248 @@
+// SearchReceiver and its serial half: from a port's name to a receiver.
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+#include <windows.h>
+
+#include <string>
+
+#include "rcvlink.h"
+#include "tests/host/support/receiver.h"
+#include "tests/host/support/report.h"
+
+using testing::ElementsAre;
+using testing::ElementsAreArray;
+using testing::IsEmpty;
+using testing::Not;
+
+namespace {
+
+constexpr HRESULT kUnexpected = static_cast<HRESULT>(0x8000FFFFU);
+constexpr auto kNoInstanceType = static_cast<EInstanceType>(3);
+
+class ApiSearch : public testing::Test {
+ protected:
+  long Search(EInstanceType type, EProtocol protocol, HANDLE abort_event = nullptr) {
+    return devapi::SearchReceiver(name_.data(), type, protocol, abort_event, &handle_);
+  }
+  // The lines of one try that opens the port and then gives up.
+  host::Lines LinesOfTry(const std::string& speed, const std::string& rts) const {
+    return {"SearchReceiverOnSerial - try " + speed + " [" + port_ + "]",
+            "SearchReceiverOnSerial - try RTS control is " + rts + " [" + port_ + "]",
+            "CreateReceiverOnSerial - opening serial port [" + port_ + "]",
+            "CAbstractConnection::Cancel []",
+            "CSerialConnection::Flush",
+            "CSerialConnection::Open - OK [" + port_ + "]"};
+  }
+  // What a connection says at its end.
+  host::Lines LinesOfEnd() const {
+    return {"CAbstractConnection::Cancel [" + port_ + "]",
+            "CAbstractConnection::Disconnect - disconnected [" + port_ + "]"};
+  }
+
+  void UsePort(const std::wstring& name) {
+    name_ = name;
+    port_ = host::Narrow(name);
+  }
+
+  std::wstring name_;
+  std::string port_;
+  void* handle_ = nullptr;
+};
+
+void Append(host::Lines& lines, const host::Lines& more) {
+  lines.insert(lines.end(), more.begin(), more.end());
+}
+
+// Nothing is plugged in.
+class ApiSearchOfMissingPort : public ApiSearch {
+ protected:
+  ApiSearchOfMissingPort() {
+    const std::string name = lease_.name();
+    UsePort(std::wstring(name.begin(), name.end()));
+  }
+  host::Lines LinesOfTheOnlyTry() const {
+    host::Lines lines = LinesOfTry("current port speed", "handshake");
+    lines.resize(4);
+    Append(lines,
+           {"CSerialConnection::Create - CreateFile failed [2] [" + port_ + "]",
+            "CAbstractConnection::Cancel [" + port_ + "]"});
+    return lines;
+  }
+
+  const bed::PortLease lease_;
+  const host::Report report_;
+};
+
+TEST_F(ApiSearchOfMissingPort, EndsAfterOneTry) {
+  EXPECT_EQ(Search(eInstanceSerial, eProtocolAny), host::kFileNotFound);
+  EXPECT_THAT(report_.Lines(), ElementsAreArray(LinesOfTheOnlyTry()));
+  EXPECT_EQ(handle_, nullptr);
+}
+
+TEST_F(ApiSearchOfMissingPort, SerialHalfDoesTheSame) {
+  EXPECT_EQ(SearchReceiverOnSerial(name_.data(), eProtocolAny, nullptr, &handle_),
+            host::kFileNotFound);
+  EXPECT_THAT(report_.Lines(), ElementsAreArray(LinesOfTheOnlyTry()));
+}
+
+TEST_F(ApiSearchOfMissingPort, GoesOnToUsbWhereAnyLinkWillDo) {
+  EXPECT_EQ(Search(eInstanceAny, eProtocolAny), E_NOTIMPL);
+  host::Lines lines = LinesOfTheOnlyTry();
+  Append(lines,
+         {"SearchReceiver - SearchReceiverOnSerial failed[" + port_ + "] [0x80070002]",
+          "CreateReceiverOnUSB - opening USB [" + port_ + "]",
+          "SearchReceiver - CreateReceiverOnUSB failed[" + port_ + "] [0x80004001]"});
+  EXPECT_THAT(report_.Lines(), ElementsAreArray(lines));
+  EXPECT_EQ(handle_, nullptr);
+}
+
+TEST_F(ApiSearchOfMissingPort, UsbAloneLeavesTheSerialPortAlone) {
+  EXPECT_EQ(Search(eInstanceUSB, eProtocolVelmar), E_NOTIMPL);
+  EXPECT_THAT(report_.Lines(), ElementsAre("CreateReceiverOnUSB - opening USB [" + port_ + "]"));
+}
+
+TEST_F(ApiSearchOfMissingPort, RefusesAStrangeKindOfLink) {
+  EXPECT_EQ(Search(kNoInstanceType, eProtocolAny), kUnexpected);
+  EXPECT_THAT(report_.Lines(), IsEmpty());
+}
+
+TEST_F(ApiSearchOfMissingPort, RefusesMissingArguments) {
+  EXPECT_EQ(devapi::SearchReceiver(name_.data(), eInstanceAny, eProtocolAny, nullptr, nullptr),
+            E_INVALIDARG);
+  EXPECT_EQ(devapi::SearchReceiver(nullptr, eInstanceSerial, eProtocolAny, nullptr, &handle_),
+            E_INVALIDARG);
+  EXPECT_EQ(devapi::CreateReceiverOnUSB(nullptr, eProtocolAny, nullptr, &handle_), E_INVALIDARG);
+  EXPECT_EQ(devapi::CreateReceiverOnUSB(name_.data(), eProtocolAny, nullptr, nullptr),
+            E_INVALIDARG);
+  EXPECT_THAT(report_.LinesWith("CSerialConnection"), IsEmpty());
+}
+
+TEST_F(ApiSearch, ReturnsARegisteredReceiverAtOnce) {
+  const bed::SimulatedPort port({"quorin"});
+  UsePort(port.name());
+  const host::Receiver receiver(port);
+  const std::string before = port.Transcript();
+  const host::Report report;
+
+  EXPECT_EQ(Search(eInstanceSerial, eProtocolVelmar), S_OK);
+  EXPECT_EQ(handle_, receiver.get());
+  EXPECT_EQ(Search(kNoInstanceType, eProtocolAny), S_OK) << "it is looked for before the type";
+  EXPECT_THAT(report.Lines(),
+              ElementsAre("OpenReceiver - ref [2] [" + port_ + "]",
+                          "SearchReceiver - receiver already exists [" + port_ + "]",
+                          "OpenReceiver - ref [3] [" + port_ + "]",
+                          "SearchReceiver - receiver already exists [" + port_ + "]"));
+  EXPECT_EQ(devapi::CloseReceiver(handle_), S_FALSE);
+  EXPECT_EQ(devapi::CloseReceiver(handle_), S_FALSE);
+  EXPECT_EQ(port.Transcript(), before) << "it was asked nevertheless";
+}
+
+// The port stands at 9600 bit/s, so the receiver is reached at the fourth try.
+TEST_F(ApiSearch, SweepsTheSpeedsFromTheCurrentOneOn) {
+  const bed::SimulatedPort port({"quorin", "--speed", "57600"});
+  UsePort(port.name());
+  const host::Report report;
+
+  ASSERT_EQ(Search(eInstanceSerial, eProtocolQuorin), S_OK);
+  EXPECT_THAT(report.LinesWith("SearchReceiverOnSerial"),
+              ElementsAre("SearchReceiverOnSerial - try current port speed [" + port_ + "]",
+                          "SearchReceiverOnSerial - try RTS control is handshake [" + port_ + "]",
+                          "SearchReceiverOnSerial - try speed [9600] [" + port_ + "]",
+                          "SearchReceiverOnSerial - try RTS control is handshake [" + port_ + "]",
+                          "SearchReceiverOnSerial - try speed [115200] [" + port_ + "]",
+                          "SearchReceiverOnSerial - try RTS control is handshake [" + port_ + "]",
+                          "SearchReceiverOnSerial - try speed [57600] [" + port_ + "]",
+                          "SearchReceiverOnSerial - try RTS control is handshake [" + port_ + "]"));
+  const std::string silence =
+      "CQuorinProtocol::CheckConnection - ping cmd failed [0x800705B4] [" + port_ + "]";
+  EXPECT_EQ(host::CountOf(report.Lines(), silence), 3U);
+  EXPECT_TRUE(report.Has("CreateReceiverOnSerial - OK [" + port_ + "]"));
+  port.WaitForTranscript(" echo /dev/null\n");
+  EXPECT_EQ(host::SentByHost(port.Transcript()), host::HandshakeOfHost());
+  EXPECT_EQ(devapi::CloseReceiver(handle_), S_OK);
+}
+
+TEST_F(ApiSearch, FindsItAtTheSpeedThatThePortWasLeftAt) {
+  const bed::SimulatedPort port({"quorin", "--speed", "38400"});
+  UsePort(port.name());
+  { const host::Receiver before(port, CBR_38400); }
+  const host::Report report;
+
+  ASSERT_EQ(Search(eInstanceAny, eProtocolAny), S_OK);
+  EXPECT_EQ(report.LinesWith("SearchReceiverOnSerial").size(), 2U);
+  EXPECT_EQ(devapi::CloseReceiver(handle_), S_OK);
+}
+
+// Without a family to ask for, each try ends as soon as the port is open.
+TEST_F(ApiSearch, NeverAsksForQuorinWhereVelmarIsWanted) {
+  const bed::SimulatedPort port({"quorin"});
+  UsePort(port.name());
+  const host::Report report;
+
+  EXPECT_EQ(Search(eInstanceSerial, eProtocolVelmar), S_FALSE);
+  EXPECT_EQ(handle_, nullptr);
+  EXPECT_THAT(report.LinesWith("CreateReceiverOnSerial - looking for Quorin"), IsEmpty());
+  EXPECT_THAT(port.Transcript(), IsEmpty());
+
+  host::Lines expected;
+  for (const char* const rts : {"handshake", "enable", "disable"}) {
+    for (const char* const speed : {"current port speed",
+                                    "speed [9600]",
+                                    "speed [115200]",
+                                    "speed [57600]",
+                                    "speed [38400]",
+                                    "speed [19200]"}) {
+      host::Lines lines = LinesOfTry(speed, rts);
+      lines.resize(2);
+      Append(expected, lines);
+    }
+  }
+  EXPECT_THAT(report.LinesWith("SearchReceiverOnSerial"), ElementsAreArray(expected));
+}
+
+TEST_F(ApiSearch, EndsOnceThePortIsOpenWhenItWasAbortedBefore) {
+  const bed::SimulatedPort port({"quorin"});
+  UsePort(port.name());
+  const host::Event abort_event(true);
+  const host::Report report;
+
+  EXPECT_EQ(Search(eInstanceSerial, eProtocolAny, abort_event.get()), S_FALSE);
+  EXPECT_EQ(handle_, nullptr);
+  host::Lines lines = LinesOfTry("current port speed", "handshake");
+  Append(lines, LinesOfEnd());
+  EXPECT_THAT(report.Lines(), ElementsAreArray(lines));
+  EXPECT_THAT(port.Transcript(), IsEmpty());
+}
+
+TEST_F(ApiSearch, EndsWhenItIsAbortedInASilence) {
+  bed::SimulatedPort port({"quorin"});
+  UsePort(port.name());
+  host::Event abort_event;
+  const host::Report report;
+  port.Pause();
+
+  auto search = host::OnThread(
+      [&] { return Search(eInstanceSerial, eProtocolAny, abort_event.get()); });
+  report.WaitFor("CQuorinCommand::Execute - start reading. Timeout is [8000 msec]");
+  abort_event.Set();
+  EXPECT_EQ(search.get(), S_FALSE);
+  EXPECT_EQ(handle_, nullptr);
+  EXPECT_EQ(report.LinesWith("SearchReceiverOnSerial").size(), 2U);
+  EXPECT_THAT(report.LinesWith("CAbstractConnection::Read"), IsEmpty()) << "it was waited out";
+  EXPECT_THAT(report.LinesWith("CQuorinProtocol::CheckConnection - ping"), IsEmpty());
+  EXPECT_TRUE(report.Has("CAbstractConnection::Disconnect - disconnected [" + port_ + "]"));
+}
+
+TEST_F(ApiSearch, TakesAStaleHandleForAFind) {
+  const bed::SimulatedPort port({"quorin"});
+  UsePort(port.name());
+  const host::Report report;
+  void* const stale = &name_;
+  handle_ = stale;
+
+  EXPECT_EQ(Search(eInstanceSerial, eProtocolVelmar), S_OK);
+  EXPECT_EQ(handle_, stale);
+  EXPECT_EQ(report.LinesWith("SearchReceiverOnSerial").size(), 2U);
+}
+
+}  // namespace
