@@ -76,7 +76,7 @@ DWORD CQuorinProtocol::RaiseSpeed() {
   const HRESULT followed = connection()->SetSpeed(kTransferSpeed);
   if (FAILED(followed)) {
     Trace(L"CQuorinProtocol::DownloadFile - host speed up is failed [0x%08X]\r\n", followed);
-    DCSetRcvBaudrate(speed);
+    ChangeReceiverSpeed(speed, OnAbort::kKeep);
     return 0;
   }
   return speed;
@@ -107,8 +107,12 @@ HRESULT CQuorinProtocol::Transfer(const wchar_t* name, IStream* stream, EInstanc
   Trace(L"CQuorinProtocol::DownloadFile - file size [%s] is %i bytes\r\n", name, size);
 
   CGetFileCmd get_file(narrow_name, kBlockPayload, kCommandFlags);
+  get_file.SendWhole();
   ThrowIfFailed(ExecuteCommand(get_file));
-  ThrowIfAborted();
+  if (TakeAbort()) {
+    EndTransfer();  // the receiver has heard the command and waits for a control byte
+    return S_FALSE;
+  }
   ReportProgress(1);
   connection()->Flush();
   ThrowIfFailed(WriteControl(kNak));

@@ -117,18 +117,17 @@ HRESULT CQuorinProtocol::GetReceiverInfo(HANDLE abort_event, CReceiverInfo* info
 void CQuorinProtocol::ReadIdentity(CReceiverInfo* info) {
   const auto ask = [&](auto& command) {
     ThrowIfFailed(ExecuteCommand(command));
+    ThrowIfAborted();
     if (command.Kind() != ReplyKind::kReply) throw HResultError(S_FALSE);
     return command.Text();
   };
   ReportProgress(0);
   CGetReceiverIDCmd get_id(kCommandFlags);
   UniqueBstr id = CopyBstr(ask(get_id).c_str());
-  ThrowIfAborted();
   ReportProgress(50);
   CGetReceiverModelCmd get_model(kCommandFlags);
   const std::wstring model_text = ask(get_model);
   UniqueBstr model = CopyBstr(model_text.c_str());
-  ThrowIfAborted();
   UnlockConnection();
   ReportProgress(100);
 
@@ -201,10 +200,10 @@ void CQuorinProtocol::ThrowIfAborted() {
 }
 
 template <typename MakeCommand>
-HRESULT CQuorinProtocol::ChangePort(MakeCommand make_command) {
+HRESULT CQuorinProtocol::ChangePort(MakeCommand make_command, OnAbort on_abort) {
   CGetPortCmd get_port(kCommandFlags);
   if (const HRESULT result = ExecuteCommand(get_port); FAILED(result)) return result;
-  ThrowIfAborted();
+  if (on_abort == OnAbort::kStop) ThrowIfAborted();
   const int port_index = get_port.PortIndex();
   if (port_index < 0) return S_FALSE;
   auto command = make_command(port_index);
@@ -213,8 +212,9 @@ HRESULT CQuorinProtocol::ChangePort(MakeCommand make_command) {
   return FAILED(result) ? result : S_OK;
 }
 
-HRESULT CQuorinProtocol::ChangeReceiverSpeed(DWORD speed) {
-  return ChangePort([&](int port) { return CChangeBaudRateCmd(port, speed, kCommandFlags); });
+HRESULT CQuorinProtocol::ChangeReceiverSpeed(DWORD speed, OnAbort on_abort) {
+  return ChangePort([&](int port) { return CChangeBaudRateCmd(port, speed, kCommandFlags); },
+                    on_abort);
 }
 
 HRESULT CQuorinProtocol::DCSetRcvBaudrate(DWORD baud_rate) {

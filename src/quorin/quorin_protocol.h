@@ -39,10 +39,12 @@ class CQuorinProtocol : public CAbstractProtocol {
 
  private:
   // Asks for the receiver's port and sends it one setting. S_FALSE when it names none, or the
-  // command's failure; raises S_FALSE when an abort came before the setting was sent.
+  // command's failure. An abort that came before the setting was sent raises S_FALSE, or is kept
+  // for later: what puts a speed back is not to be stopped.
+  enum class OnAbort { kStop, kKeep };
   template <typename MakeCommand>
-  HRESULT ChangePort(MakeCommand make_command);
-  HRESULT ChangeReceiverSpeed(DWORD speed);
+  HRESULT ChangePort(MakeCommand make_command, OnAbort on_abort = OnAbort::kStop);
+  HRESULT ChangeReceiverSpeed(DWORD speed, OnAbort on_abort = OnAbort::kStop);
 
   void ReadIdentity(CReceiverInfo* info);
 

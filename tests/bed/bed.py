@@ -26,6 +26,7 @@ Windows programs (paths relative to the folder of the release build's programs):
       a line of it showed in turn; "errors" is empty, as a terminal does not keep them apart.
 
   {"do": "folder"}                                   -> {"path": a new, empty folder}
+  {"do": "write", "path": P, "bytes": HEX}           makes a file, under names that Windows has not
 """
 
 import argparse
@@ -90,6 +91,7 @@ class Connection(socketserver.StreamRequestHandler):
             "interrupt": self._interrupt,
             "finish": self._finish,
             "folder": self._folder,
+            "write": self._write,
         }
         if request["do"] not in actions:
             raise Refused(f"unknown request {request['do']!r}")
@@ -146,6 +148,10 @@ class Connection(socketserver.StreamRequestHandler):
 
     def _finish(self, request):
         return self._jobs[request["job"]].finish(request["seconds"])
+
+    def _write(self, request):
+        with open(request["path"], "wb") as file:
+            file.write(bytes.fromhex(request["bytes"]))
 
     def _folder(self, _request):
         parent = os.path.join(BUILD, "tmp")

@@ -110,7 +110,7 @@ TEST(BedRefusal, TellsWhatTheSimulatorSaid) {
 }
 
 TEST(BedFolder, IsSeenFromBothSides) {
-  const bed::TempFolder folder;
+  bed::TempFolder folder;
   folder.Write("a.bin", std::string("\0\r\n\xFF", 4));
   EXPECT_EQ(folder.Read("a.bin"), std::string("\0\r\n\xFF", 4));
   EXPECT_EQ(bed::ToUnixPath(folder.path()), folder.unix_path());

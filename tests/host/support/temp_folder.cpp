@@ -23,10 +23,15 @@ TempFolder::TempFolder()
       path_(ToWindowsPath(unix_path_)) {}
 
 void TempFolder::Write(const std::string& name, const std::string& content) const {
-  std::ofstream file(path_ / name, std::ios::binary | std::ios::trunc);
-  file.write(content.data(), static_cast<std::streamsize>(content.size()));
-  file.close();
-  if (!file) throw Error("cannot write " + (path_ / name).string());
+  constexpr char kDigits[] = "0123456789abcdef";
+  std::string hex;
+  hex.reserve(2 * content.size());
+  for (const char byte : content) {
+    const auto value = static_cast<unsigned char>(byte);
+    hex += kDigits[value >> 4];
+    hex += kDigits[value & 0xF];
+  }
+  connection_.Request({{"do", "write"}, {"path", unix_path_ + "/" + name}, {"bytes", hex}});
 }
 
 std::string TempFolder::Read(const std::string& name) const {

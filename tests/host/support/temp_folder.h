@@ -24,11 +24,12 @@ class TempFolder {
   // The path of a file in the folder.
   std::filesystem::path operator/(const std::string& name) const { return path_ / name; }
 
+  // The name is UTF-8 and may be one that Windows does not have.
   void Write(const std::string& name, const std::string& content) const;
   std::string Read(const std::string& name) const;
 
  private:
-  Connection connection_;
+  mutable Connection connection_;  // asking changes nothing of the folder
   std::string unix_path_;
   std::filesystem::path path_;
 };
