@@ -2,6 +2,7 @@
 #define SIMULATOR_FAULTS_H_
 
 #include <cstdint>
+#include <string>
 
 namespace sim {
 
@@ -19,6 +20,12 @@ inline bool TakeOccurrence(uint32_t& times) {
   }
   return true;
 }
+
+// The receiver tells this size for a file, whatever it sends.
+struct SizeLie {
+  std::string file;
+  uint64_t size = 0;
+};
 
 }  // namespace sim
 

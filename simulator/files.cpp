@@ -91,4 +91,17 @@ bool FileStore::Remove(const std::string& name) {
   return std::erase_if(files_, [&](const Served& file) { return file.entry.name == name; }) > 0;
 }
 
+bool FileStore::Rename(const std::string& name, const std::string& new_name) {
+  if (Find(new_name)) {
+    return false;
+  }
+  for (Served& file : files_) {
+    if (file.entry.name == name) {
+      file.entry.name = new_name;
+      return true;
+    }
+  }
+  return false;
+}
+
 }  // namespace sim

@@ -20,8 +20,8 @@ struct FileEntry {
   std::time_t modified = 0;
 };
 
-// The files a receiver serves: real ones of a folder, or ones made up in memory. Removing a file
-// takes it out of what is served; nothing on disk is ever changed.
+// The files a receiver serves: real ones of a folder, or ones made up in memory. Removing or
+// renaming a file changes what is served; nothing on disk is ever changed.
 class FileStore {
  public:
   FileStore() = default;
@@ -42,6 +42,9 @@ class FileStore {
 
   // False if no such file is served.
   bool Remove(const std::string& name);
+
+  // False if no such file is served, or another one has the new name.
+  bool Rename(const std::string& name, const std::string& new_name);
 
  private:
   struct Served {

@@ -59,8 +59,27 @@ void Line::DropOutput() {
 
 size_t Line::Remaining() const { return queue_.front().bytes.size() - sent_of_front_; }
 
+size_t Line::Waiting() const {
+  size_t count = 0;
+  for (const Output& output : queue_) {
+    count += output.bytes.size();
+  }
+  return count - sent_of_front_;
+}
+
+// A piece goes on into the next message unless that one has to wait for its time or for a speed.
 size_t Line::PieceLength() const {
-  return options_.piece_size == 0 ? Remaining() : std::min(options_.piece_size, Remaining());
+  size_t length = Remaining();
+  if (options_.piece_size == 0) {
+    return length;
+  }
+  for (size_t i = 1; i < queue_.size() && length < options_.piece_size; ++i) {
+    if (queue_[i - 1].speed_after || queue_[i].not_before_ms > queue_.front().not_before_ms) {
+      break;
+    }
+    length += queue_[i].bytes.size();
+  }
+  return std::min(options_.piece_size, length);
 }
 
 uint64_t Line::ByteTimeNs() const { return kBitsPerByte * kNsPerSecond / std::max(speed_, 1U); }
@@ -98,35 +117,47 @@ Bytes Line::Send(uint64_t now_ms, uint32_t host_speed) {
   if (!due || *due > now_ms) {
     return {};
   }
-  const Output& front = queue_.front();
-  if (sent_of_front_ == 0 && !front.description.empty()) {
-    transcript_.FromReceiver(front.description);
-  }
+  // What leaves now leaves at this speed, even if it is the last before a change.
+  const bool readable = Matches(host_speed);
   const size_t count = BytesDue(now_ms);
-  const auto begin = front.bytes.begin() + static_cast<std::ptrdiff_t>(sent_of_front_);
-  Bytes piece(begin, begin + static_cast<std::ptrdiff_t>(count));
-  if (!Matches(host_speed)) {
+  wire_free_ns_ = WireStartNs() + count * ByteTimeNs();
+  Bytes piece;
+  piece.reserve(count);
+  while (piece.size() < count) {
+    TakeFromFront(count - piece.size(), piece);
+  }
+  if (options_.piece_size != 0) {
+    next_piece_ms_ = now_ms + options_.piece_gap_ms;
+  }
+  if (!readable) {
     if (options_.garbled) {
       std::transform(piece.begin(), piece.end(), piece.begin(), Garble);
     } else {
       piece.clear();
     }
   }
-
-  wire_free_ns_ = WireStartNs() + count * ByteTimeNs();
-  sent_of_front_ += count;
-  if (options_.piece_size != 0) {
-    next_piece_ms_ = now_ms + options_.piece_gap_ms;
-  }
-  if (sent_of_front_ == front.bytes.size()) {
-    const std::optional<uint32_t> speed = front.speed_after;
-    queue_.pop_front();
-    sent_of_front_ = 0;
-    if (speed) {
-      SetSpeed(*speed);
-    }
-  }
   return piece;
+}
+
+// Moves up to `count` bytes of the first message to `bytes`.
+void Line::TakeFromFront(size_t count, Bytes& bytes) {
+  const Output& front = queue_.front();
+  if (sent_of_front_ == 0 && !front.description.empty()) {
+    transcript_.FromReceiver(front.description);
+  }
+  count = std::min(count, Remaining());
+  const auto begin = front.bytes.begin() + static_cast<std::ptrdiff_t>(sent_of_front_);
+  bytes.insert(bytes.end(), begin, begin + static_cast<std::ptrdiff_t>(count));
+  sent_of_front_ += count;
+  if (Remaining() > 0) {
+    return;
+  }
+  const std::optional<uint32_t> speed = front.speed_after;
+  queue_.pop_front();
+  sent_of_front_ = 0;
+  if (speed) {
+    SetSpeed(*speed);
+  }
 }
 
 }  // namespace sim

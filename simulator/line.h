@@ -21,7 +21,8 @@ struct LineOptions {
   bool garbled = false;
   // Output takes the time it needs on a wire, 10 bits a byte.
   bool paced = false;
-  // Output comes in pieces of this many bytes with a pause between them; 0 means whole.
+  // Output comes in pieces of this many bytes with a pause between them, wherever one message ends
+  // and the next begins; 0 means message by message.
   size_t piece_size = 0;
   uint32_t piece_gap_ms = kDefaultPieceGapMs;
 };
@@ -54,6 +55,9 @@ class Line {
   // True when everything queued has left.
   bool Idle() const { return queue_.empty(); }
 
+  // How many bytes have not left yet.
+  size_t Waiting() const;
+
   // Takes back what has not left yet. A change of speed that was to follow it happens now.
   void DropOutput();
 
@@ -67,6 +71,7 @@ class Line {
   uint64_t ByteTimeNs() const;
   uint64_t WireStartNs() const;
   size_t BytesDue(uint64_t now_ms) const;
+  void TakeFromFront(size_t count, Bytes& bytes);
 
   LineOptions options_;
   Transcript& transcript_;

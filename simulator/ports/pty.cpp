@@ -146,7 +146,8 @@ void PtyPort::Wait(const Receiver& receiver, const sigset_t& wait_mask) const {
     event.events |= POLLOUT;
   }
   timespec timeout{};
-  const std::optional<uint64_t> next = receiver.NextSendTime();
+  // Nothing is sent while the terminal has no room.
+  const std::optional<uint64_t> next = unwritten_.empty() ? receiver.NextSendTime() : std::nullopt;
   if (next) {
     const uint64_t now_ns = NowNs();
     const uint64_t due_ns = *next * kNsPerMs;
@@ -204,13 +205,11 @@ void PtyPort::Deliver(Receiver& receiver, std::span<const uint8_t> bytes) {
   }
 }
 
+// One write at a time, so that a receiver with a lot to send still listens.
 void PtyPort::SendDue(Receiver& receiver) {
-  while (!receiver.gone()) {
-    const uint64_t now_ms = NowMs();
-    const std::optional<uint64_t> next = receiver.NextSendTime();
-    if (!next || *next > now_ms) {
-      return;
-    }
+  const uint64_t now_ms = NowMs();
+  const std::optional<uint64_t> next = receiver.NextSendTime();
+  if (unwritten_.empty() && next && *next <= now_ms) {
     Write(receiver.Send(now_ms, host_speed_));
   }
 }

@@ -12,8 +12,10 @@
 #include "simulator/line.h"
 #include "simulator/ports/pty.h"
 #include "simulator/program/quorin_program.h"
+#include "simulator/program/velmar_program.h"
 #include "simulator/quorin/receiver.h"
 #include "simulator/transcript.h"
+#include "simulator/velmar/receiver.h"
 
 namespace {
 
@@ -87,12 +89,12 @@ std::ofstream OpenTranscript(const std::string& path) {
   return file;
 }
 
-void RunQuorin(const sim::QuorinOptions& options, const PortOptions& port_options) {
+template <typename FamilyReceiver, typename FamilyOptions>
+void Run(const FamilyOptions& options, const PortOptions& port_options) {
   const sigset_t wait_mask = CatchSignals();
   std::ofstream file = OpenTranscript(port_options.transcript);
   sim::Transcript transcript = file.is_open() ? sim::Transcript(file) : sim::Transcript();
-  sim::QuorinReceiver receiver(
-      options, sim::FileStore::FromFolder(port_options.folder), &transcript);
+  FamilyReceiver receiver(options, sim::FileStore::FromFolder(port_options.folder), &transcript);
   sim::PtyPort port(port_options.link);
   std::cout << port.slave_name() << std::endl;
   port.Serve(receiver, stop_requested, wait_mask);
@@ -112,9 +114,18 @@ int main(int argc, char** argv) {
   AddPortOptions(*quorin_command, port, quorin.line);
   sim::AddQuorinOptions(*quorin_command, quorin);
 
+  sim::VelmarOptions velmar;
+  CLI::App* const velmar_command = app.add_subcommand("velmar", "a Velmar receiver");
+  AddPortOptions(*velmar_command, port, velmar.line);
+  sim::AddVelmarOptions(*velmar_command, velmar);
+
   CLI11_PARSE(app, argc, argv);
   try {
-    RunQuorin(quorin, port);
+    if (quorin_command->parsed()) {
+      Run<sim::QuorinReceiver>(quorin, port);
+    } else {
+      Run<sim::VelmarReceiver>(velmar, port);
+    }
   } catch (const std::exception& error) {
     std::fprintf(stderr, "rcvlink-sim: %s\n", error.what());
     return kExitFailure;

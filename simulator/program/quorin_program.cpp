@@ -1,11 +1,9 @@
 #include "simulator/program/quorin_program.h"
 
 #include <array>
-#include <functional>
-#include <stdexcept>
 #include <string>
-#include <vector>
 
+#include "simulator/program/text_option.h"
 #include "simulator/quorin/fault_text.h"
 
 namespace sim {
@@ -64,26 +62,6 @@ constexpr std::array<ReplyFaultOption, 7> kReplyFaults = {{
      "BYTES[:COMMAND][@TIMES]",
      "the reply's header is off by so many bytes (write --bad-length=-3 for fewer)"},
 }};
-
-// An option that may be given several times and whose texts are handed to `take`.
-CLI::Option* AddTextOption(CLI::App& command,
-                           const std::string& name,
-                           const std::string& form,
-                           const std::string& help,
-                           std::function<void(const std::string&)> take) {
-  const auto take_all = [name, take](const std::vector<std::string>& texts) {
-    for (const std::string& text : texts) {
-      try {
-        take(text);
-      } catch (const std::invalid_argument& error) {
-        throw CLI::ValidationError(name, error.what());
-      }
-    }
-  };
-  return command.add_option_function<std::vector<std::string>>(name, take_all, help)
-      ->allow_extra_args(false)
-      ->type_name(form);
-}
 
 void AddIdentityOptions(CLI::App& command, QuorinOptions& options) {
   QuorinIdentity& identity = options.identity;

@@ -3,12 +3,13 @@
 
 #include <string_view>
 
+#include "simulator/fault_text.h"
 #include "simulator/quorin/faults.h"
 
 namespace sim {
 
 // Faults as they are written on a command line. Each of these throws std::invalid_argument with a
-// message for the user when the text does not fit. TIMES is a number above 0 or "always".
+// message for the user when the text does not fit.
 
 // "BLOCK[@TIMES]", once unless told; for kSilence "BLOCK:SECONDS[@TIMES]".
 BlockFault ParseBlockFault(BlockFaultKind kind, std::string_view text);
@@ -16,12 +17,6 @@ BlockFault ParseBlockFault(BlockFaultKind kind, std::string_view text);
 // "COMMAND[@TIMES]", always unless told; for the kinds with an amount "AMOUNT[:COMMAND][@TIMES]".
 // The amount is in seconds for kSilence and in bytes for the others.
 ReplyFault ParseReplyFault(ReplyFaultKind kind, std::string_view text);
-
-// "NAME=SIZE".
-SizeLie ParseSizeLie(std::string_view text);
-
-// "TIMES" alone.
-uint32_t ParseTimes(std::string_view text);
 
 }  // namespace sim
 

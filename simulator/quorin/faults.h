@@ -56,12 +56,6 @@ struct ReplyFault {
   int32_t amount = 0;
 };
 
-// The receiver tells this size for a file, whatever it sends.
-struct SizeLie {
-  std::string file;
-  uint64_t size = 0;
-};
-
 struct Faults {
   std::vector<BlockFault> blocks = {};
   std::vector<ReplyFault> replies = {};

@@ -42,25 +42,6 @@ DCB SettingsOfTry(DWORD speed, DWORD rts_control) {
   return settings;
 }
 
-// A probe's wait for the receiver ends at once when the host's abort event is signalled.
-class AbortWatch {
- public:
-  AbortWatch(CIConnection* connection, HANDLE abort_event) : connection_(connection) {
-    connection_->SetAbortEvent(abort_event);
-  }
-  AbortWatch(const AbortWatch&) = delete;
-  AbortWatch& operator=(const AbortWatch&) = delete;
-  ~AbortWatch() { connection_->SetAbortEvent(nullptr); }
-
- private:
-  CIConnection* connection_;
-};
-
-bool ProbeQuorin(CIConnection* connection, HANDLE abort_event) {
-  const AbortWatch watch(connection, abort_event);
-  return CQuorinProtocol::Probe(connection, abort_event);
-}
-
 // The driver of the family that answers, S_FALSE for none.
 HRESULT FindDriver(std::unique_ptr<CIConnection> connection,
                    const wchar_t* port,
@@ -70,7 +51,7 @@ HRESULT FindDriver(std::unique_ptr<CIConnection> connection,
   if (protocol != eProtocolVelmar) {
     if (IsSignalled(abort_event)) return S_FALSE;
     Trace(L"CreateReceiverOnSerial - looking for Quorin receiver [%s]\r\n", port);
-    if (ProbeQuorin(connection.get(), abort_event)) {
+    if (CQuorinProtocol::Probe(connection.get(), abort_event)) {
       driver = std::make_unique<CQuorinProtocol>(std::move(connection));
       Trace(L"CreateReceiverOnSerial - Quorin receiver found [%s]\r\n", port);
       return S_OK;

@@ -59,8 +59,9 @@ long GetFileInfo(void* fileList, long index, CFileInfo* info) {
   *info = file;
   info->bstrName = nullptr;
   return CatchResult([&] {
-    info->bstrName = CopyBstr(file.bstrName).release();
-    Trace(L"GetFileInfo - [%s] [%u]\r\n", info->bstrName, info->dwSize);
+    UniqueBstr name = CopyBstr(file.bstrName);
+    Trace(L"GetFileInfo - [%s] [%u]\r\n", name.get(), file.dwSize);
+    info->bstrName = name.release();
     return S_OK;
   });
 }

@@ -23,21 +23,24 @@
 ///
 /// @par Result codes
 /// All `devapi` functions return a 32-bit HRESULT:
-///  | value      | name          | meaning                                                        |
-///  |------------|---------------|----------------------------------------------------------------|
-///  | 0x00000000 | S_OK          | done                                                           |
-///  | 0x00000001 | S_FALSE       | nothing was done, and that is no error: nothing found, aborted,
-///  | |            |               | or other users of the receiver remain | | 0x80070057 |
-///  E_INVALIDARG  | a required pointer is null, a handle is unknown, an index is    | | | | not
-///  below the count                                            | | 0x8007000E | E_OUTOFMEMORY | an
-///  allocation failed                                           | | 0x80004001 | E_NOTIMPL     |
-///  this receiver's family does not offer the operation            | | 0x80004005 | E_FAIL        |
-///  internal failure; a download of a file of size 0               | | 0x8000FFFF | E_UNEXPECTED  |
-///  an `EInstanceType` that is none                                | | 0x8007048F |               |
-///  (ERROR_DEVICE_NOT_CONNECTED) no connection, no driver, no      | |            |               |
-///  complete reply, or the receiver refused the command            | | 0x800705B4 |               |
-///  (ERROR_TIMEOUT) the receiver stayed silent                     | | 0x8007xxxx |               |
-///  any other Win32 error, its number in the low 16 bits           |
+///
+///     0x00000000 S_OK           done
+///     0x00000001 S_FALSE        nothing was done, and that is no error: nothing found, aborted, or
+///                               other users of the receiver remain
+///     0x80070057 E_INVALIDARG   a required pointer is null, a handle is unknown, an index is not
+///                               below the count
+///     0x8007000E E_OUTOFMEMORY  an allocation failed
+///     0x80004001 E_NOTIMPL      this receiver's family does not offer the operation
+///     0x80004005 E_FAIL         internal failure; a download of a file of size 0
+///     0x8000FFFF E_UNEXPECTED   an `EInstanceType` that is none
+///     0x8007048F                (ERROR_DEVICE_NOT_CONNECTED) no connection, no driver, no complete
+///                               reply, or the receiver refused the command
+///     0x800705B4                (ERROR_TIMEOUT) the receiver stayed silent
+///     0x8007xxxx                any other Win32 error, its number in the low 16 bits
+///
+/// @par Abort events
+/// An abort event is the host's own Win32 event, and should be manual-reset: one that resets itself
+/// is spent on the first step that looks at it.
 ///
 /// @par Threads
 /// Every function may be called from any thread, unless its comment says otherwise. Each call runs
@@ -234,8 +237,10 @@ RCVLINK_API long DestroyReceiver(wchar_t* port);
 ///                   null: that wait cannot be ended. The caller owns it.
 /// @param[out] info  filled on success; on failure both strings are null
 /// @retval S_OK         the host frees `bstrReceiverId` and `bstrModel`
-/// @retval S_FALSE      aborted, or the receiver did not answer with its identity
+/// @retval S_FALSE      aborted, or the receiver answered with something else than its identity
 /// @retval E_INVALIDARG `info` is null
+/// @retval 0x800705B4   the receiver stayed silent
+/// @retval 0x8007048F   the receiver refused
 /// @return otherwise the failing code of the exchange
 /// @warning A failure of a Quorin receiver after the lock was taken leaves the calling thread
 ///          holding the receiver's lock: call `UnlockConnection` after a result other than S_OK.
@@ -247,6 +252,7 @@ RCVLINK_API long GetReceiverInfo(void* receiver, void* abortEvent, CReceiverInfo
 /// @retval S_OK         checked; `answer` is set (an aborted check answers 0)
 /// @retval S_FALSE      aborted while another thread held the receiver; `answer` is not written
 /// @retval E_INVALIDARG `answer` is null
+/// @return otherwise the Win32 error of the wait for the lock, as `LockConnection`
 RCVLINK_API long CheckConnection(void* receiver, void* abortEvent, short* answer);
 
 /// Takes the receiver for the calling thread until `UnlockConnection`. The lock counts: it is given
@@ -254,7 +260,8 @@ RCVLINK_API long CheckConnection(void* receiver, void* abortEvent, short* answer
 /// @param abortEvent Win32 event that ends the wait; null: wait without limit
 /// @retval S_OK    the calling thread holds the receiver
 /// @retval S_FALSE the event was signalled first
-/// @return otherwise the Win32 error of the wait
+/// @return otherwise the Win32 error of the wait. A thread that ended while it held the receiver makes
+///         the wait of the next one fail so, and yet hands the lock over: call `UnlockConnection`.
 RCVLINK_API long LockConnection(void* receiver, void* abortEvent);
 
 /// Gives the receiver back.
@@ -262,7 +269,8 @@ RCVLINK_API long LockConnection(void* receiver, void* abortEvent);
 RCVLINK_API long UnlockConnection(void* receiver);
 
 /// Ends the operation that another thread runs on the receiver, at its next step; takes no lock and
-/// waits for nothing. Without a running operation, the next one that looks for it ends instead.
+/// waits for nothing. When no running operation looks for it (none runs, or a `CheckConnection`), the
+/// next one that does ends instead.
 /// @retval S_OK always
 RCVLINK_API long Abort(void* receiver);
 
@@ -278,6 +286,10 @@ RCVLINK_API long Abort(void* receiver);
 /// @retval 0x800705B4   the receiver stayed silent
 /// @retval 0x8007048F   the receiver refused a command, or sent a block that makes no sense
 /// @return otherwise the failing code of the connection
+/// @note A Quorin receiver that falls silent between two blocks is asked again without end on a port
+///       whose reads end empty, as those of Windows do: a host that has no patience calls `Abort`.
+/// @note Quorin blocks are numbered with 16 bits: a file of more than 65536 blocks of 512 bytes
+///       (33554432 bytes) does not come to its end.
 RCVLINK_API long DownloadFile(void* receiver,
                               wchar_t* name,
                               IStream* stream,
@@ -294,7 +306,8 @@ RCVLINK_API long UploadFile(void* receiver,
 /// @retval S_OK         done
 /// @retval S_FALSE      aborted
 /// @retval E_INVALIDARG `name` is null
-/// @retval 0x8007048F   the receiver refused, or did not answer
+/// @retval 0x8007048F   the receiver refused
+/// @retval 0x800705B4   the receiver stayed silent
 RCVLINK_API long DeleteFileW(void* receiver, wchar_t* name);
 
 /// Renames a file of the receiver.
@@ -332,8 +345,7 @@ RCVLINK_API long DCSetRcvStopbits(void* receiver, unsigned char stopBits);
 /// @retval S_OK          read
 /// @retval E_INVALIDARG  `fileList` is null, or the receiver's handle is unknown
 /// @retval E_OUTOFMEMORY an allocation failed
-/// @return otherwise the receiver's result; a failure (negative) makes no list. S_FALSE (the
-/// reading
+/// @return otherwise the receiver's result; a failure (negative) makes no list. S_FALSE (the reading
 ///         was aborted) makes an empty one.
 RCVLINK_API long OpenFileList(void* receiver, void** fileList);
 

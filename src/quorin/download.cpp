@@ -24,7 +24,7 @@ constexpr DWORD kTransferSpeed = 115200;
 constexpr DWORD kSerialReadTimeoutMs = 3000;
 constexpr int kMaxTimeouts = 3;
 
-// In 32-bit arithmetic, as hosts have always seen it: it wraps for files beyond 43383508 bytes.
+// In 32-bit arithmetic, which wraps beyond 43383508 bytes, and cut to 8 bits.
 uint8_t SerialPercent(uint32_t delivered, uint32_t size) {
   return static_cast<uint8_t>(delivered * 99 / size + 1);
 }
@@ -76,7 +76,10 @@ DWORD CQuorinProtocol::RaiseSpeed() {
   const HRESULT followed = connection()->SetSpeed(kTransferSpeed);
   if (FAILED(followed)) {
     Trace(L"CQuorinProtocol::DownloadFile - host speed up is failed [0x%08X]\r\n", followed);
-    ChangeReceiverSpeed(speed, OnAbort::kKeep);
+    // Once more when an abort cut the first try off.
+    if (ChangeReceiverSpeed(speed, OnAbort::kKeep) != S_OK) {
+      ChangeReceiverSpeed(speed, OnAbort::kKeep);
+    }
     return 0;
   }
   return speed;

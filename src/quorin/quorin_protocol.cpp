@@ -10,6 +10,7 @@
 #include "quorin/protocol_flags.h"
 #include "quorin/settings.h"
 #include "report/report_file.h"
+#include "transport/abort_shield.h"
 
 using namespace QuorinCommands;
 
@@ -54,6 +55,7 @@ HRESULT CQuorinProtocol::ExecuteCommand(CQuorinCommand& command) {
 }
 
 bool CQuorinProtocol::Probe(CIConnection* connection, HANDLE abort_event) {
+  const AbortWatch watch(connection, abort_event);
   // False ends the handshake with no receiver found.
   const auto run = [&](CQuorinCommand& command) {
     const HRESULT result = command.Execute(connection, abort_event);
@@ -90,6 +92,7 @@ HRESULT CQuorinProtocol::CheckConnection(HANDLE abort_event, short* answer) {
   if (const HRESULT locked = LockConnection(abort_event); locked < 0 || locked == S_FALSE) {
     return locked;
   }
+  UseUpCancel();
   const HRESULT result = CatchResult([&] {
     *answer = Probe(connection(), abort_event) ? VARIANT_TRUE : VARIANT_FALSE;
     return S_OK;

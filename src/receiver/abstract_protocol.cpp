@@ -26,6 +26,7 @@ HRESULT CAbstractProtocol::ExecuteAsCurrent(CReceiverCmd& command) {
     CAbstractProtocol& driver;
     ~CurrentScope() { driver.SetCurrentCommand(nullptr); }
   };
+  if (connection()) UseUpCancel();
   SetCurrentCommand(&command);
   const CurrentScope scope{*this};
   return command.Execute(connection(), nullptr);
@@ -41,20 +42,25 @@ void CAbstractProtocol::Abort() {
 }
 
 bool CAbstractProtocol::TakeAbort() {
-  {
-    const std::scoped_lock lock(command_lock_);
-    if (!std::exchange(abort_, false)) return false;
-  }
-  UseUpCancel();
-  return true;
+  const std::scoped_lock lock(command_lock_);
+  const bool aborted = std::exchange(abort_, false);
+  if (aborted) cancel_left_over_ = true;
+  return aborted;
 }
 
 void CAbstractProtocol::UseUpCancel() {
-  // A read that does not wait takes the signal if it is still there. A byte that it may take
-  // belonged to what was aborted.
-  BYTE stray = 0;
-  DWORD bytes_read = 0;
-  connection()->Read(&stray, sizeof(stray), &bytes_read, 0);
+  const std::scoped_lock lock(command_lock_);
+  // The cancel of a new abort is not for us.
+  if (!std::exchange(cancel_left_over_, false) || abort_) return;
+  // A read that finds nothing and does not wait takes the signal if it is still there. The bytes
+  // ahead of it belonged to what was aborted; a receiver that talks on and on is left alone.
+  constexpr int kMaxReads = 64;
+  std::array<BYTE, 512> stray{};
+  for (int i = 0; i < kMaxReads; ++i) {
+    DWORD bytes_read = 0;
+    const HRESULT result = connection()->Read(stray.data(), stray.size(), &bytes_read, 0);
+    if (result != S_OK || bytes_read == 0) return;
+  }
 }
 
 HRESULT CAbstractProtocol::LockConnection(HANDLE abort_event) {

@@ -29,10 +29,12 @@ class CAbstractProtocol : public CIProtocol {
   // Executes a command as the current one, so that Abort reaches it.
   HRESULT ExecuteAsCurrent(CReceiverCmd& command);
 
-  // Whether an abort came; finding it forgets it, so one abort ends one operation. A cancel of the
-  // connection that came with it and ended no wait is used up too, or it would end the first wait
-  // of what follows.
+  // Whether an abort came; finding it forgets it, so one abort ends one operation.
   bool TakeAbort();
+
+  // Before commands are sent: takes the cancel of an abort that was found already, if it ended no
+  // wait, or it would end the first wait of what follows. ExecuteAsCurrent does this by itself.
+  void UseUpCancel();
 
   // A progress report, at most 100.
   void ReportProgress(DWORD percent);
@@ -43,11 +45,11 @@ class CAbstractProtocol : public CIProtocol {
 
  private:
   void SetCurrentCommand(CReceiverCmd* command);
-  void UseUpCancel();
 
   const wchar_t* class_name_;
-  CriticalSection command_lock_;  // guards abort_ and current_command_
+  CriticalSection command_lock_;  // guards the three below
   bool abort_ = false;
+  bool cancel_left_over_ = false;  // an abort was found; its cancel may still be there
   CReceiverCmd* current_command_ = nullptr;
   std::unique_ptr<CIConnection> connection_;  // last, so that the link goes first
 };

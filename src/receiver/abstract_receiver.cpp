@@ -40,9 +40,13 @@ HRESULT CAbstractReceiver::WithProgress(const CProgressCallback* progress, Trans
   } else {
     SetProgressCallback(nullptr, nullptr);
   }
-  const HRESULT result = transfer();
-  SetProgressCallback(nullptr, nullptr);
-  return result;
+  // Also when the transfer raises something.
+  struct Removal {
+    CAbstractReceiver& receiver;
+    ~Removal() { receiver.SetProgressCallback(nullptr, nullptr); }
+  };
+  const Removal removal{*this};
+  return transfer();
 }
 
 HRESULT CAbstractReceiver::DownloadFile(const wchar_t* name,

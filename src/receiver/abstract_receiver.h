@@ -41,10 +41,10 @@ class CAbstractReceiver : public CIReceiver, public CIProtocolCallback {
   template <typename Transfer>
   HRESULT WithProgress(const CProgressCallback* progress, Transfer transfer);
 
-  std::unique_ptr<CIProtocol> driver_;
+  CriticalSection lock_;  // guards the next two and each progress call
   ProgressFunction progress_function_ = nullptr;
   void* progress_context_ = nullptr;
-  CriticalSection lock_;  // guards the two fields above and each progress call
+  std::unique_ptr<CIProtocol> driver_;  // goes first
 };
 
 #endif  // RCVLINK_RECEIVER_ABSTRACT_RECEIVER_H_

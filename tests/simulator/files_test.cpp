@@ -73,6 +73,23 @@ TEST_F(FolderTest, RemovingHidesAndDeletesNothing) {
   EXPECT_TRUE(fs::exists(folder_ / "A.log"));
 }
 
+TEST_F(FolderTest, RenamingChangesTheNameThatIsServed) {
+  FileStore store = FileStore::FromFolder(folder_);
+  EXPECT_TRUE(store.Rename("A.log", "C.log"));
+  EXPECT_FALSE(store.Find("A.log").has_value());
+  EXPECT_EQ(store.Read("C.log", 6, 4), ToBytes("file"));
+  EXPECT_TRUE(fs::exists(folder_ / "A.log"));
+  EXPECT_FALSE(fs::exists(folder_ / "C.log"));
+}
+
+TEST_F(FolderTest, ARenamingThatCannotBeChangesNothing) {
+  FileStore store = FileStore::FromFolder(folder_);
+  EXPECT_FALSE(store.Rename("C.log", "D.log"));
+  EXPECT_FALSE(store.Rename("A.log", "B.log"));
+  EXPECT_EQ(store.Read("A.log", 6, 4), ToBytes("file"));
+  EXPECT_EQ(store.Read("B.log", 0, 6), ToBytes("second"));
+}
+
 TEST_F(FolderTest, AFileThatShrankEndsItsTransfer) {
   Put("A0101.log", std::string(1100, 'x'));
   Session session({}, FileStore::FromFolder(folder_));

@@ -56,6 +56,34 @@ TEST(LineTest, PiecesComeOneByOneWithAPause) {
   EXPECT_EQ(session.port.Now(), 2 * kDefaultPieceGapMs);
 }
 
+TEST(LineTest, APieceGoesOnIntoTheNextMessage) {
+  QuorinOptions options;
+  options.line.piece_size = 12;
+  Session session(options);
+  session.Say("%1%\r\n%2%\r\n");
+  EXPECT_EQ(ToText(session.port.Read(SIZE_MAX, 100)), "RE003%1%\r\nRE");
+  EXPECT_EQ(ToText(session.port.Read(SIZE_MAX, 100)), "003%2%\r\n");
+}
+
+TEST(LineTest, APieceDoesNotGoOnBeyondAChangeOfSpeed) {
+  QuorinOptions options;
+  options.line.piece_size = 100;
+  Session session(options);
+  session.Say("%1%set,cur/term/rate,115200\r\n%2%\r\n");
+  EXPECT_EQ(ToText(session.port.ReadFull(100, 100)), "RE003%1%\r\n");
+}
+
+TEST(LineTest, APieceDoesNotTakeWhatIsNotDue) {
+  QuorinOptions options;
+  options.line.piece_size = 100;
+  options.faults.replies = {{ReplyFaultKind::kSilence, "print", kAlways, 1000}};
+  Session session(options);
+  session.Say("%1%\r\n%2%print,/par/rcvid\r\n");
+  EXPECT_EQ(ToText(session.port.Read(SIZE_MAX, 100)), "RE003%1%\r\n");
+  EXPECT_EQ(ToText(session.port.Read(SIZE_MAX, 2000)), "RE00A%2%QR00421\r\n");
+  EXPECT_EQ(session.port.Now(), 1000U);
+}
+
 TEST(LineTest, PacedPiecesComeWhenTheirLastByteHas) {
   QuorinOptions options;
   options.line.paced = true;
