@@ -11,6 +11,7 @@
 #include "receiver/abstract_receiver.h"
 #include "report/report_file.h"
 #include "transport/serial_connection.h"
+#include "velmar/velmar_protocol.h"
 
 namespace {
 
@@ -57,8 +58,12 @@ HRESULT FindDriver(std::unique_ptr<CIConnection> connection,
       return S_OK;
     }
   }
-  // Velmar receivers are not recognised yet: none is found.
-  return S_FALSE;
+  if (protocol == eProtocolQuorin || IsSignalled(abort_event)) return S_FALSE;
+  Trace(L"CreateReceiverOnSerial - looking for Velmar receiver [%s]\r\n", port);
+  if (!CVelmarProtocol::Probe(connection.get(), abort_event)) return S_FALSE;
+  driver = std::make_unique<CVelmarProtocol>(std::move(connection));
+  Trace(L"CreateReceiverOnSerial - Velmar receiver found [%s]\r\n", port);
+  return S_OK;
 }
 
 }  // namespace

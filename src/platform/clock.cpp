@@ -7,6 +7,7 @@ namespace {
 class SystemClock : public Clock {
  public:
   DWORD Ticks() override { return GetTickCount(); }
+  void Pause(DWORD milliseconds) override { Sleep(milliseconds); }
 };
 
 std::atomic<Clock*>& Override() {

@@ -1,4 +1,4 @@
-// The millisecond clock that time-outs are measured with.
+// The millisecond clock that time-outs and pauses are measured with.
 #ifndef RCVLINK_PLATFORM_CLOCK_H_
 #define RCVLINK_PLATFORM_CLOCK_H_
 
@@ -9,6 +9,8 @@ class Clock {
   virtual ~Clock() = default;
   // Milliseconds since some start; wraps as GetTickCount does, so only differences count.
   virtual DWORD Ticks() = 0;
+  // Lets the thread rest.
+  virtual void Pause(DWORD milliseconds) = 0;
 };
 
 // The clock in force: the system's, unless a test has put its own in place.

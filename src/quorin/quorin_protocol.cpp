@@ -159,17 +159,7 @@ HRESULT CQuorinProtocol::GetFiles(CFileList* files) {
           connection_lock_.handle());
     ThrowIfAborted();
 
-    constexpr DWORD kListRead = 90;
-    constexpr DWORD kListCopying = 10;
-    ReportProgress(kListRead);
-    const auto count = static_cast<DWORD>(get_list.Entries().size());
-    DWORD i = 0;
-    for (const FileEntry& entry : get_list.Entries()) {
-      if (!files->Append(CopyBstr(entry.name.c_str()), entry.size, entry.time)) {
-        throw HResultError(E_OUTOFMEMORY);
-      }
-      ReportProgress(kListCopying * i++ / count + kListRead);
-    }
+    AppendEntries(get_list.Entries(), *files);
     Trace(L"CQuorinProtocol::GetFiles - OK\r\n");
     return S_OK;
   });

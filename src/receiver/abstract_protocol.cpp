@@ -48,10 +48,19 @@ bool CAbstractProtocol::TakeAbort() {
   return aborted;
 }
 
+bool CAbstractProtocol::IsAborted() {
+  const std::scoped_lock lock(command_lock_);
+  return abort_;
+}
+
 void CAbstractProtocol::UseUpCancel() {
   const std::scoped_lock lock(command_lock_);
   // The cancel of a new abort is not for us.
-  if (!std::exchange(cancel_left_over_, false) || abort_) return;
+  if (std::exchange(cancel_left_over_, false) && !abort_) DropCancel();
+}
+
+void CAbstractProtocol::DropCancel() {
+  const std::scoped_lock lock(command_lock_);
   // A read that finds nothing and does not wait takes the signal if it is still there. The bytes
   // ahead of it belonged to what was aborted; a receiver that talks on and on is left alone.
   constexpr int kMaxReads = 64;
@@ -86,6 +95,20 @@ HRESULT CAbstractProtocol::UnlockConnection() {
         class_name_,
         connection_lock_.handle());
   return connection_lock_.Unlock() ? TRUE : FALSE;
+}
+
+void CAbstractProtocol::AppendEntries(const std::vector<FileEntry>& entries, CFileList& files) {
+  constexpr DWORD kListRead = 90;
+  constexpr DWORD kListCopying = 10;
+  ReportProgress(kListRead);
+  const auto count = static_cast<DWORD>(entries.size());
+  DWORD i = 0;
+  for (const FileEntry& entry : entries) {
+    if (!files.Append(CopyBstr(entry.name.c_str()), entry.size, entry.time)) {
+      throw HResultError(E_OUTOFMEMORY);
+    }
+    ReportProgress(kListCopying * i++ / count + kListRead);
+  }
 }
 
 void CAbstractProtocol::ReportProgress(DWORD percent) {

@@ -5,7 +5,9 @@
 
 #include <memory>
 #include <string>
+#include <vector>
 
+#include "commands/file_entry.h"
 #include "commands/receiver_cmd.h"
 #include "platform/critical_section.h"
 #include "platform/mutex.h"
@@ -35,6 +37,14 @@ class CAbstractProtocol : public CIProtocol {
   // Before commands are sent: takes the cancel of an abort that was found already, if it ended no
   // wait, or it would end the first wait of what follows. ExecuteAsCurrent does this by itself.
   void UseUpCancel();
+
+  // Whether an abort came that nobody has taken yet.
+  bool IsAborted();
+  // Takes a cancel that ended no wait, also that of an abort which nobody has taken yet.
+  void DropCancel();
+
+  // Hands a directory to the host's list, the last tenth of the progress. Raises E_OUTOFMEMORY.
+  void AppendEntries(const std::vector<FileEntry>& entries, CFileList& files);
 
   // A progress report, at most 100.
   void ReportProgress(DWORD percent);

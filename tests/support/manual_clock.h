@@ -7,8 +7,13 @@
 class ManualClock : public Clock {
  public:
   DWORD Ticks() override { return now; }
+  void Pause(DWORD milliseconds) override {
+    now += milliseconds;
+    paused += milliseconds;
+  }
 
   DWORD now = 0;
+  DWORD paused = 0;  // all pauses together
 
  private:
   ClockOverride override_{*this};  // in force while this lives

@@ -1,0 +1,195 @@
+#include "velmar/commands.h"
+
+#include <algorithm>
+#include <new>
+#include <string_view>
+
+#include "platform/text.h"
+#include "report/report_file.h"
+
+namespace VelmarCommands {
+namespace {
+
+constexpr uint32_t kPlain = 0;
+constexpr uint32_t kUnlogReadTimeoutMs = 8000;
+
+// This family's numbering: 1 is even. The other family's is the other way round.
+const char* ParityWord(uint8_t parity) {
+  constexpr uint8_t kEven = 1;
+  constexpr uint8_t kOdd = 2;
+  if (parity == kEven) return "E";
+  if (parity == kOdd) return "O";
+  return "N";
+}
+
+const char* HandshakeWord(uint8_t handshake) {
+  constexpr uint8_t kXon = 1;
+  constexpr uint8_t kCts = 2;
+  if (handshake == kXon) return "XON";
+  if (handshake == kCts) return "CTS";
+  return "N";
+}
+
+}  // namespace
+
+HRESULT CLogCommand::ParseReply(const char* bytes,
+                                uint32_t length,
+                                bool* done,
+                                uint32_t* consumed) {
+  return ParseAcknowledgedReply(bytes, length, done, consumed);
+}
+
+HRESULT CLogCommand::Conclude(Progress progress, bool* done) {
+  *done = progress == Progress::kComplete;
+  switch (progress) {
+    case Progress::kNothing:
+      return S_FALSE;
+    case Progress::kMore:
+      SetResponse(RESPONSE_DATA);
+      return S_FALSE;
+    case Progress::kComplete:
+      SetResponse(RESPONSE_DATA);
+      return S_OK;
+    case Progress::kContradiction:
+      SetResponse(RESPONSE_ERROR);
+      return S_FALSE;
+    case Progress::kNoMemory:
+      break;
+  }
+  return E_OUTOFMEMORY;
+}
+
+CGetReceiverInfoCmd::CGetReceiverInfoCmd() : CLogCommand("log versiona once\r", kPlain) {
+  Trace(L"CGetReceiverInfoCmd::CGetReceiverInfoCmd\r\n");
+}
+
+HRESULT CGetReceiverInfoCmd::ParseLogBody(const char* bytes,
+                                          uint32_t length,
+                                          bool* done,
+                                          uint32_t*) {
+  return Conclude(DecodeVersion({bytes, length}, version_), done);
+}
+
+CGetFileListCmd::CGetFileListCmd() : CLogCommand("log direnta once\r", kPlain) {
+  Trace(L"CGetFileListCmd::CGetFileListCmd\r\n");
+}
+
+HRESULT CGetFileListCmd::ParseAsciiLog(const char* bytes, uint32_t length, bool* done, uint32_t*) {
+  return Conclude(DecodeDirectory({bytes, length}, entries_), done);
+}
+
+CGetFileHeaderCmd::CGetFileHeaderCmd() : CLogCommand("log filehdra\r", kPlain) {
+  Trace(L"CGetFileHeaderCmd::CGetFileHeaderCmd\r\n");
+}
+
+HRESULT CGetFileHeaderCmd::ParseLogBody(const char* bytes, uint32_t length, bool* done, uint32_t*) {
+  return Conclude(DecodeFileHeader({bytes, length}, file_header_), done);
+}
+
+CLogConfigCommand::CLogConfigCommand() : CLogCommand("log comconfiga once\r", kPlain) {
+  Trace(L"CLogConfigCommand::CLogConfigCommand\r\n");
+}
+
+HRESULT CLogConfigCommand::ParseLogBody(const char* bytes, uint32_t length, bool* done, uint32_t*) {
+  return Conclude(DecodePortConfig({bytes, length}, Port(), config_), done);
+}
+
+CReadFileCmd::CReadFileCmd(CReadFileCmdCallback* callback, void* context)
+    : CLogCommand("log filetransferb\r", kStreamed), callback_(callback), context_(context) {
+  Trace(L"CReadFileCmd::CReadFileCmd\r\n");
+}
+
+HRESULT CReadFileCmd::ParseReply(const char* bytes,
+                                 uint32_t length,
+                                 bool* done,
+                                 uint32_t* consumed) {
+  if (!chunk_) return CLogCommand::ParseReply(bytes, length, done, consumed);
+  const HRESULT result = ParseBinaryLog(bytes, length, done, consumed);
+  if (Response() == RESPONSE_OK) *done = false;
+  return result;
+}
+
+HRESULT CReadFileCmd::ParseLogBody(const char* bytes,
+                                   uint32_t length,
+                                   bool* done,
+                                   uint32_t* consumed) {
+  constexpr uint32_t kBodyBeforeData = 8;  // passed over; the binary header holds it
+  constexpr uint32_t kUsualChunk = 1024;
+  *done = false;
+  if (length < kBodyBeforeData) return S_FALSE;
+  const uint32_t message_length = Binary().MessageLength();
+  const bool says_its_chunk =
+      message_length >= kBodyBeforeData && message_length <= kBodyBeforeData + kUsualChunk;
+  const uint32_t chunk_length = says_its_chunk ? message_length - kBodyBeforeData : kUsualChunk;
+  if (length < chunk_length) return S_FALSE;
+
+  std::unique_ptr<uint8_t[]> chunk(new (std::nothrow) uint8_t[chunk_length]);
+  if (!chunk) return E_OUTOFMEMORY;
+  std::copy_n(bytes, chunk_length, chunk.get());
+  chunk_ = std::move(chunk);
+  chunk_length_ = chunk_length;
+  if (callback_) {
+    if (const HRESULT result = callback_->OnDataReceived(context_); FAILED(result)) return result;
+  }
+  if (Binary().Sequence() != 0) {
+    *consumed += static_cast<uint32_t>(Binary().LogLength());
+  } else {
+    SetResponse(RESPONSE_DATA);
+    *done = true;
+  }
+  return S_OK;
+}
+
+CSetCurrentFileCmd::CSetCurrentFileCmd(const char* name) : CVelmarCommand("", kPlain) {
+  SetCommandText(name ? FormatText("currentfile %s all\r", name).c_str() : "currentfile\r");
+}
+
+HRESULT CSetCurrentFileCmd::ParseReply(const char* bytes,
+                                       uint32_t length,
+                                       bool* done,
+                                       uint32_t* consumed) {
+  const HRESULT result = ParseAcknowledgedReply(bytes, length, done, consumed);
+  if (FAILED(result)) return result;
+  if (Response() == RESPONSE_OK || Response() == RESPONSE_DATA) *done = true;
+  return S_OK;
+}
+
+CDeleteFileCmd::CDeleteFileCmd(const char* name) : CVelmarCommand("", kPlain) {
+  Trace(L"CDeleteFileCmd::CDeleteFileCmd\r\n");
+  SetCommandText(FormatText("del file %s\r", name).c_str());
+}
+
+CRenameFileCmd::CRenameFileCmd(const char* old_name, const char* new_name)
+    : CVelmarCommand("", kPlain) {
+  Trace(L"CRenameFileCmd::CRenameFileCmd\r\n");
+  SetCommandText(FormatText("rename %s %s\r", old_name, new_name).c_str());
+}
+
+CSetPortParamsCmd::CSetPortParamsCmd(const char*,
+                                     uint32_t baud,
+                                     uint8_t parity,
+                                     uint8_t data_bits,
+                                     uint8_t stop_bits,
+                                     uint8_t handshake)
+    : CVelmarCommand("", kPlain) {
+  Trace(L"CSetPortParamsCmd::CSetPortParamsCmd\r\n");
+  SetCommandText(FormatText("COM %u %s %u %u %s\r",
+                            baud,
+                            ParityWord(parity),
+                            data_bits,
+                            stop_bits,
+                            HandshakeWord(handshake))
+                     .c_str());
+}
+
+CSetInterfacemodeCommand::CSetInterfacemodeCommand()
+    : CVelmarCommand("interfacemode thisport novatel novatel on\r", kPlain) {
+  Trace(L"CSetInterfacemodeCommand::CSetInterfacemodeCommand\r\n");
+  SetFlags(kSendOnly);
+}
+
+CUnlogAllCommand::CUnlogAllCommand() : CVelmarCommand("unlogall thisport\r", kPlain) {
+  SetReadTimeout(kUnlogReadTimeoutMs);
+}
+
+}  // namespace VelmarCommands

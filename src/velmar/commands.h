@@ -1,0 +1,144 @@
+// The commands of the Velmar language (NovAtel's OEM commands and logs). Each is built, executed
+// once over a connection, asked for its results and thrown away.
+#ifndef RCVLINK_VELMAR_COMMANDS_H_
+#define RCVLINK_VELMAR_COMMANDS_H_
+
+#include <cstdint>
+#include <memory>
+#include <string>
+#include <vector>
+
+#include "commands/file_entry.h"
+#include "velmar/logs.h"
+#include "velmar/velmar_command.h"
+
+namespace VelmarCommands {
+
+// A command that waits for a log behind the acknowledgement.
+class CLogCommand : public CVelmarCommand {
+ public:
+  using CVelmarCommand::CVelmarCommand;
+  HRESULT ParseReply(const char* bytes, uint32_t length, bool* done, uint32_t* consumed) override;
+
+ protected:
+  // Takes over what a decoder of logs.h found.
+  HRESULT Conclude(Progress progress, bool* done);
+};
+
+class CGetReceiverInfoCmd : public CLogCommand {
+ public:
+  CGetReceiverInfoCmd();
+  HRESULT ParseLogBody(const char* bytes, uint32_t length, bool* done, uint32_t* consumed) override;
+  const VersionLog& Version() const { return version_; }
+
+ private:
+  VersionLog version_;
+};
+
+class CGetFileListCmd : public CLogCommand {
+ public:
+  CGetFileListCmd();
+  // Reads all logs of the reply so far, from the first.
+  HRESULT ParseAsciiLog(const char* bytes,
+                        uint32_t length,
+                        bool* done,
+                        uint32_t* consumed) override;
+  std::vector<FileEntry>& Entries() { return entries_; }
+
+ private:
+  std::vector<FileEntry> entries_;
+};
+
+// The header of the current file.
+class CGetFileHeaderCmd : public CLogCommand {
+ public:
+  CGetFileHeaderCmd();
+  HRESULT ParseLogBody(const char* bytes, uint32_t length, bool* done, uint32_t* consumed) override;
+  const FileHeaderLog& FileHeader() const { return file_header_; }
+
+ private:
+  FileHeaderLog file_header_;
+};
+
+// The settings of the port that the receiver is talking on.
+class CLogConfigCommand : public CLogCommand {
+ public:
+  CLogConfigCommand();
+  HRESULT ParseLogBody(const char* bytes, uint32_t length, bool* done, uint32_t* consumed) override;
+  const PortConfigLog& Config() const { return config_; }
+
+ private:
+  PortConfigLog config_;
+};
+
+// Told of each chunk of a file; the chunk is the command's, until the next.
+class CReadFileCmdCallback {
+ public:
+  // A failure ends the transfer.
+  virtual HRESULT OnDataReceived(void* context) = 0;
+
+ protected:
+  ~CReadFileCmdCallback() = default;
+};
+
+// Transfers the current file.
+class CReadFileCmd : public CLogCommand {
+ public:
+  CReadFileCmd(CReadFileCmdCallback* callback, void* context);
+  HRESULT ParseReply(const char* bytes, uint32_t length, bool* done, uint32_t* consumed) override;
+  HRESULT ParseLogBody(const char* bytes, uint32_t length, bool* done, uint32_t* consumed) override;
+  const uint8_t* GetData() const { return chunk_.get(); }  // null before the first
+  uint32_t GetDataSize() const { return chunk_length_; }
+
+ private:
+  CReadFileCmdCallback* callback_;
+  void* context_;
+  std::unique_ptr<uint8_t[]> chunk_;
+  uint32_t chunk_length_ = 0;
+};
+
+// Makes a file current; a null name makes none.
+class CSetCurrentFileCmd : public CVelmarCommand {
+ public:
+  explicit CSetCurrentFileCmd(const char* name);
+  HRESULT ParseReply(const char* bytes, uint32_t length, bool* done, uint32_t* consumed) override;
+};
+
+// Names are put into the commands as they are.
+class CDeleteFileCmd : public CVelmarCommand {
+ public:
+  explicit CDeleteFileCmd(const char* name);
+};
+
+class CRenameFileCmd : public CVelmarCommand {
+ public:
+  CRenameFileCmd(const char* old_name, const char* new_name);
+};
+
+// Sets the port that the receiver is talking on: the command names none, whatever `port` says.
+// Parity 1 even, 2 odd, else none; handshake 1 XON, 2 CTS, else none.
+class CSetPortParamsCmd : public CVelmarCommand {
+ public:
+  CSetPortParamsCmd(const char* port,
+                    uint32_t baud,
+                    uint8_t parity,
+                    uint8_t data_bits,
+                    uint8_t stop_bits,
+                    uint8_t handshake);
+};
+
+// Makes the port speak this language both ways.
+class CSetInterfacemodeCommand : public CVelmarCommand {
+ public:
+  CSetInterfacemodeCommand();
+};
+
+// Stops all logs on the port.
+class CUnlogAllCommand : public CVelmarCommand {
+ public:
+  CUnlogAllCommand();
+};
+
+}  // namespace VelmarCommands
+
+#endif  // RCVLINK_VELMAR_COMMANDS_H_

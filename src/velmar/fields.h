@@ -1,0 +1,23 @@
+// Comma-separated fields, as ASCII logs have them.
+#ifndef RCVLINK_VELMAR_FIELDS_H_
+#define RCVLINK_VELMAR_FIELDS_H_
+
+#include <string>
+#include <string_view>
+#include <vector>
+
+namespace VelmarCommands {
+
+// Splits at the commas outside double quotes; quotes stay part of their field. The end of the text
+// ends the last field, which is kept even when empty; a text that ends inside quotes loses it.
+std::vector<std::wstring> SplitFields(std::string_view text);
+
+// The text without double quotes at either end.
+std::wstring WithoutQuotes(std::wstring_view field);
+
+// Leading digits, 0 if there are none.
+int ToInteger(const std::wstring& field);
+
+}  // namespace VelmarCommands
+
+#endif  // RCVLINK_VELMAR_FIELDS_H_

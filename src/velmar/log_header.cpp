@@ -1,0 +1,31 @@
+#include "velmar/log_header.h"
+
+#include <algorithm>
+#include <cstdlib>
+#include <vector>
+
+#include "velmar/fields.h"
+
+namespace VelmarCommands {
+
+std::optional<AsciiHeader> ParseHeaderFields(std::string_view text) {
+  constexpr size_t kHeaderFields = 10;
+  const std::vector<std::wstring> fields = SplitFields(text);
+  if (fields.size() < kHeaderFields) return std::nullopt;
+  return AsciiHeader{.message_name = fields[0],
+                     .port = fields[1],
+                     .sequence = ToInteger(fields[2]),
+                     .gps_week = ToInteger(fields[5]),
+                     .gps_seconds = std::wcstod(fields[6].c_str(), nullptr)};
+}
+
+void BinaryHeader::Assign(std::string_view log) {
+  std::copy_n(log.begin(), kLength, bytes_.begin());
+}
+
+uint16_t BinaryHeader::Word(size_t offset) const {
+  constexpr int kBitsOfByte = 8;
+  return static_cast<uint16_t>(bytes_[offset] | (bytes_[offset + 1] << kBitsOfByte));
+}
+
+}  // namespace VelmarCommands

@@ -1,0 +1,36 @@
+#include "velmar/response.h"
+
+namespace VelmarCommands {
+namespace {
+
+constexpr std::string_view kOpening = "\r\n<";
+constexpr std::string_view kOk = "\r\n<OK\r\n";
+constexpr std::string_view kError = "\r\n<ERROR:";
+constexpr size_t kEnoughForOk = 8;
+constexpr size_t kEnoughForError = 10;
+
+// The rest of a reply behind its acknowledgement.
+Response WithPrompt(std::string_view bytes, ResponseType acknowledgement, size_t cursor) {
+  const auto byte_at = [&](size_t i) { return i < bytes.size() ? bytes[i] : '\0'; };
+  if (byte_at(cursor) == '\0') return {RESPONSE_INCOMPLETE};
+  if (byte_at(cursor) != '[') return {RESPONSE_UNKNOWN};
+  while (byte_at(cursor) != ']') {
+    if (byte_at(cursor) == '\0') return {RESPONSE_INCOMPLETE};
+    ++cursor;
+  }
+  return {acknowledgement, cursor + 1};
+}
+
+}  // namespace
+
+Response RecogniseResponse(std::string_view bytes) {
+  const std::string_view opening = bytes.substr(0, kOpening.size());
+  if (!kOpening.starts_with(opening)) return {RESPONSE_UNKNOWN};
+  if (bytes.size() < kEnoughForOk) return {RESPONSE_INCOMPLETE};
+  if (bytes.starts_with(kOk)) return WithPrompt(bytes, RESPONSE_OK, kOk.size());
+  if (bytes.size() < kEnoughForError) return {RESPONSE_INCOMPLETE};
+  if (bytes.starts_with(kError)) return WithPrompt(bytes, RESPONSE_ERROR, kError.size());
+  return {RESPONSE_UNKNOWN};
+}
+
+}  // namespace VelmarCommands

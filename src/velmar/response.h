@@ -1,0 +1,35 @@
+// How a Velmar receiver opens its reply: an acknowledgement, the prompt of the port, then the log
+// that was asked for, if any.
+//
+//   "\r\n<OK\r\n" "[COM1]" "#VERSIONA,COM1,0,..."
+//   "\r\n<ERROR:" "[COM1]"
+#ifndef RCVLINK_VELMAR_RESPONSE_H_
+#define RCVLINK_VELMAR_RESPONSE_H_
+
+#include <cstddef>
+#include <cstdint>
+#include <string_view>
+
+namespace VelmarCommands {
+
+enum ResponseType : int32_t {
+  RESPONSE_OK = 0,          // acknowledged
+  RESPONSE_DATA = 1,        // the expected data is complete
+  RESPONSE_ERROR = 2,       // refused, or data that contradicts itself
+  RESPONSE_INCOMPLETE = 3,  // more bytes are needed
+  RESPONSE_UNKNOWN = 4
+};
+
+struct Response {
+  ResponseType type = RESPONSE_UNKNOWN;
+  // Where the prompt ends; 0 while it has not ended (or never will, by the type).
+  size_t prompt_end = 0;
+};
+
+// Recognises acknowledgement and prompt at the start of the bytes. An error text ahead of the
+// prompt makes a reply unknown; a 0 byte stands for an end that is not there yet.
+Response RecogniseResponse(std::string_view bytes);
+
+}  // namespace VelmarCommands
+
+#endif  // RCVLINK_VELMAR_RESPONSE_H_

@@ -1,0 +1,203 @@
+#include "velmar/velmar_protocol.h"
+
+#include <mutex>
+#include <string>
+#include <utility>
+
+#include "platform/event.h"
+#include "platform/hresult.h"
+#include "platform/text.h"
+#include "report/report_file.h"
+
+using namespace VelmarCommands;
+
+namespace {
+
+constexpr DWORD kFeatures = 13;
+constexpr DWORD kVariant = 2;
+
+// Writes the kept reply of a command that failed to the report.
+void DumpInvalidResponse(HRESULT result, CIConnection* connection, const CVelmarCommand& command) {
+  if (SUCCEEDED(result)) return;
+  const std::string name = connection ? NarrowNameOf(connection) : std::string();
+  const uint8_t* const reply = command.GetReply();
+  if (!reply && command.GetReplyLength() != 0) throw HResultError(E_INVALIDARG);
+  const std::string text(reply, reply + command.GetReplyLength());
+  Trace("CVelmarProtocol::DumpInvalidResponse - [0x%08X] [%s] [%s]\r\n",
+        result,
+        text.c_str(),
+        name.c_str());
+}
+
+}  // namespace
+
+CVelmarProtocol::CVelmarProtocol(std::unique_ptr<CIConnection> connection)
+    : CAbstractProtocol(L"CVelmarProtocol", std::move(connection)) {}
+
+HRESULT CVelmarProtocol::ExecuteCommand(CVelmarCommand& command) {
+  const HRESULT result = ExecuteAsCurrent(command);
+  DumpInvalidResponse(result, connection(), command);
+  return result;
+}
+
+bool CVelmarProtocol::Probe(CIConnection* connection, HANDLE abort_event) {
+  if (!connection) return false;
+  const auto run = [&](CVelmarCommand& command) {
+    const HRESULT result = command.Execute(connection, abort_event);
+    DumpInvalidResponse(result, connection, command);
+    return SUCCEEDED(result);
+  };
+  const HRESULT answered = CatchResult([&] {
+    CSetInterfacemodeCommand interface_mode;
+    if (!run(interface_mode) || IsSignalled(abort_event)) return S_FALSE;
+    CUnlogAllCommand unlog_all;
+    if (!run(unlog_all)) return S_FALSE;
+    return unlog_all.Response() == RESPONSE_OK ? S_OK : S_FALSE;
+  });
+  return answered == S_OK;
+}
+
+HRESULT CVelmarProtocol::CheckConnection(HANDLE abort_event, short* answer) {
+  if (!answer) return E_INVALIDARG;
+  if (!connection()) return kNotConnected;
+  if (const HRESULT locked = LockConnection(abort_event); locked < 0 || locked == S_FALSE) {
+    return locked;
+  }
+  *answer = Probe(connection(), abort_event) ? VARIANT_TRUE : VARIANT_FALSE;
+  UnlockConnection();
+  return S_OK;
+}
+
+HRESULT CVelmarProtocol::GetReceiverInfo(HANDLE abort_event, CReceiverInfo* info) {
+  Trace(L"CVelmarProtocol::GetReceiverInfo\r\n");
+  if (!info) return E_INVALIDARG;
+  if (!connection()) return kNotConnected;
+  info->bstrModel = nullptr;
+  info->bstrReceiverId = nullptr;
+  const HRESULT result = CatchResult([&] {
+    ReadIdentity(abort_event, info);
+    return S_OK;
+  });
+  // Unlocked whether or not it was locked: reports of this family have always shown it so.
+  UnlockConnection();
+  if (result != S_OK) return result;
+  ReportProgress(100);
+  Trace(L"CVelmarProtocol::GetReceiverInfo - OK\r\n");
+  return S_OK;
+}
+
+void CVelmarProtocol::ReadIdentity(HANDLE abort_event, CReceiverInfo* info) {
+  const HRESULT locked = LockConnection(abort_event);
+  if (locked < 0 || locked == S_FALSE) throw HResultError(locked);
+  ReportProgress(0);
+  CGetReceiverInfoCmd get_info;
+  ThrowIfFailed(ExecuteCommand(get_info));
+  ThrowIfAborted();
+  if (get_info.Response() != RESPONSE_DATA) throw HResultError(S_FALSE);
+  UniqueBstr model = CopyBstr(get_info.Version().model.c_str());
+  UniqueBstr id = CopyBstr(get_info.Version().serial_number.c_str());
+  info->bstrModel = model.release();
+  info->bstrReceiverId = id.release();
+  info->dwFeatures = kFeatures;
+  info->dwProtocol = eProtocolVelmar;
+  info->dwVariant = kVariant;
+}
+
+HRESULT CVelmarProtocol::GetFiles(CFileList* files) {
+  if (!files) return E_INVALIDARG;
+  if (!connection()) return kNotConnected;
+  return CatchResult([&] {
+    const MutexGuard guard(connection_lock_);
+    ReportProgress(0);
+    CGetFileListCmd get_list;
+    ThrowIfFailed(ExecuteCommand(get_list));
+    ThrowIfAborted();
+    // The last report is that of the last entry: there is none of 100.
+    AppendEntries(get_list.Entries(), *files);
+    return S_OK;
+  });
+}
+
+template <typename MakeCommand>
+HRESULT CVelmarProtocol::ChangeFile(MakeCommand make_command) {
+  if (!connection()) return kNotConnected;
+  return CatchResult([&] {
+    const MutexGuard guard(connection_lock_);
+    ReportProgress(0);
+    auto command = make_command();
+    ThrowIfFailed(ExecuteCommand(command));
+    ThrowIfAborted();
+    // A receiver that refused has answered too: that counts as done.
+    ReportProgress(100);
+    return S_OK;
+  });
+}
+
+HRESULT CVelmarProtocol::DeleteFile(const wchar_t* name) {
+  if (!name) return E_INVALIDARG;
+  return ChangeFile([&] { return CDeleteFileCmd(ToNarrow(name).c_str()); });
+}
+
+HRESULT CVelmarProtocol::RenameFile(const wchar_t* old_name, const wchar_t* new_name) {
+  if (!old_name || !new_name) return E_INVALIDARG;
+  return ChangeFile(
+      [&] { return CRenameFileCmd(ToNarrow(old_name).c_str(), ToNarrow(new_name).c_str()); });
+}
+
+void CVelmarProtocol::SetCallback(CIProtocolCallback* callback) {
+  const std::scoped_lock lock(callback_lock_);
+  callback_ = callback;
+}
+
+void CVelmarProtocol::ThrowIfAborted() {
+  if (TakeAbort()) throw HResultError(S_FALSE);
+}
+
+template <typename Change>
+HRESULT CVelmarProtocol::SendPortSettings(Change change, bool look_for_abort, bool* sent) {
+  const MutexGuard guard(connection_lock_);
+  CLogConfigCommand get_config;
+  ThrowIfFailed(ExecuteCommand(get_config));
+  if (look_for_abort) ThrowIfAborted();
+  PortConfigLog settings = get_config.Config();
+  if (settings.port_name.empty()) return S_OK;
+  change(settings);
+  CSetPortParamsCmd set_params(ToNarrow(settings.port_name).c_str(),
+                               static_cast<uint32_t>(settings.baud),
+                               settings.parity,
+                               settings.data_bits,
+                               settings.stop_bits,
+                               settings.handshake);
+  ThrowIfFailed(ExecuteCommand(set_params));
+  *sent = true;
+  return S_OK;
+}
+
+template <typename Change>
+HRESULT CVelmarProtocol::ChangePort(Change change) {
+  if (!connection()) return kNotConnected;
+  bool sent = false;
+  return CatchResult([&] { return SendPortSettings(change, true, &sent); });
+}
+
+HRESULT CVelmarProtocol::ChangeReceiverSpeed(DWORD speed, bool* sent) {
+  // The abort flag is for the next operation to find, not for a part of this one.
+  return CatchResult([&] {
+    return SendPortSettings(
+        [&](PortConfigLog& settings) { settings.baud = static_cast<int>(speed); }, false, sent);
+  });
+}
+
+HRESULT CVelmarProtocol::DCSetRcvBaudrate(DWORD baud_rate) {
+  return ChangePort([&](PortConfigLog& settings) { settings.baud = static_cast<int>(baud_rate); });
+}
+
+HRESULT CVelmarProtocol::DCSetRcvRTSControl(BYTE) { return E_NOTIMPL; }
+
+HRESULT CVelmarProtocol::DCSetRcvParity(BYTE parity) {
+  return ChangePort([&](PortConfigLog& settings) { settings.parity = parity; });
+}
+
+HRESULT CVelmarProtocol::DCSetRcvStopbits(BYTE stop_bits) {
+  return ChangePort([&](PortConfigLog& settings) { settings.stop_bits = stop_bits; });
+}

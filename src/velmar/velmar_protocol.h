@@ -1,0 +1,61 @@
+// The driver of Velmar receivers: each operation is a short sequence of Velmar commands over the
+// connection that the driver owns.
+#ifndef RCVLINK_VELMAR_VELMAR_PROTOCOL_H_
+#define RCVLINK_VELMAR_VELMAR_PROTOCOL_H_
+
+#include <memory>
+
+#include "receiver/abstract_protocol.h"
+#include "velmar/commands.h"
+
+class CVelmarProtocol : public CAbstractProtocol, public VelmarCommands::CReadFileCmdCallback {
+ public:
+  explicit CVelmarProtocol(std::unique_ptr<CIConnection> connection);
+
+  // Whether a Velmar receiver answers on the connection. The abort event (may be null) is looked at
+  // between the steps.
+  static bool Probe(CIConnection* connection, HANDLE abort_event);
+
+  HRESULT CheckConnection(HANDLE abort_event, short* answer) override;
+  HRESULT GetReceiverInfo(HANDLE abort_event, CReceiverInfo* info) override;
+  HRESULT GetFiles(CFileList* files) override;
+  HRESULT DownloadFile(const wchar_t* name, IStream* stream, CProgressCallback* progress) override;
+  HRESULT DeleteFile(const wchar_t* name) override;
+  HRESULT RenameFile(const wchar_t* old_name, const wchar_t* new_name) override;
+  void SetCallback(CIProtocolCallback* callback) override;
+  HRESULT DCSetRcvBaudrate(DWORD baud_rate) override;
+  HRESULT DCSetRcvRTSControl(BYTE rts) override;
+  HRESULT DCSetRcvParity(BYTE parity) override;
+  HRESULT DCSetRcvStopbits(BYTE stop_bits) override;
+
+  // Runs one command as the current one.
+  virtual HRESULT ExecuteCommand(VelmarCommands::CVelmarCommand& command);
+
+  HRESULT OnDataReceived(void* context) override;
+
+ private:
+  struct TransferContext;
+
+  void ReadIdentity(HANDLE abort_event, CReceiverInfo* info);
+  // The pattern of deleting and renaming: one command under the lock, whose answer is not looked
+  // at.
+  template <typename MakeCommand>
+  HRESULT ChangeFile(MakeCommand make_command);
+
+  // Reads the port's settings and sends them back with one of them changed. S_OK also when the
+  // receiver did not say on which port it is; `*sent` tells.
+  template <typename Change>
+  HRESULT SendPortSettings(Change change, bool look_for_abort, bool* sent);
+  template <typename Change>
+  HRESULT ChangePort(Change change);
+  HRESULT ChangeReceiverSpeed(DWORD speed, bool* sent);
+
+  // The three parts of a download.
+  DWORD RaiseSpeed();
+  HRESULT Transfer(const wchar_t* name, IStream* stream);
+  HRESULT RestoreSpeed(DWORD saved_speed);
+
+  void ThrowIfAborted();
+};
+
+#endif  // RCVLINK_VELMAR_VELMAR_PROTOCOL_H_
