@@ -103,7 +103,10 @@ HRESULT CReadFileCmd::ParseReply(const char* bytes,
                                  uint32_t length,
                                  bool* done,
                                  uint32_t* consumed) {
-  if (!chunk_) return CLogCommand::ParseReply(bytes, length, done, consumed);
+  // The prompt is consumed as soon as it is whole: a first log that comes later stands alone.
+  const bool at_log = length != 0 && static_cast<uint8_t>(bytes[0]) == BinaryHeader::kSync;
+  const bool acknowledged = Response() == RESPONSE_OK && at_log;
+  if (!chunk_ && !acknowledged) return CLogCommand::ParseReply(bytes, length, done, consumed);
   const HRESULT result = ParseBinaryLog(bytes, length, done, consumed);
   if (Response() == RESPONSE_OK) *done = false;
   return result;

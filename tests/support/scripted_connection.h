@@ -25,6 +25,7 @@ class ScriptedConnection : public CIConnection {
   void GiveRead(std::string bytes) { answers_.push_back({S_OK, std::move(bytes), {}}); }
   void GiveResult(HRESULT result) { answers_.push_back({result, {}, {}}); }
   void Give(Answer answer) { answers_.push_back(std::move(answer)); }
+  void DropAnswers() { answers_.clear(); }
   // Called with all bytes of each write; what it gives is the write's result. May call GiveRead.
   std::function<HRESULT(std::string_view)> on_write;
   std::function<HRESULT()> on_flush;

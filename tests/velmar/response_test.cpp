@@ -1,0 +1,60 @@
+#include "velmar/response.h"
+
+#include <gtest/gtest.h>
+
+#include <string>
+
+#include "tests/velmar/velmar_replies.h"
+
+namespace {
+
+using namespace VelmarCommands;
+
+ResponseType TypeOf(std::string_view bytes) { return RecogniseResponse(bytes).type; }
+
+TEST(VelmarResponse, AnAcknowledgementEndsBehindThePrompt) {
+  const Response response = RecogniseResponse(kOkPrompt);
+  EXPECT_EQ(response.type, RESPONSE_OK);
+  EXPECT_EQ(response.prompt_end, kOkPrompt.size());
+  EXPECT_EQ(RecogniseResponse(kOkPrompt + "#LOG").prompt_end, kOkPrompt.size());
+}
+
+TEST(VelmarResponse, ARefusalWithoutTextIsAnError) {
+  const Response response = RecogniseResponse(kErrorPrompt);
+  EXPECT_EQ(response.type, RESPONSE_ERROR);
+  EXPECT_EQ(response.prompt_end, kErrorPrompt.size());
+}
+
+// The text ahead of the prompt is not skipped.
+TEST(VelmarResponse, ARefusalWithTextIsUnknown) {
+  EXPECT_EQ(TypeOf(kErrorTextPrompt), RESPONSE_UNKNOWN);
+}
+
+// Every beginning of a reply waits for more; none is taken for something else.
+TEST(VelmarResponse, BeginningsAreIncomplete) {
+  for (const std::string& reply : {kOkPrompt, kErrorPrompt}) {
+    for (size_t length = 0; length < reply.size(); ++length) {
+      const Response response = RecogniseResponse(reply.substr(0, length));
+      EXPECT_EQ(response.type, RESPONSE_INCOMPLETE) << reply << length;
+      EXPECT_EQ(response.prompt_end, 0u);
+    }
+  }
+}
+
+TEST(VelmarResponse, AnythingElseIsUnknownAtItsFirstByte) {
+  for (const char* reply :
+       {"x", "\rx", "\r\nx", "\r\n<OK_____", "\r\n<NO_______", "\r\n<OK\r\nx_"}) {
+    EXPECT_EQ(TypeOf(reply), RESPONSE_UNKNOWN) << reply;
+  }
+}
+
+TEST(VelmarResponse, AZeroByteIsAnEndThatIsNotThereYet) {
+  EXPECT_EQ(TypeOf(std::string("\r\n<OK\r\n\0xx", 10)), RESPONSE_INCOMPLETE);
+  EXPECT_EQ(TypeOf(std::string("\r\n<OK\r\n[CO\0M]", 13)), RESPONSE_INCOMPLETE);
+}
+
+TEST(VelmarResponse, APromptWithoutEndIsIncomplete) {
+  EXPECT_EQ(TypeOf("\r\n<OK\r\n[" + std::string(8000, 'C')), RESPONSE_INCOMPLETE);
+}
+
+}  // namespace
