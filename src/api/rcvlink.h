@@ -177,7 +177,6 @@ namespace devapi {
 /// @return otherwise why the port could not be opened: 0x80070002 when it does not exist,
 ///         0x80070005 when another program has it. E_NOTIMPL for a USB link: this version does not
 ///         reach receivers on USB yet.
-/// @note Velmar receivers are not recognised yet by this version: asking for them gives S_FALSE.
 RCVLINK_API long SearchReceiver(
     wchar_t* port, EInstanceType type, EProtocol protocol, void* abortEvent, void** receiver);
 
@@ -243,7 +242,8 @@ RCVLINK_API long DestroyReceiver(wchar_t* port);
 /// @retval 0x8007048F   the receiver refused
 /// @return otherwise the failing code of the exchange
 /// @warning A failure of a Quorin receiver after the lock was taken leaves the calling thread
-///          holding the receiver's lock: call `UnlockConnection` after a result other than S_OK.
+///          holding the receiver's lock: call `UnlockConnection` after a result other than S_OK. (A
+///          Velmar receiver lets go by itself; the call does no harm.)
 RCVLINK_API long GetReceiverInfo(void* receiver, void* abortEvent, CReceiverInfo* info);
 
 /// Asks whether the receiver still answers.
@@ -278,8 +278,11 @@ RCVLINK_API long Abort(void* receiver);
 /// @param name     name as in the file list, in the thread's ANSI code page on the wire
 /// @param stream   COM stream; only its Write is called, on the calling thread
 /// @param progress may be null
-/// @retval S_OK         done. A Quorin receiver on a serial port gives S_OK also when the stream's
-///                      Write failed: a host compares the byte count with the size listed.
+/// @retval S_OK         done, or so it seems: a host compares the byte count with the size listed. A
+///                      Quorin receiver on a serial port gives S_OK also when the stream's Write
+///                      failed; a Velmar receiver also for a file that it does not have (nothing is
+///                      written then), and whenever a raised speed was put back, whatever became of
+///                      the transfer.
 /// @retval S_FALSE      aborted, or ended by the receiver
 /// @retval E_INVALIDARG `name` or `stream` is null
 /// @retval E_FAIL       the receiver says that the file's size is 0, or does not say it
@@ -303,7 +306,8 @@ RCVLINK_API long UploadFile(void* receiver,
                             CProgressCallback* progress);
 
 /// Deletes a file of the receiver.
-/// @retval S_OK         done
+/// @retval S_OK         done. A Velmar receiver gives it also when it refused: a host that must know
+///                      reads the directory again.
 /// @retval S_FALSE      aborted
 /// @retval E_INVALIDARG `name` is null
 /// @retval 0x8007048F   the receiver refused
@@ -311,7 +315,10 @@ RCVLINK_API long UploadFile(void* receiver,
 RCVLINK_API long DeleteFileW(void* receiver, wchar_t* name);
 
 /// Renames a file of the receiver.
-/// @retval E_NOTIMPL a Quorin receiver: its family does not rename
+/// @retval S_OK         done, or refused, as with `DeleteFileW`
+/// @retval S_FALSE      aborted
+/// @retval E_INVALIDARG a name is null
+/// @retval E_NOTIMPL    a Quorin receiver: its family does not rename
 RCVLINK_API long RenameFile(void* receiver, wchar_t* oldName, wchar_t* newName);
 /// @}
 
