@@ -323,9 +323,11 @@ RCVLINK_API long RenameFile(void* receiver, wchar_t* oldName, wchar_t* newName);
 /// @}
 
 /// @name Settings of the receiver's own serial port
-/// They change the receiver, not the host's port, and wait for no confirmation. They do not lock
-/// the receiver: hold it with `LockConnection` when other threads use it. Results: S_OK sent;
-/// S_FALSE aborted, or the receiver did not name its port; 0x8007048F no answer.
+/// They change the receiver, not the host's port, and wait for no confirmation. A Quorin receiver is
+/// not locked by them: hold it with `LockConnection` when other threads use it.
+/// Results: S_OK sent (or, with a Velmar receiver, nothing was sent because it did not tell its port's
+/// settings); S_FALSE aborted, or a Quorin receiver did not name its port; 0x800705B4 a Quorin receiver
+/// stayed silent.
 /// @{
 
 /// @param baudRate bits per second

@@ -90,7 +90,7 @@ DWORD CVelmarProtocol::RaiseSpeed() {
 
 HRESULT CVelmarProtocol::RestoreSpeed(DWORD saved_speed) {
   // An abort of the transfer must not cut off the put-back; its flag stays for the next operation.
-  if (IsAborted()) UseUpCancel();
+  if (IsAborted()) DropCancel();
   bool sent = false;
   const HRESULT result = ChangeReceiverSpeed(saved_speed, &sent);
   return FAILED(result) ? result : connection()->SetSpeed(saved_speed);

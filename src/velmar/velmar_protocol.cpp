@@ -8,6 +8,7 @@
 #include "platform/hresult.h"
 #include "platform/text.h"
 #include "report/report_file.h"
+#include "transport/abort_shield.h"
 
 using namespace VelmarCommands;
 
@@ -42,6 +43,7 @@ HRESULT CVelmarProtocol::ExecuteCommand(CVelmarCommand& command) {
 
 bool CVelmarProtocol::Probe(CIConnection* connection, HANDLE abort_event) {
   if (!connection) return false;
+  const AbortWatch watch(connection, abort_event);
   const auto run = [&](CVelmarCommand& command) {
     const HRESULT result = command.Execute(connection, abort_event);
     DumpInvalidResponse(result, connection, command);
@@ -63,6 +65,7 @@ HRESULT CVelmarProtocol::CheckConnection(HANDLE abort_event, short* answer) {
   if (const HRESULT locked = LockConnection(abort_event); locked < 0 || locked == S_FALSE) {
     return locked;
   }
+  UseUpCancel();
   *answer = Probe(connection(), abort_event) ? VARIANT_TRUE : VARIANT_FALSE;
   UnlockConnection();
   return S_OK;
