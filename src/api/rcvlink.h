@@ -238,12 +238,13 @@ RCVLINK_API long DestroyReceiver(wchar_t* port);
 /// @retval S_OK         the host frees `bstrReceiverId` and `bstrModel`
 /// @retval S_FALSE      aborted, or the receiver answered with something else than its identity
 /// @retval E_INVALIDARG `info` is null
-/// @retval 0x800705B4   the receiver stayed silent
-/// @retval 0x8007048F   the receiver refused
+/// @retval 0x800705B4   a Quorin receiver stayed silent (a Velmar receiver: S_FALSE)
+/// @retval 0x8007048F   a Quorin receiver refused (a Velmar receiver: S_FALSE)
 /// @return otherwise the failing code of the exchange
 /// @warning A failure of a Quorin receiver after the lock was taken leaves the calling thread
-///          holding the receiver's lock: call `UnlockConnection` after a result other than S_OK. (A
-///          Velmar receiver lets go by itself; the call does no harm.)
+///          holding the receiver's lock: call `UnlockConnection` after a result other than S_OK. A
+///          Velmar receiver is let go by the failure itself, once, whoever took it: a host that holds
+///          it with `LockConnection` must take it again.
 RCVLINK_API long GetReceiverInfo(void* receiver, void* abortEvent, CReceiverInfo* info);
 
 /// Asks whether the receiver still answers.
@@ -276,18 +277,19 @@ RCVLINK_API long Abort(void* receiver);
 
 /// Copies a file of the receiver into a stream.
 /// @param name     name as in the file list, in the thread's ANSI code page on the wire
-/// @param stream   COM stream; only its Write is called, on the calling thread
+/// @param stream   COM stream; its Write is called, on the calling thread, and with a Velmar receiver
+///                 its AddRef and Release around the transfer
 /// @param progress may be null
 /// @retval S_OK         done, or so it seems: a host compares the byte count with the size listed. A
 ///                      Quorin receiver on a serial port gives S_OK also when the stream's Write
 ///                      failed; a Velmar receiver also for a file that it does not have (nothing is
-///                      written then), and whenever a raised speed was put back, whatever became of
-///                      the transfer.
+///                      written then) or that falls silent, and whenever a raised speed was put back,
+///                      whatever became of the transfer.
 /// @retval S_FALSE      aborted, or ended by the receiver
 /// @retval E_INVALIDARG `name` or `stream` is null
-/// @retval E_FAIL       the receiver says that the file's size is 0, or does not say it
-/// @retval 0x800705B4   the receiver stayed silent
-/// @retval 0x8007048F   the receiver refused a command, or sent a block that makes no sense
+/// @retval E_FAIL       a Quorin receiver says that the file's size is 0, or does not say it
+/// @retval 0x800705B4   a Quorin receiver stayed silent
+/// @retval 0x8007048F   a Quorin receiver refused a command, or sent a block that makes no sense
 /// @return otherwise the failing code of the connection
 /// @note A Quorin receiver that falls silent between two blocks is asked again without end on a port
 ///       whose reads end empty, as those of Windows do: a host that has no patience calls `Abort`.
@@ -306,8 +308,8 @@ RCVLINK_API long UploadFile(void* receiver,
                             CProgressCallback* progress);
 
 /// Deletes a file of the receiver.
-/// @retval S_OK         done. A Velmar receiver gives it also when it refused: a host that must know
-///                      reads the directory again.
+/// @retval S_OK         done. A Velmar receiver gives it also when it refused or stayed silent: a host
+///                      that must know reads the directory again.
 /// @retval S_FALSE      aborted
 /// @retval E_INVALIDARG `name` is null
 /// @retval 0x8007048F   the receiver refused
@@ -356,6 +358,8 @@ RCVLINK_API long DCSetRcvStopbits(void* receiver, unsigned char stopBits);
 /// @retval E_OUTOFMEMORY an allocation failed
 /// @return otherwise the receiver's result; a failure (negative) makes no list. S_FALSE (the reading
 ///         was aborted) makes an empty one.
+/// @note A Velmar receiver's directory is read through a buffer of 8192 bytes, which holds about 70
+///       files: of a larger one the list has the first part. Its silence gives an empty list.
 RCVLINK_API long OpenFileList(void* receiver, void** fileList);
 
 /// @param[out] count number of files

@@ -60,7 +60,7 @@ HRESULT CVelmarProtocol::DownloadFile(const wchar_t* name, IStream* stream, CPro
     const HRESULT result = CatchResult([&] { return Transfer(name, stream); });
     if (saved_speed == 0 || saved_speed >= kTransferSpeed) return result;
     // What the put-back gives replaces what the transfer gave.
-    return RestoreSpeed(saved_speed);
+    return RestoreSpeed(saved_speed, result == S_OK);
   });
 }
 
@@ -71,14 +71,15 @@ DWORD CVelmarProtocol::RaiseSpeed() {
   ThrowIfFailed(connection()->GetSpeed(&speed));
   if (static_cast<int32_t>(speed) >= static_cast<int32_t>(kTransferSpeed)) return 0;
 
+  // A receiver that refused, or did not say on which port it is, was not raised, and the host must not
+  // be either.
   bool sent = false;
-  const HRESULT raised = ChangeReceiverSpeed(kTransferSpeed, &sent);
-  if (FAILED(raised)) {
+  HRESULT raised = ChangeReceiverSpeed(kTransferSpeed, &sent);
+  if (SUCCEEDED(raised) && !sent) raised = S_FALSE;
+  if (raised != S_OK) {
     Trace(L"CVelmarProtocol::DownloadFile - receiver speed up is failed [0x%08X]\r\n", raised);
+    return 0;
   }
-  // A receiver that did not say on which port it is was not raised, and the host must not be
-  // either.
-  if (FAILED(raised) || !sent) return 0;
   const HRESULT followed = connection()->SetSpeed(kTransferSpeed);
   if (FAILED(followed)) {
     Trace(L"CVelmarProtocol::DownloadFile - host speed up is failed [0x%08X]\r\n", followed);
@@ -88,9 +89,14 @@ DWORD CVelmarProtocol::RaiseSpeed() {
   return speed;
 }
 
-HRESULT CVelmarProtocol::RestoreSpeed(DWORD saved_speed) {
+HRESULT CVelmarProtocol::RestoreSpeed(DWORD saved_speed, bool transfer_ended) {
   // An abort of the transfer must not cut off the put-back; its flag stays for the next operation.
   if (IsAborted()) DropCancel();
+  if (!transfer_ended) {
+    // A receiver that still sends the file would answer the put-back behind it.
+    CUnlogAllCommand stop_sending;
+    ExecuteCommand(stop_sending);
+  }
   bool sent = false;
   const HRESULT result = ChangeReceiverSpeed(saved_speed, &sent);
   return FAILED(result) ? result : connection()->SetSpeed(saved_speed);

@@ -28,8 +28,9 @@ HRESULT CVelmarCommand::Execute(CIConnection* connection, HANDLE abort_event) {
   if (!connection) return E_INVALIDARG;
   if (IsCancelled(abort_event)) return S_FALSE;
   if (const HRESULT result = connection->Flush(); FAILED(result)) return result;
+  // A write that was aborted (S_FALSE) ends the command as much as one that failed.
   if (const HRESULT result = connection->Write(GetCommand(), GetCommandLength(), GetWriteTimeout());
-      FAILED(result)) {
+      result != S_OK) {
     return result;
   }
   if (GetFlags() & kAppendCrc) {
@@ -39,7 +40,7 @@ HRESULT CVelmarCommand::Execute(CIConnection* connection, HANDLE abort_event) {
                                           static_cast<uint8_t>(crc >> 16),
                                           static_cast<uint8_t>(crc >> 24)};
     const HRESULT result = connection->Write(bytes.data(), sizeof(bytes), GetWriteTimeout());
-    if (FAILED(result)) return result;
+    if (result != S_OK) return result;
   }
   if (GetFlags() & kSendOnly) return S_OK;
   if (IsCancelled(abort_event)) return S_FALSE;
@@ -111,7 +112,7 @@ HRESULT CVelmarCommand::ReceiveReply(CIConnection* connection, HANDLE abort_even
     if (need_data && receiving.IsFull()) break;
   }
   if (keep_reply) {
-    SetReply("");
+    SetReply("");  // so that a reply of nothing has the length 0
     const std::string& kept = receiving.kept();
     const HRESULT result = AppendReply(kept.data(), static_cast<uint32_t>(kept.size()));
     if (FAILED(result)) return result;

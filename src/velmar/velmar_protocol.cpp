@@ -2,6 +2,7 @@
 
 #include <mutex>
 #include <string>
+#include <string_view>
 #include <utility>
 
 #include "platform/event.h"
@@ -28,6 +29,13 @@ void DumpInvalidResponse(HRESULT result, CIConnection* connection, const CVelmar
         result,
         text.c_str(),
         name.c_str());
+}
+
+// Whether the receiver refused, with an error text or without: the response type tells only the second.
+bool IsRefusal(const CVelmarCommand& command) {
+  constexpr std::string_view kRefusal = "\r\n<ERROR:";
+  const uint8_t* const reply = command.GetReply();
+  return reply && std::string(reply, reply + command.GetReplyLength()).starts_with(kRefusal);
 }
 
 }  // namespace
@@ -171,8 +179,9 @@ HRESULT CVelmarProtocol::SendPortSettings(Change change, bool look_for_abort, bo
                                settings.data_bits,
                                settings.stop_bits,
                                settings.handshake);
-  ThrowIfFailed(ExecuteCommand(set_params));
-  *sent = true;
+  const HRESULT result = ExecuteCommand(set_params);
+  ThrowIfFailed(result);
+  *sent = result == S_OK && !IsRefusal(set_params);
   return S_OK;
 }
 

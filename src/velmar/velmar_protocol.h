@@ -13,7 +13,7 @@ class CVelmarProtocol : public CAbstractProtocol, public VelmarCommands::CReadFi
   explicit CVelmarProtocol(std::unique_ptr<CIConnection> connection);
 
   // Whether a Velmar receiver answers on the connection. The abort event (may be null) is looked at
-  // between the steps.
+  // between the steps and ends the wait for an answer.
   static bool Probe(CIConnection* connection, HANDLE abort_event);
 
   HRESULT CheckConnection(HANDLE abort_event, short* answer) override;
@@ -43,7 +43,8 @@ class CVelmarProtocol : public CAbstractProtocol, public VelmarCommands::CReadFi
   HRESULT ChangeFile(MakeCommand make_command);
 
   // Reads the port's settings and sends them back with one of them changed. S_OK also when the
-  // receiver did not say on which port it is; `*sent` tells.
+  // receiver did not say on which port it is; `*sent` tells
+  // whether it was sent and not refused.
   template <typename Change>
   HRESULT SendPortSettings(Change change, bool look_for_abort, bool* sent);
   template <typename Change>
@@ -53,7 +54,7 @@ class CVelmarProtocol : public CAbstractProtocol, public VelmarCommands::CReadFi
   // The three parts of a download.
   DWORD RaiseSpeed();
   HRESULT Transfer(const wchar_t* name, IStream* stream);
-  HRESULT RestoreSpeed(DWORD saved_speed);
+  HRESULT RestoreSpeed(DWORD saved_speed, bool transfer_ended);
 
   void ThrowIfAborted();
 };

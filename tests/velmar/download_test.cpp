@@ -1,6 +1,7 @@
 // The download of a Velmar receiver, on a scripted connection.
 #include <algorithm>
 #include <string>
+#include <vector>
 
 #include "platform/hresult.h"
 #include "tests/support/memory_stream.h"
@@ -94,6 +95,21 @@ TEST_F(VelmarDownload, AReceiverThatCannotBeRaisedStaysSlow) {
   EXPECT_EQ(stream.bytes.size(), 100u);
 }
 
+TEST_F(VelmarDownload, AReceiverThatRefusesTheSpeedStaysSlow) {
+  for (const std::string& refusal : {kErrorPrompt, kErrorTextPrompt}) {
+    Serve(1);
+    connection->speed = 9600;
+    answers[kRaise] = refusal;
+    stream.bytes.clear();
+    EXPECT_EQ(Download(), S_OK);
+    EXPECT_TRUE(
+        report.Has("CVelmarProtocol::DownloadFile - receiver speed up is failed [0x00000001]"));
+    EXPECT_THAT(connection->calls, testing::Not(testing::Contains("speed 115200")));
+    EXPECT_EQ(stream.bytes.size(), 100u);
+    EXPECT_EQ(connection->Writes().back(), kRead);  // and nothing is put back
+  }
+}
+
 // It was not raised: raising the host would cut the link.
 TEST_F(VelmarDownload, AReceiverThatNamesNoPortStaysSlow) {
   Serve(1);
@@ -117,7 +133,7 @@ TEST_F(VelmarDownload, AHostThatCannotFollowPutsTheReceiverBackAtOnce) {
 TEST_F(VelmarDownload, UsbHasNoSpeed) {
   Serve(1);
   connection->instance_type = eInstanceUSB;
-  connection->speed = 9600;
+  connection->speed_result = E_HANDLE;  // nobody asks
   EXPECT_EQ(Download(), S_OK);
   EXPECT_THAT(connection->Writes(), ElementsAre(kCurrent, kHeader, kRead));
 }
@@ -171,6 +187,23 @@ TEST_F(VelmarDownload, AtRaisedSpeedAFailureIsCoveredByThePutBack) {
   EXPECT_EQ(connection->speed, 9600u);
 }
 
+TEST_F(VelmarDownload, AFasterLinkIsLeftAlone) {
+  Serve(1);
+  connection->speed = 230400;
+  Download();
+  EXPECT_THAT(connection->Writes(), ElementsAre(kCurrent, kHeader, kRead));
+  EXPECT_EQ(connection->speed, 230400u);
+}
+
+TEST_F(VelmarDownload, APutBackThatFailsGivesItsCode) {
+  Serve(1);
+  connection->speed = 9600;
+  before_command = [&](const std::string& command) {
+    if (command == kRestore) connection->set_speed_result = E_ACCESSDENIED;
+  };
+  EXPECT_EQ(Download(), E_ACCESSDENIED);
+}
+
 TEST_F(VelmarDownload, AnAbortEndsItAndItsFlagOutlivesIt) {
   Serve(3);
   before_command = [&](const std::string& command) {
@@ -189,7 +222,9 @@ TEST_F(VelmarDownload, AnAbortAtRaisedSpeedPutsTheSpeedBack) {
     if (command == kRead) driver.Abort();
   };
   Download();
-  EXPECT_EQ(connection->Writes().back(), kRestore);
+  const std::vector<std::string> writes = connection->Writes();
+  EXPECT_THAT(std::vector<std::string>(writes.end() - 3, writes.end()),
+              ElementsAre("unlogall thisport\r", kConfig, kRestore));
   EXPECT_EQ(connection->speed, 9600u);
   before_command = nullptr;
   EXPECT_EQ(driver.DeleteFile(L"a"), S_FALSE);

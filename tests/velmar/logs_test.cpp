@@ -16,16 +16,18 @@ using namespace VelmarCommands;
 // --- VERSION
 
 std::string Component(const std::string& type, const std::string& model) {
-  return "," + type + ",\"" + model + "\",\"SN1\",\"HW1\",\"SW1\",\"BOOT\",\"2012/Jan/01\",\"a,b\"";
+  std::string text = "," + type + ",\"" + model + "\"";
+  for (const char* field : {"SN", "HW", "SW"}) text += ",\"" + (field + ("-" + model)) + "\"";
+  return text + ",\"BOOT\",\"2012/Jan/01\",\"a,b\"";
 }
 
 TEST(VersionLog, ReadsTheReceiverCard) {
   VersionLog log;
   EXPECT_EQ(DecodeVersion("1" + Component("GPSCARD", "OEM6"), log), Progress::kComplete);
   EXPECT_EQ(log.model, L"OEM6");
-  EXPECT_EQ(log.serial_number, L"SN1");
-  EXPECT_EQ(log.hardware_version, L"HW1");
-  EXPECT_EQ(log.software_version, L"SW1");
+  EXPECT_EQ(log.serial_number, L"SN-OEM6");
+  EXPECT_EQ(log.hardware_version, L"HW-OEM6");
+  EXPECT_EQ(log.software_version, L"SW-OEM6");
 }
 
 TEST(VersionLog, TheLastEnclosureOrApplicationNamesTheModel) {
@@ -35,7 +37,9 @@ TEST(VersionLog, TheLastEnclosureOrApplicationNamesTheModel) {
                           log),
             Progress::kComplete);
   EXPECT_EQ(log.model, L"box");
-  EXPECT_EQ(log.serial_number, L"SN1");
+  EXPECT_EQ(log.serial_number, L"SN-card");
+  EXPECT_EQ(log.hardware_version, L"HW-card");
+  EXPECT_EQ(log.software_version, L"SW-card");
   EXPECT_EQ(
       DecodeVersion("2" + Component("DB_USERAPPAUTO", "app") + Component("GPSCARD", "card"), log),
       Progress::kComplete);

@@ -74,6 +74,13 @@ TEST_F(VelmarCommand, GivesTheFailureOfEachStep) {
   EXPECT_EQ(clock.paused, 0u);
 }
 
+// Nothing went out: an answer would be waited for in vain.
+TEST_F(VelmarCommand, AnAbortedWriteEndsIt) {
+  connection.on_write = [](std::string_view) { return S_FALSE; };
+  EXPECT_EQ(CVelmarCommand("x", 0).Execute(&connection, nullptr), S_FALSE);
+  EXPECT_THAT(connection.calls, ElementsAre("flush", "write x"));
+}
+
 TEST_F(VelmarCommand, AFailedReadEndsItWithoutAReply) {
   connection.GiveRead("\r\n<OK");
   connection.GiveResult(E_HANDLE);

@@ -124,7 +124,10 @@ TEST_F(VelmarDriver, ReadsTheIdentity) {
 
 TEST_F(VelmarDriver, WithoutVersionDataThereIsNoIdentity) {
   answers = {{kVersion, kOkPrompt}};
+  wchar_t left_over[] = L"left over";
   CReceiverInfo info{};
+  info.bstrReceiverId = left_over;
+  info.bstrModel = left_over;
   EXPECT_EQ(driver.GetReceiverInfo(nullptr, &info), S_FALSE);
   EXPECT_EQ(info.bstrReceiverId, nullptr);
   EXPECT_EQ(info.bstrModel, nullptr);
