@@ -85,8 +85,9 @@ class ApiPortSettings : public testing::Test {
   void ExpectSetting(const std::string& setting, const std::string& taken) {
     sent_.push_back(R"(%#%print,/cur/term\r\n)");
     sent_.push_back("set,/par/dev/ser/c/" + setting + R"(\r\n)");
-    port_.WaitForTranscript(taken + "\n");
+    receiver_.WaitForSent(sent_.size());
     EXPECT_THAT(receiver_.SentSince(), ElementsAreArray(sent_));
+    port_.WaitForTranscript(taken + "\n");
   }
 
   const bed::SimulatedPort port_{{"quorin", "--port-letter", "c"}};

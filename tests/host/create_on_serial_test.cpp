@@ -113,15 +113,12 @@ TEST(ApiCreateOnSerial, RefusesMissingArguments) {
   std::wstring name = port.name();
   DCB settings = host::Settings(CBR_9600);
   void* handle = nullptr;
-  EXPECT_EQ(
-      devapi::CreateReceiverOnSerial(nullptr, eProtocolAny, &settings, nullptr, &handle),
-      E_INVALIDARG);
-  EXPECT_EQ(
-      devapi::CreateReceiverOnSerial(name.data(), eProtocolAny, nullptr, nullptr, &handle),
-      E_INVALIDARG);
-  EXPECT_EQ(
-      devapi::CreateReceiverOnSerial(name.data(), eProtocolAny, &settings, nullptr, nullptr),
-      E_INVALIDARG);
+  EXPECT_EQ(devapi::CreateReceiverOnSerial(nullptr, eProtocolAny, &settings, nullptr, &handle),
+            E_INVALIDARG);
+  EXPECT_EQ(devapi::CreateReceiverOnSerial(name.data(), eProtocolAny, nullptr, nullptr, &handle),
+            E_INVALIDARG);
+  EXPECT_EQ(devapi::CreateReceiverOnSerial(name.data(), eProtocolAny, &settings, nullptr, nullptr),
+            E_INVALIDARG);
   EXPECT_EQ(handle, nullptr);
   EXPECT_THAT(report.Lines(), IsEmpty());
   EXPECT_THAT(port.Transcript(), IsEmpty());
@@ -144,12 +141,19 @@ TEST(ApiCreateOnSerial, PortOfAnotherNameIsReadTheSameWay) {
   EXPECT_EQ(devapi::CloseReceiver(handle), S_OK);
 }
 
-TEST(ApiCreateOnSerial, VelmarIsNotLookedForAmongQuorinReceivers) {
-  const bed::SimulatedPort port({"quorin"});
+TEST(ApiCreateOnSerial, QuorinReceiverIsNotAskedWhereVelmarIsWanted) {
+  bed::SimulatedPort port({"quorin"});
+  const host::Report report;
   void* handle = nullptr;
   EXPECT_EQ(Create(port, eProtocolVelmar, CBR_9600, &handle), S_FALSE);
   EXPECT_EQ(handle, nullptr);
-  EXPECT_THAT(port.Transcript(), IsEmpty());
+  EXPECT_THAT(report.LinesWith("CreateReceiverOnSerial - looking for Quorin"), IsEmpty());
+  EXPECT_EQ(report.LinesWith("CreateReceiverOnSerial - looking for Velmar").size(), 1U);
+  port.Stop();  // what it has heard without an end of line is noted then
+  const std::string transcript = port.Transcript();
+  for (const char* const greeting : {"#OFF#", "dm", "print,", "%"}) {
+    EXPECT_EQ(transcript.find(greeting), std::string::npos) << transcript;
+  }
 }
 
 TEST(ApiCreateOnSerial, SpeedZeroKeepsThePortsOwn) {
@@ -168,8 +172,8 @@ TEST(ApiCreateOnSerial, UsesTheSettingsItIsGiven) {
   DCB settings = host::Settings(CBR_19200);
   settings.StopBits = TWOSTOPBITS;
   void* handle = nullptr;
-  ASSERT_EQ(
-      devapi::CreateReceiverOnSerial(name.data(), eProtocolAny, &settings, nullptr, &handle), S_OK);
+  ASSERT_EQ(devapi::CreateReceiverOnSerial(name.data(), eProtocolAny, &settings, nullptr, &handle),
+            S_OK);
   EXPECT_EQ(devapi::CloseReceiver(handle), S_OK);
   const DCB used = RawPort(port.path()).GetSettings();
   EXPECT_EQ(used.BaudRate, DWORD{CBR_19200});
@@ -211,7 +215,7 @@ TEST(ApiCreateOnSerial, SilentReceiverIsNoReceiver) {
   port.Pause();
   const host::Report report;
   void* handle = nullptr;
-  EXPECT_EQ(Create(port, eProtocolAny, CBR_9600, &handle), S_FALSE);
+  EXPECT_EQ(Create(port, eProtocolQuorin, CBR_9600, &handle), S_FALSE);
   EXPECT_EQ(handle, nullptr);
   EXPECT_TRUE(report.Has("CQuorinProtocol::CheckConnection - ping cmd failed [0x800705B4] [" +
                          host::Narrow(port.name()) + "]"));
@@ -224,8 +228,8 @@ TEST(ApiCreateOnSerial, TwoPortsAreTriedAtOnce) {
   const host::Report report;
   slow.Pause();
   void* slow_handle = nullptr;
-  auto slow_create = host::OnThread(
-      [&] { return Create(slow, eProtocolQuorin, CBR_9600, &slow_handle); });
+  auto slow_create =
+      host::OnThread([&] { return Create(slow, eProtocolQuorin, CBR_9600, &slow_handle); });
   report.WaitFor("CQuorinCommand::Execute - start reading. Timeout is [8000 msec]");
 
   void* quick_handle = nullptr;

@@ -74,7 +74,7 @@ TEST_P(ApiDownloadOf, DeliversEveryByte) {
       << "at full speed nothing else is said";
 }
 
-INSTANTIATE_TEST_SUITE_P(Sizes, ApiDownloadOf, testing::Values(1, 511, 512, 513, 1024, 60000));
+INSTANTIATE_TEST_SUITE_P(Sizes, ApiDownloadOf, testing::Values(1, 511, 512, 513, 60000));
 
 TEST(ApiDownload, TellsItsSteps) {
   const bed::SimulatedPort port({"quorin"}, {{"A.log", host::Content(20000)}});
@@ -143,15 +143,16 @@ TEST(ApiDownload, TwoInARowAreTheSame) {
 
 // Two receivers, two threads: each gets its own file.
 TEST(ApiDownload, RunsOnTwoPortsAtOnce) {
-  const bed::SimulatedPort first({"quorin"}, {{"A.log", host::Content(9000)}});
-  const bed::SimulatedPort second({"quorin"}, {{"A.log", std::string(7000, 'x')}});
-  const host::Receiver receiver(first);
-  const host::Receiver other(second);
+  const std::vector<std::string> arguments = {"quorin", "--speed", "115200"};
+  const bed::SimulatedPort first(arguments, {{"A.log", host::Content(9000)}});
+  const bed::SimulatedPort second(arguments, {{"A.log", std::string(7000, 'x')}});
+  const host::Receiver receiver(first, CBR_115200);
+  const host::Receiver other(second, CBR_115200);
   host::GatedProgress held(50);
   host::MemoryStream stream;
   host::MemoryStream other_stream;
-  auto download = host::OnThread(
-      [&] { return receiver.Download(L"A.log", stream, &held.progress); });
+  auto download =
+      host::OnThread([&] { return receiver.Download(L"A.log", stream, &held.progress); });
   ASSERT_TRUE(held.gate.WaitForArrival());
   EXPECT_EQ(other.Download(L"A.log", other_stream), S_OK) << "while the first stands still";
   held.gate.Open();

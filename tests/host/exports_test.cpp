@@ -93,17 +93,16 @@ TEST(ApiExports, BothNamesOfAFunctionLeadToTheSamePlace) {
 TEST(ApiExports, TheHeaderLeadsToThemToo) {
   EXPECT_EQ(reinterpret_cast<void*>(&devapi::DeleteFileW),
             reinterpret_cast<void*>(Find("?DeleteFileW@devapi@@YAJPEAXPEA_W@Z")));
-  EXPECT_EQ(reinterpret_cast<void*>(&SearchReceiverOnSerial),
-            reinterpret_cast<void*>(
-                Find("?SearchReceiverOnSerial@@YAJPEA_WW4EProtocol@@PEAXPEAPEAX@Z")));
+  EXPECT_EQ(
+      reinterpret_cast<void*>(&SearchReceiverOnSerial),
+      reinterpret_cast<void*>(Find("?SearchReceiverOnSerial@@YAJPEA_WW4EProtocol@@PEAXPEAPEAX@Z")));
 }
 
 TEST(ApiExports, AnswerUnderTheMicrosoftName) {
   const auto open = FindAs<long(wchar_t*, void**)>("?OpenReceiver@devapi@@YAJPEA_WPEAPEAX@Z");
   const auto destroy = FindAs<long(wchar_t*)>("?DestroyReceiver@devapi@@YAJPEA_W@Z");
   const auto abort = FindAs<long(void*)>("?Abort@devapi@@YAJPEAX@Z");
-  const auto set_speed =
-      FindAs<long(void*, unsigned long)>("?DCSetRcvBaudrate@devapi@@YAJPEAXK@Z");
+  const auto set_speed = FindAs<long(void*, unsigned long)>("?DCSetRcvBaudrate@devapi@@YAJPEAXK@Z");
   const auto get_info =
       FindAs<long(void*, long, CFileInfo*)>("?GetFileInfo@devapi@@YAJPEAXJPEAUCFileInfo@@@Z");
   ASSERT_TRUE(open && destroy && abort && set_speed && get_info);

@@ -7,7 +7,7 @@
 #include <cstring>
 #include <ctime>
 #include <filesystem>
-#include <fstream>
+#include <ostream>
 #include <string>
 #include <vector>
 
@@ -57,17 +57,18 @@ struct Amount {
   std::vector<std::string> switches;
 };
 
+std::ostream& operator<<(std::ostream& out, const Amount& amount) { return out << amount.files; }
+
 class ApiFileListOf : public testing::TestWithParam<Amount> {};
 
 TEST_P(ApiFileListOf, TellsNamesSizesAndTimes) {
-  const bed::TempFolder folder;
+  bed::TempFolder folder;
   for (size_t i = 0; i < GetParam().files; ++i) {
     folder.Write(NumberedName(i), host::Content(i * i * 7));
     SetModified(folder / NumberedName(i), kTime + static_cast<__time64_t>(i) * kTimeStep);
   }
   std::vector<std::string> arguments = {"quorin", "--folder", folder.unix_path()};
-  arguments.insert(
-      arguments.end(), GetParam().switches.begin(), GetParam().switches.end());
+  arguments.insert(arguments.end(), GetParam().switches.begin(), GetParam().switches.end());
   const bed::SimulatedPort port(arguments);
   const host::Receiver receiver(port);
 
@@ -118,10 +119,7 @@ TEST(ApiFileList, NamesBeyondAsciiComeAndGo) {
   const std::u8string utf8 = u8"Gr\u00F6\u00DFe.log";
   const std::string bytes(utf8.begin(), utf8.end());
   const std::string content = host::Content(700);
-  const bed::TempFolder folder;
-  std::ofstream(folder.path() / utf8, std::ios::binary) << content;
-  const bed::SimulatedPort port(
-      {"quorin", "--speed", "115200", "--folder", folder.unix_path()});
+  const bed::SimulatedPort port({"quorin", "--speed", "115200"}, {{bytes, content}});
   const host::Receiver receiver(port, CBR_115200);
 
   const host::FileList list(receiver.get());
@@ -209,28 +207,37 @@ TEST(ApiFileList, UnknownListsAreRefused) {
   EXPECT_EQ(count, -7);
 }
 
-// Runs on a thread of its own that does not come back from the exception.
-DWORD ExceptionOf(void* list, long index) {
-  static DWORD code;
-  static void* current_list;
-  static long current_index;
-  code = 0;
-  current_list = list;
-  current_index = index;
-  void* const handler = AddVectoredExceptionHandler(1, [](EXCEPTION_POINTERS* raised) -> LONG {
-    if (raised->ExceptionRecord->ExceptionFlags != EXCEPTION_NONCONTINUABLE) {
-      return EXCEPTION_CONTINUE_SEARCH;
-    }
-    code = raised->ExceptionRecord->ExceptionCode;
+// The structured exception that GetFileInfo raises; code 0 for none.
+struct Raised {
+  void* list;
+  long index;
+  DWORD code;
+  DWORD flags;
+};
+
+// The call runs on a thread of its own, which the exception ends. A handler that is never left
+// stays installed for ever, so it looks at nothing but the calls made here.
+Raised CallGetFileInfo(void* list, long index) {
+  static Raised* current = nullptr;
+  static thread_local bool calling = false;
+  Raised raised{list, index, 0, 0};
+  current = &raised;
+  static void* const handler = AddVectoredExceptionHandler(1, [](EXCEPTION_POINTERS* at) -> LONG {
+    if (!calling) return EXCEPTION_CONTINUE_SEARCH;
+    current->code = at->ExceptionRecord->ExceptionCode;
+    current->flags = at->ExceptionRecord->ExceptionFlags;
     ExitThread(0);
   });
+  EXPECT_NE(handler, nullptr);
   const HANDLE thread = CreateThread(
       nullptr,
       0,
       [](void*) -> DWORD {
+        calling = true;
         CFileInfo info{};
-        devapi::GetFileInfo(current_list, current_index, &info);
+        devapi::GetFileInfo(current->list, current->index, &info);
         SysFreeString(info.bstrName);
+        calling = false;
         return 0;
       },
       nullptr,
@@ -238,8 +245,7 @@ DWORD ExceptionOf(void* list, long index) {
       nullptr);
   WaitForSingleObject(thread, INFINITE);
   CloseHandle(thread);
-  RemoveVectoredExceptionHandler(handler);
-  return code;
+  return raised;
 }
 
 TEST(ApiFileList, EntriesAreReadWithinBoundsOnly) {
@@ -255,9 +261,12 @@ TEST(ApiFileList, EntriesAreReadWithinBoundsOnly) {
   EXPECT_EQ(devapi::GetFilesCount(list, nullptr), E_INVALIDARG);
   EXPECT_EQ(info.bstrName, nullptr);
 
-  EXPECT_EQ(ExceptionOf(list, 0), 0U);
-  EXPECT_EQ(ExceptionOf(list, -1), 0xC000008CU);
-  EXPECT_EQ(ExceptionOf(list, LONG_MIN), 0xC000008CU);
+  EXPECT_EQ(CallGetFileInfo(list, 0).code, 0U);
+  for (const long index : {-1L, LONG_MIN}) {
+    const Raised raised = CallGetFileInfo(list, index);
+    EXPECT_EQ(raised.code, 0xC000008CU);
+    EXPECT_EQ(raised.flags, DWORD{EXCEPTION_NONCONTINUABLE});
+  }
 
   CFileInfo again{};
   EXPECT_EQ(devapi::GetFileInfo(list, 0, &info), S_OK);

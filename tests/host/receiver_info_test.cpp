@@ -4,6 +4,7 @@
 #include <windows.h>
 
 #include <cstring>
+#include <ostream>
 #include <string>
 
 #include "rcvlink.h"
@@ -78,6 +79,8 @@ struct Model {
   unsigned variant;
 };
 
+std::ostream& operator<<(std::ostream& out, const Model& model) { return out << model.text; }
+
 class ApiReceiverInfoOfModel : public testing::TestWithParam<Model> {};
 
 TEST_P(ApiReceiverInfoOfModel, TellsTheVariant) {
@@ -134,8 +137,8 @@ TEST(ApiReceiverInfo, AbortEventEndsTheWaitForTheLock) {
 
   host::Event abort_event;
   CReceiverInfo info = FilledRecord();
-  auto asked = host::OnThread(
-      [&] { return devapi::GetReceiverInfo(handle, abort_event.get(), &info); });
+  auto asked =
+      host::OnThread([&] { return devapi::GetReceiverInfo(handle, abort_event.get(), &info); });
   report.WaitFor("CQuorinProtocol::GetReceiverInfo");
   abort_event.Set();
   EXPECT_EQ(asked.get(), S_FALSE);

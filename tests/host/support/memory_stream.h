@@ -15,11 +15,11 @@ namespace host {
 // Lives on the stack of a test: nobody frees it by counting references.
 class MemoryStream : public IStream {
  public:
-  std::string bytes;                 // what came so far
-  size_t writes = 0;                 // how often Write was called
-  size_t fail_at_write = SIZE_MAX;   // the write (from 0) that fails, and all after it
-  size_t other_calls = 0;            // calls of anything but Write
-  DWORD thread = 0;                  // the thread of the last Write
+  std::string bytes;                // what came so far
+  size_t writes = 0;                // how often Write was called
+  size_t fail_at_write = SIZE_MAX;  // the write (from 0) that fails, and all after it
+  size_t other_calls = 0;           // calls of anything but Write
+  DWORD thread = 0;                 // the thread of the last Write
   HRESULT failure = STG_E_MEDIUMFULL;
 
   HRESULT STDMETHODCALLTYPE QueryInterface(REFIID id, void** object) override;

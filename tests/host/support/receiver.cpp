@@ -1,12 +1,17 @@
 #include "tests/host/support/receiver.h"
 
 #include <algorithm>
+#include <chrono>
+#include <thread>
 
 namespace host {
 namespace {
 
 // The last that a host says in its greeting, as the receiver takes it.
 constexpr const char* kEndOfGreeting = " echo /dev/null\n";
+
+constexpr auto kPatience = std::chrono::seconds(20);
+constexpr auto kPollInterval = std::chrono::milliseconds(5);
 
 std::wstring TakeText(wchar_t* text) {
   std::wstring copy = text == nullptr ? L"" : text;
@@ -49,6 +54,24 @@ Receiver::Receiver(const bed::SimulatedPort& port, DWORD speed) : port_(port) {
 
 Receiver::~Receiver() {
   if (handle_ != nullptr) devapi::CloseReceiver(handle_);
+}
+
+void Receiver::WaitForSent(size_t count) const {
+  WaitUntil([count](const Lines& sent) { return sent.size() >= count; });
+}
+
+void Receiver::WaitForLastSent(std::string_view line) const {
+  WaitUntil([line](const Lines& sent) { return !sent.empty() && sent.back() == line; });
+}
+
+void Receiver::WaitUntil(const std::function<bool(const Lines& sent)>& done) const {
+  const auto end = std::chrono::steady_clock::now() + kPatience;
+  while (!done(SentSince())) {
+    if (std::chrono::steady_clock::now() > end) {
+      throw bed::Error("the host has not sent that:\n" + port_.Transcript());
+    }
+    std::this_thread::sleep_for(kPollInterval);
+  }
 }
 
 HRESULT Receiver::Download(const std::wstring& name, IStream& stream, Progress* progress) const {

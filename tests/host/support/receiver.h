@@ -7,6 +7,7 @@
 #include <functional>
 #include <future>
 #include <string>
+#include <string_view>
 #include <utility>
 
 #include "rcvlink.h"
@@ -71,6 +72,10 @@ class Receiver {
   // What has passed since the greeting.
   Lines WireSince() const { return WireLines(port_.Transcript(), greeting_); }
   Lines SentSince() const { return SentByHost(port_.Transcript(), greeting_); }
+  // Wait until the host has sent so many lines since, or such a line last; raise bed::Error when
+  // that does not come.
+  void WaitForSent(size_t count) const;
+  void WaitForLastSent(std::string_view line) const;
 
   HRESULT Download(const std::wstring& name, IStream& stream, Progress* progress = nullptr) const;
   Identity Identify() const;
@@ -78,6 +83,8 @@ class Receiver {
   long Check() const;
 
  private:
+  void WaitUntil(const std::function<bool(const Lines& sent)>& done) const;
+
   const bed::SimulatedPort& port_;
   void* handle_ = nullptr;
   size_t greeting_ = 0;  // how many lines of the transcript it took

@@ -1,0 +1,119 @@
+// The program with a Velmar receiver, whose refusals the library does not tell.
+#include <nlohmann/json.hpp>
+
+#include "tests/cli_run/cli.h"
+
+namespace cli_run {
+namespace {
+
+using nlohmann::json;
+using testing::ElementsAre;
+using testing::HasSubstr;
+using testing::IsEmpty;
+
+class VelmarCli : public Cli {
+ protected:
+  bed::ProgramResult RunOn(const bed::SimulatedPort& receiver,
+                           std::vector<std::string> arguments) const {
+    arguments.insert(arguments.end(), {"--protocol", "velmar"});
+    return Cli::RunOn(receiver, std::move(arguments));
+  }
+  std::vector<std::string> NamesOn(const bed::SimulatedPort& receiver) const {
+    std::vector<std::string> names;
+    for (const json& file : json::parse(RunOn(receiver, {"ls", "--json"}).output)) {
+      names.push_back(file.at("name"));
+    }
+    return names;
+  }
+};
+
+TEST_F(VelmarCli, FindAndInfoTellTheFamily) {
+  const bed::SimulatedPort receiver({"velmar", "--id", "VM7", "--model", "VR9"});
+  const auto found = RunOn(receiver, {"find"});
+  EXPECT_EQ(found.status, kDone) << found.errors;
+  EXPECT_THAT(found.output, HasSubstr("Velmar receiver, model VR9, id VM7"));
+
+  const auto result = RunOn(receiver, {"info", "--json"});
+  ASSERT_EQ(result.status, kDone) << result.errors;
+  const json info = json::parse(result.output);
+  EXPECT_EQ(info.at("protocol"), "velmar");
+  EXPECT_EQ(info.at("id"), "VM7");
+  EXPECT_EQ(info.at("model"), "VR9");
+  EXPECT_EQ(info.at("features"), 13);
+  EXPECT_EQ(info.at("variant"), 2);
+  EXPECT_EQ(info.at("renaming"), true);
+}
+
+TEST_F(VelmarCli, ListShowsNamesSizesAndTotal) {
+  const bed::SimulatedPort receiver({"velmar"}, {{"a.log", Content(700)}, {"b.log", Content(30)}});
+  const auto result = RunOn(receiver, {"ls"});
+  EXPECT_EQ(result.status, kDone) << result.errors;
+  EXPECT_THAT(result.output, HasSubstr("a.log"));
+  EXPECT_THAT(result.output, HasSubstr("b.log"));
+  EXPECT_THAT(result.output, HasSubstr("2 files, 730 bytes"));
+}
+
+TEST_F(VelmarCli, GetBringsTheFile) {
+  const bed::SimulatedPort receiver({"velmar"}, {{"a.log", Content(3000)}});
+  const auto result = RunOn(receiver, {"get", "a.log"});
+  EXPECT_EQ(result.status, kDone) << result.errors;
+  EXPECT_EQ(folder.Read("a.log"), Content(3000));
+  EXPECT_THAT(LocalFiles(), ElementsAre("a.log"));
+}
+
+TEST_F(VelmarCli, AFileOfAnotherSizeThanListedIsAFailure) {
+  const bed::SimulatedPort receiver({"velmar", "--lie-size", "a.log=4000"},
+                                    {{"a.log", Content(3000)}});
+  const auto result = RunOn(receiver, {"get", "a.log"});
+  EXPECT_EQ(result.status, kFailed);
+  EXPECT_THAT(result.errors, HasSubstr("listed 4000 bytes, but 3000 arrived"));
+  EXPECT_THAT(LocalFiles(), IsEmpty());
+}
+
+TEST_F(VelmarCli, MoveRenamesTheFile) {
+  const bed::SimulatedPort receiver({"velmar"}, {{"a.log", "a"}, {"b.log", "b"}});
+  const auto result = RunOn(receiver, {"mv", "a.log", "c.log"});
+  EXPECT_EQ(result.status, kDone) << result.errors;
+  EXPECT_THAT(NamesOn(receiver), testing::UnorderedElementsAre("b.log", "c.log"));
+}
+
+TEST_F(VelmarCli, ARefusedMoveIsNoticed) {
+  const bed::SimulatedPort receiver({"velmar", "--refuse", "rename"}, {{"a.log", "a"}});
+  const auto result = RunOn(receiver, {"mv", "a.log", "c.log"});
+  EXPECT_EQ(result.status, kFailed);
+  EXPECT_THAT(result.errors, HasSubstr("its directory does not show it"));
+}
+
+TEST_F(VelmarCli, RemoveDeletesTheFile) {
+  const bed::SimulatedPort receiver({"velmar"}, {{"a.log", "a"}, {"b.log", "b"}});
+  const auto result = RunOn(receiver, {"rm", "a.log"});
+  EXPECT_EQ(result.status, kDone) << result.errors;
+  EXPECT_THAT(NamesOn(receiver), ElementsAre("b.log"));
+}
+
+TEST_F(VelmarCli, ARefusedRemoveIsNoticed) {
+  const bed::SimulatedPort receiver({"velmar", "--refuse", "del"}, {{"a.log", "a"}});
+  const auto result = RunOn(receiver, {"rm", "a.log"});
+  EXPECT_EQ(result.status, kFailed);
+  EXPECT_THAT(result.errors, HasSubstr("a.log"));
+  EXPECT_THAT(result.errors, HasSubstr("still has the file"));
+}
+
+// The families number parities the other way round.
+TEST_F(VelmarCli, ParitiesReachTheReceiverInItsOwnWords) {
+  const bed::SimulatedPort receiver({"velmar"});
+  EXPECT_EQ(RunOn(receiver, {"set", "parity", "even"}).status, kDone);
+  EXPECT_THAT(receiver.Transcript(), HasSubstr(R"(> COM 9600 E 8 1 N\r)"));
+  EXPECT_EQ(RunOn(receiver, {"set", "parity", "odd"}).status, kDone);
+  EXPECT_THAT(receiver.Transcript(), HasSubstr(R"(> COM 9600 O 8 1 N\r)"));
+}
+
+TEST_F(VelmarCli, TheRtsLineIsRefusedWithASentence) {
+  const bed::SimulatedPort receiver({"velmar"});
+  const auto result = RunOn(receiver, {"set", "rts", "off"});
+  EXPECT_EQ(result.status, kFailed);
+  EXPECT_THAT(result.errors, HasSubstr("a Velmar receiver does not offer to control its RTS line"));
+}
+
+}  // namespace
+}  // namespace cli_run

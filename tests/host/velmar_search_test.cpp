@@ -1,0 +1,98 @@
+// Velmar receivers on serial ports: which family is asked for, in which order.
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+#include <windows.h>
+
+#include <string>
+
+#include "rcvlink.h"
+#include "tests/host/support/receiver.h"
+#include "tests/host/support/report.h"
+
+using testing::ElementsAre;
+using testing::ElementsAreArray;
+
+namespace {
+
+constexpr const char* kFirstQuestion = R"(interfacemode thisport novatel novatel on\r)";
+constexpr const char* kSecondQuestion = R"(unlogall thisport\r)";
+
+class ApiVelmarSearch : public testing::Test {
+ protected:
+  ~ApiVelmarSearch() override {
+    if (handle_ != nullptr) devapi::CloseReceiver(handle_);
+  }
+
+  long Create(EProtocol protocol) {
+    std::wstring name = port_.name();
+    DCB settings = host::Settings(CBR_9600);
+    return devapi::CreateReceiverOnSerial(name.data(), protocol, &settings, nullptr, &handle_);
+  }
+  host::Lines Sent() const { return host::SentByHost(port_.Transcript()); }
+  std::string Told(const std::string& step) const {
+    return "CreateReceiverOnSerial - " + step + " [" + host::Narrow(port_.name()) + "]";
+  }
+  void ExpectSteps(const host::Lines& steps) const {
+    host::Lines expected;
+    for (const std::string& step : steps) expected.push_back(Told(step));
+    EXPECT_THAT(report_.LinesWith("CreateReceiverOnSerial"), ElementsAreArray(expected));
+  }
+
+  const bed::SimulatedPort port_{{"velmar"}};
+  const host::Report report_;
+  void* handle_ = nullptr;
+};
+
+TEST_F(ApiVelmarSearch, FindsItWithoutAWordOfTheOtherFamily) {
+  ASSERT_EQ(Create(eProtocolVelmar), S_OK);
+  EXPECT_NE(handle_, nullptr);
+  ExpectSteps(
+      {"opening serial port", "looking for Velmar receiver", "Velmar receiver found", "OK"});
+  EXPECT_THAT(Sent(), ElementsAre(kFirstQuestion, kSecondQuestion));
+
+  short answer = 7;
+  EXPECT_EQ(devapi::CheckConnection(handle_, nullptr, &answer), S_OK);
+  EXPECT_EQ(answer, VARIANT_TRUE);
+  EXPECT_THAT(Sent(),
+              ElementsAre(kFirstQuestion, kSecondQuestion, kFirstQuestion, kSecondQuestion));
+}
+
+TEST_F(ApiVelmarSearch, AnyFamilyIsQuorinFirst) {
+  ASSERT_EQ(Create(eProtocolAny), S_OK);
+  ExpectSteps({"opening serial port",
+               "looking for Quorin receiver",
+               "looking for Velmar receiver",
+               "Velmar receiver found",
+               "OK"});
+  CReceiverInfo info{};
+  ASSERT_EQ(devapi::GetReceiverInfo(handle_, nullptr, &info), S_OK);
+  EXPECT_EQ(info.dwProtocol, 2U);
+  SysFreeString(info.bstrReceiverId);
+  SysFreeString(info.bstrModel);
+}
+
+TEST_F(ApiVelmarSearch, IsNotAskedWhereQuorinIsWanted) {
+  EXPECT_EQ(Create(eProtocolQuorin), S_FALSE);
+  EXPECT_EQ(handle_, nullptr);
+  ExpectSteps({"opening serial port", "looking for Quorin receiver"});
+  const std::string transcript = port_.Transcript();
+  EXPECT_NE(transcript.find("dm"), std::string::npos) << "it was not asked at all";
+  EXPECT_EQ(transcript.find("interfacemode"), std::string::npos) << transcript;
+  EXPECT_EQ(transcript.find("unlogall"), std::string::npos) << transcript;
+}
+
+// A receiver that refuses the second question is none. (The first one's answer, which nobody waits
+// for, could be taken for it.)
+TEST(ApiVelmarSearchRefused, IsNoReceiver) {
+  const bed::SimulatedPort port({"velmar", "--mute", "interfacemode", "--refuse", "unlogall"});
+  std::wstring name = port.name();
+  DCB settings = host::Settings(CBR_9600);
+  void* handle = nullptr;
+  EXPECT_EQ(
+      devapi::CreateReceiverOnSerial(name.data(), eProtocolVelmar, &settings, nullptr, &handle),
+      S_FALSE);
+  EXPECT_EQ(handle, nullptr);
+  EXPECT_THAT(host::SentByHost(port.Transcript()), ElementsAre(kFirstQuestion, kSecondQuestion));
+}
+
+}  // namespace
