@@ -185,6 +185,14 @@ CSetPortParamsCmd::CSetPortParamsCmd(const char*,
                      .c_str());
 }
 
+CSetPortParamsCmd::CSetPortParamsCmd(const PortConfigLog& settings)
+    : CSetPortParamsCmd(ToNarrow(settings.port_name).c_str(),
+                        static_cast<uint32_t>(settings.baud),
+                        settings.parity,
+                        settings.data_bits,
+                        settings.stop_bits,
+                        settings.handshake) {}
+
 CSetInterfacemodeCommand::CSetInterfacemodeCommand()
     : CVelmarCommand("interfacemode thisport novatel novatel on\r", kPlain) {
   Trace(L"CSetInterfacemodeCommand::CSetInterfacemodeCommand\r\n");

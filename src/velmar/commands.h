@@ -125,6 +125,7 @@ class CSetPortParamsCmd : public CVelmarCommand {
                     uint8_t data_bits,
                     uint8_t stop_bits,
                     uint8_t handshake);
+  explicit CSetPortParamsCmd(const PortConfigLog& settings);
 };
 
 // Makes the port speak this language both ways.

@@ -3,10 +3,12 @@
 #include <algorithm>
 #include <cstdint>
 #include <string>
+#include <string_view>
 
 #include "platform/hresult.h"
 #include "platform/text.h"
 #include "report/report_file.h"
+#include "transport/abort_shield.h"
 #include "velmar/velmar_protocol.h"
 
 #include <objidl.h>
@@ -36,6 +38,14 @@ uint8_t Percent(uint32_t total, uint32_t remaining) {
   return static_cast<uint8_t>((total - remaining) * kComplete / total);
 }
 
+// Whether the receiver refused, with an error text or without: the response type tells only the
+// second.
+bool IsRefusal(const CVelmarCommand& command) {
+  constexpr std::string_view kRefusal = "\r\n<ERROR:";
+  const uint8_t* const reply = command.GetReply();
+  return reply && std::string(reply, reply + command.GetReplyLength()).starts_with(kRefusal);
+}
+
 }  // namespace
 
 struct CVelmarProtocol::TransferContext {
@@ -54,55 +64,78 @@ HRESULT CVelmarProtocol::DownloadFile(const wchar_t* name, IStream* stream, CPro
     Trace(L"CVelmarProtocol::DownloadFile - connection is locked [0x%p]\r\n",
           connection_lock_.handle());
     ReportProgress(0);
-    EInstanceType link = eInstanceAny;
-    ThrowIfFailed(connection()->GetInstanceType(&link));
-    const DWORD saved_speed = link == eInstanceSerial ? RaiseSpeed() : 0;
-    const HRESULT result = CatchResult([&] { return Transfer(name, stream); });
-    if (saved_speed == 0 || saved_speed >= kTransferSpeed) return result;
-    // What the put-back gives replaces what the transfer gave.
-    return RestoreSpeed(saved_speed, result == S_OK);
+    const HRESULT result = CatchResult([&] { return DownloadLocked(name, stream); });
+    // An abort of this download ends no wait of the next operation; its flag stays for it.
+    if (IsAborted()) DropCancel();
+    return result;
   });
 }
 
+HRESULT CVelmarProtocol::DownloadLocked(const wchar_t* name, IStream* stream) {
+  EInstanceType link = eInstanceAny;
+  ThrowIfFailed(connection()->GetInstanceType(&link));
+  const DWORD saved_speed = link == eInstanceSerial ? RaiseSpeed() : 0;
+  bool is_sending = false;
+  const HRESULT result = CatchResult([&] { return Transfer(name, stream, &is_sending); });
+  if (saved_speed == 0 || saved_speed >= kTransferSpeed) return result;
+  // What the put-back gives replaces what the transfer gave.
+  return RestoreSpeed(saved_speed, result == S_OK && !is_sending);
+}
+
 // Raises the receiver, then the host. Gives the speed to go back to, 0 when nothing was raised: the
-// transfer then runs at the old speed.
+// transfer then runs at the old speed. An abort ahead of the change raises S_FALSE.
 DWORD CVelmarProtocol::RaiseSpeed() {
   DWORD speed = 0;
   ThrowIfFailed(connection()->GetSpeed(&speed));
   if (static_cast<int32_t>(speed) >= static_cast<int32_t>(kTransferSpeed)) return 0;
 
-  // A receiver that refused, or did not say on which port it is, was not raised, and the host must not
-  // be either.
-  bool sent = false;
-  HRESULT raised = ChangeReceiverSpeed(kTransferSpeed, &sent);
-  if (SUCCEEDED(raised) && !sent) raised = S_FALSE;
-  if (raised != S_OK) {
-    Trace(L"CVelmarProtocol::DownloadFile - receiver speed up is failed [0x%08X]\r\n", raised);
+  bool changed = false;
+  const HRESULT raised = ChangeReceiverSpeed(kTransferSpeed, OnAbort::kEnd, &changed);
+  if (raised == S_FALSE) throw HResultError(S_FALSE);
+  // A receiver that refused, or did not say on which port it is, was not raised: raising the host
+  // would cut the link.
+  if (!changed) {
+    const HRESULT failure = FAILED(raised) ? raised : S_FALSE;
+    Trace(L"CVelmarProtocol::DownloadFile - receiver speed up is failed [0x%08X]\r\n", failure);
     return 0;
   }
   const HRESULT followed = connection()->SetSpeed(kTransferSpeed);
   if (FAILED(followed)) {
     Trace(L"CVelmarProtocol::DownloadFile - host speed up is failed [0x%08X]\r\n", followed);
-    ChangeReceiverSpeed(speed, &sent);
+    ChangeReceiverSpeed(speed, OnAbort::kKeep, &changed);
     return 0;
   }
   return speed;
 }
 
 HRESULT CVelmarProtocol::RestoreSpeed(DWORD saved_speed, bool transfer_ended) {
-  // An abort of the transfer must not cut off the put-back; its flag stays for the next operation.
-  if (IsAborted()) DropCancel();
   if (!transfer_ended) {
     // A receiver that still sends the file would answer the put-back behind it.
     CUnlogAllCommand stop_sending;
-    ExecuteCommand(stop_sending);
+    ExecuteUndisturbed(stop_sending);
   }
-  bool sent = false;
-  const HRESULT result = ChangeReceiverSpeed(saved_speed, &sent);
+  bool changed = false;
+  const HRESULT result = ChangeReceiverSpeed(saved_speed, OnAbort::kKeep, &changed);
   return FAILED(result) ? result : connection()->SetSpeed(saved_speed);
 }
 
-HRESULT CVelmarProtocol::Transfer(const wchar_t* name, IStream* stream) {
+HRESULT CVelmarProtocol::ChangeReceiverSpeed(DWORD speed, OnAbort on_abort, bool* changed) {
+  *changed = false;
+  return CatchResult([&] {
+    CLogConfigCommand get_config;
+    const HRESULT asked =
+        on_abort == OnAbort::kEnd ? ExecuteCommand(get_config) : ExecuteUndisturbed(get_config);
+    PortConfigLog settings = get_config.Config();
+    if (asked != S_OK || settings.port_name.empty()) return asked;
+    settings.baud = static_cast<int>(speed);
+    CSetPortParamsCmd set_port(settings);
+    const HRESULT result = ExecuteUndisturbed(set_port);
+    *changed = result == S_OK && !IsRefusal(set_port);
+    return result;
+  });
+}
+
+HRESULT CVelmarProtocol::Transfer(const wchar_t* name, IStream* stream, bool* is_sending) {
   CSetCurrentFileCmd set_current(ToNarrow(name).c_str());
   HRESULT result = ExecuteCommand(set_current);
   ThrowIfFailed(result);
@@ -115,8 +148,10 @@ HRESULT CVelmarProtocol::Transfer(const wchar_t* name, IStream* stream) {
       TransferContext context{this, nullptr, AddReference(stream), total, total, 0};
       CReadFileCmd read_file(this, &context);
       context.read_command = &read_file;
+      *is_sending = true;
       result = ExecuteCommand(read_file);
       ThrowIfFailed(result);
+      *is_sending = read_file.Response() != RESPONSE_DATA;
     }
   }
   // Also for a file that the receiver does not know: the stream stays empty, and that is no

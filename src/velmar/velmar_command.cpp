@@ -94,7 +94,8 @@ HRESULT CVelmarCommand::ReceiveReply(CIConnection* connection, HANDLE abort_even
         Trace(L"CVelmarCommand::Execute - read failed [0x%08X]\r\n", read);
         if (read != kTimedOut) return read;
       }
-      if (IsCancelled(abort_event)) return S_FALSE;
+      // The cancel may have come ahead of this command and ended its wait all the same.
+      if (read == S_FALSE || IsCancelled(abort_event)) return S_FALSE;
       if (count == 0) break;
       if (keep_reply && !receiving.Keep(count)) return E_OUTOFMEMORY;
       receiving.Hold(count);

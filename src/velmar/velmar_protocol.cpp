@@ -2,7 +2,6 @@
 
 #include <mutex>
 #include <string>
-#include <string_view>
 #include <utility>
 
 #include "platform/event.h"
@@ -31,13 +30,6 @@ void DumpInvalidResponse(HRESULT result, CIConnection* connection, const CVelmar
         name.c_str());
 }
 
-// Whether the receiver refused, with an error text or without: the response type tells only the second.
-bool IsRefusal(const CVelmarCommand& command) {
-  constexpr std::string_view kRefusal = "\r\n<ERROR:";
-  const uint8_t* const reply = command.GetReply();
-  return reply && std::string(reply, reply + command.GetReplyLength()).starts_with(kRefusal);
-}
-
 }  // namespace
 
 CVelmarProtocol::CVelmarProtocol(std::unique_ptr<CIConnection> connection)
@@ -45,6 +37,13 @@ CVelmarProtocol::CVelmarProtocol(std::unique_ptr<CIConnection> connection)
 
 HRESULT CVelmarProtocol::ExecuteCommand(CVelmarCommand& command) {
   const HRESULT result = ExecuteAsCurrent(command);
+  DumpInvalidResponse(result, connection(), command);
+  return result;
+}
+
+HRESULT CVelmarProtocol::ExecuteUndisturbed(CVelmarCommand& command) {
+  const AbortShield shield(connection());
+  const HRESULT result = command.Execute(connection(), nullptr);
   DumpInvalidResponse(result, connection(), command);
   return result;
 }
@@ -73,7 +72,7 @@ HRESULT CVelmarProtocol::CheckConnection(HANDLE abort_event, short* answer) {
   if (const HRESULT locked = LockConnection(abort_event); locked < 0 || locked == S_FALSE) {
     return locked;
   }
-  UseUpCancel();
+  DropEarlierCancel();
   *answer = Probe(connection(), abort_event) ? VARIANT_TRUE : VARIANT_FALSE;
   UnlockConnection();
   return S_OK;
@@ -101,6 +100,7 @@ void CVelmarProtocol::ReadIdentity(HANDLE abort_event, CReceiverInfo* info) {
   const HRESULT locked = LockConnection(abort_event);
   if (locked < 0 || locked == S_FALSE) throw HResultError(locked);
   ReportProgress(0);
+  DropEarlierCancel();
   CGetReceiverInfoCmd get_info;
   ThrowIfFailed(ExecuteCommand(get_info));
   ThrowIfAborted();
@@ -120,6 +120,7 @@ HRESULT CVelmarProtocol::GetFiles(CFileList* files) {
   return CatchResult([&] {
     const MutexGuard guard(connection_lock_);
     ReportProgress(0);
+    DropEarlierCancel();
     CGetFileListCmd get_list;
     ThrowIfFailed(ExecuteCommand(get_list));
     ThrowIfAborted();
@@ -135,6 +136,7 @@ HRESULT CVelmarProtocol::ChangeFile(MakeCommand make_command) {
   return CatchResult([&] {
     const MutexGuard guard(connection_lock_);
     ReportProgress(0);
+    DropEarlierCancel();
     auto command = make_command();
     ThrowIfFailed(ExecuteCommand(command));
     ThrowIfAborted();
@@ -160,43 +162,32 @@ void CVelmarProtocol::SetCallback(CIProtocolCallback* callback) {
   callback_ = callback;
 }
 
+// An abort between operations does not keep the next one's command from being sent: its flag is found
+// afterwards.
+void CVelmarProtocol::DropEarlierCancel() {
+  UseUpCancel();
+  if (IsAborted()) DropCancel();
+}
+
 void CVelmarProtocol::ThrowIfAborted() {
   if (TakeAbort()) throw HResultError(S_FALSE);
 }
 
 template <typename Change>
-HRESULT CVelmarProtocol::SendPortSettings(Change change, bool look_for_abort, bool* sent) {
-  const MutexGuard guard(connection_lock_);
-  CLogConfigCommand get_config;
-  ThrowIfFailed(ExecuteCommand(get_config));
-  if (look_for_abort) ThrowIfAborted();
-  PortConfigLog settings = get_config.Config();
-  if (settings.port_name.empty()) return S_OK;
-  change(settings);
-  CSetPortParamsCmd set_params(ToNarrow(settings.port_name).c_str(),
-                               static_cast<uint32_t>(settings.baud),
-                               settings.parity,
-                               settings.data_bits,
-                               settings.stop_bits,
-                               settings.handshake);
-  const HRESULT result = ExecuteCommand(set_params);
-  ThrowIfFailed(result);
-  *sent = result == S_OK && !IsRefusal(set_params);
-  return S_OK;
-}
-
-template <typename Change>
 HRESULT CVelmarProtocol::ChangePort(Change change) {
   if (!connection()) return kNotConnected;
-  bool sent = false;
-  return CatchResult([&] { return SendPortSettings(change, true, &sent); });
-}
-
-HRESULT CVelmarProtocol::ChangeReceiverSpeed(DWORD speed, bool* sent) {
-  // The abort flag is for the next operation to find, not for a part of this one.
   return CatchResult([&] {
-    return SendPortSettings(
-        [&](PortConfigLog& settings) { settings.baud = static_cast<int>(speed); }, false, sent);
+    const MutexGuard guard(connection_lock_);
+    DropEarlierCancel();
+    CLogConfigCommand get_config;
+    ThrowIfFailed(ExecuteCommand(get_config));
+    ThrowIfAborted();
+    PortConfigLog settings = get_config.Config();
+    if (settings.port_name.empty()) return S_OK;
+    change(settings);
+    CSetPortParamsCmd set_port(settings);
+    ThrowIfFailed(ExecuteCommand(set_port));
+    return S_OK;
   });
 }
 

@@ -43,19 +43,26 @@ class CVelmarProtocol : public CAbstractProtocol, public VelmarCommands::CReadFi
   HRESULT ChangeFile(MakeCommand make_command);
 
   // Reads the port's settings and sends them back with one of them changed. S_OK also when the
-  // receiver did not say on which port it is; `*sent` tells
-  // whether it was sent and not refused.
-  template <typename Change>
-  HRESULT SendPortSettings(Change change, bool look_for_abort, bool* sent);
+  // receiver did not say on which port it is.
   template <typename Change>
   HRESULT ChangePort(Change change);
-  HRESULT ChangeReceiverSpeed(DWORD speed, bool* sent);
 
-  // The three parts of a download.
+  // The same for a download, which has to know what became of it: `*changed` tells whether the new
+  // speed was sent and not refused. The question is cut off by an abort (S_FALSE) or not, the change
+  // itself never is: it would leave the two ends at different speeds.
+  enum class OnAbort { kEnd, kKeep };
+  HRESULT ChangeReceiverSpeed(DWORD speed, OnAbort on_abort, bool* changed);
+  // Runs a command that no abort reaches.
+  HRESULT ExecuteUndisturbed(VelmarCommands::CVelmarCommand& command);
+
+  // A download and its three parts.
+  HRESULT DownloadLocked(const wchar_t* name, IStream* stream);
   DWORD RaiseSpeed();
-  HRESULT Transfer(const wchar_t* name, IStream* stream);
+  // `*is_sending` tells whether the receiver may still be sending the file.
+  HRESULT Transfer(const wchar_t* name, IStream* stream, bool* is_sending);
   HRESULT RestoreSpeed(DWORD saved_speed, bool transfer_ended);
 
+  void DropEarlierCancel();
   void ThrowIfAborted();
 };
 

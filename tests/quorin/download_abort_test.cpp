@@ -9,7 +9,7 @@
 
 #include "platform/hresult.h"
 #include "simulator/quorin/receiver.h"
-#include "tests/quorin/aborting_connection.h"
+#include "tests/support/aborting_connection.h"
 #include "tests/quorin/block_stream.h"
 #include "tests/quorin/quorin_driver.h"
 #include "tests/support/memory_stream.h"

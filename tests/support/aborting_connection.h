@@ -1,7 +1,7 @@
 // A simulated receiver's connection that lets an abort come at any of its calls, and cancels one
 // wait as a device does.
-#ifndef RCVLINK_TESTS_QUORIN_ABORTING_CONNECTION_H_
-#define RCVLINK_TESTS_QUORIN_ABORTING_CONNECTION_H_
+#ifndef RCVLINK_TESTS_SUPPORT_ABORTING_CONNECTION_H_
+#define RCVLINK_TESTS_SUPPORT_ABORTING_CONNECTION_H_
 
 #include <cstddef>
 #include <cstdint>
@@ -86,4 +86,4 @@ class AbortingConnection : public CIConnection {
   HANDLE abort_event_ = nullptr;
 };
 
-#endif  // RCVLINK_TESTS_QUORIN_ABORTING_CONNECTION_H_
+#endif  // RCVLINK_TESTS_SUPPORT_ABORTING_CONNECTION_H_

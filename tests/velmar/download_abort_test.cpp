@@ -1,0 +1,155 @@
+// An abort at each call of a whole download, against the simulated receiver.
+#include <gtest/gtest.h>
+
+#include <memory>
+#include <sstream>
+#include <string>
+#include <tuple>
+#include <utility>
+
+#include "platform/hresult.h"
+#include "simulator/velmar/receiver.h"
+#include "tests/support/aborting_connection.h"
+#include "tests/support/manual_clock.h"
+#include "tests/support/memory_stream.h"
+#include "velmar/velmar_protocol.h"
+
+namespace {
+
+constexpr wchar_t kName[] = L"A0101.pdc";
+constexpr size_t kSize = 3000;  // three chunks
+constexpr DWORD kSpeed = 9600;
+
+std::string Content() {
+  std::string content;
+  while (content.size() < kSize) content += std::to_string(content.size()) + " ";
+  content.resize(kSize);
+  return content;
+}
+
+sim::FileStore OneFile() {
+  sim::FileStore files;
+  files.Add("A0101.pdc", sim::ToBytes(Content()), 600000000);
+  return files;
+}
+
+// A driver, its link and the receiver at the other end.
+struct Bench {
+  explicit Bench(CancelledWrite cancelled_write, const sim::VelmarOptions& options = {})
+      : receiver(options, OneFile(), &transcript),
+        connection(new AbortingConnection(receiver, cancelled_write)),
+        driver(std::unique_ptr<CIConnection>(connection)) {
+    connection->abort = [this] { driver.Abort(); };
+  }
+
+  HRESULT Download() { return driver.DownloadFile(kName, &stream, nullptr); }
+  // Host and receiver are where they were, and understand each other.
+  void ExpectLinkAtOldSpeed() {
+    EXPECT_EQ(receiver.speed(), kSpeed);
+    EXPECT_EQ(connection->Speed(), kSpeed);
+  }
+
+  ManualClock clock;
+  std::ostringstream log;
+  sim::Transcript transcript{log};
+  sim::VelmarReceiver receiver;
+  AbortingConnection* connection;  // the driver's
+  CVelmarProtocol driver;
+  MemoryStream stream;
+};
+
+class VelmarDownloadAbort
+    : public testing::TestWithParam<std::tuple<CancelledWrite,
+                                               bool /*at the end of the call*/,
+                                               bool /*stops for commands*/>> {
+ protected:
+  CancelledWrite HowWritesAreCancelled() const { return std::get<0>(GetParam()); }
+  sim::VelmarOptions Options() const {
+    sim::VelmarOptions options;
+    options.stops_for_commands = std::get<2>(GetParam());
+    return options;
+  }
+
+  // How many calls a download has when nothing comes between.
+  size_t CountCalls() const {
+    Bench bench(HowWritesAreCancelled(), Options());
+    EXPECT_EQ(bench.Download(), S_OK);
+    EXPECT_EQ(bench.stream.bytes, Content());
+    bench.ExpectLinkAtOldSpeed();
+    return bench.connection->calls;
+  }
+  // Downloads with an abort at this call, then whatever the test wants; until one fails.
+  template <typename Check>
+  void AbortAtEachCall(Check check) const {
+    const size_t calls = CountCalls();
+    ASSERT_GT(calls, 20U);
+    for (size_t call = 0; call < calls; ++call) {
+      SCOPED_TRACE("abort at call " + std::to_string(call));
+      Bench bench(HowWritesAreCancelled(), Options());
+      bench.connection->abort_at = call;
+      bench.connection->at_end = std::get<1>(GetParam());
+      const HRESULT result = bench.Download();
+      check(bench, result);
+      if (testing::Test::HasFailure()) FAIL() << bench.log.str();
+    }
+  }
+};
+
+TEST_P(VelmarDownloadAbort, LeavesBothEndsAtTheOldSpeed) {
+  AbortAtEachCall([](Bench& bench, HRESULT result) {
+    EXPECT_GE(result, S_OK);
+    bench.ExpectLinkAtOldSpeed();
+    EXPECT_TRUE(Content().starts_with(bench.stream.bytes));
+  });
+}
+
+// The flag is left to the first operation that looks for it; that one still sends its command.
+TEST_P(VelmarDownloadAbort, EndsTheNextDeletionAfterItsCommand) {
+  AbortAtEachCall([](Bench& bench, HRESULT) {
+    EXPECT_EQ(bench.driver.DeleteFile(L"other.pdc"), S_FALSE);
+    EXPECT_TRUE(bench.log.str().find("> del file other.pdc\\r") != std::string::npos);
+    EXPECT_EQ(bench.driver.DeleteFile(L"other.pdc"), S_OK);
+  });
+}
+
+// A download does not look for the flag, and the cancel was its predecessor's.
+TEST_P(VelmarDownloadAbort, DoesNotDisturbTheNextDownload) {
+  AbortAtEachCall([](Bench& bench, HRESULT) {
+    bench.stream.bytes.clear();
+    EXPECT_EQ(bench.Download(), S_OK);
+    EXPECT_TRUE(bench.stream.bytes == Content());
+    bench.ExpectLinkAtOldSpeed();
+  });
+}
+
+TEST_P(VelmarDownloadAbort, DoesNotDisturbACheck) {
+  AbortAtEachCall([](Bench& bench, HRESULT) {
+    short answer = 0;
+    EXPECT_EQ(bench.driver.CheckConnection(nullptr, &answer), S_OK);
+    EXPECT_EQ(answer, VARIANT_TRUE);
+  });
+}
+
+// Until the receiver is told of the new speed, an abort ends the download: at 9600 bit/s it would
+// take minutes.
+TEST_P(VelmarDownloadAbort, BringsNothingOnceFoundAheadOfTheTransfer) {
+  AbortAtEachCall([](Bench& bench, HRESULT) {
+    if (bench.log.str().find("> log filetransferb") == std::string::npos) {
+      EXPECT_TRUE(bench.stream.bytes.empty());
+    }
+    // Aborted ahead of the speed-up, it has not even asked for the file.
+    if (bench.log.str().find("> COM 115200") == std::string::npos) {
+      EXPECT_EQ(bench.log.str().find("> currentfile"), std::string::npos);
+    }
+  });
+}
+
+INSTANTIATE_TEST_SUITE_P(All,
+                         VelmarDownloadAbort,
+                         testing::Combine(testing::Values(CancelledWrite::kCompletes,
+                                                          CancelledWrite::kIsLost,
+                                                          CancelledWrite::kIsSentAllTheSame),
+                                          testing::Bool(),
+                                          testing::Bool()));
+
+}  // namespace
