@@ -1,4 +1,4 @@
-// An abort at each call of a whole download, against the simulated receiver.
+// Aborts against the simulated receiver: at each call of a whole download, and between operations.
 #include <gtest/gtest.h>
 
 #include <memory>
@@ -151,5 +151,50 @@ INSTANTIATE_TEST_SUITE_P(All,
                                                           CancelledWrite::kIsSentAllTheSame),
                                           testing::Bool(),
                                           testing::Bool()));
+
+// A receiver that went silent may go on when nobody expects it: it is stopped ahead of the put-back.
+TEST(VelmarBrokenDownload, StopsAReceiverThatWentSilent) {
+  sim::VelmarOptions options;
+  options.faults.chunks = {{sim::VelmarChunkFaultKind::kSilence, /*chunk=*/1, /*times=*/1, 45000}};
+  Bench bench(CancelledWrite::kCompletes, options);
+  EXPECT_EQ(bench.Download(), S_OK);
+  EXPECT_EQ(bench.stream.bytes.size(), 1024U);
+  EXPECT_NE(bench.log.str().find("> unlogall thisport"), std::string::npos) << bench.log.str();
+  bench.ExpectLinkAtOldSpeed();
+}
+
+class VelmarAbortBetweenOperations : public testing::TestWithParam<CancelledWrite> {};
+
+// Each that looks for the flag sends its command all the same, and ends with S_FALSE then.
+TEST_P(VelmarAbortBetweenOperations, EndsTheNextAfterItsCommand) {
+  Bench bench(GetParam());
+  CVelmarProtocol& driver = bench.driver;
+  const auto expect_ended = [&](const std::string& command, auto operation) {
+    bench.log.str("");
+    driver.Abort();
+    EXPECT_EQ(operation(), S_FALSE) << command;
+    EXPECT_NE(bench.log.str().find("> " + command + "\\r\n< \\r\\n<"), std::string::npos)
+        << command << " was not sent and answered:\n"
+        << bench.log.str();
+  };
+  expect_ended("log versiona once", [&] {
+    CReceiverInfo info{};
+    return driver.GetReceiverInfo(nullptr, &info);
+  });
+  expect_ended("log direnta once", [&] {
+    CFileList files;
+    const HRESULT result = driver.GetFiles(&files);
+    EXPECT_EQ(files.Count(), 0);
+    return result;
+  });
+  expect_ended("rename a b", [&] { return driver.RenameFile(L"a", L"b"); });
+  expect_ended("del file a", [&] { return driver.DeleteFile(L"a"); });
+  expect_ended("log comconfiga once", [&] { return driver.DCSetRcvBaudrate(57600); });
+  EXPECT_EQ(bench.receiver.speed(), kSpeed);
+}
+
+INSTANTIATE_TEST_SUITE_P(All,
+                         VelmarAbortBetweenOperations,
+                         testing::Values(CancelledWrite::kCompletes, CancelledWrite::kIsLost));
 
 }  // namespace
