@@ -36,6 +36,11 @@ struct Context {
     if (!arguments.quiet && !arguments.json) err.Write(text);
   }
 
+  /// Tells what a reader of the result has to know, also one of JSON.
+  void Warn(const std::string& text) {
+    if (!arguments.quiet) err.Write(text);
+  }
+
   /// Reports a failure after which the command goes on; JSON has it in its document.
   void Complain(const Failure& failure) {
     if (!arguments.json) err.Write(Describe(failure));

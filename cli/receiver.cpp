@@ -38,6 +38,16 @@ long ReadEntry(void* list, long index, RemoteFile& file) {
   return S_OK;
 }
 
+/// Whether so many files may have filled the library's buffer for a Velmar directory, so that more of
+/// them got lost: from the lengths of their lines at the longest.
+bool MayBeCut(const std::vector<RemoteFile>& files) {
+  constexpr std::size_t kBuffer = 8192;
+  constexpr std::size_t kLongestLineBesidesName = 125;
+  std::size_t length = kLongestLineBesidesName;  // of the first that did not fit
+  for (const RemoteFile& file : files) length += kLongestLineBesidesName + file.name.size();
+  return length >= kBuffer;
+}
+
 }  // namespace
 
 bool Identity::offers_renaming() const { return (features & kRenameFeature) != 0; }
@@ -48,7 +58,8 @@ void Aborter::Tick() {
 }
 
 Receiver::Receiver(Context& context)
-    : interrupt_(context.interrupt),
+    : context_(context),
+      interrupt_(context.interrupt),
       handle_(FindReceiver(context)),
       cancel_watch_(Aborter::kInterval, [this, aborter = Aborter(handle())]() mutable {
         if (interrupt_.requested()) aborter.Tick();
@@ -86,6 +97,12 @@ std::vector<RemoteFile> Receiver::ListFiles() {
   for (long i = 0; i < count; ++i) {
     const long read = ReadEntry(list.get(), i, files[static_cast<std::size_t>(i)]);
     if (read != S_OK) throw FailureOf(kTried, read);
+  }
+  if (MayBeCut(files) && Identify().family == eProtocolVelmar) {
+    context_.Warn(
+        "Note: this list may be cut. A Velmar receiver's directory is read up to 8192 bytes, some "
+        "70 "
+        "files; those behind them appear when others have been deleted.\n");
   }
   return files;
 }

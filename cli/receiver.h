@@ -61,7 +61,7 @@ class Receiver {
   /// @throws Failure
   Identity Identify();
 
-  /// Reads the receiver's directory.
+  /// Reads the receiver's directory. Warns when some of it may be missing.
   /// @throws Failure
   std::vector<RemoteFile> ListFiles();
 
@@ -76,6 +76,7 @@ class Receiver {
     void operator()(void* handle) const { devapi::CloseReceiver(handle); }
   };
 
+  Context& context_;
   const Interrupt& interrupt_;
   std::unique_ptr<void, Closer> handle_;
   Ticker cancel_watch_;  // ends before the handle does

@@ -53,6 +53,30 @@ TEST_F(VelmarCli, ListShowsNamesSizesAndTotal) {
   EXPECT_THAT(result.output, HasSubstr("2 files, 730 bytes"));
 }
 
+// The library's buffer ends the list: whoever reads it has to know.
+TEST_F(VelmarCli, AListThatMayBeCutIsSaidToBe) {
+  Files files;
+  const auto add_until = [&](size_t count) {
+    while (files.size() < count) files.emplace("file" + std::to_string(100 + files.size()), "x");
+  };
+  add_until(30);
+  const bed::SimulatedPort few({"velmar"}, files);
+  EXPECT_THAT(RunOn(few, {"ls"}).errors, testing::Not(HasSubstr("may be cut")));
+  add_until(120);
+  const bed::SimulatedPort many({"velmar"}, files);
+  const auto result = RunOn(many, {"ls", "--json"});
+  EXPECT_EQ(result.status, kDone);
+  EXPECT_THAT(result.errors, HasSubstr("this list may be cut"));
+  const size_t listed = json::parse(result.output).size();
+  EXPECT_GT(listed, 50U);
+  EXPECT_LT(listed, files.size());
+
+  const bed::SimulatedPort quorin({"quorin"}, files);
+  const auto whole = Cli::RunOn(quorin, {"ls", "--json", "--protocol", "quorin"});
+  EXPECT_EQ(json::parse(whole.output).size(), files.size());
+  EXPECT_THAT(whole.errors, testing::Not(HasSubstr("may be cut")));
+}
+
 TEST_F(VelmarCli, GetBringsTheFile) {
   const bed::SimulatedPort receiver({"velmar"}, {{"a.log", Content(3000)}});
   const auto result = RunOn(receiver, {"get", "a.log"});
