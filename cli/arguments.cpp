@@ -143,6 +143,7 @@ void AddOptions(CLI::App& app, RawArguments& raw) {
   app.add_option("--report", raw.report, "Trace the library's doings into this file in %TEMP%")
       ->option_text("NAME");
   app.add_flag("--json", values.json, "Print one JSON value, errors included");
+  app.add_flag("--verbose", values.verbose, "Tell also why --link any went on to USB");
   app.add_flag("--quiet", values.quiet, "Print only errors and what was asked for");
 }
 
@@ -151,7 +152,10 @@ CLI::App* AddCommand(
   CLI::App* const sub = app.add_subcommand(std::move(name), std::move(description));
   sub->callback([&raw, command] { raw.values.command = command; });
   if (command != Command::kPorts) {
-    sub->add_option("PORT", raw.port, "The port's name, as in COM7")->required()->option_text(" ");
+    sub->add_option(
+           "PORT", raw.port, "The port's name, as in COM7; with --link usb the device's path")
+        ->required()
+        ->option_text(" ");
   }
   return sub;
 }

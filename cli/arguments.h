@@ -24,12 +24,13 @@ struct Arguments {
   bool all = false;                 ///< kGet: every file of the receiver
   bool force = false;               ///< kGet: overwrite
   SettingChange change;             ///< kSet
-  EInstanceType link = eInstanceSerial;
+  EInstanceType link = eInstanceSerial;  ///< any: serial, then USB, under the same name
   EProtocol protocol = eProtocolAny;
   std::optional<unsigned long> speed;  ///< given: one try at this speed
   std::optional<RtsMode> rts;          ///< given: one try with this use of RTS
   bool json = false;
   bool quiet = false;
+  bool verbose = false;
   std::wstring report;           ///< name of the library's report file; empty: none
   unsigned stall_timeout_s = 0;  ///< 0: never
 };

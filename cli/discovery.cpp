@@ -5,6 +5,7 @@
 #include <optional>
 
 #include "formats.h"
+#include "handle.h"
 #include "rcvlink.h"
 #include "text.h"
 #include "ticker.h"
@@ -20,7 +21,7 @@ class SearchNote {
   explicit SearchNote(Context& context) : context_(context), start_(GetTickCount64()) {
     if (!context.err.is_terminal()) return;
     const Arguments& arguments = context.arguments;
-    if (!IsOneTry(arguments)) {
+    if (arguments.link != eInstanceUSB && !IsOneTry(arguments)) {
       context.Note(
           "Up to 18 tries of speed and RTS, some minutes on a silent port. Known speed? Then say "
           "--speed N.\n");
@@ -52,66 +53,94 @@ class SearchNote {
   std::optional<Ticker> ticker_;
 };
 
-long Search(const Context& context, void** receiver) {
+long SearchOn(EInstanceType link, const Context& context, void** receiver) {
   const Arguments& arguments = context.arguments;
   std::wstring port = arguments.port;
   const HANDLE cancel = context.interrupt.event();
-  if (!IsOneTry(arguments)) {
-    return devapi::SearchReceiver(
-        port.data(), arguments.link, arguments.protocol, cancel, receiver);
+  if (link == eInstanceUSB || !IsOneTry(arguments)) {
+    return devapi::SearchReceiver(port.data(), link, arguments.protocol, cancel, receiver);
   }
   DCB settings = PortSettings(arguments.speed.value_or(0), arguments.rts.value_or(RtsMode::kOn));
   return devapi::CreateReceiverOnSerial(
       port.data(), arguments.protocol, &settings, cancel, receiver);
 }
 
-std::string SilenceHint(const Arguments& arguments) {
+std::string SilenceHint(const Arguments& arguments, EInstanceType link) {
+  if (link == eInstanceUSB) return "Is it switched on, and is it a Quorin receiver?";
   if (IsOneTry(arguments)) {
     return "Is it switched on, and is this its speed? Without --speed and --rts all are tried.";
   }
   return "Is it switched on, and is this the port of its cable? `rcvlink-cli ports` lists them.";
 }
 
-}  // namespace
+/// Why a device cannot be opened, as far as asking for nothing of it tells; S_OK when it can. A
+/// search on USB that cannot open its device finds no receiver, no more.
+long WhyNotOpened(const std::wstring& device) {
+  constexpr DWORD kShareAll = FILE_SHARE_READ | FILE_SHARE_WRITE;
+  const UniqueHandle handle(
+      CreateFileW(device.c_str(), 0, kShareAll, nullptr, OPEN_EXISTING, 0, nullptr));
+  return handle.get() == INVALID_HANDLE_VALUE ? ResultOfWin32(GetLastError()) : S_OK;
+}
 
-Failure SearchFailure(const Arguments& arguments, long code) {
+bool IsMissing(long code) {
+  return code == ResultOfWin32(ERROR_FILE_NOT_FOUND) ||
+         code == ResultOfWin32(ERROR_PATH_NOT_FOUND) || code == ResultOfWin32(ERROR_INVALID_NAME);
+}
+
+/// What a result of the search on a link means to the user.
+Failure SearchFailure(const Arguments& arguments, EInstanceType link, long code) {
+  const bool on_usb = link == eInstanceUSB;
   const std::string port = Printable(arguments.port);
+  if (on_usb && SUCCEEDED(code) && FAILED(WhyNotOpened(arguments.port))) {
+    code = WhyNotOpened(arguments.port);
+  }
   Failure failure{.exit = ExitCode::kNoReceiver, .tried = "find a receiver", .code = code};
-  const bool missing =
-      code == ResultOfWin32(ERROR_FILE_NOT_FOUND) || code == ResultOfWin32(ERROR_PATH_NOT_FOUND);
-  if (missing) {
+  if (IsMissing(code)) {
     failure.meaning = port + " does not exist: nothing is plugged in there";
-    failure.hint = "`rcvlink-cli ports` lists the ports of this computer.";
+    failure.hint = on_usb ? "A device on USB is named by its whole path, such as "
+                            "\\\\?\\usb#vid_1234&pid_5678#...; --link serial is for COM ports."
+                          : "`rcvlink-cli ports` lists the ports of this computer.";
   } else if (code == ResultOfWin32(ERROR_ACCESS_DENIED)) {
     failure.meaning = "another program is using " + port;
     failure.hint = "Close that program and try again.";
-  } else if (code == E_NOTIMPL && arguments.link == eInstanceAny) {
-    failure.meaning =
-        "no receiver on a serial port of that name, and this version does not reach "
-        "receivers on USB yet";
-    failure.hint = "With --link serial the reason is told.";
-  } else if (code == E_NOTIMPL) {
-    failure.meaning = "this version does not reach receivers on USB yet";
-  } else if (code == S_FALSE || code == S_OK) {
+  } else if (SUCCEEDED(code)) {
     failure.meaning = "no receiver answered";
-    failure.hint = SilenceHint(arguments);
+    failure.hint = SilenceHint(arguments, link);
   }
   return failure;
 }
 
-void* FindReceiver(Context& context) {
+}  // namespace
+
+FoundReceiver FindReceiver(Context& context) {
+  const Arguments& arguments = context.arguments;
+  const bool any = arguments.link == eInstanceAny;
+  EInstanceType link = any ? eInstanceSerial : arguments.link;
   void* receiver = nullptr;
   long code = S_OK;
   {
     const SearchNote note(context);
-    code = Search(context, &receiver);
+    code = SearchOn(link, context, &receiver);
   }
-  if (code == S_OK && receiver != nullptr) return receiver;
-  Failure failure = SearchFailure(context.arguments, code);
+  if (any && receiver == nullptr && !context.interrupt.requested()) {
+    if (arguments.verbose) {
+      Failure failure = SearchFailure(arguments, link, code);
+      failure.tried = "find a receiver on a serial port";
+      failure.port = Printable(arguments.port);
+      context.err.Write(Describe(failure));
+    }
+    link = eInstanceUSB;
+    code = SearchOn(link, context, &receiver);
+  }
+  if (receiver != nullptr) return {receiver, link};
+  Failure failure = SearchFailure(arguments, link, code);
   if (context.interrupt.requested()) {
     failure.exit = ExitCode::kCancelled;
     failure.meaning = "ended by Ctrl-C";
     failure.hint.clear();
+  } else if (any) {
+    failure.tried = "find a receiver on a serial port or on USB";
+    if (!arguments.verbose) failure.hint = "With --verbose the reason for each of them is told.";
   }
   throw failure;
 }

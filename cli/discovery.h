@@ -4,16 +4,18 @@
 #define RCVLINK_CLI_DISCOVERY_H_
 
 #include "context.h"
+#include "rcvlink.h"
 
 namespace cli {
 
-/// Searches the port, or tries it once when the command line tells speed or RTS.
-/// @return the library's handle, to be given back with `devapi::CloseReceiver`
-/// @throws Failure when there is no receiver
-void* FindReceiver(Context& context);
+struct FoundReceiver {
+  void* handle;  ///< the library's, to be given back with `devapi::CloseReceiver`
+  EInstanceType link;
+};
 
-/// What a result of the search means to the user.
-Failure SearchFailure(const Arguments& arguments, long code);
+/// Searches the port, or tries it once when the command line tells speed or RTS.
+/// @throws Failure when there is no receiver
+FoundReceiver FindReceiver(Context& context);
 
 }  // namespace cli
 

@@ -57,10 +57,13 @@ void Aborter::Tick() {
   if (ticks_++ % kTicksPerAbort == 0) devapi::Abort(receiver_);
 }
 
-Receiver::Receiver(Context& context)
+Receiver::Receiver(Context& context) : Receiver(context, FindReceiver(context)) {}
+
+Receiver::Receiver(Context& context, const FoundReceiver& found)
     : context_(context),
       interrupt_(context.interrupt),
-      handle_(FindReceiver(context)),
+      handle_(found.handle),
+      link_(found.link),
       cancel_watch_(Aborter::kInterval, [this, aborter = Aborter(handle())]() mutable {
         if (interrupt_.requested()) aborter.Tick();
       }) {}

@@ -11,6 +11,7 @@
 #include <vector>
 
 #include "context.h"
+#include "discovery.h"
 #include "rcvlink.h"
 #include "ticker.h"
 
@@ -57,6 +58,7 @@ class Receiver {
   explicit Receiver(Context& context);
 
   void* handle() const { return handle_.get(); }
+  EInstanceType link() const { return link_; }  ///< on which it was found: serial or USB
 
   /// @throws Failure
   Identity Identify();
@@ -72,6 +74,8 @@ class Receiver {
   void ThrowIfCancelled(const std::string& tried) const;
 
  private:
+  Receiver(Context& context, const FoundReceiver& found);
+
   struct Closer {
     void operator()(void* handle) const { devapi::CloseReceiver(handle); }
   };
@@ -79,6 +83,7 @@ class Receiver {
   Context& context_;
   const Interrupt& interrupt_;
   std::unique_ptr<void, Closer> handle_;
+  EInstanceType link_;
   Ticker cancel_watch_;  // ends before the handle does
 };
 

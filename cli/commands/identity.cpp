@@ -4,19 +4,14 @@
 #include <wtypes.h>
 
 #include "commands.h"
-#include "names.h"
 #include "receiver.h"
 #include "text.h"
 
 namespace cli {
 namespace {
 
-/// The link on which the receiver was found. For "any" the library does not tell it; a COM port's
-/// name is tried as one first.
-std::string LinkOf(const Arguments& arguments) {
-  const bool one_try = arguments.speed || arguments.rts;
-  if (one_try || arguments.link == eInstanceSerial) return "serial";
-  return arguments.link == eInstanceAny && IsComPort(arguments.port) ? "serial" : "usb";
+std::string LinkWord(const Receiver& receiver) {
+  return receiver.link() == eInstanceUSB ? "usb" : "serial";
 }
 
 std::string Row(const std::string& label, const std::string& value) {
@@ -24,9 +19,9 @@ std::string Row(const std::string& label, const std::string& value) {
   return PadRight(label, kLabelWidth) + value + "\n";
 }
 
-Json ToJson(const Arguments& arguments, const Identity& identity) {
+Json ToJson(const Arguments& arguments, const Receiver& receiver, const Identity& identity) {
   return {{"port", ToUtf8(arguments.port)},
-          {"link", LinkOf(arguments)},
+          {"link", LinkWord(receiver)},
           {"protocol", FamilyWord(identity.family)},
           {"id", ToUtf8(identity.id)},
           {"model", ToUtf8(identity.model)}};
@@ -38,10 +33,10 @@ Outcome RunFind(Context& context) {
   const Arguments& arguments = context.arguments;
   Receiver receiver(context);
   const Identity identity = receiver.Identify();
-  context.Say(Printable(arguments.port) + " (" + LinkOf(arguments) +
+  context.Say(Printable(arguments.port) + " (" + LinkWord(receiver) +
               "): " + FamilyName(identity.family) + " receiver, model " +
               Printable(identity.model) + ", id " + Printable(identity.id) + "\n");
-  return {.document = ToJson(arguments, identity)};
+  return {.document = ToJson(arguments, receiver, identity)};
 }
 
 Outcome RunInfo(Context& context) {
@@ -49,13 +44,13 @@ Outcome RunInfo(Context& context) {
   Receiver receiver(context);
   const Identity identity = receiver.Identify();
   const bool renaming = identity.offers_renaming();
-  context.Say(Row("Port", Printable(arguments.port) + " (" + LinkOf(arguments) + ")") +
+  context.Say(Row("Port", Printable(arguments.port) + " (" + LinkWord(receiver) + ")") +
               Row("Id", Printable(identity.id)) + Row("Model", Printable(identity.model)) +
               Row("Family", FamilyName(identity.family)) +
               Row("Variant", std::to_string(identity.variant)) +
               Row("Renaming", renaming ? "offered" : "not offered") +
               Row("Features", std::to_string(identity.features)));
-  Json document = ToJson(arguments, identity);
+  Json document = ToJson(arguments, receiver, identity);
   document["variant"] = identity.variant;
   document["features"] = identity.features;
   document["renaming"] = renaming;

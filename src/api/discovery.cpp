@@ -11,6 +11,7 @@
 #include "receiver/abstract_receiver.h"
 #include "report/report_file.h"
 #include "transport/serial_connection.h"
+#include "transport/usb_connection.h"
 #include "velmar/velmar_protocol.h"
 
 namespace {
@@ -66,6 +67,19 @@ HRESULT FindDriver(std::unique_ptr<CIConnection> connection,
   return S_OK;
 }
 
+// Makes the receiver around the driver that was found, and registers it.
+HRESULT Register(const wchar_t* caller,
+                 const wchar_t* port,
+                 std::unique_ptr<CIProtocol> driver,
+                 void** receiver) {
+  auto object = std::make_shared<CAbstractReceiver>(std::move(driver));
+  void* handle = nullptr;
+  ThrowIfFailed(Receivers().Insert(port, std::move(object), &handle));
+  Trace(L"%s - OK [%s]\r\n", caller, port);
+  *receiver = handle;
+  return S_OK;
+}
+
 }  // namespace
 
 namespace devapi {
@@ -80,20 +94,24 @@ long CreateReceiverOnSerial(
     std::unique_ptr<CIProtocol> driver;
     const HRESULT found = FindDriver(std::move(connection), port, protocol, abortEvent, driver);
     if (found != S_OK) return found;
-    auto object = std::make_shared<CAbstractReceiver>(std::move(driver));
-    void* handle = nullptr;
-    ThrowIfFailed(Receivers().Insert(port, std::move(object), &handle));
-    Trace(L"CreateReceiverOnSerial - OK [%s]\r\n", port);
-    *receiver = handle;
-    return S_OK;
+    return Register(L"CreateReceiverOnSerial", port, std::move(driver), receiver);
   });
 }
 
-long CreateReceiverOnUSB(wchar_t* device, EProtocol, void*, void** receiver) {
+// Only Quorin receivers are on USB, whatever family is asked for.
+long CreateReceiverOnUSB(wchar_t* device, EProtocol, void* abortEvent, void** receiver) {
   if (!device || !receiver) return E_INVALIDARG;
-  Trace(L"CreateReceiverOnUSB - opening USB [%s]\r\n", device);
-  // There is no USB link yet, and none is pretended.
-  return E_NOTIMPL;
+  return CatchResult([&] {
+    auto connection = std::make_unique<CUSBConnection>();
+    Trace(L"CreateReceiverOnUSB - opening USB [%s]\r\n", device);
+    ThrowIfFailed(connection->Open(device));
+    if (IsSignalled(abortEvent)) return S_FALSE;
+    Trace(L"CreateReceiverOnUSB - looking for Quorin receiver [%s]\r\n", device);
+    if (!CQuorinProtocol::Probe(connection.get(), abortEvent)) return S_FALSE;
+    auto driver = std::make_unique<CQuorinProtocol>(std::move(connection));
+    Trace(L"CreateReceiverOnUSB - Quorin receiver found [%s]\r\n", device);
+    return Register(L"CreateReceiverOnUSB", device, std::move(driver), receiver);
+  });
 }
 
 long SearchReceiver(

@@ -162,7 +162,7 @@ namespace devapi {
 /// the port's own speed, then 9600, 115200, 57600, 38400, 19200), each opening the port anew and
 /// asking for the families that `protocol` names; on USB a single try, for Quorin only.
 ///
-/// @param port       name of the COM port ("COM7") or of the USB device
+/// @param port       name of the COM port ("COM7") or path of the USB device, as CreateFileW takes it
 /// @param type       the kind of link
 /// @param protocol   the family to ask for
 /// @param abortEvent Win32 event; once it is signalled the search ends at its next step. Null: the
@@ -175,8 +175,8 @@ namespace devapi {
 /// @retval E_INVALIDARG `receiver` is null
 /// @retval E_UNEXPECTED `type` is none of the three (and the name is not registered)
 /// @return otherwise why the port could not be opened: 0x80070002 when it does not exist,
-///         0x80070005 when another program has it. E_NOTIMPL for a USB link: this version does not
-///         reach receivers on USB yet.
+///         0x80070005 when another program has it. A USB device that cannot be opened at all gives
+///         S_FALSE; one that refuses its pipes gives why.
 RCVLINK_API long SearchReceiver(
     wchar_t* port, EInstanceType type, EProtocol protocol, void* abortEvent, void** receiver);
 
@@ -194,9 +194,15 @@ RCVLINK_API long SearchReceiver(
 RCVLINK_API long CreateReceiverOnSerial(
     wchar_t* port, EProtocol protocol, _DCB* settings, void* abortEvent, void** receiver);
 
-/// One try on a USB device, for a Quorin receiver whatever `protocol` says.
-/// @retval E_INVALIDARG `device` or `receiver` is null
-/// @retval E_NOTIMPL    otherwise: this version does not reach receivers on USB yet
+/// One try on a USB device of the USBIO driver, for a Quorin receiver whatever `protocol` says.
+/// Parameters as in `SearchReceiver`; `device` is taken as it is, nothing is put in front of it.
+/// @retval S_OK          found; *receiver holds the handle
+/// @retval S_FALSE       no receiver answered, the device could not be opened, its descriptors have
+///                       another layout than those of the receivers, or aborted
+/// @retval E_INVALIDARG  `device` or `receiver` is null
+/// @retval E_OUTOFMEMORY an allocation failed
+/// @return otherwise why the device's pipes could not be used: an HRESULT of a Win32 error, or one of
+///         the USBIO driver's own errors (0xE.......)
 RCVLINK_API long CreateReceiverOnUSB(wchar_t* device,
                                      EProtocol protocol,
                                      void* abortEvent,

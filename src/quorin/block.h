@@ -1,4 +1,4 @@
-// One block of a Quorin download as it is on the wire, for the block length that is used:
+// One block of a Quorin download as it is on the wire:
 //
 //   offset  size
 //   0       1     type: 0x02 data, 0x04 last, 0x23 the receiver ends the transfer

@@ -1,5 +1,6 @@
 // The download of CQuorinProtocol: the link is raised to full speed, the receiver is asked for the
 // file, and its blocks are taken one by one (block.h).
+#include <algorithm>
 #include <cstdint>
 #include <optional>
 #include <span>
@@ -7,6 +8,7 @@
 
 #include <objidl.h>
 
+#include "platform/clock.h"
 #include "platform/hresult.h"
 #include "platform/text.h"
 #include "quorin/block.h"
@@ -27,6 +29,11 @@ constexpr int kMaxTimeouts = 3;
 // In 32-bit arithmetic, which wraps beyond 43383508 bytes, and cut to 8 bits.
 uint8_t SerialPercent(uint32_t delivered, uint32_t size) {
   return static_cast<uint8_t>(delivered * 99 / size + 1);
+}
+
+// Cut to 8 bits; right for files of any size.
+uint8_t UsbPercent(uint32_t delivered, uint32_t size) {
+  return static_cast<uint8_t>(static_cast<uint64_t>(delivered * 99.0 / size + 1.0));
 }
 
 HRESULT WriteToStream(IStream* stream, std::span<const uint8_t> bytes) {
@@ -138,6 +145,11 @@ std::optional<HRESULT> CQuorinProtocol::AskAgain() {
   return FAILED(result) ? std::optional(result) : std::nullopt;
 }
 
+std::optional<HRESULT> CQuorinProtocol::AskAgain(const wchar_t* trace_line) {
+  Trace(trace_line);
+  return AskAgain();
+}
+
 // The receiver must hear that it is over, whatever cancels are on their way.
 HRESULT CQuorinProtocol::EndTransfer() {
   const AbortShield shield(connection());
@@ -155,8 +167,9 @@ struct CQuorinProtocol::Download {
   uint16_t crc = 0;  // of the blocks accepted so far
   uint32_t expected_sequence = 0;
   uint32_t delivered = 0;
-  uint8_t percent = 0;
-  int timeouts = 0;
+  uint8_t percent = 0;    // the last that was counted
+  DWORD reported_at = 0;  // over USB: ticks of the last report
+  int timeouts = 0;       // on a serial port of this block, over USB of the whole download
 };
 
 HRESULT CQuorinProtocol::DownloadOverSerial(IStream* stream, int size) {
@@ -175,12 +188,13 @@ std::optional<HRESULT> CQuorinProtocol::TakeSerialBlock(Download& download,
                                                         uint32_t size) {
   constexpr wchar_t kCancelled[] =
       L"CQuorinProtocol::DownloadOverSerial - download is cancelled\r\n";
+  constexpr wchar_t kTimeout[] = L"CQuorinProtocol::DownloadOverSerial - read timeout\r\n";
   if (TakeAbort()) return EndCancelledDownload(kCancelled);
 
   Block block;
   DWORD count = 0;
   HRESULT read = connection()->Read(block.data(), kBlockHeader, &count, kSerialReadTimeoutMs);
-  if (FAILED(read)) return AfterFailedRead(read, download);
+  if (FAILED(read)) return AfterFailedRead(read, download, kTimeout);
   if (TakeAbort()) return EndCancelledDownload(kCancelled);
 
   if (count < kBlockHeader) return AskAgain();
@@ -200,7 +214,7 @@ std::optional<HRESULT> CQuorinProtocol::TakeSerialBlock(Download& download,
 
   constexpr DWORD kRest = kBlockLength - kBlockHeader;
   read = connection()->Read(block.data() + kBlockHeader, kRest, &count, kSerialReadTimeoutMs);
-  if (FAILED(read)) return AfterFailedRead(read, download);
+  if (FAILED(read)) return AfterFailedRead(read, download, kTimeout);
   if (count < kRest || !block.HasEndByte() || !block.IsChainedTo(download.crc)) return AskAgain();
 
   download.crc = block.Crc();
@@ -227,14 +241,114 @@ std::optional<HRESULT> CQuorinProtocol::TakeSerialBlock(Download& download,
   return std::nullopt;
 }
 
-// A silence is answered by asking again, three times for a block; any other failure ends it.
-std::optional<HRESULT> CQuorinProtocol::AfterFailedRead(HRESULT failure, Download& download) {
+HRESULT CQuorinProtocol::DownloadOverUSB(IStream* stream, int size, DWORD block_length) {
+  if (!stream || size < 1 || block_length != kBlockPayload) return E_INVALIDARG;
+  Download download;
+  download.reported_at = CurrentClock().Ticks();
+  for (;;) {
+    if (const auto ended = TakeUsbBlock(download, stream, static_cast<uint32_t>(size))) {
+      return *ended;
+    }
+  }
+}
+
+// One round of the transfer over USB. It differs from the serial one in that a block is read whole, all
+// that is wrong with it is written to the report, the time-outs are counted over the whole download,
+// progress is told in steps, and a failure of the host's stream is passed on.
+std::optional<HRESULT> CQuorinProtocol::TakeUsbBlock(Download& download,
+                                                     IStream* stream,
+                                                     uint32_t size) {
+  constexpr wchar_t kCancelled[] = L"CQuorinProtocol::DownloadOverUSB - download is cancelled\r\n";
+  constexpr wchar_t kTimeout[] = L"CQuorinProtocol::DownloadOverUSB - read timeout.\r\n";
+  if (TakeAbort()) return EndCancelledDownload(kCancelled);
+
+  Block block;
+  const HRESULT read = ReadWholeBlock(block);
+  if (TakeAbort()) return EndCancelledDownload(kCancelled);
+  if (FAILED(read)) return AfterFailedRead(read, download, kTimeout);
+
+  switch (block.Type()) {
+    case BlockType::kEnd:
+      Trace(L"CQuorinProtocol::DownloadOverUSB - recognisable byte is 0x23\r\n");
+      return S_FALSE;
+    case BlockType::kData:
+      if (block.Sequence() != download.expected_sequence) {
+        return AskAgain(L"CQuorinProtocol::DownloadOverUSB - out of sequence\r\n");
+      }
+      break;
+    case BlockType::kLast:
+      break;
+    default:
+      return AskAgain(
+          L"CQuorinProtocol::DownloadOverUSB - recognisable byte is not recognised\r\n");
+  }
+  const std::optional<size_t> payload_length = block.PayloadLength();
+  if (!payload_length) return kNotConnected;
+  if (read != S_OK) return read;
+  if (!block.HasEndByte()) {
+    return AskAgain(L"CQuorinProtocol::DownloadOverUSB - eob character is missed\r\n");
+  }
+  if (!block.IsChainedTo(download.crc)) {
+    return AskAgain(L"CQuorinProtocol::DownloadOverUSB - cheksum missmatch\r\n");
+  }
+
+  download.crc = block.Crc();
+  const HRESULT stored = WriteToStream(stream, block.Payload().first(*payload_length));
+  if (FAILED(stored)) {
+    Trace(L"CQuorinProtocol::DownloadOverUSB - write to stream failed [0x%08X]\r\n", stored);
+    EndTransfer();
+    return stored;
+  }
+  download.delivered += static_cast<uint32_t>(*payload_length);
+  ReportUsbProgress(download, size);
+
+  if (block.Type() == BlockType::kLast) {
+    EndTransfer();
+    return stored;
+  }
+  if (TakeAbort()) return EndCancelledDownload(kCancelled);
+  const HRESULT sent = WriteControl(kAck);
+  if (FAILED(sent)) return sent;
+  if (sent != S_OK) return TakeAbort() ? EndCancelledDownload(kCancelled) : sent;
+  ++download.expected_sequence;
+  return std::nullopt;
+}
+
+// In pieces of no more than a bulk packet, until all is there, a read does not succeed or an abort is
+// seen.
+HRESULT CQuorinProtocol::ReadWholeBlock(Block& block) {
+  constexpr DWORD kMaxPiece = 512;
+  DWORD held = 0;
+  while (held < kBlockLength && !IsAborted()) {
+    const DWORD piece = std::min<DWORD>(kBlockLength - held, kMaxPiece);
+    DWORD count = 0;
+    const HRESULT read =
+        connection()->Read(block.data() + held, piece, &count, download_read_timeout_ms_);
+    if (read != S_OK) return read;
+    held += std::min(count, piece);
+  }
+  return S_OK;
+}
+
+// Twice a second at most; a change in between is not made up for.
+void CQuorinProtocol::ReportUsbProgress(Download& download, uint32_t size) {
+  constexpr DWORD kReportIntervalMs = 500;
+  const uint8_t percent = UsbPercent(download.delivered, size);
+  if (percent == download.percent) return;
+  download.percent = percent;
+  const DWORD now = CurrentClock().Ticks();
+  if (now - download.reported_at <= kReportIntervalMs) return;
+  download.reported_at = now;
+  ReportProgress(percent);
+}
+
+// A silence is answered by asking again, three times; any other failure ends the transfer.
+std::optional<HRESULT> CQuorinProtocol::AfterFailedRead(HRESULT failure,
+                                                        Download& download,
+                                                        const wchar_t* trace_line) {
   if (failure != kTimedOut) return failure;
-  Trace(L"CQuorinProtocol::DownloadOverSerial - read timeout\r\n");
+  Trace(trace_line);
   if (download.timeouts == kMaxTimeouts) return kTimedOut;
   ++download.timeouts;
   return AskAgain();
 }
-
-// The USB transfer comes with the USB link.
-HRESULT CQuorinProtocol::DownloadOverUSB(IStream*, int, DWORD) { return E_NOTIMPL; }

@@ -7,6 +7,7 @@
 #include <memory>
 #include <optional>
 
+#include "quorin/block.h"
 #include "quorin/quorin_command.h"
 #include "receiver/abstract_protocol.h"
 
@@ -33,7 +34,8 @@ class CQuorinProtocol : public CAbstractProtocol {
   // Runs one command as the current one. The failure that ended it, else the command's own result.
   virtual HRESULT ExecuteCommand(QuorinCommands::CQuorinCommand& command);
   // The block transfer that follows a get command, into the stream. `size` is what the receiver
-  // said (at least 1) and serves the progress only.
+  // said (at least 1) and serves the progress only. `block_length` is the payload of a block; no
+  // other than kBlockPayload is in use.
   virtual HRESULT DownloadOverSerial(IStream* stream, int size);
   virtual HRESULT DownloadOverUSB(IStream* stream, int size, DWORD block_length);
 
@@ -56,8 +58,14 @@ class CQuorinProtocol : public CAbstractProtocol {
   // The steps of a block transfer; one that gives a result ends it.
   struct Download;
   std::optional<HRESULT> TakeSerialBlock(Download& download, IStream* stream, uint32_t size);
-  std::optional<HRESULT> AfterFailedRead(HRESULT failure, Download& download);
+  std::optional<HRESULT> TakeUsbBlock(Download& download, IStream* stream, uint32_t size);
+  HRESULT ReadWholeBlock(Block& block);
+  void ReportUsbProgress(Download& download, uint32_t size);
+  std::optional<HRESULT> AfterFailedRead(HRESULT failure,
+                                         Download& download,
+                                         const wchar_t* trace_line);
   std::optional<HRESULT> AskAgain();
+  std::optional<HRESULT> AskAgain(const wchar_t* trace_line);
   HRESULT EndTransfer();
   HRESULT EndCancelledDownload(const wchar_t* trace_line);
   HRESULT WriteControl(uint8_t control);

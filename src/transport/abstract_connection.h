@@ -10,6 +10,9 @@
 
 class CAbstractConnection : public CIConnection {
  public:
+  // Asks on an open connection whether a receiver answers; watches the abort event.
+  using Probe = bool (*)(CIConnection* connection, HANDLE abort_event);
+
   HRESULT Disconnect() override;
   HRESULT Read(void* buffer, DWORD size, DWORD* bytes_read, DWORD timeout_ms) override;
   HRESULT Write(const void* buffer, DWORD size, DWORD timeout_ms) override;

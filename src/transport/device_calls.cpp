@@ -1,5 +1,7 @@
 #include "transport/device_calls.h"
 
+#include "platform/handle.h"
+
 HANDLE DeviceCalls::CreateFile(const wchar_t* path, DWORD access, DWORD share, DWORD flags) {
   return CreateFileW(path, access, share, nullptr, OPEN_EXISTING, flags, nullptr);
 }
@@ -19,6 +21,26 @@ BOOL DeviceCalls::GetOverlappedResult(HANDLE device, OVERLAPPED* block, DWORD* b
 }
 
 BOOL DeviceCalls::CancelIo(HANDLE device) { return ::CancelIo(device); }
+
+BOOL DeviceCalls::DeviceIoControl(HANDLE device,
+                                  DWORD code,
+                                  const void* input,
+                                  DWORD input_size,
+                                  void* output,
+                                  DWORD output_size,
+                                  DWORD* returned) {
+  const KernelHandle done(CreateEventW(nullptr, TRUE, FALSE, nullptr));
+  if (!done) return FALSE;
+  // Devices are open for overlapped transfers, so a request is one as well.
+  OVERLAPPED block{};
+  block.hEvent = done.get();
+  void* const in = const_cast<void*>(input);  // Win32 does not say that it only reads it
+  if (::DeviceIoControl(device, code, in, input_size, output, output_size, returned, &block)) {
+    return TRUE;
+  }
+  if (GetLastError() != ERROR_IO_PENDING) return FALSE;
+  return ::GetOverlappedResult(device, &block, returned, TRUE);
+}
 
 DWORD DeviceCalls::WaitForMultipleObjects(DWORD count, const HANDLE* handles, DWORD timeout_ms) {
   return ::WaitForMultipleObjects(count, handles, FALSE, timeout_ms);

@@ -16,6 +16,14 @@ class DeviceCalls {
       HANDLE device, const void* buffer, DWORD size, DWORD* written, OVERLAPPED* block);
   virtual BOOL GetOverlappedResult(HANDLE device, OVERLAPPED* block, DWORD* bytes, BOOL wait);
   virtual BOOL CancelIo(HANDLE device);
+  // Waits until the device has answered. `*returned` is how much of the output it filled.
+  virtual BOOL DeviceIoControl(HANDLE device,
+                               DWORD code,
+                               const void* input,
+                               DWORD input_size,
+                               void* output,
+                               DWORD output_size,
+                               DWORD* returned);
   // Waits for any of `count` handles.
   virtual DWORD WaitForMultipleObjects(DWORD count, const HANDLE* handles, DWORD timeout_ms);
 

@@ -6,9 +6,6 @@
 
 class CSerialConnection : public CAbstractConnection {
  public:
-  // Asks on an open connection whether a receiver answers; watches the abort event.
-  using Probe = bool (*)(CIConnection* connection, HANDLE abort_event);
-
   explicit CSerialConnection(DeviceCalls& calls = SystemCalls());
   ~CSerialConnection() override;
 

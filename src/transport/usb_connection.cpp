@@ -1,0 +1,159 @@
+#include "transport/usb_connection.h"
+
+#include <array>
+#include <vector>
+
+#include "platform/hresult.h"
+#include "report/report_file.h"
+#include "transport/usbio.h"
+
+namespace {
+
+template <typename Record>
+std::span<const uint8_t> BytesOf(const Record& record) {
+  return {reinterpret_cast<const uint8_t*>(&record), sizeof(record)};
+}
+
+struct DriverError {
+  uint32_t code;
+  const wchar_t* name;
+};
+constexpr std::array<DriverError, 4> kDriverErrors = {
+    {{usbio::kCrcError, L"USBIO_ERR_CRC"},
+     {usbio::kBitStuffError, L"USBIO_ERR_BTSTUFF"},
+     {usbio::kDataToggleError, L"USBIO_ERR_DATA_TOGGLE_MISMATCH"},
+     {usbio::kNotBoundError, L"USBIO_ERR_NOT_BOUND"}}};
+
+// Explains the driver's own errors in the report; others explain themselves.
+void DumpDriveErrorDesc(HRESULT result) {
+  for (const DriverError& error : kDriverErrors) {
+    if (error.code != static_cast<uint32_t>(result)) continue;
+    // The number comes in lower case with "08X" behind it: reports have always had it so.
+    Trace(L"CUSBConnection::DumpDriveErrorDesc - %s [%0x08X]\r\n", error.name, result);
+  }
+}
+
+}  // namespace
+
+CUSBConnection::~CUSBConnection() { CUSBConnection::Disconnect(); }
+
+HRESULT CUSBConnection::Connect(const wchar_t*, HANDLE, Probe) { return E_NOTIMPL; }
+
+HRESULT CUSBConnection::Open(const wchar_t* device) {
+  Trace(L"CUSBConnection::Create\r\n");
+  if (!device) return E_INVALIDARG;
+  Disconnect();
+  if (const HRESULT result = CreateEvents(); FAILED(result)) return result;
+  OpenHandles(device);
+  Configure(device);
+  BulkEndpoints endpoints;
+  if (const HRESULT result = ReadEndpoints(&endpoints); result != S_OK) return result;
+  if (const HRESULT result = BindPipes(endpoints); FAILED(result)) return result;
+  name_ = CopyBstr(device);
+  Trace(L"CUSBConnection::Create - OK [%s]\r\n", name_.get());
+  return S_OK;
+}
+
+void CUSBConnection::OpenHandles(const wchar_t* device) {
+  const auto open = [&](DWORD access) {
+    FileHandle handle(calls_.CreateFile(device, access, 0, FILE_FLAG_OVERLAPPED));
+    if (!handle) Trace(L"%u\r\n", GetLastError());
+    return handle;
+  };
+  device_ = open(GENERIC_WRITE);
+  read_handle_ = open(GENERIC_READ);
+}
+
+void CUSBConnection::Configure(const wchar_t* device) {
+  const usbio::ConfigurationRequest configuration;
+  const DWORD error = Request(device_.get(), usbio::kSetConfiguration, BytesOf(configuration));
+  if (error == ERROR_SUCCESS) return;
+  Trace(
+      L"CUSBConnection::Create - DeviceIoControl(IOCTL_USBIO_SET_CONFIGURATION) is failed [%u] "
+      L"[%s]. "
+      L"Try to continue...\r\n",
+      error,
+      device);
+}
+
+HRESULT CUSBConnection::ReadEndpoints(BulkEndpoints* endpoints) {
+  const usbio::DescriptorRequest request;
+  std::array<uint8_t, kConfigurationDescriptorLength> head{};
+  DWORD returned = 0;
+  const DWORD head_error =
+      Request(device_.get(), usbio::kGetDescriptor, BytesOf(request), head, &returned);
+  // The plain error number is the result; discovery then finds out that no receiver answers.
+  if (head_error != ERROR_SUCCESS) return static_cast<HRESULT>(head_error);
+  if (returned != head.size()) return S_FALSE;
+
+  std::vector<uint8_t> descriptors(TotalLength(head));
+  const DWORD error =
+      Request(device_.get(), usbio::kGetDescriptor, BytesOf(request), descriptors, &returned);
+  if (error != ERROR_SUCCESS) return HResultFromError(error);
+  const auto found = FindBulkEndpoints(descriptors);
+  if (!found) return S_FALSE;
+  *endpoints = *found;
+  return S_OK;
+}
+
+HRESULT CUSBConnection::BindPipes(const BulkEndpoints& endpoints) {
+  DWORD error = Request(read_handle_.get(), usbio::kBindPipe, BytesOf(endpoints.in));
+  if (error == ERROR_SUCCESS) {
+    error = Request(device_.get(), usbio::kBindPipe, BytesOf(endpoints.out));
+  }
+  if (error == ERROR_SUCCESS) error = Request(device_.get(), usbio::kResetPipe);
+  if (error == ERROR_SUCCESS) error = Request(read_handle_.get(), usbio::kResetPipe);
+  return HResultFromError(error);
+}
+
+DWORD CUSBConnection::Request(HANDLE handle,
+                              uint32_t code,
+                              std::span<const uint8_t> input,
+                              std::span<uint8_t> output,
+                              DWORD* returned) {
+  DWORD ignored = 0;
+  const BOOL succeeded = calls_.DeviceIoControl(handle,
+                                                code,
+                                                input.data(),
+                                                static_cast<DWORD>(input.size()),
+                                                output.data(),
+                                                static_cast<DWORD>(output.size()),
+                                                returned ? returned : &ignored);
+  return succeeded ? ERROR_SUCCESS : GetLastError();
+}
+
+HRESULT CUSBConnection::Disconnect() {
+  Trace(L"CUSBConnection::Disconnect\r\n");
+  if (device_ && link_state_ == kBound) Request(device_.get(), usbio::kUnbindPipe);
+  read_handle_.Reset();
+  return CAbstractConnection::Disconnect();
+}
+
+HRESULT CUSBConnection::Write(const void* buffer, DWORD size, DWORD timeout_ms) {
+  const HRESULT result = CAbstractConnection::Write(buffer, size, timeout_ms);
+  if (FAILED(result)) DumpDriveErrorDesc(result);
+  return result;
+}
+
+HRESULT CUSBConnection::Flush() {
+  Trace(L"CUSBConnection::Flush\r\n");
+  for (;;) {
+    uint8_t waiting = 0;
+    DWORD count = 0;
+    if (Read(&waiting, sizeof(waiting), &count, 0) != S_OK || count != sizeof(waiting)) return S_OK;
+  }
+}
+
+HRESULT CUSBConnection::GetInstanceType(EInstanceType* type) {
+  *type = eInstanceUSB;
+  return S_OK;
+}
+
+HRESULT CUSBConnection::GetSpeed(DWORD* speed) {
+  *speed = 0;
+  return S_FALSE;
+}
+
+HRESULT CUSBConnection::SetSpeed(DWORD) { return S_FALSE; }
+
+HANDLE CUSBConnection::GetReadHandle() { return read_handle_.get(); }

@@ -1,0 +1,54 @@
+#include "transport/usb_descriptors.h"
+
+namespace {
+
+// Offsets within descriptors.
+constexpr size_t kLength = 0;  // of any descriptor: its own length
+constexpr size_t kTotalLength = 2;
+constexpr size_t kEndpointCount = 4;
+constexpr size_t kEndpointAddress = 2;
+constexpr size_t kEndpointAttributes = 3;
+
+constexpr size_t kEndpointLength = 7;
+constexpr size_t kFewestEndpoints = 2;
+
+constexpr uint8_t kTransferTypeMask = 0x03;
+constexpr uint8_t kBulk = 0x02;
+constexpr uint8_t kDirectionIn = 0x80;
+
+constexpr int kBitsOfByte = 8;
+
+}  // namespace
+
+size_t TotalLength(std::span<const uint8_t, kConfigurationDescriptorLength> configuration) {
+  return static_cast<size_t>(configuration[kTotalLength] |
+                             (configuration[kTotalLength + 1] << kBitsOfByte));
+}
+
+std::optional<BulkEndpoints> FindBulkEndpoints(std::span<const uint8_t> descriptors) {
+  if (descriptors.empty()) return std::nullopt;
+  const size_t interface_at = descriptors[kLength];
+  if (interface_at + kEndpointCount >= descriptors.size()) return std::nullopt;
+  const std::span<const uint8_t> from_interface = descriptors.subspan(interface_at);
+  const size_t count = from_interface[kEndpointCount];
+  const size_t interface_length = from_interface[kLength];
+  if (count < kFewestEndpoints ||
+      from_interface.size() != interface_length + count * kEndpointLength) {
+    return std::nullopt;
+  }
+
+  BulkEndpoints found;
+  bool has_out = false;
+  bool has_in = false;
+  std::span<const uint8_t> rest = from_interface.subspan(interface_length);
+  for (; !rest.empty() && !(has_out && has_in); rest = rest.subspan(kEndpointLength)) {
+    if (rest[kLength] != kEndpointLength) return std::nullopt;
+    if ((rest[kEndpointAttributes] & kTransferTypeMask) != kBulk) continue;
+    const uint8_t address = rest[kEndpointAddress];
+    const bool is_in = (address & kDirectionIn) != 0;
+    (is_in ? found.in : found.out) = address;
+    (is_in ? has_in : has_out) = true;
+  }
+  // The defaults go together: a device with one bulk endpoint only has neither of its own.
+  return has_out && has_in ? found : BulkEndpoints{};
+}
