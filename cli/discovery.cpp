@@ -139,7 +139,8 @@ FoundReceiver FindReceiver(Context& context) {
     failure.meaning = "ended by Ctrl-C";
     failure.hint.clear();
   } else if (any) {
-    failure.tried = "find a receiver on a serial port or on USB";
+    failure.tried = arguments.verbose ? "find a receiver on USB"
+                                      : "find a receiver on a serial port or on USB";
     if (!arguments.verbose) failure.hint = "With --verbose the reason for each of them is told.";
   }
   throw failure;
