@@ -46,6 +46,8 @@ HRESULT CatchResult(Operation operation) {
     return error.code();
   } catch (const std::bad_alloc&) {
     return E_OUTOFMEMORY;
+  } catch (const std::exception&) {
+    return E_UNEXPECTED;  // none may leave the library: its hosts have exceptions of their own
   }
 }
 

@@ -15,7 +15,7 @@ std::vector<std::wstring> SplitFields(std::string_view text);
 // The text without double quotes at either end.
 std::wstring WithoutQuotes(std::wstring_view field);
 
-// Leading digits, 0 if there are none.
+// As _wtoi: leading blanks, a sign, digits; 0 if there are none.
 int ToInteger(const std::wstring& field);
 
 }  // namespace VelmarCommands
