@@ -5,12 +5,12 @@
 #include <exception>
 #include <fstream>
 #include <iostream>
-#include <stdexcept>
 #include <string>
 
 #include "simulator/files.h"
 #include "simulator/line.h"
 #include "simulator/ports/pty.h"
+#include "simulator/program/port_options.h"
 #include "simulator/program/quorin_program.h"
 #include "simulator/program/velmar_program.h"
 #include "simulator/quorin/receiver.h"
@@ -18,9 +18,6 @@
 #include "simulator/velmar/receiver.h"
 
 namespace {
-
-constexpr int kExitFailure = 2;
-constexpr const char* kPortGroup = "Port";
 
 volatile std::sig_atomic_t stop_requested = 0;
 
@@ -44,57 +41,35 @@ sigset_t CatchSignals() {
   return before;
 }
 
-// What is asked about the port and the files, whatever the family.
 struct PortOptions {
-  std::string folder;
+  sim::FileOptions files;
   std::string link;
-  std::string transcript;
 };
 
 void AddPortOptions(CLI::App& command, PortOptions& port, sim::LineOptions& line) {
-  command.add_option("--folder", port.folder, "the files to serve")
-      ->required()
-      ->check(CLI::ExistingDirectory)
-      ->type_name("DIR");
-  command.add_option("--transcript", port.transcript, "write down what passes")->type_name("FILE");
+  sim::AddFileOptions(command, port.files);
   command.add_option("--link", port.link, "a symbolic link to the port, removed at the end")
       ->type_name("PATH")
-      ->group(kPortGroup);
+      ->group(sim::kPortGroup);
   command.add_option("--speed", line.speed, "the line speed at the start, bit/s")
       ->capture_default_str()
       ->check(CLI::PositiveNumber)
-      ->group(kPortGroup);
+      ->group(sim::kPortGroup);
   command
       .add_flag("--garbled", line.garbled, "at a wrong speed bytes arrive as garbage, not as none")
-      ->group(kPortGroup);
-  command.add_flag("--pace", line.paced, "send no faster than the line speed")->group(kPortGroup);
-  command.add_option("--pieces", line.piece_size, "send in pieces of so many bytes")
-      ->type_name("BYTES")
-      ->check(CLI::PositiveNumber)
-      ->group(kPortGroup);
-  command.add_option("--piece-gap", line.piece_gap_ms, "the pause between pieces, ms")
-      ->capture_default_str()
-      ->type_name("MS")
-      ->group(kPortGroup);
-}
-
-std::ofstream OpenTranscript(const std::string& path) {
-  std::ofstream file;
-  if (!path.empty()) {
-    file.open(path, std::ios::binary | std::ios::trunc);
-    if (!file) {
-      throw std::runtime_error("cannot write the transcript " + path);
-    }
-  }
-  return file;
+      ->group(sim::kPortGroup);
+  command.add_flag("--pace", line.paced, "send no faster than the line speed")
+      ->group(sim::kPortGroup);
+  sim::AddPieceOptions(command, line);
 }
 
 template <typename FamilyReceiver, typename FamilyOptions>
 void Run(const FamilyOptions& options, const PortOptions& port_options) {
   const sigset_t wait_mask = CatchSignals();
-  std::ofstream file = OpenTranscript(port_options.transcript);
+  std::ofstream file = sim::OpenTranscript(port_options.files.transcript);
   sim::Transcript transcript = file.is_open() ? sim::Transcript(file) : sim::Transcript();
-  FamilyReceiver receiver(options, sim::FileStore::FromFolder(port_options.folder), &transcript);
+  FamilyReceiver receiver(
+      options, sim::FileStore::FromFolder(port_options.files.folder), &transcript);
   sim::PtyPort port(port_options.link);
   std::cout << port.slave_name() << std::endl;
   port.Serve(receiver, stop_requested, wait_mask);
@@ -128,7 +103,7 @@ int main(int argc, char** argv) {
     }
   } catch (const std::exception& error) {
     std::fprintf(stderr, "rcvlink-sim: %s\n", error.what());
-    return kExitFailure;
+    return sim::kExitFailure;
   }
   return 0;
 }

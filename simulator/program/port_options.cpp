@@ -1,0 +1,38 @@
+#include "simulator/program/port_options.h"
+
+#include <filesystem>
+#include <stdexcept>
+
+namespace sim {
+
+void AddFileOptions(CLI::App& command, FileOptions& files) {
+  command.add_option("--folder", files.folder, "the files to serve")
+      ->required()
+      ->check(CLI::ExistingDirectory)
+      ->type_name("DIR");
+  command.add_option("--transcript", files.transcript, "write down what passes")->type_name("FILE");
+}
+
+void AddPieceOptions(CLI::App& command, LineOptions& line) {
+  command.add_option("--pieces", line.piece_size, "send in pieces of so many bytes")
+      ->type_name("BYTES")
+      ->check(CLI::PositiveNumber)
+      ->group(kPortGroup);
+  command.add_option("--piece-gap", line.piece_gap_ms, "the pause between pieces, ms")
+      ->capture_default_str()
+      ->type_name("MS")
+      ->group(kPortGroup);
+}
+
+std::ofstream OpenTranscript(const std::string& path) {
+  std::ofstream file;
+  if (!path.empty()) {
+    file.open(std::filesystem::path(path), std::ios::binary | std::ios::trunc);
+    if (!file) {
+      throw std::runtime_error("cannot write the transcript " + path);
+    }
+  }
+  return file;
+}
+
+}  // namespace sim

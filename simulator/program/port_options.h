@@ -1,0 +1,31 @@
+#ifndef SIMULATOR_PROGRAM_PORT_OPTIONS_H_
+#define SIMULATOR_PROGRAM_PORT_OPTIONS_H_
+
+#include <CLI/CLI.hpp>
+#include <fstream>
+#include <string>
+
+#include "simulator/line.h"
+
+namespace sim {
+
+inline constexpr int kExitFailure = 2;
+inline constexpr const char* kPortGroup = "Port";
+
+// What is asked about the files, whatever the family and the port.
+struct FileOptions {
+  std::string folder;
+  std::string transcript;
+};
+
+void AddFileOptions(CLI::App& command, FileOptions& files);
+
+// Sending in pieces, which any port can.
+void AddPieceOptions(CLI::App& command, LineOptions& line);
+
+// A stream that is not open when there is no path. Throws std::runtime_error.
+std::ofstream OpenTranscript(const std::string& path);
+
+}  // namespace sim
+
+#endif  // SIMULATOR_PROGRAM_PORT_OPTIONS_H_

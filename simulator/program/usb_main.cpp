@@ -1,0 +1,125 @@
+#include <windows.h>
+
+#include <shellapi.h>
+
+#include <CLI/CLI.hpp>
+#include <array>
+#include <cstdio>
+#include <exception>
+#include <filesystem>
+#include <fstream>
+#include <iostream>
+#include <memory>
+#include <string>
+#include <thread>
+#include <vector>
+
+#include "simulator/files.h"
+#include "simulator/ports/handle.h"
+#include "simulator/ports/usb.h"
+#include "simulator/program/port_options.h"
+#include "simulator/program/quorin_program.h"
+#include "simulator/program/usb_options.h"
+#include "simulator/quorin/receiver.h"
+#include "simulator/transcript.h"
+#include "simulator/usb/device.h"
+
+namespace {
+
+constexpr const char* kUsbPortName = "/dev/usb";
+
+struct LocalFreer {
+  void operator()(wchar_t** memory) const { LocalFree(memory); }
+};
+
+// The words behind the program's name in UTF-8, from the last to the first.
+std::vector<std::string> CommandLineWords() {
+  int count = 0;
+  const std::unique_ptr<wchar_t*, LocalFreer> words(CommandLineToArgvW(GetCommandLineW(), &count));
+  std::vector<std::string> reversed;
+  for (int i = count - 1; i > 0; --i) {
+    const std::u8string word = std::filesystem::path(words.get()[i]).u8string();
+    reversed.emplace_back(word.begin(), word.end());
+  }
+  return reversed;
+}
+
+// Lives as long as the program, as the system and a thread set it at any time.
+HANDLE StopEvent() {
+  static const sim::UniqueHandle event(
+      CreateEventW(nullptr, /*bManualReset=*/TRUE, FALSE, nullptr));
+  return event.get();
+}
+
+BOOL WINAPI StopForControl(DWORD) {
+  SetEvent(StopEvent());
+  return TRUE;
+}
+
+// Whoever has started the program ends it by closing its input, and does so when it dies.
+void StopAtEndOfInput() {
+  const HANDLE input = GetStdHandle(STD_INPUT_HANDLE);
+  std::array<char, 256> ignored;
+  DWORD count = 0;
+  while (ReadFile(input, ignored.data(), static_cast<DWORD>(ignored.size()), &count, nullptr) &&
+         count > 0) {
+  }
+  SetEvent(StopEvent());
+}
+
+struct PortOptions {
+  sim::FileOptions files;
+  std::string device;
+};
+
+void Run(const sim::QuorinOptions& options,
+         const sim::UsbOptions& usb_options,
+         const PortOptions& port_options) {
+  std::ofstream file = sim::OpenTranscript(port_options.files.transcript);
+  sim::Transcript transcript = file.is_open() ? sim::Transcript(file) : sim::Transcript();
+  sim::QuorinReceiver receiver(
+      options, sim::FileStore::FromFolder(port_options.files.folder), &transcript);
+  sim::UsbDevice device(usb_options, receiver, transcript);
+  sim::UsbPort port(std::wstring(port_options.device.begin(), port_options.device.end()));
+  std::cout << "\\\\.\\" << port_options.device << std::endl;
+  SetConsoleCtrlHandler(StopForControl, TRUE);
+  std::thread(StopAtEndOfInput).detach();
+  port.Serve(device, receiver, StopEvent());
+}
+
+}  // namespace
+
+int main() {
+  CLI::App app(
+      "Simulated GNSS receivers on a simulated USB device. The first line of the output is the "
+      "path to open; the program runs until its standard input ends or it is interrupted.",
+      "rcvlink-sim-usb");
+  app.require_subcommand(1);
+
+  PortOptions port;
+  sim::UsbOptions usb;
+  sim::QuorinOptions quorin;
+  quorin.identity.port_name = kUsbPortName;
+  CLI::App* const command = app.add_subcommand("quorin", "a Quorin receiver");
+  sim::AddFileOptions(*command, port.files);
+  command->add_option("--device", port.device, "the name of the device, opened as \\\\.\\NAME")
+      ->required()
+      ->type_name("NAME")
+      ->group(sim::kPortGroup);
+  sim::AddPieceOptions(*command, quorin.line);
+  sim::AddUsbOptions(*command, usb);
+  sim::AddQuorinOptions(*command, quorin);
+
+  try {
+    app.parse(CommandLineWords());
+  } catch (const CLI::ParseError& error) {
+    return app.exit(error);
+  }
+  try {
+    Run(quorin, usb, port);
+  } catch (const std::exception& error) {
+    std::fprintf(stderr, "rcvlink-sim-usb: %s\n", error.what());
+    return sim::kExitFailure;
+  }
+  return 0;
+}

@@ -1,0 +1,212 @@
+#include "tests/host/support/simulated_usb.h"
+
+#include <algorithm>
+#include <array>
+#include <atomic>
+#include <mutex>
+#include <thread>
+
+namespace bed {
+namespace {
+
+constexpr wchar_t kProgram[] = L"rcvlink-sim-usb.exe";
+constexpr const char* kTranscript = "transcript.txt";
+constexpr auto kPollInterval = std::chrono::milliseconds(5);
+constexpr UINT kKilled = 1;
+
+std::string NewName() {
+  static std::atomic<int> count = 0;
+  return "rcvlink-usb-" + std::to_string(GetCurrentProcessId()) + "-" + std::to_string(++count);
+}
+
+std::string ToUtf8(const std::filesystem::path& path) {
+  const std::u8string text = path.u8string();
+  return std::string(text.begin(), text.end());
+}
+
+std::wstring FromUtf8(const std::string& text) {
+  return std::filesystem::path(std::u8string(text.begin(), text.end())).wstring();
+}
+
+// The word as a program finds it again in its command line.
+std::wstring Quoted(const std::wstring& word) {
+  std::wstring quoted = L"\"";
+  size_t backslashes = 0;
+  for (const wchar_t character : word) {
+    if (character == L'"') quoted.append(backslashes + 1, L'\\');
+    backslashes = character == L'\\' ? backslashes + 1 : 0;
+    quoted += character;
+  }
+  return quoted.append(backslashes, L'\\') + L'"';
+}
+
+std::filesystem::path ProgramPath() {
+  std::wstring path(MAX_PATH, L'\0');
+  DWORD length = 0;
+  while ((length = GetModuleFileNameW(nullptr, path.data(), static_cast<DWORD>(path.size()))) ==
+         path.size()) {
+    path.resize(2 * path.size());
+  }
+  path.resize(length);
+  return std::filesystem::path(path).parent_path() / kProgram;
+}
+
+struct Pipe {
+  UsbHandle read;
+  UsbHandle write;
+};
+
+Pipe MakePipe() {
+  SECURITY_ATTRIBUTES inherited{sizeof(SECURITY_ATTRIBUTES), nullptr, TRUE};
+  HANDLE read = nullptr;
+  HANDLE write = nullptr;
+  if (!CreatePipe(&read, &write, &inherited, 0)) throw Error("no pipe");
+  return {UsbHandle(read), UsbHandle(write)};
+}
+
+void KeepToThisProcess(const UsbHandle& handle) {
+  SetHandleInformation(handle.get(), HANDLE_FLAG_INHERIT, 0);
+}
+
+struct Started {
+  UsbHandle process;
+  UsbHandle input;
+  UsbHandle output;
+};
+
+Started StartProgram(const std::vector<std::string>& arguments) {
+  const std::wstring program = ProgramPath().wstring();
+  std::wstring command = Quoted(program);
+  for (const std::string& argument : arguments) command += L' ' + Quoted(FromUtf8(argument));
+
+  // Another program started at the same moment would inherit the pipes' other ends.
+  static std::mutex start_mutex;
+  const std::scoped_lock lock(start_mutex);
+  Pipe input = MakePipe();
+  Pipe output = MakePipe();
+  KeepToThisProcess(input.write);
+  KeepToThisProcess(output.read);
+  STARTUPINFOW startup{};
+  startup.cb = sizeof(startup);
+  startup.dwFlags = STARTF_USESTDHANDLES;
+  startup.hStdInput = input.read.get();
+  startup.hStdOutput = output.write.get();
+  startup.hStdError = output.write.get();
+  PROCESS_INFORMATION started{};
+  if (!CreateProcessW(program.c_str(),
+                      command.data(),
+                      nullptr,
+                      nullptr,
+                      /*bInheritHandles=*/TRUE,
+                      0,
+                      nullptr,
+                      nullptr,
+                      &startup,
+                      &started)) {
+    throw Error("cannot start rcvlink-sim-usb: error " + std::to_string(GetLastError()));
+  }
+  CloseHandle(started.hThread);
+  return {UsbHandle(started.hProcess), std::move(input.write), std::move(output.read)};
+}
+
+// What comes before the end of a line, or of the output; false when it was the latter.
+bool ReadLine(HANDLE output, std::string& line) {
+  char character = 0;
+  DWORD count = 0;
+  while (ReadFile(output, &character, 1, &count, nullptr) && count == 1) {
+    if (character == '\n') return true;
+    line += character;
+  }
+  return false;
+}
+
+std::string ReadRest(HANDLE output) {
+  std::string text;
+  while (ReadLine(output, text)) text += '\n';
+  return text;
+}
+
+int ExitStatus(HANDLE process) {
+  DWORD status = 0;
+  GetExitCodeProcess(process, &status);
+  return static_cast<int>(status);
+}
+
+}  // namespace
+
+SimulatedUsb::SimulatedUsb(std::vector<std::string> arguments,
+                           const std::map<std::string, std::string>& files)
+    : name_(NewName()) {
+  for (const auto& [name, content] : files) files_.Write(name, content);
+  Start(std::move(arguments));
+}
+
+SimulatedUsb::~SimulatedUsb() {
+  if (process_) Unplug();
+}
+
+std::wstring SimulatedUsb::device() const { return L"\\\\.\\" + FromUtf8(name_); }
+
+int SimulatedUsb::Unplug() {
+  input_.reset();
+  WaitForSingleObject(process_.get(), INFINITE);
+  const int status = ExitStatus(process_.get());
+  process_.reset();
+  output_.reset();
+  return status;
+}
+
+void SimulatedUsb::Kill() {
+  TerminateProcess(process_.get(), kKilled);
+  Unplug();
+}
+
+void SimulatedUsb::Start(std::vector<std::string> arguments) {
+  if (std::find(arguments.begin(), arguments.end(), "--folder") == arguments.end()) {
+    arguments.insert(arguments.end(), {"--folder", ToUtf8(files_.path())});
+  }
+  arguments.insert(arguments.end(),
+                   {"--device", name_, "--transcript", ToUtf8(notes_ / kTranscript)});
+  Started started = StartProgram(arguments);
+  std::string first_line;
+  if (!ReadLine(started.output.get(), first_line) || !first_line.starts_with("\\\\.\\")) {
+    started.input.reset();
+    const std::string output = first_line + '\n' + ReadRest(started.output.get());
+    WaitForSingleObject(started.process.get(), INFINITE);
+    const int status = ExitStatus(started.process.get());
+    throw Error("rcvlink-sim-usb ended with " + std::to_string(status) + ": " + output);
+  }
+  process_ = std::move(started.process);
+  input_ = std::move(started.input);
+  output_ = std::move(started.output);
+}
+
+std::optional<int> SimulatedUsb::Status() const {
+  return WaitForSingleObject(process_.get(), 0) == WAIT_OBJECT_0
+             ? std::optional(ExitStatus(process_.get()))
+             : std::nullopt;
+}
+
+int SimulatedUsb::WaitForEnd(std::chrono::milliseconds timeout) const {
+  if (WaitForSingleObject(process_.get(), static_cast<DWORD>(timeout.count())) != WAIT_OBJECT_0) {
+    throw Error("rcvlink-sim-usb does not end");
+  }
+  return ExitStatus(process_.get());
+}
+
+std::string SimulatedUsb::Transcript() const { return notes_.Read(kTranscript); }
+
+void SimulatedUsb::WaitForTranscript(std::string_view text,
+                                     std::chrono::milliseconds timeout) const {
+  const auto end = std::chrono::steady_clock::now() + timeout;
+  std::string transcript = Transcript();
+  while (transcript.find(text) == std::string::npos) {
+    if (std::chrono::steady_clock::now() > end) {
+      throw Error("the transcript does not hold \"" + std::string(text) + "\":\n" + transcript);
+    }
+    std::this_thread::sleep_for(kPollInterval);
+    transcript = Transcript();
+  }
+}
+
+}  // namespace bed

@@ -1,0 +1,78 @@
+// USB devices with simulated receivers in them.
+#ifndef RCVLINK_TESTS_HOST_SUPPORT_SIMULATED_USB_H_
+#define RCVLINK_TESTS_HOST_SUPPORT_SIMULATED_USB_H_
+
+#include <windows.h>
+
+#include <chrono>
+#include <map>
+#include <memory>
+#include <optional>
+#include <string>
+#include <string_view>
+#include <vector>
+
+#include "tests/host/support/temp_folder.h"
+
+namespace bed {
+
+struct UsbHandleCloser {
+  using pointer = HANDLE;
+  void operator()(HANDLE handle) const { CloseHandle(handle); }
+};
+using UsbHandle = std::unique_ptr<HANDLE, UsbHandleCloser>;
+
+// A USB device with a simulated receiver in it. Its name is its own among all processes, and the
+// receiver's program ends when this one does, however that comes.
+class SimulatedUsb {
+ public:
+  // `arguments` are those of rcvlink-sim-usb, the family first: {"quorin", "--id", "ABC"}. What it
+  // needs besides is added: --device, --transcript, and --folder with files(), unless it is given.
+  // `files` are put there first, by name; the receiver looks at its folder when it starts. Returns
+  // when the device can be opened; raises Error with what the program said when it ends instead.
+  explicit SimulatedUsb(std::vector<std::string> arguments,
+                        const std::map<std::string, std::string>& files = {});
+  SimulatedUsb(const SimulatedUsb&) = delete;
+  SimulatedUsb& operator=(const SimulatedUsb&) = delete;
+  // Unplugs the device.
+  ~SimulatedUsb();
+
+  // L"\\\\.\\rcvlink-usb-12-3", as CreateFileW wants it. Plugged in again, the device has the same.
+  std::wstring device() const;
+
+  // The folder that the receiver serves.
+  const TempFolder& files() const { return files_; }
+
+  // Unplugs the device in the middle of whatever it does, and returns its program's exit status.
+  // When it is done, no transfer is pending and the path can no longer be opened.
+  int Unplug();
+  // Ends the program without a word, which unplugs the device too, but maybe not at once.
+  void Kill();
+  // Plugs a device in again after Unplug or Kill. The transcript starts afresh.
+  void Start(std::vector<std::string> arguments);
+  // The exit status, when the receiver's program has ended by itself.
+  std::optional<int> Status() const;
+  // Waits for that end; raises Error when it does not come.
+  int WaitForEnd(std::chrono::milliseconds timeout = std::chrono::seconds(20)) const;
+
+  // What has passed so far, one event a line: "> " from the host, "< " from the receiver, "= " a
+  // setting, "- " a remark. What a request did is there when the request has ended; a handle is
+  // closed a little later than CloseHandle says.
+  std::string Transcript() const;
+  // Waits until the transcript holds `text`; raises Error when it does not come.
+  void WaitForTranscript(std::string_view text,
+                         std::chrono::milliseconds timeout = std::chrono::seconds(20)) const;
+
+ private:
+  std::string name_;
+  TempFolder files_;
+  TempFolder notes_;
+  UsbHandle process_;
+  // The program's standard input, at whose end it ends, and its output.
+  UsbHandle input_;
+  UsbHandle output_;
+};
+
+}  // namespace bed
+
+#endif  // RCVLINK_TESTS_HOST_SUPPORT_SIMULATED_USB_H_
