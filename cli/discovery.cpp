@@ -95,7 +95,10 @@ Failure SearchFailure(const Arguments& arguments, EInstanceType link, long code)
     code = WhyNotOpened(arguments.port);
   }
   Failure failure{.exit = ExitCode::kNoReceiver, .tried = "find a receiver", .code = code};
-  if (IsMissing(code)) {
+  if (!on_usb && code == ResultOfWin32(ERROR_INVALID_NAME)) {
+    failure.meaning = port + " is no name of a COM port";
+    failure.hint = "`rcvlink-cli ports` lists the ports of this computer.";
+  } else if (IsMissing(code)) {
     failure.meaning = port + " does not exist: nothing is plugged in there";
     failure.hint = on_usb ? "A device on USB is named by its whole path, such as "
                             "\\\\?\\usb#vid_1234&pid_5678#...; --link serial is for COM ports."
@@ -139,8 +142,8 @@ FoundReceiver FindReceiver(Context& context) {
     failure.meaning = "ended by Ctrl-C";
     failure.hint.clear();
   } else if (any) {
-    failure.tried = arguments.verbose ? "find a receiver on USB"
-                                      : "find a receiver on a serial port or on USB";
+    failure.tried =
+        arguments.verbose ? "find a receiver on USB" : "find a receiver on a serial port or on USB";
     if (!arguments.verbose) failure.hint = "With --verbose the reason for each of them is told.";
   }
   throw failure;

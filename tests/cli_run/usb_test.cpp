@@ -1,0 +1,116 @@
+// The program with a receiver on USB.
+#include <nlohmann/json.hpp>
+
+#include "tests/cli_run/cli.h"
+#include "tests/host/support/simulated_usb.h"
+
+namespace cli_run {
+namespace {
+
+using nlohmann::json;
+using testing::ElementsAre;
+using testing::HasSubstr;
+using testing::Not;
+
+class UsbCli : public Cli {
+ protected:
+  bed::ProgramResult RunOn(const bed::SimulatedUsb& usb,
+                           std::vector<std::string> arguments,
+                           const std::string& link = "usb") const {
+    arguments.insert(arguments.begin() + 1, DeviceOf(usb));
+    arguments.insert(arguments.end(), {"--link", link});
+    return Run(arguments);
+  }
+  static std::string DeviceOf(const bed::SimulatedUsb& usb) {
+    // As the paths of real devices begin; the other form is that of COM ports.
+    const std::wstring device = usb.device().replace(0, 4, LR"(\\?\)");
+    return {device.begin(), device.end()};
+  }
+};
+
+TEST_F(UsbCli, FindAndInfoTellTheLink) {
+  const bed::SimulatedUsb usb({"quorin", "--id", "QU7", "--model", "QR9"});
+  const auto found = RunOn(usb, {"find"});
+  EXPECT_EQ(found.status, kDone) << found.errors;
+  EXPECT_THAT(found.output,
+              HasSubstr(DeviceOf(usb) + " (usb): Quorin receiver, model QR9, id QU7"));
+
+  const auto result = RunOn(usb, {"info", "--json"});
+  ASSERT_EQ(result.status, kDone) << result.errors;
+  const json info = json::parse(result.output);
+  EXPECT_EQ(info.at("link"), "usb");
+  EXPECT_EQ(info.at("protocol"), "quorin");
+  EXPECT_EQ(info.at("id"), "QU7");
+}
+
+TEST_F(UsbCli, ListsGetsAndRemoves) {
+  const bed::SimulatedUsb usb({"quorin"}, {{"a.log", Content(70000)}, {"b.log", "b"}});
+  EXPECT_THAT(RunOn(usb, {"ls"}).output, HasSubstr("2 files, 70001 bytes"));
+
+  const auto got = RunOn(usb, {"get", "a.log"});
+  EXPECT_EQ(got.status, kDone) << got.errors;
+  EXPECT_EQ(folder.Read("a.log"), Content(70000));
+  EXPECT_THAT(LocalFiles(), ElementsAre("a.log"));
+
+  EXPECT_EQ(RunOn(usb, {"rm", "a.log"}).status, kDone);
+  EXPECT_THAT(RunOn(usb, {"ls"}).output, HasSubstr("1 file, 1 bytes"));
+}
+
+TEST_F(UsbCli, AnyLinkFindsItOnUsb) {
+  const bed::SimulatedUsb usb({"quorin"});
+  const auto quiet = RunOn(usb, {"find"}, "any");
+  EXPECT_EQ(quiet.status, kDone) << quiet.errors;
+  EXPECT_THAT(quiet.output, HasSubstr("(usb): Quorin receiver"));
+  EXPECT_EQ(quiet.errors, "");
+
+  const auto verbose = RunOn(usb, {"find", "--verbose"}, "any");
+  EXPECT_EQ(verbose.status, kDone) << verbose.errors;
+  EXPECT_THAT(verbose.errors, HasSubstr("could not find a receiver on a serial port"));
+}
+
+TEST_F(UsbCli, AnyLinkFindsItOnASerialPort) {
+  const bed::SimulatedPort port({"quorin"});
+  const auto result = Run(On(port, {"find", "--link", "any", "--json"}));
+  EXPECT_EQ(result.status, kDone) << result.errors;
+  EXPECT_EQ(json::parse(result.output).at("link"), "serial");
+}
+
+TEST_F(UsbCli, AMissingDeviceIsSaidToBeMissing) {
+  const auto result = Run({"find", R"(\\?\rcvlink-none)", "--link", "usb"});
+  EXPECT_EQ(result.status, kNoReceiver);
+  EXPECT_THAT(result.errors, HasSubstr(R"(\\?\rcvlink-none does not exist)"));
+}
+
+TEST_F(UsbCli, OfTwoFailuresVerboseTellsBoth) {
+  const auto brief = Run({"find", R"(\\?\rcvlink-none)", "--link", "any"});
+  EXPECT_EQ(brief.status, kNoReceiver);
+  EXPECT_THAT(brief.errors, HasSubstr("on a serial port or on USB"));
+  EXPECT_THAT(brief.errors, HasSubstr("--verbose"));
+  const auto verbose = Run({"find", R"(\\?\rcvlink-none)", "--link", "any", "--verbose"});
+  EXPECT_THAT(verbose.errors, HasSubstr("find a receiver on a serial port:"));
+  EXPECT_THAT(verbose.errors, HasSubstr("find a receiver on USB:"));
+  EXPECT_THAT(verbose.errors, Not(HasSubstr("With --verbose")));
+}
+
+TEST_F(UsbCli, ADeviceOfAnotherLayoutHasNoReceiver) {
+  const bed::SimulatedUsb usb({"quorin", "--class-descriptor"});
+  const auto result = RunOn(usb, {"find"});
+  EXPECT_EQ(result.status, kNoReceiver);
+  EXPECT_THAT(result.errors, HasSubstr("no receiver answered"));
+}
+
+TEST_F(UsbCli, ASpeedIsNotForUsb) {
+  const auto result = Run({"find", R"(\\?\x)", "--link", "usb", "--speed", "9600"});
+  EXPECT_EQ(result.status, kUsage);
+}
+
+TEST_F(UsbCli, ADownloadThatIsUnpluggedIsAFailure) {
+  const bed::SimulatedUsb usb({"quorin", "--vanish-after", "20"}, {{"a.log", Content(100000)}});
+  const auto result = RunOn(usb, {"get", "a.log"});
+  EXPECT_EQ(result.status, kFailed);
+  EXPECT_THAT(result.errors, HasSubstr("a.log"));
+  EXPECT_FALSE(Has("a.log"));
+}
+
+}  // namespace
+}  // namespace cli_run
