@@ -180,6 +180,60 @@ NTSTATUS Complete(IRP* irp, NTSTATUS status, ULONG_PTR count = 0) {
   return status;
 }
 
+// ---- IRPs that are over
+//
+// Wine 8 cancels an IRP by its address, on the thread that calls the driver. A cancel that is on its
+// way while the IRP completes meets whatever is at that address then: memory that was freed, or the
+// IRP of quite another request. So the memory of IRPs that are over is kept for a while, until no
+// such cancel can be on its way any more. It goes by the completion routine that Wine has put into
+// the driver's own stack location; Windows does not put one there, and nothing is kept.
+
+constexpr size_t kKeptIrps = 128;
+
+// Places in an IRP that are the driver's.
+constexpr size_t kRequestContext = 0;
+constexpr size_t kRoutineContext = 1;
+constexpr size_t kRoutineArgumentContext = 2;
+
+IRP* kept_irps[kKeptIrps];
+size_t oldest_kept_irp;
+
+// Ends an IRP that was completed. The state must not be locked.
+void Release(IRP* kept) {
+  if (kept != nullptr) {
+    IoCompleteRequest(kept, IO_NO_INCREMENT);
+  }
+}
+
+NTSTATUS NTAPI KeepCompleted(DEVICE_OBJECT* device, IRP* irp, void*) {
+  void** const context = irp->Tail.Overlay.DriverContext;
+  const auto routine = reinterpret_cast<PIO_COMPLETION_ROUTINE>(context[kRoutineContext]);
+  const NTSTATUS status = routine(device, irp, context[kRoutineArgumentContext]);
+  if (status == STATUS_MORE_PROCESSING_REQUIRED) {
+    return status;
+  }
+  IRP* released = nullptr;
+  {
+    const StateGuard guard;
+    released = kept_irps[oldest_kept_irp];
+    kept_irps[oldest_kept_irp] = irp;
+    oldest_kept_irp = (oldest_kept_irp + 1) % kKeptIrps;
+  }
+  Release(released);
+  return STATUS_MORE_PROCESSING_REQUIRED;
+}
+
+// To be called for an IRP that is going to be pending.
+void KeepWhenCompleted(IRP* irp) {
+  IO_STACK_LOCATION* const stack = IoGetCurrentIrpStackLocation(irp);
+  if (stack->CompletionRoutine != nullptr) {
+    void** const context = irp->Tail.Overlay.DriverContext;
+    context[kRoutineContext] = reinterpret_cast<void*>(stack->CompletionRoutine);
+    context[kRoutineArgumentContext] = stack->Context;
+    stack->CompletionRoutine = KeepCompleted;
+  }
+}
+
 // IRPs that are to be completed once the state is no longer locked.
 class Completions {
  public:
@@ -369,7 +423,7 @@ void ServeReaders(Plug* plug, Completions& completions) {
 
 void NTAPI CancelRequest(DEVICE_OBJECT*, IRP* irp) {
   IoReleaseCancelSpinLock(irp->CancelIrql);
-  auto* const request = static_cast<Request*>(irp->Tail.Overlay.DriverContext[0]);
+  auto* const request = static_cast<Request*>(irp->Tail.Overlay.DriverContext[kRequestContext]);
   {
     const StateGuard guard;
     RemoveEntryList(&request->link);
@@ -386,7 +440,8 @@ NTSTATUS Enqueue(HostDevice* device, Request* request, Completions& completions)
     return STATUS_DEVICE_NOT_CONNECTED;
   }
   request->id = ++last_request;
-  request->irp->Tail.Overlay.DriverContext[0] = request;
+  request->irp->Tail.Overlay.DriverContext[kRequestContext] = request;
+  KeepWhenCompleted(request->irp);
   IoSetCancelRoutine(request->irp, CancelRequest);
   if (request->irp->Cancel && Claim(request->irp)) {
     return STATUS_CANCELLED;
@@ -761,6 +816,7 @@ NTSTATUS Wait(Plug* plug, IRP* irp, Completions& completions) {
   if (plug->waiting != nullptr) {
     return STATUS_INVALID_DEVICE_STATE;
   }
+  KeepWhenCompleted(irp);
   IoSetCancelRoutine(irp, CancelWaiting);
   if (irp->Cancel && Claim(irp)) {
     return STATUS_CANCELLED;
@@ -881,6 +937,9 @@ NTSTATUS NTAPI DispatchWrite(DEVICE_OBJECT* object, IRP* irp) {
 void NTAPI UnloadDriver(DRIVER_OBJECT*) {
   UNICODE_STRING link = Constant(kBusLink);
   IoDeleteSymbolicLink(&link);
+  for (IRP* const kept : kept_irps) {
+    Release(kept);
+  }
   while (!IsListEmpty(&host_devices)) {
     IoDeleteDevice(At<HostDevice>(RemoveHeadList(&host_devices))->object);
   }

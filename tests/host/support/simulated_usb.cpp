@@ -74,6 +74,33 @@ struct Started {
   UsbHandle output;
 };
 
+PROCESS_INFORMATION CreateProgram(const std::wstring& program,
+                                  std::wstring command,
+                                  STARTUPINFOW& startup) {
+  // Under load, one start in thousands fails so on Wine.
+  constexpr DWORD kPassingError = ERROR_INTERNAL_ERROR;
+  constexpr int kTries = 3;
+  PROCESS_INFORMATION started{};
+  for (int tries = 1;; ++tries) {
+    if (CreateProcessW(program.c_str(),
+                       command.data(),
+                       nullptr,
+                       nullptr,
+                       /*bInheritHandles=*/TRUE,
+                       0,
+                       nullptr,
+                       nullptr,
+                       &startup,
+                       &started)) {
+      return started;
+    }
+    const DWORD error = GetLastError();
+    if (error != kPassingError || tries == kTries) {
+      throw Error("cannot start rcvlink-sim-usb: error " + std::to_string(error));
+    }
+  }
+}
+
 Started StartProgram(const std::vector<std::string>& arguments) {
   const std::wstring program = ProgramPath().wstring();
   std::wstring command = Quoted(program);
@@ -92,19 +119,7 @@ Started StartProgram(const std::vector<std::string>& arguments) {
   startup.hStdInput = input.read.get();
   startup.hStdOutput = output.write.get();
   startup.hStdError = output.write.get();
-  PROCESS_INFORMATION started{};
-  if (!CreateProcessW(program.c_str(),
-                      command.data(),
-                      nullptr,
-                      nullptr,
-                      /*bInheritHandles=*/TRUE,
-                      0,
-                      nullptr,
-                      nullptr,
-                      &startup,
-                      &started)) {
-    throw Error("cannot start rcvlink-sim-usb: error " + std::to_string(GetLastError()));
-  }
+  const PROCESS_INFORMATION started = CreateProgram(program, command, startup);
   CloseHandle(started.hThread);
   return {UsbHandle(started.hProcess), std::move(input.write), std::move(output.read)};
 }
