@@ -20,6 +20,7 @@ BOOL Fail(DWORD error) {
 
 HANDLE FakeDevice::CreateFile(const wchar_t* path, DWORD access, DWORD share, DWORD flags) {
   calls.push_back("CreateFile");
+  if (on_open) on_open();
   opened_path = path;
   opened_access = access;
   opened_share = share;

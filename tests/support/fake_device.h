@@ -31,6 +31,7 @@ class FakeDevice : public DeviceCalls {
     HANDLE handle;
   };
   std::vector<Opening> openings;
+  std::function<void()> on_open;
   std::deque<DWORD> open_errors;  // of the next openings, ahead of open_error
 
   // Transfers: 0 completes at once; ERROR_IO_PENDING is waited for; any other fails.
