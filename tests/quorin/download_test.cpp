@@ -143,14 +143,6 @@ TEST_F(QuorinDownload, TakesAHostThatHadNothingToChange) {
   ExpectSaid({kSpeedUp, kStart, kBlocks, kRestore});
 }
 
-TEST_F(QuorinDownload, DoesNotRaiseAnythingOverUsb) {
-  connection->instance_type = eInstanceUSB;
-  Download();
-  EXPECT_EQ(Said().front(), "%%\n");
-  EXPECT_THAT(Said(), Not(Contains("speed 115200")));
-  EXPECT_THAT(Said(), Not(Contains("speed 9600")));
-}
-
 // The speed is put back after every failure, and the failure is the result.
 class QuorinFailedDownload : public QuorinDownload {
  protected:
