@@ -16,6 +16,7 @@ using sim::ReplyFaultKind;
 namespace {
 
 constexpr size_t kSize = SimulatedDownload::kUsualSize;
+constexpr DWORD kUsb = 0;           // a link without a speed
 constexpr uint32_t kLastBlock = 2;  // its number
 
 struct FaultCase {
@@ -58,6 +59,17 @@ TEST_P(QuorinOvercomes, WithTheWholeFile) {
   EXPECT_EQ(download.HostSpeed(), 9600U);
   EXPECT_FALSE(download.receiver.in_transfer());
   EXPECT_FALSE(download.receiver.echoes());
+  if (HasFailure()) FAIL() << download.Log();
+}
+
+TEST_P(QuorinOvercomes, WithTheWholeFileOverUsb) {
+  sim::QuorinOptions options;
+  GetParam().make(options);
+  SimulatedDownload download(options, kSize, kUsb);
+  EXPECT_EQ(download.Run(), S_OK);
+  EXPECT_TRUE(download.HasWholeFile());
+  EXPECT_FALSE(download.receiver.in_transfer());
+  EXPECT_EQ(download.CountInLog("rate,"), 0U);
   if (HasFailure()) FAIL() << download.Log();
 }
 

@@ -7,62 +7,16 @@
 #include <vector>
 
 #include "platform/hresult.h"
-#include "tests/quorin/block_stream.h"
-#include "tests/quorin/quorin_driver.h"
-#include "tests/support/memory_stream.h"
-#include "tests/support/report_capture.h"
+#include "tests/quorin/download_fixture.h"
 
 using testing::Contains;
 using testing::ElementsAre;
-using testing::ElementsAreArray;
 using testing::IsEmpty;
 using testing::Not;
 
 namespace {
 
-constexpr char kGetPort[] = "print,/cur/term\r\n";
-constexpr char kRaise[] = "set,/par/dev/ser/b/rate,115200\r\n";
-constexpr char kGetSize[] = "print,/log/A0101.log&size\r\n";
-constexpr char kGetFile[] = "get,\"A0101.log\":{500,512}\r\n";
-constexpr char kPutBack[] = "set,cur/term/rate,9600\r\n";
-
-// What is said in each part of a download of two blocks.
-const std::vector<std::string> kSpeedUp = {"%%print,/cur/term\r\n", kRaise, "speed 115200"};
-const std::vector<std::string> kStart = {
-    "%%\n", "%%print,/log/A0101.log&size\r\n", "%%get,\"A0101.log\":{500,512}\r\n", "\x15"};
-const std::vector<std::string> kBlocks = {"\x06", "#"};
-const std::vector<std::string> kRestore = {"%%set,cur/term/rate,9600\r\n", "speed 9600"};
-
-std::vector<std::string> Joined(std::initializer_list<std::vector<std::string>> parts) {
-  std::vector<std::string> all;
-  for (const auto& part : parts) all.insert(all.end(), part.begin(), part.end());
-  return all;
-}
-
-class QuorinDownload : public QuorinDriverTest {
- protected:
-  QuorinDownload() {
-    receiver.Reply(kGetPort, "/dev/ser/b");
-    receiver.Reply("\n", "");
-    receiver.Reply(kGetSize, "600");
-    receiver.Reply(kGetFile, "");
-    receiver.Reply(kPutBack, "");
-    receiver.On("\x15", [this](const std::string&) {
-      BlockStream blocks;
-      connection->GiveRead(blocks.Data(0, content.substr(0, 512)));
-      connection->GiveRead(blocks.Last(content.substr(512)));
-    });
-  }
-
-  HRESULT Download() { return driver.DownloadFile(L"A0101.log", &stream, nullptr); }
-  void ExpectSaid(std::initializer_list<std::vector<std::string>> parts) {
-    EXPECT_THAT(Said(), ElementsAreArray(Joined(parts)));
-  }
-
-  const std::string content = TestContent(600);
-  MemoryStream stream;
-  const ReportCapture report;
-};
+using QuorinDownload = QuorinDownloadTest;
 
 TEST_F(QuorinDownload, RaisesTheSpeedGetsTheFileAndPutsTheSpeedBack) {
   EXPECT_EQ(Download(), S_OK);
@@ -187,14 +141,6 @@ TEST_F(QuorinDownload, TakesAHostThatHadNothingToChange) {
   connection->set_speed_result = S_FALSE;
   EXPECT_EQ(Download(), S_OK);
   ExpectSaid({kSpeedUp, kStart, kBlocks, kRestore});
-}
-
-TEST_F(QuorinDownload, DoesNotRaiseAnythingOverUsb) {
-  connection->instance_type = eInstanceUSB;
-  Download();
-  EXPECT_EQ(Said().front(), "%%\n");
-  EXPECT_THAT(Said(), Not(Contains("speed 115200")));
-  EXPECT_THAT(Said(), Not(Contains("speed 9600")));
 }
 
 // The speed is put back after every failure, and the failure is the result.

@@ -19,8 +19,10 @@ enum class CancelledWrite {
 
 class AbortingConnection : public CIConnection {
  public:
-  AbortingConnection(sim::Receiver& receiver, CancelledWrite cancelled_write)
-      : inner_(receiver), cancelled_write_(cancelled_write) {}
+  AbortingConnection(sim::Receiver& receiver,
+                     CancelledWrite cancelled_write,
+                     DWORD host_speed = 9600)
+      : inner_(receiver, host_speed), cancelled_write_(cancelled_write) {}
 
   // The abort comes as the call of this number begins, or as it ends. Reads of no wait are not
   // counted: they belong to an abort.
@@ -48,7 +50,8 @@ class AbortingConnection : public CIConnection {
     });
   }
   HRESULT Flush() override {
-    return Call([&] { return inner_.Flush(); });
+    // Over USB it reads, and a cancel ends that as it ends any read.
+    return Call([&] { return Speed() == 0 && TakeCancel() ? S_OK : inner_.Flush(); });
   }
   void Cancel() override { cancelled_ = true; }
   HRESULT GetInstanceType(EInstanceType* type) override {

@@ -1,5 +1,9 @@
 #include "tests/support/fake_device.h"
 
+#include <algorithm>
+#include <cstdio>
+#include <utility>
+
 namespace {
 
 // Something real to own and close.
@@ -16,13 +20,20 @@ BOOL Fail(DWORD error) {
 
 HANDLE FakeDevice::CreateFile(const wchar_t* path, DWORD access, DWORD share, DWORD flags) {
   calls.push_back("CreateFile");
+  if (on_open) on_open();
   opened_path = path;
   opened_access = access;
   opened_share = share;
   opened_flags = flags;
-  if (open_error == ERROR_SUCCESS) return OpenNothing();
-  SetLastError(open_error);
-  return INVALID_HANDLE_VALUE;
+  DWORD error = open_error;
+  if (!open_errors.empty()) {
+    error = open_errors.front();
+    open_errors.pop_front();
+  }
+  const HANDLE handle = error == ERROR_SUCCESS ? OpenNothing() : INVALID_HANDLE_VALUE;
+  openings.push_back({path, access, share, flags, handle});
+  if (error != ERROR_SUCCESS) SetLastError(error);
+  return handle;
 }
 
 BOOL FakeDevice::Answer(const std::string& call) {
@@ -30,30 +41,66 @@ BOOL FakeDevice::Answer(const std::string& call) {
   return call == failing_call ? Fail(failure) : TRUE;
 }
 
-BOOL FakeDevice::StartTransfer(const std::string& call, DWORD* count) {
+BOOL FakeDevice::StartTransfer(const std::string& call, HANDLE handle, DWORD size, DWORD* count) {
   calls.push_back(call);
-  if (transfer_error != ERROR_SUCCESS) return Fail(transfer_error);
-  *count = transferred;
+  transfer_calls.push_back({call, handle, size});
+  TransferAnswer answer{transfer_error, transferred};
+  if (!transfers.empty()) {
+    answer = transfers.front();
+    transfers.pop_front();
+  }
+  if (answer.error != ERROR_SUCCESS) return Fail(answer.error);
+  *count = answer.count;
   return TRUE;
 }
 
-BOOL FakeDevice::ReadFile(HANDLE, void*, DWORD, DWORD* read, OVERLAPPED*) {
-  return StartTransfer("ReadFile", read);
+BOOL FakeDevice::ReadFile(HANDLE handle, void*, DWORD size, DWORD* read, OVERLAPPED*) {
+  return StartTransfer("ReadFile", handle, size, read);
 }
 
-BOOL FakeDevice::WriteFile(HANDLE, const void*, DWORD, DWORD* written, OVERLAPPED*) {
-  return StartTransfer("WriteFile", written);
+BOOL FakeDevice::WriteFile(HANDLE handle, const void*, DWORD size, DWORD* written, OVERLAPPED*) {
+  return StartTransfer("WriteFile", handle, size, written);
 }
 
-BOOL FakeDevice::GetOverlappedResult(HANDLE, OVERLAPPED*, DWORD* bytes, BOOL wait) {
-  calls.push_back(wait ? "GetOverlappedResult waiting" : "GetOverlappedResult");
+BOOL FakeDevice::GetOverlappedResult(HANDLE handle, OVERLAPPED*, DWORD* bytes, BOOL wait) {
+  const std::string call = wait ? "GetOverlappedResult waiting" : "GetOverlappedResult";
+  calls.push_back(call);
+  transfer_calls.push_back({call, handle, 0});
   if (wait) return Fail(ERROR_OPERATION_ABORTED);
   if (overlapped_error != ERROR_SUCCESS) return Fail(overlapped_error);
   *bytes = transferred;
   return TRUE;
 }
 
-BOOL FakeDevice::CancelIo(HANDLE) { return Answer("CancelIo"); }
+BOOL FakeDevice::CancelIo(HANDLE handle) {
+  transfer_calls.push_back({"CancelIo", handle, 0});
+  return Answer("CancelIo");
+}
+
+BOOL FakeDevice::DeviceIoControl(HANDLE handle,
+                                 DWORD code,
+                                 const void* input,
+                                 DWORD input_size,
+                                 void* output,
+                                 DWORD output_size,
+                                 DWORD* returned) {
+  char name[32] = {};
+  std::snprintf(name, sizeof(name), "DeviceIoControl %08lX", code);
+  calls.push_back(name);
+  requests.push_back(
+      {handle, code, std::string(static_cast<const char*>(input), input_size), output_size});
+  if (on_request) on_request(requests.back());
+  RequestAnswer answer;
+  if (auto& answers = request_answers[code]; !answers.empty()) {
+    answer = std::move(answers.front());
+    answers.pop_front();
+  }
+  if (answer.error != ERROR_SUCCESS) return Fail(answer.error);
+  const size_t count = std::min<size_t>(answer.output.size(), output_size);
+  std::copy_n(answer.output.begin(), count, static_cast<char*>(output));
+  *returned = static_cast<DWORD>(count);
+  return TRUE;
+}
 
 DWORD FakeDevice::WaitForMultipleObjects(DWORD count, const HANDLE* handles, DWORD timeout_ms) {
   calls.push_back("Wait");

@@ -1,9 +1,10 @@
-// The Win32 calls of a connection, answered by a script: what a real port would say, in order.
+// The Win32 calls of a connection, answered by a script: what a real device would say, in order.
 #ifndef RCVLINK_TESTS_SUPPORT_FAKE_DEVICE_H_
 #define RCVLINK_TESTS_SUPPORT_FAKE_DEVICE_H_
 
 #include <deque>
 #include <functional>
+#include <map>
 #include <string>
 #include <vector>
 
@@ -21,15 +22,53 @@ class FakeDevice : public DeviceCalls {
   DWORD opened_access = 0;
   DWORD opened_share = 99;
   DWORD opened_flags = 0;
+  // Every opening, for devices that are opened more than once.
+  struct Opening {
+    std::wstring path;
+    DWORD access;
+    DWORD share;
+    DWORD flags;
+    HANDLE handle;
+  };
+  std::vector<Opening> openings;
+  std::function<void()> on_open;
+  std::deque<DWORD> open_errors;  // of the next openings, ahead of open_error
 
   // Transfers: 0 completes at once; ERROR_IO_PENDING is waited for; any other fails.
   DWORD transfer_error = ERROR_SUCCESS;
   DWORD transferred = 0;
+  struct TransferAnswer {
+    DWORD error;
+    DWORD count;
+  };
+  std::deque<TransferAnswer> transfers;  // how the next ones start, ahead of the two above
+  struct Transfer {
+    std::string call;
+    HANDLE device;
+    DWORD size;  // 0 for a call that has none
+  };
+  std::vector<Transfer> transfer_calls;  // all calls of transfers, with the handle they were for
   // What the wait gives (its index, WAIT_TIMEOUT, WAIT_FAILED), and runs first.
   DWORD wait_answer = WAIT_OBJECT_0 + 1;
   std::function<void(DWORD count, const HANDLE* handles)> on_wait;
   DWORD wait_timeout = 0;
   DWORD overlapped_error = ERROR_SUCCESS;  // of GetOverlappedResult without waiting
+
+  // Requests to the driver: what it answers to each code, one after the other; then a success
+  // without output. Their names in `calls` carry the code.
+  struct RequestAnswer {
+    DWORD error = ERROR_SUCCESS;
+    std::string output = {};
+  };
+  std::map<DWORD, std::deque<RequestAnswer>> request_answers;
+  struct Request {
+    HANDLE device;
+    DWORD code;
+    std::string input;
+    DWORD output_size;
+  };
+  std::vector<Request> requests;
+  std::function<void(const Request&)> on_request;
 
   // The serial port: which of the calls fail, and with what.
   DCB state{};
@@ -54,6 +93,13 @@ class FakeDevice : public DeviceCalls {
       HANDLE, const void* buffer, DWORD size, DWORD* written, OVERLAPPED* block) override;
   BOOL GetOverlappedResult(HANDLE, OVERLAPPED* block, DWORD* bytes, BOOL wait) override;
   BOOL CancelIo(HANDLE) override;
+  BOOL DeviceIoControl(HANDLE device,
+                       DWORD code,
+                       const void* input,
+                       DWORD input_size,
+                       void* output,
+                       DWORD output_size,
+                       DWORD* returned) override;
   DWORD WaitForMultipleObjects(DWORD count, const HANDLE* handles, DWORD timeout_ms) override;
   BOOL SetCommMask(HANDLE, DWORD mask) override;
   BOOL SetupComm(HANDLE, DWORD input_queue, DWORD output_queue) override;
@@ -65,7 +111,7 @@ class FakeDevice : public DeviceCalls {
 
  private:
   BOOL Answer(const std::string& call);
-  BOOL StartTransfer(const std::string& call, DWORD* count);
+  BOOL StartTransfer(const std::string& call, HANDLE handle, DWORD size, DWORD* count);
 };
 
 #endif  // RCVLINK_TESTS_SUPPORT_FAKE_DEVICE_H_

@@ -18,6 +18,7 @@ HRESULT SimulatedConnection::Read(void* buffer, DWORD size, DWORD* bytes_read, D
     if (bytes.empty()) break;
     std::ranges::copy(bytes, out + *bytes_read);
     *bytes_read += static_cast<DWORD>(bytes.size());
+    if (IsUsb()) break;
   }
   return *bytes_read == 0 ? kTimedOut : S_OK;
 }
@@ -33,7 +34,7 @@ HRESULT SimulatedConnection::Flush() {
 }
 
 HRESULT SimulatedConnection::GetInstanceType(EInstanceType* type) {
-  *type = eInstanceSerial;
+  *type = IsUsb() ? eInstanceUSB : eInstanceSerial;
   return S_OK;
 }
 
@@ -44,11 +45,11 @@ HRESULT SimulatedConnection::GetName(BSTR* name) {
 
 HRESULT SimulatedConnection::GetSpeed(DWORD* speed) {
   *speed = speed_;
-  return S_OK;
+  return IsUsb() ? S_FALSE : S_OK;
 }
 
 HRESULT SimulatedConnection::SetSpeed(DWORD speed) {
-  if (speed == speed_) return S_FALSE;
+  if (IsUsb() || speed == speed_) return S_FALSE;
   speed_ = speed;
   port_.SetHostSpeed(speed);
   return S_OK;

@@ -8,8 +8,9 @@
 #include "simulator/ports/memory.h"
 #include "transport/connection.h"
 
-// Behaves as a serial connection to the receiver. Reads end when as many bytes came as were asked
-// for, or once the line was quiet for a while, as a COM port's do.
+// Behaves as a serial connection to the receiver: reads end when as many bytes came as were asked
+// for, or once the line was quiet for a while, as a COM port's do. At a speed of 0 it is one over
+// USB: reads end with whatever is there.
 class SimulatedConnection : public CIConnection {
  public:
   explicit SimulatedConnection(sim::Receiver& receiver, DWORD host_speed = 9600)
@@ -32,6 +33,8 @@ class SimulatedConnection : public CIConnection {
   HRESULT SetSpeed(DWORD speed) override;
 
  private:
+  bool IsUsb() const { return speed_ == 0; }
+
   sim::MemoryPort port_;
   DWORD speed_;
   bool cancelled_ = false;  // one cancel ends one read
