@@ -8,7 +8,7 @@
 #include <optional>
 #include <string>
 
-#include "tests/quorin/guarded_bytes.h"
+#include "tests/support/guarded_bytes.h"
 
 using namespace QuorinCommands;
 using Kind = QuorinCommands::ListMessage::Kind;

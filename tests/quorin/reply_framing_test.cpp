@@ -8,7 +8,7 @@
 #include <random>
 #include <string>
 
-#include "tests/quorin/guarded_bytes.h"
+#include "tests/support/guarded_bytes.h"
 
 using namespace QuorinCommands;
 

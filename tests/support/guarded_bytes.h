@@ -1,6 +1,6 @@
 // A copy of some bytes with an unreadable page right behind them: reading on ends the program.
-#ifndef RCVLINK_TESTS_QUORIN_GUARDED_BYTES_H_
-#define RCVLINK_TESTS_QUORIN_GUARDED_BYTES_H_
+#ifndef RCVLINK_TESTS_SUPPORT_GUARDED_BYTES_H_
+#define RCVLINK_TESTS_SUPPORT_GUARDED_BYTES_H_
 
 #include <algorithm>
 #include <cstddef>
@@ -33,4 +33,4 @@ class GuardedBytes {
   char* begin_ = nullptr;
 };
 
-#endif  // RCVLINK_TESTS_QUORIN_GUARDED_BYTES_H_
+#endif  // RCVLINK_TESTS_SUPPORT_GUARDED_BYTES_H_
