@@ -1,6 +1,17 @@
 #include "transport/device_calls.h"
 
+#include <atomic>
+
 #include "platform/handle.h"
+
+namespace {
+
+std::atomic<DeviceCalls*>& Override() {
+  static std::atomic<DeviceCalls*> calls{nullptr};
+  return calls;
+}
+
+}  // namespace
 
 HANDLE DeviceCalls::CreateFile(const wchar_t* path, DWORD access, DWORD share, DWORD flags) {
   return CreateFileW(path, access, share, nullptr, OPEN_EXISTING, flags, nullptr);
@@ -67,6 +78,12 @@ BOOL DeviceCalls::ClearCommError(HANDLE device, DWORD* errors, COMSTAT* status) 
 BOOL DeviceCalls::PurgeComm(HANDLE device, DWORD flags) { return ::PurgeComm(device, flags); }
 
 DeviceCalls& SystemCalls() {
-  static DeviceCalls calls;
-  return calls;
+  static DeviceCalls system_calls;
+  DeviceCalls* const calls = Override();
+  return calls ? *calls : system_calls;
 }
+
+SystemCallsOverride::SystemCallsOverride(DeviceCalls& calls)
+    : previous_(Override().exchange(&calls)) {}
+
+SystemCallsOverride::~SystemCallsOverride() { Override() = previous_; }

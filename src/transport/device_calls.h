@@ -36,7 +36,20 @@ class DeviceCalls {
   virtual BOOL PurgeComm(HANDLE device, DWORD flags);
 };
 
-// The system's own.
+// The system's own, unless a test has put others in their place.
 DeviceCalls& SystemCalls();
+
+// Answers for the system in a scope; for tests, on one thread. A connection keeps the calls that it was
+// made with.
+class SystemCallsOverride {
+ public:
+  explicit SystemCallsOverride(DeviceCalls& calls);
+  SystemCallsOverride(const SystemCallsOverride&) = delete;
+  SystemCallsOverride& operator=(const SystemCallsOverride&) = delete;
+  ~SystemCallsOverride();
+
+ private:
+  DeviceCalls* previous_;
+};
 
 #endif  // RCVLINK_TRANSPORT_DEVICE_CALLS_H_

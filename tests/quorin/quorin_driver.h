@@ -7,12 +7,11 @@
 #include <functional>
 #include <memory>
 #include <string>
-#include <thread>
 #include <vector>
 
-#include "platform/handle.h"
 #include "quorin/quorin_protocol.h"
 #include "tests/quorin/quorin_responder.h"
+#include "tests/support/driver_lock.h"
 #include "tests/support/scripted_connection.h"
 
 class ProgressRecorder : public CIProtocolCallback {
@@ -27,33 +26,7 @@ class ProgressRecorder : public CIProtocolCallback {
 };
 
 // The driver under test, with the handle of its lock for the report's lines.
-class QuorinDriver : public CQuorinProtocol {
- public:
-  using CQuorinProtocol::CQuorinProtocol;
-
-  HANDLE LockHandle() const { return connection_lock_.handle(); }
-  // As the report writes a handle: sixteen digits.
-  std::string LockText() const {
-    char digits[32] = {};
-    std::snprintf(digits,
-                  sizeof(digits),
-                  "[0x%016llX]",
-                  static_cast<unsigned long long>(reinterpret_cast<uintptr_t>(LockHandle())));
-    return digits;
-  }
-};
-
-// Whether another thread could take the connection at once.
-inline bool IsFreeForOthers(CIProtocol& driver) {
-  HRESULT locked = E_FAIL;
-  std::thread([&] {
-    // The lock comes first if it is free, or else the event.
-    const KernelHandle event(CreateEventW(nullptr, TRUE, TRUE, nullptr));
-    locked = driver.LockConnection(event.get());
-    if (locked == S_OK) driver.UnlockConnection();
-  }).join();
-  return locked == S_OK;
-}
+using QuorinDriver = WithLockText<CQuorinProtocol>;
 
 class QuorinDriverTest : public testing::Test {
  protected:

@@ -38,10 +38,11 @@ HRESULT ScriptedConnection::Read(void* buffer, DWORD size, DWORD* bytes_read, DW
   return result;
 }
 
-HRESULT ScriptedConnection::Write(const void* buffer, DWORD size, DWORD) {
+HRESULT ScriptedConnection::Write(const void* buffer, DWORD size, DWORD timeout_ms) {
   const std::string bytes(static_cast<const char*>(buffer), size);
   calls.push_back("write " + bytes);
   writes_.push_back(bytes);
+  write_timeouts.push_back(timeout_ms);
   return on_write ? on_write(bytes) : S_OK;
 }
 

@@ -44,6 +44,7 @@ class ScriptedConnection : public CIConnection {
   std::vector<std::string> calls;
   std::vector<std::string> Writes() const;  // the bytes of each write
   std::string Written() const;              // all of them
+  std::vector<DWORD> write_timeouts;        // of each write
   HANDLE abort_event = nullptr;
   size_t AnswersLeft() const { return answers_.size(); }
 

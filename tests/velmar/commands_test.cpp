@@ -3,10 +3,12 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include <algorithm>
 #include <functional>
 #include <string>
 #include <vector>
 
+#include "tests/support/guarded_bytes.h"
 #include "tests/support/manual_clock.h"
 #include "tests/support/report_capture.h"
 #include "tests/support/scripted_connection.h"
@@ -108,6 +110,188 @@ TEST_F(VelmarExchange, ALogInPiecesOfAnySizeIsRead) {
   }
 }
 
+std::string Version(const std::string& body) { return kOkPrompt + AsciiLog("VERSIONA", body); }
+
+const std::string kVersionBody = "1,GPSCARD,\"OEM\",\"SN\",\"HW\",\"SW\",\"B\",\"D\",\"T\"";
+const std::string kPorts =
+    "2,COM1,9600,N,8,1,N,ON,OFF,NOVATEL,NOVATEL,ON,COM2,57600,E,7,2,XON,ON,OFF,NOVATEL,NOVATEL,ON";
+
+std::string FileHeader(const std::string& size) {
+  std::string body = "\"a.pdc\"," + size;
+  for (int i = 2; i < 23; ++i) body += ",0";
+  return kOkPrompt + AsciiLog("FILEHDRA", body);
+}
+
+std::string Directory(int files) {
+  std::string reply = kOkPrompt;
+  for (int i = files - 1; i >= 0; --i) {
+    reply +=
+        AsciiLog("DIRENTA", "\"" + std::to_string(i) + "\"," + std::to_string(i) + ",0,1,1", i);
+  }
+  return reply;
+}
+
+// Runs a command once for each place at which its reply may be cut in two.
+template <typename Command, typename Check>
+void AtEverySplit(const std::string& reply, Check check) {
+  for (size_t cut = 1; cut < reply.size(); ++cut) {
+    SCOPED_TRACE(cut);
+    ScriptedConnection connection;
+    connection.GiveRead(reply.substr(0, cut));
+    connection.GiveRead(reply.substr(cut));
+    Command command;
+    EXPECT_EQ(command.Execute(&connection, nullptr), S_OK);
+    check(command);
+    // What was held when the second part came stands in the kept reply once more.
+    const std::string kept(command.GetReply(), command.GetReply() + command.GetReplyLength());
+    const bool both = connection.AnswersLeft() == 0;
+    EXPECT_EQ(kept, both ? reply.substr(0, cut) + reply : reply.substr(0, cut));
+  }
+}
+
+TEST_F(VelmarExchange, AVersionIsReadWhereverItIsCut) {
+  AtEverySplit<CGetReceiverInfoCmd>(Version(kVersionBody), [](const auto& command) {
+    EXPECT_EQ(command.Response(), RESPONSE_DATA);
+    EXPECT_EQ(command.Version().model, L"OEM");
+    EXPECT_EQ(command.Version().serial_number, L"SN");
+    EXPECT_EQ(command.Version().hardware_version, L"HW");
+    EXPECT_EQ(command.Version().software_version, L"SW");
+  });
+}
+
+TEST_F(VelmarExchange, ADirectoryIsReadWhereverItIsCut) {
+  AtEverySplit<CGetFileListCmd>(Directory(3), [](auto& command) {
+    EXPECT_EQ(command.Response(), RESPONSE_DATA);
+    ASSERT_EQ(command.Entries().size(), 3u);
+    EXPECT_EQ(command.Entries()[0].name, L"2");
+    EXPECT_EQ(command.Entries()[2].name, L"0");
+  });
+}
+
+TEST_F(VelmarExchange, AFileHeaderIsReadWhereverItIsCut) {
+  AtEverySplit<CGetFileHeaderCmd>(FileHeader("123456"), [](const auto& command) {
+    EXPECT_EQ(command.Response(), RESPONSE_DATA);
+    EXPECT_EQ(command.FileHeader().file_name, L"\"a.pdc\"");
+    EXPECT_EQ(command.FileHeader().file_size, 123456);
+  });
+}
+
+TEST_F(VelmarExchange, AConfigurationIsReadWhereverItIsCut) {
+  const std::string reply = kOkPrompt + AsciiLog("COMCONFIGA", kPorts, 0, "COM2");
+  AtEverySplit<CLogConfigCommand>(reply, [](const auto& command) {
+    EXPECT_EQ(command.Response(), RESPONSE_DATA);
+    EXPECT_EQ(command.Config().port_name, L"COM2");
+    EXPECT_EQ(command.Config().baud, 57600);
+    EXPECT_EQ(command.Config().parity, 1);
+    EXPECT_EQ(command.Config().data_bits, 7);
+    EXPECT_EQ(command.Config().stop_bits, 2);
+    EXPECT_EQ(command.Config().handshake, 1);
+  });
+}
+
+TEST_F(VelmarExchange, AnAcknowledgementIsReadWhereverItIsCut) {
+  AtEverySplit<CUnlogAllCommand>(
+      kOkPrompt, [](const auto& command) { EXPECT_EQ(command.Response(), RESPONSE_OK); });
+  AtEverySplit<CUnlogAllCommand>(
+      kErrorPrompt, [](const auto& command) { EXPECT_EQ(command.Response(), RESPONSE_ERROR); });
+}
+
+TEST_F(VelmarExchange, AVersionWithoutComponentsIsCompleteAndEmpty) {
+  CGetReceiverInfoCmd command;
+  EXPECT_EQ(Run(command, {Version("0")}), S_OK);
+  EXPECT_EQ(command.Response(), RESPONSE_DATA);
+  EXPECT_EQ(connection.calls.size(), 3u);  // nothing more is waited for
+  EXPECT_EQ(command.Version().model, L"");
+  EXPECT_EQ(command.Version().serial_number, L"");
+  EXPECT_EQ(command.Version().hardware_version, L"");
+  EXPECT_EQ(command.Version().software_version, L"");
+}
+
+// The type says data as soon as any has come; that it is not whole shows in the fields alone.
+TEST_F(VelmarExchange, ALogThatStaysIncompleteEndsWithTheTimeOut) {
+  const auto run = [&](CVelmarCommand& command, const std::string& reply) {
+    connection.calls.clear();
+    EXPECT_EQ(Run(command, {reply}), S_OK);
+    EXPECT_EQ(connection.calls.size(), 4u) << reply;
+    return command.Response();
+  };
+  CGetReceiverInfoCmd version;
+  EXPECT_EQ(run(version, Version("2" + kVersionBody.substr(1))), RESPONSE_DATA);
+  EXPECT_EQ(version.Version().model, L"");
+  CGetReceiverInfoCmd many;
+  EXPECT_EQ(run(many, Version("2147483647" + kVersionBody.substr(1))), RESPONSE_DATA);
+  CGetReceiverInfoCmd open;
+  EXPECT_EQ(run(open, kOkPrompt + "#VERSIONA,COM1,0,55,F,1888,4,0,0,1;\"1"), RESPONSE_INCOMPLETE);
+  CGetFileListCmd files;
+  EXPECT_EQ(run(files, kOkPrompt + AsciiLog("DIRENTA", "a,1,0,1,1", 1)), RESPONSE_DATA);
+  EXPECT_EQ(files.Entries().size(), 1u);
+  CGetFileListCmd quoted;
+  EXPECT_EQ(run(quoted, kOkPrompt + "#\"DIRENTA,COM1"), RESPONSE_OK);
+  CGetFileHeaderCmd header;
+  EXPECT_EQ(run(header, kOkPrompt + AsciiLog("FILEHDRA", "\"a\",5,0")), RESPONSE_DATA);
+  EXPECT_EQ(header.FileHeader().file_size, 0);
+  CLogConfigCommand config;
+  EXPECT_EQ(run(config, kOkPrompt + AsciiLog("COMCONFIGA", "1,COM1,9600")), RESPONSE_DATA);
+  EXPECT_EQ(config.Config().port_name, L"");
+}
+
+TEST_F(VelmarExchange, ARefusalWithoutTextEndsTheWaitForALog) {
+  CGetReceiverInfoCmd command;
+  EXPECT_EQ(Run(command, {kErrorPrompt}), S_OK);
+  EXPECT_EQ(command.Response(), RESPONSE_ERROR);
+  EXPECT_EQ(connection.calls.size(), 3u);
+}
+
+TEST_F(VelmarExchange, ARefusalWithTextEndsTheWaitForALog) {
+  CGetFileListCmd command;
+  EXPECT_EQ(Run(command, {kErrorTextPrompt}), S_OK);
+  EXPECT_EQ(command.Response(), RESPONSE_UNKNOWN);
+  EXPECT_EQ(connection.calls.size(), 3u);
+}
+
+TEST_F(VelmarExchange, StrayBytesEndTheWaitForALog) {
+  CGetFileListCmd command;
+  EXPECT_EQ(Run(command, {"x" + Directory(1)}), S_OK);
+  EXPECT_EQ(command.Response(), RESPONSE_UNKNOWN);
+  EXPECT_EQ(connection.calls.size(), 3u);
+}
+
+// A log behind a line end is not looked for, however long it is waited.
+TEST_F(VelmarExchange, ALogBehindALineEndIsNotSeen) {
+  CGetReceiverInfoCmd command;
+  const std::string log = AsciiLog("VERSIONA", kVersionBody);
+  EXPECT_EQ(Run(command, {kOkPrompt + "\r\n", log}), S_OK);
+  EXPECT_EQ(command.Response(), RESPONSE_OK);
+  EXPECT_EQ(connection.calls.size(), 5u);
+}
+
+TEST_F(VelmarExchange, ALogOfAnotherNameIsReadByItsFields) {
+  CGetReceiverInfoCmd command;
+  EXPECT_EQ(Run(command, {kOkPrompt + AsciiLog("OTHERA", kVersionBody)}), S_OK);
+  EXPECT_EQ(command.Response(), RESPONSE_DATA);
+  EXPECT_EQ(command.Version().model, L"OEM");
+}
+
+TEST_F(VelmarExchange, ALogOfAPortIsThatOfTheHeader) {
+  for (const char* port : {"COM1", "COM2"}) {
+    CLogConfigCommand command;
+    EXPECT_EQ(Run(command, {kOkPrompt + AsciiLog("COMCONFIGA", kPorts, 0, port)}), S_OK);
+    EXPECT_EQ(command.Config().port_name, port == std::string("COM1") ? L"COM1" : L"COM2");
+    EXPECT_EQ(command.Config().baud, port == std::string("COM1") ? 9600 : 57600);
+  }
+}
+
+TEST_F(VelmarExchange, WithoutPortsThereIsNoConfiguration) {
+  for (const char* count : {"0", "-1", "-2147483648"}) {
+    CLogConfigCommand command;
+    connection.calls.clear();
+    EXPECT_EQ(Run(command, {kOkPrompt + AsciiLog("COMCONFIGA", count)}), S_OK);
+    EXPECT_EQ(command.Response(), RESPONSE_DATA) << count;
+    EXPECT_EQ(command.Config().port_name, L"") << count;
+    EXPECT_EQ(connection.calls.size(), 3u) << count;
+  }
+}
+
 TEST_F(VelmarExchange, ADirectoryIsReadFromItsFirstByteEachTime) {
   CGetFileListCmd command;
   const std::string first = AsciiLog("DIRENTA", "\"a\",1,0,20120101,000000", 1);
@@ -127,17 +311,38 @@ TEST_F(VelmarExchange, AGapInTheDirectoryIsAnError) {
   EXPECT_EQ(command.Entries().size(), 2u);
 }
 
-// A directory that is larger than the receive buffer ends with what fitted in.
+// A directory that is larger than the receive buffer ends with what fitted in, whatever the reads.
 TEST_F(VelmarExchange, ADirectoryLargerThanTheBufferIsCut) {
-  CGetFileListCmd command;
-  std::string reply = kOkPrompt;
-  for (int i = 199; i >= 0; --i) {
-    reply += AsciiLog("DIRENTA", "\"" + std::to_string(i) + "\",1,0,20120101,000000", i);
+  constexpr size_t kBuffer = 8192;
+  const std::string reply = Directory(200);
+  ASSERT_GT(reply.size(), kBuffer);
+  size_t fitting = 0;
+  for (size_t end = 0; (end = reply.find("*12345678\r\n", end)) != std::string::npos; ++fitting) {
+    end += 11;
+    if (end > kBuffer) break;
   }
-  EXPECT_EQ(Run(command, {reply}), S_OK);
-  EXPECT_EQ(command.Response(), RESPONSE_DATA);
-  EXPECT_GT(command.Entries().size(), 50u);
-  EXPECT_LT(command.Entries().size(), 200u);
+  for (const size_t piece : {size_t{100}, size_t{4000}, kBuffer, reply.size()}) {
+    ScriptedConnection pieces;
+    for (size_t i = 0; i < reply.size(); i += piece) pieces.GiveRead(reply.substr(i, piece));
+    CGetFileListCmd command;
+    EXPECT_EQ(command.Execute(&pieces, nullptr), S_OK);
+    EXPECT_EQ(command.Response(), RESPONSE_DATA);
+    EXPECT_EQ(command.Entries().size(), fitting) << piece;
+    EXPECT_EQ(command.Entries().front().name, L"199");
+    EXPECT_GT(pieces.AnswersLeft(), 0u);
+  }
+}
+
+TEST_F(VelmarExchange, ADirectoryThatJustFillsTheBufferIsWhole) {
+  constexpr size_t kBuffer = 8192;
+  std::string reply = Directory(80);
+  ASSERT_LT(reply.size(), kBuffer);
+  const std::string padding(kBuffer - reply.size(), 'x');
+  reply.insert(reply.find("\"79\"") + 1, padding);
+  CGetFileListCmd command;
+  EXPECT_EQ(Run(command, {reply.substr(0, 8191), reply.substr(8191)}), S_OK);
+  EXPECT_EQ(command.Entries().size(), 80u);
+  EXPECT_EQ(connection.calls.back(), "read 1 30000");
 }
 
 TEST_F(VelmarExchange, AHeaderOfTooFewFieldsIsIncomplete) {
@@ -161,6 +366,31 @@ TEST_F(VelmarExchange, TheCurrentFileIsSetOnceAcknowledged) {
   EXPECT_EQ(connection.calls.size(), 3u);
   EXPECT_EQ(Run(command, {kErrorPrompt}), S_OK);
   EXPECT_EQ(command.Response(), RESPONSE_ERROR);
+  EXPECT_EQ(connection.calls.size(), 6u);
+}
+
+TEST_F(VelmarExchange, TheCurrentFileIsRefusedWithAText) {
+  CSetCurrentFileCmd command("a");
+  EXPECT_EQ(Run(command, {kErrorTextPrompt}), S_OK);
+  EXPECT_EQ(command.Response(), RESPONSE_UNKNOWN);
+  EXPECT_EQ(connection.calls.size(), 3u);
+}
+
+TEST_F(VelmarExchange, TheCurrentFileIsNotSetBeforeThePromptHasEnded) {
+  for (size_t cut = 1; cut < kOkPrompt.size(); ++cut) {
+    ScriptedConnection pieces;
+    pieces.GiveRead(kOkPrompt.substr(0, cut));
+    pieces.GiveRead(kOkPrompt.substr(cut));
+    CSetCurrentFileCmd command("a");
+    EXPECT_EQ(command.Execute(&pieces, nullptr), S_OK);
+    EXPECT_EQ(command.Response(), RESPONSE_OK) << cut;
+    EXPECT_EQ(pieces.AnswersLeft(), 0u) << cut;
+  }
+}
+
+TEST_F(VelmarExchange, TheCurrentFileFailsWithAnAbbreviatedLog) {
+  CSetCurrentFileCmd command("a");
+  EXPECT_EQ(Run(command, {kOkPrompt + "<"}), E_NOTIMPL);
 }
 
 // --- FILETRANSFER
@@ -249,6 +479,122 @@ TEST_F(FileTransfer, LyingLengthsEnd) {
   }
 }
 
+TEST_F(FileTransfer, ChunksArriveWhereverTheReplyIsCut) {
+  const std::string reply = kOkPrompt + BinaryLog{"first chunk", 2}.Bytes() +
+                            BinaryLog{"second", 1}.Bytes() + BinaryLog{"the end", 0}.Bytes();
+  for (size_t cut = 1; cut < reply.size(); ++cut) {
+    ScriptedConnection pieces;
+    pieces.GiveRead(reply.substr(0, cut));
+    pieces.GiveRead(reply.substr(cut));
+    Chunks got;
+    CReadFileCmd read(&got, &got);
+    got.command = &read;
+    EXPECT_EQ(read.Execute(&pieces, nullptr), S_OK);
+    EXPECT_EQ(read.Response(), RESPONSE_DATA) << cut;
+    EXPECT_THAT(got.chunks, ElementsAre("first chunk", "second", "the end")) << cut;
+    EXPECT_EQ(pieces.AnswersLeft(), 0u);
+  }
+}
+
+TEST_F(FileTransfer, AFileManyTimesTheBufferPassesThrough) {
+  std::string reply = kOkPrompt;
+  std::vector<std::string> expected;
+  for (int i = 99; i >= 0; --i) {
+    expected.push_back(std::string(1000, static_cast<char>(i + ' ')));
+    reply += BinaryLog{expected.back(), static_cast<uint16_t>(i)}.Bytes();
+  }
+  EXPECT_EQ(Transfer({reply}), S_OK);
+  EXPECT_EQ(command.Response(), RESPONSE_DATA);
+  EXPECT_TRUE(chunks.chunks == expected);
+}
+
+// Only the first of the three sync bytes is looked at, and that only ahead of the first chunk; the
+// checksum never.
+TEST_F(FileTransfer, SyncBytesAndChecksumsAreNotLookedAt) {
+  std::string first = BinaryLog{"one..", 2}.Bytes();
+  first[1] = 'x';
+  first[2] = 'y';
+  std::string second = BinaryLog{"two..", 1}.Bytes();
+  second[0] = 'x';
+  EXPECT_EQ(Transfer({kOkPrompt + first + second + BinaryLog{"three", 0}.Bytes()}), S_OK);
+  EXPECT_EQ(command.Response(), RESPONSE_DATA);
+  EXPECT_THAT(chunks.chunks, ElementsAre("one..", "two..", "three"));
+}
+
+TEST_F(FileTransfer, OtherBytesThanALogBehindThePromptEndIt) {
+  EXPECT_EQ(Transfer({kOkPrompt + "x" + BinaryLog{"chunk", 0}.Bytes()}), S_OK);
+  EXPECT_EQ(command.Response(), RESPONSE_UNKNOWN);
+  EXPECT_TRUE(chunks.chunks.empty());
+}
+
+TEST_F(FileTransfer, ARefusalEndsIt) {
+  EXPECT_EQ(Transfer({kErrorPrompt}), S_OK);
+  EXPECT_EQ(command.Response(), RESPONSE_ERROR);
+  EXPECT_EQ(connection.calls.size(), 3u);
+  EXPECT_TRUE(chunks.chunks.empty());
+}
+
+// The whole of a log goes by its own lengths, whatever was taken of it.
+TEST_F(FileTransfer, LongMessagesAreCutAndPassedOver) {
+  const std::string longer(1992, 'a');
+  EXPECT_EQ(Transfer({kOkPrompt + BinaryLog{longer, 1}.Bytes() + BinaryLog{"the end", 0}.Bytes()}),
+            S_OK);
+  EXPECT_EQ(command.Response(), RESPONSE_DATA);
+  EXPECT_THAT(chunks.chunks, ElementsAre(std::string(1024, 'a'), "the end"));
+}
+
+TEST_F(FileTransfer, AMessageLargerThanTheBufferEndsIt) {
+  EXPECT_EQ(Transfer({kOkPrompt + BinaryLog{std::string(20000, 'a'), 1}.Bytes()}), S_OK);
+  EXPECT_EQ(command.Response(), RESPONSE_OK);
+  EXPECT_TRUE(chunks.chunks.empty());
+  EXPECT_GT(connection.AnswersLeft(), 0u);
+}
+
+// The header's own length counts for where the next log begins, not for where the body does.
+TEST_F(FileTransfer, LongHeadersMoveTheNextLogOnly) {
+  const std::string log = BinaryLog{"first chunk", 1, -1, 32}.Bytes() + "four";
+  EXPECT_EQ(Transfer({kOkPrompt + log + BinaryLog{"the end", 0}.Bytes()}), S_OK);
+  EXPECT_EQ(command.Response(), RESPONSE_DATA);
+  EXPECT_THAT(chunks.chunks, ElementsAre("first chunk", "the end"));
+}
+
+// A chunk without bytes is handed on when there are enough behind it to be looked at.
+TEST_F(FileTransfer, AChunkMayBeEmpty) {
+  EXPECT_EQ(Transfer({kOkPrompt + BinaryLog{"", 1}.Bytes() + BinaryLog{"data", 0}.Bytes()}), S_OK);
+  EXPECT_EQ(command.Response(), RESPONSE_DATA);
+  EXPECT_THAT(chunks.chunks, ElementsAre("", "data"));
+}
+
+// Nothing behind the bytes that have come is read, whatever the lengths say.
+TEST_F(FileTransfer, NothingIsReadBeyondWhatCame) {
+  for (const uint8_t header : std::vector<uint8_t>{0, 28, 255}) {
+    for (const int length : {0, 7, 8, 50, 1032, 1033}) {
+      const std::string log = BinaryLog{std::string(1400, 'x'), 1, length, header}.Bytes();
+      const int usual = length < 8 || length > 1032 ? 1024 : length - 8;
+      for (size_t size = 0; size < log.size(); ++size) {
+        const GuardedBytes guarded(std::string_view(log).substr(0, size));
+        CReadFileCmd read(nullptr, nullptr);
+        bool done = true;
+        uint32_t consumed = 0;
+        const HRESULT result = read.ParseBinaryLog(
+            guarded.View().data(), static_cast<uint32_t>(size), &done, &consumed);
+        // The log as long as it says, and 36 bytes with a body of 8 and of the chunk behind them.
+        const size_t needed = std::max<size_t>(static_cast<size_t>(length) + 4 + header,
+                                               36 + static_cast<size_t>(std::max(8, usual)));
+        ASSERT_EQ(result, size < needed ? S_FALSE : S_OK) << header << " " << length << " " << size;
+        ASSERT_EQ(consumed, size < needed ? 0u : static_cast<uint32_t>(length) + 4 + header);
+        ASSERT_EQ(read.GetDataSize(), size < needed ? 0u : static_cast<uint32_t>(usual));
+        ASSERT_FALSE(done);
+      }
+    }
+  }
+}
+
+TEST_F(FileTransfer, BeforeTheFirstChunkThereIsNone) {
+  EXPECT_EQ(command.GetData(), nullptr);
+  EXPECT_EQ(command.GetDataSize(), 0u);
+}
+
 TEST_F(FileTransfer, AFailingHostEndsIt) {
   chunks.fail_at = 2;
   const std::string chunk = BinaryLog{"data", 1}.Bytes();
@@ -270,6 +616,21 @@ TEST_F(FileTransfer, ALastChunkOfLessThanFourBytesIsWaitedForInVain) {
             S_OK);
   EXPECT_EQ(command.Response(), RESPONSE_OK);
   EXPECT_THAT(chunks.chunks, ElementsAre("data"));
+}
+
+// Success of any kind goes on.
+TEST_F(FileTransfer, AHostThatIsContentGoesOn) {
+  struct Content : CReadFileCmdCallback {
+    HRESULT OnDataReceived(void*) override {
+      ++calls;
+      return S_FALSE;
+    }
+    int calls = 0;
+  } content;
+  CReadFileCmd read(&content, nullptr);
+  EXPECT_EQ(Run(read, {kOkPrompt + BinaryLog{"data", 1}.Bytes() + BinaryLog{"data", 0}.Bytes()}),
+            S_OK);
+  EXPECT_EQ(content.calls, 2);
 }
 
 TEST_F(FileTransfer, ASequenceThatNeverEndsTimesOut) {

@@ -1,6 +1,7 @@
 // The download of a Velmar receiver, on a scripted connection.
 #include <algorithm>
 #include <string>
+#include <utility>
 #include <vector>
 
 #include "platform/hresult.h"
@@ -61,6 +62,44 @@ TEST_F(VelmarDownload, BringsTheFileAndReportsEachPercentOnce) {
   EXPECT_TRUE(report.HasStart("CVelmarProtocol::DownloadFile - connection is locked [0x"));
 }
 
+TEST_F(VelmarDownload, HoldsTheConnectionUntilAllIsDone) {
+  Serve(2);
+  connection->speed = 9600;
+  std::vector<bool> free;
+  before_command = [&](const std::string&) { free.push_back(IsFreeForOthers(driver)); };
+  on_percent = [&](int) { free.push_back(IsFreeForOthers(driver)); };
+  EXPECT_EQ(Download(), S_OK);
+  EXPECT_EQ(free.size(), 7u + 4u);
+  EXPECT_THAT(free, testing::Each(false));
+  EXPECT_TRUE(IsFreeForOthers(driver));
+}
+
+// Each chunk is in the stream before its percent is told, and the last percent is told while the link
+// is still fast.
+TEST_F(VelmarDownload, TellsThePercentOfWhatIsWritten) {
+  Serve(2);
+  connection->speed = 9600;
+  std::vector<size_t> written;
+  std::vector<DWORD> speeds;
+  on_percent = [&](int) {
+    written.push_back(stream.bytes.size());
+    speeds.push_back(connection->speed);
+  };
+  EXPECT_EQ(Download(), S_OK);
+  EXPECT_THAT(percents, ElementsAre(0, 50, 100, 100));
+  EXPECT_THAT(written, ElementsAre(0u, 100u, 200u, 200u));
+  EXPECT_THAT(speeds, ElementsAre(9600u, 115200u, 115200u, 115200u));
+}
+
+TEST_F(VelmarDownload, NamesAreInTheCodePageOfTheThread) {
+  constexpr LCID kGreek = 0x0408;
+  const LCID before = GetThreadLocale();
+  SetThreadLocale(kGreek);
+  driver.DownloadFile(L"\x3B1 \"%s\"", &stream, nullptr);
+  SetThreadLocale(before);
+  EXPECT_THAT(connection->Writes(), ElementsAre("currentfile \xE1 \"%s\" all\r"));
+}
+
 TEST_F(VelmarDownload, AFastLinkIsLeftAlone) {
   Serve(1);
   Download();
@@ -110,6 +149,43 @@ TEST_F(VelmarDownload, AReceiverThatRefusesTheSpeedStaysSlow) {
   }
 }
 
+// One bit per second less than full speed is raised.
+TEST_F(VelmarDownload, AnySlowerLinkIsRaised) {
+  for (const DWORD speed : {1ul, 300ul, 57600ul, 115199ul}) {
+    Serve(1);
+    connection->speed = speed;
+    connection->calls.clear();
+    EXPECT_EQ(Download(), S_OK);
+    EXPECT_THAT(connection->calls, testing::Contains("speed 115200"));
+    EXPECT_EQ(connection->speed, speed);
+  }
+}
+
+// A host that knows no speed of its own, or one that is negative as a number, is raised, and nothing is
+// put back.
+TEST_F(VelmarDownload, StrangeSpeedsAreNotPutBack) {
+  for (const DWORD speed : {0ul, 0x80000000ul, 0xFFFFFFFFul}) {
+    ScriptedConnection* const link = connection;
+    const size_t before = link->Writes().size();
+    Serve(1);
+    link->speed = speed;
+    EXPECT_EQ(Download(), S_OK);
+    EXPECT_EQ(link->speed, 115200u) << speed;
+    const std::vector<std::string> writes = link->Writes();
+    EXPECT_THAT(std::vector<std::string>(writes.begin() + static_cast<std::ptrdiff_t>(before),
+                                         writes.end()),
+                ElementsAre(kConfig, kRaise, kCurrent, kHeader, kRead));
+  }
+}
+
+TEST_F(VelmarDownload, ASpeedBelowTheSignIsFastEnough) {
+  Serve(1);
+  connection->speed = 0x7FFFFFFF;
+  EXPECT_EQ(Download(), S_OK);
+  EXPECT_THAT(connection->Writes(), ElementsAre(kCurrent, kHeader, kRead));
+  EXPECT_EQ(connection->speed, 0x7FFFFFFFu);
+}
+
 // It was not raised: raising the host would cut the link.
 TEST_F(VelmarDownload, AReceiverThatNamesNoPortStaysSlow) {
   Serve(1);
@@ -128,6 +204,28 @@ TEST_F(VelmarDownload, AHostThatCannotFollowPutsTheReceiverBackAtOnce) {
   EXPECT_TRUE(report.Has("CVelmarProtocol::DownloadFile - host speed up is failed [0x80070005]"));
   EXPECT_THAT(connection->Writes(),
               ElementsAre(kConfig, kRaise, kConfig, kRestore, kCurrent, kHeader, kRead));
+  EXPECT_EQ(connection->speed, 9600u);
+  EXPECT_EQ(stream.bytes.size(), 100u);
+}
+
+// The put-back that is made at once may fail without anybody knowing.
+TEST_F(VelmarDownload, AHostThatCannotFollowDoesNotLookAtThePutBack) {
+  Serve(1);
+  connection->speed = 9600;
+  connection->set_speed_result = E_ACCESSDENIED;
+  answers[kRestore] = kOkPrompt + "<";
+  EXPECT_EQ(Download(), S_OK);
+  EXPECT_EQ(stream.bytes.size(), 100u);
+}
+
+// A host that was at full speed already, as it says itself.
+TEST_F(VelmarDownload, AHostThatHasNothingToChangeHasFollowed) {
+  Serve(1);
+  connection->speed = 9600;
+  connection->set_speed_result = S_FALSE;
+  EXPECT_EQ(Download(), S_FALSE);  // the put-back's
+  EXPECT_THAT(connection->Writes(),
+              ElementsAre(kConfig, kRaise, kCurrent, kHeader, kRead, kConfig, kRestore));
 }
 
 TEST_F(VelmarDownload, UsbHasNoSpeed) {
@@ -145,6 +243,8 @@ TEST_F(VelmarDownload, ALinkThatCannotBeAskedEndsItBeforeAnythingIsSent) {
   connection->speed_result = E_ACCESSDENIED;
   EXPECT_EQ(Download(), E_ACCESSDENIED);
   EXPECT_TRUE(connection->Writes().empty());
+  EXPECT_THAT(percents, ElementsAre(0, 0));
+  EXPECT_TRUE(IsFreeForOthers(driver));
 }
 
 TEST_F(VelmarDownload, AnUnknownFileIsAnEmptySuccess) {
@@ -153,6 +253,64 @@ TEST_F(VelmarDownload, AnUnknownFileIsAnEmptySuccess) {
   EXPECT_THAT(connection->Writes(), ElementsAre(kCurrent));
   EXPECT_EQ(stream.writes, 0u);
   EXPECT_THAT(percents, ElementsAre(0, 100));
+}
+
+TEST_F(VelmarDownload, AFileThatIsRefusedWithATextIsAnEmptySuccess) {
+  answers[kCurrent] = kErrorTextPrompt;
+  EXPECT_EQ(Download(), S_OK);
+  EXPECT_THAT(connection->Writes(), ElementsAre(kCurrent));
+  EXPECT_THAT(percents, ElementsAre(0, 100));
+}
+
+// Where something follows the prompt it is no plain acknowledgement.
+TEST_F(VelmarDownload, AFileThatIsAnsweredWithALogIsAnEmptySuccess) {
+  answers[kCurrent] = kOkPrompt + AsciiLog("A", "body");
+  EXPECT_EQ(Download(), S_OK);
+  EXPECT_THAT(connection->Writes(), ElementsAre(kCurrent));
+}
+
+TEST_F(VelmarDownload, ARefusalAtRaisedSpeedIsPutBackToo) {
+  connection->speed = 9600;
+  answers[kCurrent] = kErrorPrompt;
+  EXPECT_EQ(Download(), S_OK);
+  EXPECT_THAT(connection->Writes(), ElementsAre(kConfig, kRaise, kCurrent, kConfig, kRestore));
+  EXPECT_EQ(connection->speed, 9600u);
+  EXPECT_THAT(percents, ElementsAre(0, 100));
+}
+
+TEST_F(VelmarDownload, AFailingCommandEndsItWithoutALastReport) {
+  Serve(1);
+  for (const std::string& failing : {kCurrent, kHeader, kRead}) {
+    const std::string answer = std::exchange(answers[failing], kOkPrompt + "<");
+    percents.clear();
+    EXPECT_EQ(Download(), E_NOTIMPL) << failing;
+    EXPECT_EQ(connection->Writes().back(), failing);
+    EXPECT_THAT(percents, ElementsAre(0));
+    EXPECT_TRUE(report.Has("CVelmarProtocol::DumpInvalidResponse - [0x80004001] [] [COM7]"));
+    EXPECT_EQ(stream.references, 1u);
+    EXPECT_TRUE(IsFreeForOthers(driver));
+    answers[failing] = answer;
+  }
+  EXPECT_EQ(stream.writes, 0u);
+}
+
+// What came is there, and nothing tells that it is not all.
+TEST_F(VelmarDownload, ATransferThatStopsInBetweenIsASuccess) {
+  Serve(4);
+  const std::string reply = answers[kRead];
+  answers[kRead] = reply.substr(0, reply.size() - 1);
+  EXPECT_EQ(Download(), S_OK);
+  EXPECT_EQ(stream.bytes.size(), 300u);
+  EXPECT_THAT(percents, ElementsAre(0, 25, 50, 75, 100));
+}
+
+// The size of a header that is not whole is not known yet.
+TEST_F(VelmarDownload, AHeaderThatStopsInBetweenCountsAsASizeOfNothing) {
+  Serve(1);
+  answers[kHeader] = kOkPrompt + AsciiLog("FILEHDRA", "\"a.pdc\",100,0");
+  EXPECT_EQ(Download(), S_OK);
+  EXPECT_EQ(stream.bytes.size(), 100u);
+  EXPECT_THAT(percents, ElementsAre(0, 100, 100));
 }
 
 TEST_F(VelmarDownload, WithoutAHeaderNothingIsRead) {
@@ -175,7 +333,11 @@ TEST_F(VelmarDownload, AFailingStreamEndsIt) {
   stream.fail_at_write = 1;
   EXPECT_EQ(Download(), STG_E_MEDIUMFULL);
   EXPECT_EQ(stream.writes, 2u);
+  EXPECT_EQ(stream.bytes, std::string(100, 'c'));
   EXPECT_THAT(percents, ElementsAre(0, 33));
+  EXPECT_EQ(stream.references, 1u);
+  EXPECT_TRUE(IsFreeForOthers(driver));
+  EXPECT_TRUE(report.Has("CVelmarProtocol::DumpInvalidResponse - [0x80030070] [] [COM7]"));
 }
 
 // The put-back's result takes the place of the transfer's.
@@ -185,6 +347,45 @@ TEST_F(VelmarDownload, AtRaisedSpeedAFailureIsCoveredByThePutBack) {
   stream.fail_at_write = 1;
   EXPECT_EQ(Download(), S_OK);
   EXPECT_EQ(connection->speed, 9600u);
+}
+
+// And where the put-back fails itself, its code is the download's; the host stays where it is.
+TEST_F(VelmarDownload, APutBackThatCannotBeAskedForGivesItsCode) {
+  for (const std::string& failing : {kConfig, kRestore}) {
+    Serve(1);
+    connection->speed = 9600;
+    connection->calls.clear();
+    std::string read_to_the_end;
+    before_command = [&](const std::string& command) {
+      if (command == kRead) read_to_the_end = std::exchange(answers[failing], kOkPrompt + "<");
+    };
+    EXPECT_EQ(Download(), E_NOTIMPL) << failing;
+    EXPECT_EQ(connection->speed, 115200u);
+    EXPECT_THAT(connection->calls, testing::Not(testing::Contains("speed 9600")));
+    EXPECT_EQ(stream.bytes.size(), 100u);
+    EXPECT_EQ(percents.back(), 100);
+    EXPECT_TRUE(IsFreeForOthers(driver));
+    answers[failing] = read_to_the_end;
+    stream.bytes.clear();
+  }
+}
+
+// A receiver that stays where it is, or does not say on which port, is not waited for.
+TEST_F(VelmarDownload, TheHostGoesBackWhateverTheReceiverSays) {
+  for (const auto& [command, answer] : {std::pair(kRestore, kErrorPrompt),
+                                        std::pair(kRestore, kErrorTextPrompt),
+                                        std::pair(kRestore, std::string()),
+                                        std::pair(kConfig, kOkPrompt)}) {
+    Serve(1);
+    connection->speed = 9600;
+    const std::string usual = answers[command];
+    before_command = [&](const std::string& now) {
+      if (now == kRead) answers[command] = answer;
+    };
+    EXPECT_EQ(Download(), S_OK);
+    EXPECT_EQ(connection->speed, 9600u);
+    answers[command] = usual;
+  }
 }
 
 TEST_F(VelmarDownload, AFasterLinkIsLeftAlone) {
@@ -230,13 +431,57 @@ TEST_F(VelmarDownload, AnAbortAtRaisedSpeedPutsTheSpeedBack) {
   EXPECT_EQ(driver.DeleteFile(L"a"), S_FALSE);
 }
 
+// A file that turns out longer than its header said: the percent is kept in a byte, and told as 100 at
+// the most.
+TEST_F(VelmarDownload, ThePercentOfAFileThatIsLongerThanSaid) {
+  Serve(3);
+  answers[kHeader] = HeaderReply("100");
+  EXPECT_EQ(Download(), S_OK);
+  EXPECT_THAT(percents, ElementsAre(0, 100, 100, 300 - 256, 100));
+}
+
+TEST_F(VelmarDownload, APercentThatDoesNotChangeIsNotTold) {
+  Serve(4);
+  answers[kHeader] = HeaderReply("20000");
+  EXPECT_EQ(Download(), S_OK);
+  EXPECT_THAT(percents, ElementsAre(0, 1, 2, 100));
+}
+
+// Sizes of 2 GB and more do not fit the number of the header, which ends at its largest; a negative one
+// is a very large one.
+TEST_F(VelmarDownload, SizesBeyondTheNumberAreTakenAsTheyCome) {
+  for (const char* size : {"4000000000", "-1"}) {
+    Serve(1);
+    answers[kHeader] = HeaderReply(size);
+    percents.clear();
+    EXPECT_EQ(Download(), S_OK);
+    EXPECT_THAT(percents, ElementsAre(0, 100)) << size;
+  }
+}
+
 // In 32-bit arithmetic the product of a large file wraps, as hosts have always seen it.
 TEST_F(VelmarDownload, ThePercentOfALargeFileWraps) {
+  constexpr size_t kChunk = 1024;
+  constexpr size_t kChunksUntilItWraps = 42949672 / kChunk + 1;
   answers[kHeader] = HeaderReply("100000000");
-  answers[kRead] = kOkPrompt + BinaryLog{std::string(1024, 'x'), 1}.Bytes() +
-                   BinaryLog{std::string(1024, 'x'), 0}.Bytes();
+  answers[kRead] = kOkPrompt + BinaryLog{std::string(kChunk, 'x'), 1}.Bytes();
+  const auto answer = connection->on_write;
+  connection->on_write = [&](std::string_view bytes) {
+    const HRESULT result = answer(bytes);
+    if (bytes == kRead) {
+      const std::string more = BinaryLog{std::string(kChunk, 'x'), 1}.Bytes();
+      for (size_t i = 2; i < kChunksUntilItWraps; ++i) connection->GiveRead(more);
+      connection->GiveRead(BinaryLog{std::string(kChunk, 'x'), 0}.Bytes());
+    }
+    return result;
+  };
   EXPECT_EQ(Download(), S_OK);
-  EXPECT_THAT(percents, ElementsAre(0, 100));
+  EXPECT_EQ(stream.bytes.size(), kChunksUntilItWraps * kChunk);
+  std::vector<int> expected;
+  for (int percent = 0; percent <= 42; ++percent) expected.push_back(percent);
+  expected.push_back(0);
+  expected.push_back(100);
+  EXPECT_EQ(percents, expected);
 }
 
 }  // namespace

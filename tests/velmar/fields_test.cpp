@@ -3,6 +3,11 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include <string>
+#include <string_view>
+
+#include "platform/win32.h"
+
 namespace {
 
 using testing::ElementsAre;
@@ -28,11 +33,35 @@ TEST(Fields, ATextThatEndsInsideQuotesLosesItsLastField) {
   EXPECT_THAT(SplitFields("\""), IsEmpty());
 }
 
+TEST(Fields, AreNotTrimmed) { EXPECT_THAT(SplitFields(" a ,\r\n"), ElementsAre(L" a ", L"\r\n")); }
+
+TEST(Fields, MayHaveZeroBytes) {
+  EXPECT_THAT(SplitFields(std::string_view("a\0b,c", 5)),
+              ElementsAre(std::wstring(L"a\0b", 3), L"c"));
+}
+
+// It is the thread's code page: alpha is one byte in the Greek one, and another letter elsewhere.
+TEST(Fields, AreInTheCodePageOfTheThread) {
+  constexpr LCID kGreek = 0x0408;
+  constexpr LCID kEnglish = 0x0409;
+  const LCID before = GetThreadLocale();
+  SetThreadLocale(kGreek);
+  const auto greek = SplitFields("\xE1,b");
+  SetThreadLocale(kEnglish);
+  const auto english = SplitFields("\xE1,b");
+  SetThreadLocale(before);
+  EXPECT_THAT(greek, ElementsAre(L"\x3B1", L"b"));
+  EXPECT_THAT(english, ElementsAre(L"\xE1", L"b"));
+}
+
 TEST(Fields, QuotesAreTakenFromBothEnds) {
   EXPECT_EQ(WithoutQuotes(L"\"a\"b\""), L"a\"b");
   EXPECT_EQ(WithoutQuotes(L"plain"), L"plain");
   EXPECT_EQ(WithoutQuotes(L"\"\""), L"");
   EXPECT_EQ(WithoutQuotes(L""), L"");
+  EXPECT_EQ(WithoutQuotes(L"\"\"a\"\""), L"a");
+  EXPECT_EQ(WithoutQuotes(L"\"a"), L"a");
+  EXPECT_EQ(WithoutQuotes(L" \"a\""), L" \"a");  // not at the end
 }
 
 TEST(Fields, IntegersAreTheirLeadingDigits) {
@@ -40,6 +69,9 @@ TEST(Fields, IntegersAreTheirLeadingDigits) {
   EXPECT_EQ(ToInteger(L"-7"), -7);
   EXPECT_EQ(ToInteger(L"x"), 0);
   EXPECT_EQ(ToInteger(L""), 0);
+  EXPECT_EQ(ToInteger(L"-2147483648"), -2147483647 - 1);
+  EXPECT_EQ(ToInteger(L"2147483647"), 2147483647);
+  EXPECT_EQ(ToInteger(L"\"7\""), 0);
 }
 
 }  // namespace

@@ -46,16 +46,66 @@ TEST(VersionLog, TheLastEnclosureOrApplicationNamesTheModel) {
   EXPECT_EQ(log.model, L"card");
 }
 
-TEST(VersionLog, TypesCompareExactly) {
+TEST(VersionLog, AnApplicationNamesTheModelOfTheCard) {
   VersionLog log;
-  DecodeVersion("1" + Component("gpscard", "card"), log);
-  EXPECT_EQ(log.model, L"");
+  EXPECT_EQ(
+      DecodeVersion("2" + Component("GPSCARD", "card") + Component("DB_USERAPPAUTO", "app"), log),
+      Progress::kComplete);
+  EXPECT_EQ(log.model, L"app");
+  EXPECT_EQ(log.serial_number, L"SN-card");
+  EXPECT_EQ(log.hardware_version, L"HW-card");
+  EXPECT_EQ(log.software_version, L"SW-card");
+}
+
+TEST(VersionLog, TypesCompareExactly) {
+  for (const char* type : {"gpscard",
+                           "GPSCARD ",
+                           "\"GPSCARD\"",
+                           "GPSCARD2",
+                           "enclosure",
+                           "\"ENCLOSURE\"",
+                           "DB_USERAPP",
+                           "db_userappauto",
+                           ""}) {
+    VersionLog log;
+    EXPECT_EQ(DecodeVersion("1" + Component(type, "card"), log), Progress::kComplete);
+    EXPECT_EQ(log.model, L"") << type;
+    EXPECT_EQ(log.serial_number, L"") << type;
+  }
+}
+
+TEST(VersionLog, QuotesGoAtBothEndsAndOnlyThere) {
+  VersionLog log;
+  DecodeVersion("1,GPSCARD,\"\"M\"\",S\"1\"N,\"\",plain,B,D,T", log);
+  EXPECT_EQ(log.model, L"M");
+  EXPECT_EQ(log.serial_number, L"S\"1\"N");
+  EXPECT_EQ(log.hardware_version, L"");
+  EXPECT_EQ(log.software_version, L"plain");
 }
 
 TEST(VersionLog, NoComponentIsCompleteAndEmpty) {
   VersionLog log;
   EXPECT_EQ(DecodeVersion("0", log), Progress::kComplete);
   EXPECT_EQ(log.model, L"");
+  EXPECT_EQ(log.serial_number, L"");
+  EXPECT_EQ(log.hardware_version, L"");
+  EXPECT_EQ(log.software_version, L"");
+}
+
+// The components behind the count are not there.
+TEST(VersionLog, TheCountTellsHowManyComponentsThereAre) {
+  VersionLog log;
+  EXPECT_EQ(DecodeVersion("1" + Component("GPSCARD", "card") + Component("ENCLOSURE", "box"), log),
+            Progress::kComplete);
+  EXPECT_EQ(log.model, L"card");
+}
+
+TEST(VersionLog, ABodyThatEndsInsideQuotesLacksAField) {
+  VersionLog log;
+  EXPECT_EQ(DecodeVersion("1,GPSCARD,M,S,H,W,B,D,\"T", log), Progress::kMore);
+  EXPECT_EQ(log.model, L"");
+  EXPECT_EQ(DecodeVersion("\"1", log), Progress::kNothing);
+  EXPECT_EQ(DecodeVersion("1,GPSCARD,M,S,H,W,B,D,", log), Progress::kComplete);
 }
 
 TEST(VersionLog, WaitsForAllFields) {
@@ -69,7 +119,9 @@ TEST(VersionLog, WaitsForAllFields) {
 TEST(VersionLog, HugeAndNegativeCountsEnd) {
   VersionLog log;
   EXPECT_EQ(DecodeVersion("2147483647" + Component("GPSCARD", "a"), log), Progress::kMore);
+  EXPECT_EQ(DecodeVersion("536870912" + Component("GPSCARD", "a"), log), Progress::kMore);
   EXPECT_EQ(DecodeVersion("-1" + Component("GPSCARD", "a"), log), Progress::kComplete);
+  EXPECT_EQ(log.model, L"");
   EXPECT_EQ(DecodeVersion("-2147483648", log), Progress::kComplete);
 }
 
@@ -102,6 +154,46 @@ TEST(DirectoryLogs, ReadNameSizeAndTime) {
   EXPECT_EQ(time.wMilliseconds, 0);
 }
 
+TEST(DirectoryLogs, ReadEachPartOfDateAndTime) {
+  std::vector<FileEntry> entries;
+  EXPECT_EQ(DecodeDirectory(AsciiLog("DIRENTA", "plain,2147483647,77,20130709,010203"), entries),
+            Progress::kComplete);
+  ASSERT_EQ(entries.size(), 1u);
+  EXPECT_EQ(entries[0].name, L"plain");
+  EXPECT_EQ(entries[0].size, 2147483647u);
+  const SYSTEMTIME& time = entries[0].time;
+  EXPECT_EQ(time.wYear, 2013);
+  EXPECT_EQ(time.wMonth, 7);
+  EXPECT_EQ(time.wDay, 9);
+  EXPECT_EQ(time.wHour, 1);
+  EXPECT_EQ(time.wMinute, 2);
+  EXPECT_EQ(time.wSecond, 3);
+}
+
+TEST(DirectoryLogs, QuotesProtectCommasOfNames) {
+  std::vector<FileEntry> entries;
+  EXPECT_EQ(DecodeDirectory(AsciiLog("DIRENTA", "\"a,b\",5,0,20130709,010203"), entries),
+            Progress::kComplete);
+  ASSERT_EQ(entries.size(), 1u);
+  EXPECT_EQ(entries[0].name, L"a,b");
+  EXPECT_EQ(entries[0].size, 5u);
+}
+
+// What stands between the logs is passed over; only the whole name opens one.
+TEST(DirectoryLogs, AreFoundAmongOtherFields) {
+  std::vector<FileEntry> entries;
+  const std::string text = "#DIRENTB,x;#direnta*" + Entry("a", 1) + "[COM1],;*\r\n,\r" + "," +
+                           Entry("b", 0) + Entry("c", 0);
+  EXPECT_EQ(DecodeDirectory(text, entries), Progress::kComplete);
+  EXPECT_THAT(Names(entries), testing::ElementsAre(L"a", L"b"));  // behind the last is nothing
+}
+
+TEST(DirectoryLogs, WithoutALogWaitForMore) {
+  std::vector<FileEntry> entries;
+  EXPECT_EQ(DecodeDirectory("#", entries), Progress::kMore);
+  EXPECT_EQ(DecodeDirectory("\"#DIRENTA", entries), Progress::kNothing);
+}
+
 TEST(DirectoryLogs, CountDownToTheLast) {
   std::vector<FileEntry> entries;
   const std::string text = Entry("a", 3) + Entry("b", 2) + Entry("c", 1) + Entry("d", 0);
@@ -124,12 +216,29 @@ TEST(DirectoryLogs, SequencesAtTheEndOfTheirRangeDoNotOverflow) {
 // Each beginning of the text waits, and holds the logs that are whole.
 TEST(DirectoryLogs, EveryBeginningWaitsForMore) {
   const std::string text = Entry("a", 1) + Entry("b", 0);
-  for (size_t length = 0; length < text.size() - 2; ++length) {
+  const size_t first = Entry("a", 1).size();
+  for (size_t length = 0; length < text.size(); ++length) {
     std::vector<FileEntry> entries;
     const Progress progress = DecodeDirectory(text.substr(0, length), entries);
     EXPECT_TRUE(progress == Progress::kMore || progress == Progress::kNothing) << length;
-    EXPECT_LE(entries.size(), 1u);
+    EXPECT_EQ(entries.size(), length < first ? 0u : 1u) << length;
   }
+  std::vector<FileEntry> entries;
+  EXPECT_EQ(DecodeDirectory(text, entries), Progress::kComplete);
+}
+
+TEST(DirectoryLogs, TheSameNumberTwiceContradicts) {
+  std::vector<FileEntry> entries;
+  EXPECT_EQ(DecodeDirectory(Entry("a", 1) + Entry("b", 1), entries), Progress::kContradiction);
+  EXPECT_EQ(DecodeDirectory(Entry("a", 1) + Entry("b", 2), entries), Progress::kContradiction);
+  EXPECT_EQ(DecodeDirectory(Entry("a", 1) + Entry("b", -1), entries), Progress::kContradiction);
+}
+
+// A number below 0 is no last one.
+TEST(DirectoryLogs, CountOnBelowZero) {
+  std::vector<FileEntry> entries;
+  EXPECT_EQ(DecodeDirectory(Entry("a", -1) + Entry("b", -2), entries), Progress::kMore);
+  EXPECT_EQ(entries.size(), 2u);
 }
 
 TEST(DirectoryLogs, StartAfresh) {
@@ -154,6 +263,19 @@ TEST(FileHeaderLog, NeedsAllItsFields) {
   EXPECT_EQ(DecodeFileHeader(Fields(23, "\"a.pdc\",123456"), log), Progress::kComplete);
   EXPECT_EQ(log.file_name, L"\"a.pdc\"");
   EXPECT_EQ(log.file_size, 123456);
+  EXPECT_EQ(DecodeFileHeader(Fields(30, "b,-7"), log), Progress::kComplete);
+  EXPECT_EQ(log.file_name, L"b");
+  EXPECT_EQ(log.file_size, -7);
+}
+
+TEST(FileHeaderLog, OfTooFewFieldsChangesNothing) {
+  FileHeaderLog log{.file_name = L"before", .file_size = 5};
+  for (const std::string& body :
+       {std::string(), std::string("\""), Fields(22, "a,1"), Fields(22, "a,1") + ",\"x"}) {
+    EXPECT_EQ(DecodeFileHeader(body, log), Progress::kMore) << body;
+    EXPECT_EQ(log.file_name, L"before") << body;
+    EXPECT_EQ(log.file_size, 5) << body;
+  }
 }
 
 // --- COMCONFIG
@@ -173,6 +295,61 @@ TEST(PortConfig, TakesThePortThatIsTalkedOn) {
   EXPECT_EQ(log.data_bits, 7);
   EXPECT_EQ(log.stop_bits, 2);
   EXPECT_EQ(log.handshake, 2);
+}
+
+TEST(PortConfig, TakesTheFirstPortToo) {
+  PortConfigLog log;
+  const std::string body =
+      "2" + PortFields("COM1,9600,N,8,1,N") + PortFields("COM2,115200,O,7,2,CTS");
+  EXPECT_EQ(DecodePortConfig(body, L"COM1", log), Progress::kComplete);
+  EXPECT_EQ(log.port_name, L"COM1");
+  EXPECT_EQ(log.baud, 9600);
+  EXPECT_EQ(log.data_bits, 8);
+}
+
+// The last that has the name.
+TEST(PortConfig, OfAPortThatIsListedTwiceIsTheLast) {
+  PortConfigLog log;
+  const std::string body =
+      "2" + PortFields("COM1,9600,E,8,1,XON") + PortFields("COM1,19200,x,7,2,x");
+  EXPECT_EQ(DecodePortConfig(body, L"COM1", log), Progress::kComplete);
+  EXPECT_EQ(log.baud, 19200);
+  EXPECT_EQ(log.parity, 1);  // words that are none leave what was there
+  EXPECT_EQ(log.handshake, 1);
+}
+
+TEST(PortConfig, TheCountTellsHowManyPortsThereAre) {
+  PortConfigLog log;
+  const std::string two = PortFields("COM1,1,N,8,1,N") + PortFields("COM2,2,N,8,1,N");
+  EXPECT_EQ(DecodePortConfig("1" + two, L"COM2", log), Progress::kComplete);
+  EXPECT_EQ(log.port_name, L"");
+  EXPECT_EQ(DecodePortConfig("3" + two, L"COM2", log), Progress::kMore);
+  EXPECT_EQ(DecodePortConfig("2" + two, L"COM2", log), Progress::kComplete);
+  EXPECT_EQ(log.port_name, L"COM2");
+}
+
+TEST(PortConfig, WaitsForAllFields) {
+  const std::string body = "1" + PortFields("COM1,9600,N,8,1,N");
+  for (size_t length = 1; length < body.rfind(','); ++length) {
+    PortConfigLog log;
+    EXPECT_EQ(DecodePortConfig(body.substr(0, length), L"COM1", log), Progress::kMore) << length;
+    EXPECT_EQ(log.port_name, L"");
+  }
+  PortConfigLog log;
+  EXPECT_EQ(DecodePortConfig(body.substr(0, body.rfind(',') + 1), L"COM1", log),
+            Progress::kComplete);
+  EXPECT_EQ(DecodePortConfig(body + "\"", L"COM1", log), Progress::kMore);
+  EXPECT_EQ(DecodePortConfig("\"", L"COM1", log), Progress::kNothing);
+}
+
+TEST(PortConfig, WordsCompareExactly) {
+  for (const char* word : {"\"E\"", "e", "EVEN", "", " E"}) {
+    PortConfigLog log{.port_name = L"", .parity = 9, .handshake = 9};
+    DecodePortConfig("1" + PortFields(std::string("COM1,1,") + word + ",8,1,cts"), L"COM1", log);
+    EXPECT_EQ(log.port_name, L"COM1");
+    EXPECT_EQ(log.parity, 9) << word;
+    EXPECT_EQ(log.handshake, 9) << word;
+  }
 }
 
 TEST(PortConfig, ReadsEachWord) {
@@ -200,8 +377,16 @@ TEST(PortConfig, CountsOfAnyKindEnd) {
   EXPECT_EQ(DecodePortConfig("", L"COM1", log), Progress::kNothing);
   EXPECT_EQ(DecodePortConfig("0", L"COM1", log), Progress::kComplete);
   EXPECT_EQ(DecodePortConfig("-5", L"COM1", log), Progress::kComplete);
-  EXPECT_EQ(DecodePortConfig("2147483647" + PortFields("COM1,1,N,8,1,N"), L"COM1", log),
-            Progress::kMore);
+  for (const char* count : {"2147483647", "390451573", "2"}) {  // the second wraps to few fields
+    EXPECT_EQ(DecodePortConfig(count + PortFields("COM1,1,N,8,1,N"), L"COM1", log), Progress::kMore)
+        << count;
+  }
+  for (const char* count : {"-2147483648", "-1", "0", "x"}) {
+    EXPECT_EQ(DecodePortConfig(count + PortFields("COM1,1,N,8,1,N"), L"COM1", log),
+              Progress::kComplete)
+        << count;
+  }
+  EXPECT_EQ(log.port_name, L"");
 }
 
 }  // namespace

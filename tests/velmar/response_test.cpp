@@ -48,6 +48,24 @@ TEST(VelmarResponse, AnythingElseIsUnknownAtItsFirstByte) {
   }
 }
 
+// How many bytes are waited for before an opening is told from another.
+TEST(VelmarResponse, IsTakenForUnknownOnceEnoughHasCome) {
+  EXPECT_EQ(TypeOf("\r\n<OK\r\nx"), RESPONSE_UNKNOWN);
+  const std::string other = "\r\n<NOTHING";
+  for (size_t length = 0; length < 10; ++length) {
+    EXPECT_EQ(TypeOf(other.substr(0, length)), RESPONSE_INCOMPLETE) << length;
+  }
+  EXPECT_EQ(TypeOf(other.substr(0, 10)), RESPONSE_UNKNOWN);
+  EXPECT_EQ(TypeOf("\r\n<ERROR:x"), RESPONSE_UNKNOWN);
+  EXPECT_EQ(TypeOf("\r\n<ERROR ["), RESPONSE_UNKNOWN);
+}
+
+TEST(VelmarResponse, ThePromptEndsAtItsFirstBracket) {
+  EXPECT_EQ(RecogniseResponse("\r\n<OK\r\n[]").prompt_end, 9u);
+  EXPECT_EQ(RecogniseResponse("\r\n<OK\r\n[a[b]c]").prompt_end, 12u);
+  EXPECT_EQ(RecogniseResponse("\r\n<ERROR:[\r\n\xFF]").prompt_end, 14u);
+}
+
 TEST(VelmarResponse, AZeroByteIsAnEndThatIsNotThereYet) {
   EXPECT_EQ(TypeOf(std::string("\r\n<OK\r\n\0xx", 10)), RESPONSE_INCOMPLETE);
   EXPECT_EQ(TypeOf(std::string("\r\n<OK\r\n[CO\0M]", 13)), RESPONSE_INCOMPLETE);

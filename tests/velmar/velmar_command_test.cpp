@@ -3,12 +3,15 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include <algorithm>
 #include <string>
 #include <tuple>
+#include <utility>
 #include <vector>
 
 #include "platform/handle.h"
 #include "platform/hresult.h"
+#include "tests/support/guarded_bytes.h"
 #include "tests/support/manual_clock.h"
 #include "tests/support/report_capture.h"
 #include "tests/support/scripted_connection.h"
@@ -57,6 +60,20 @@ TEST_F(VelmarCommand, SendOnlyReadsNothingAndDoesNotPause) {
   EXPECT_EQ(clock.paused, 0u);
 }
 
+TEST_F(VelmarCommand, GivesEachWriteHalfASecond) {
+  CVelmarCommand("x\r", kAppendCrc | kSendOnly).Execute(&connection, nullptr);
+  EXPECT_THAT(connection.write_timeouts, ElementsAre(500u, 500u));
+}
+
+TEST_F(VelmarCommand, ReadsTheAnswerToACommandWithItsChecksum) {
+  connection.GiveRead(kOkPrompt);
+  CVelmarCommand command("123456789", kAppendCrc);
+  EXPECT_EQ(command.Execute(&connection, nullptr), S_OK);
+  EXPECT_THAT(connection.calls,
+              ElementsAre("flush", "write 123456789", "write \x88\x2D\xFD\x2D", "read 8192 30000"));
+  EXPECT_EQ(command.Response(), RESPONSE_OK);
+}
+
 TEST_F(VelmarCommand, AppendsItsChecksumLowByteFirst) {
   CVelmarCommand command("123456789", kAppendCrc | kSendOnly);
   command.Execute(&connection, nullptr);
@@ -79,6 +96,12 @@ TEST_F(VelmarCommand, AnAbortedWriteEndsIt) {
   connection.on_write = [](std::string_view) { return S_FALSE; };
   EXPECT_EQ(CVelmarCommand("x", 0).Execute(&connection, nullptr), S_FALSE);
   EXPECT_THAT(connection.calls, ElementsAre("flush", "write x"));
+}
+
+TEST_F(VelmarCommand, AnAbortedWriteOfTheChecksumEndsIt) {
+  connection.on_write = [](std::string_view bytes) { return bytes == "x" ? S_OK : S_FALSE; };
+  EXPECT_EQ(CVelmarCommand("x", kAppendCrc).Execute(&connection, nullptr), S_FALSE);
+  EXPECT_EQ(connection.calls.size(), 3u);
 }
 
 TEST_F(VelmarCommand, AFailedReadEndsItWithoutAReply) {
@@ -127,6 +150,17 @@ TEST_F(VelmarCommand, TheKeptReplyRepeatsWhatWasHeld) {
   EXPECT_EQ(Reply(command), "\r\n<OK\r" + kOkPrompt);
 }
 
+TEST_F(VelmarCommand, EachReadHasTheWholeTimeAndTheRestOfTheBuffer) {
+  connection.GiveRead("\r\n<OK\r");
+  connection.GiveRead("\n[");
+  connection.GiveRead("COM1]");
+  CVelmarCommand command("x", 0);
+  command.SetReadTimeout(700);
+  EXPECT_EQ(command.Execute(&connection, nullptr), S_OK);
+  EXPECT_THAT(connection.calls,
+              ElementsAre("flush", "write x", "read 8192 700", "read 8186 700", "read 8184 700"));
+}
+
 TEST_F(VelmarCommand, AReplyInPiecesOfAnySizeIsTheSame) {
   for (size_t piece = 1; piece <= kOkPrompt.size(); ++piece) {
     ScriptedConnection pieces;
@@ -135,8 +169,8 @@ TEST_F(VelmarCommand, AReplyInPiecesOfAnySizeIsTheSame) {
     }
     CVelmarCommand command("x", 0);
     EXPECT_EQ(command.Execute(&pieces, nullptr), S_OK);
-    // The first byte alone is a reply's beginning; what is behind the prompt has not come.
     EXPECT_EQ(command.Response(), RESPONSE_OK) << piece;
+    EXPECT_EQ(pieces.AnswersLeft(), 0u) << piece;
   }
 }
 
@@ -148,9 +182,31 @@ TEST_F(VelmarCommand, ARefusalWithTextIsUnknown) {
   EXPECT_TRUE(report.Has("CVelmarCommand::Execute - unknown response type"));
 }
 
+TEST_F(VelmarCommand, ARefusalWithoutTextIsAnError) {
+  connection.GiveRead(kErrorPrompt);
+  CVelmarCommand command("x", 0);
+  EXPECT_EQ(command.Execute(&connection, nullptr), S_OK);
+  EXPECT_EQ(command.Response(), RESPONSE_ERROR);
+  EXPECT_EQ(connection.calls.size(), 3u);
+}
+
+TEST_F(VelmarCommand, BytesThatAreNoReplyAreUnknown) {
+  connection.GiveRead("x" + kOkPrompt);
+  CVelmarCommand command("x", 0);
+  EXPECT_EQ(command.Execute(&connection, nullptr), S_OK);
+  EXPECT_EQ(command.Response(), RESPONSE_UNKNOWN);
+  EXPECT_EQ(Reply(command), "x" + kOkPrompt);
+  EXPECT_EQ(connection.calls.size(), 3u);
+  EXPECT_EQ(clock.paused, 500u);
+}
+
 TEST_F(VelmarCommand, AnAbbreviatedLogIsNotOffered) {
   connection.GiveRead(kOkPrompt + "<VERSION");
-  EXPECT_EQ(CVelmarCommand("x", 0).Execute(&connection, nullptr), static_cast<HRESULT>(0x80004001));
+  CVelmarCommand command("x", 0);
+  command.SetReply("before");
+  EXPECT_EQ(command.Execute(&connection, nullptr), static_cast<HRESULT>(0x80004001));
+  EXPECT_EQ(Reply(command), "before");
+  EXPECT_EQ(clock.paused, 0u);
 }
 
 TEST_F(VelmarCommand, ALineEndBehindThePromptEndsIt) {
@@ -175,6 +231,66 @@ TEST_F(VelmarCommand, ABufferThatIsFullEndsIt) {
   EXPECT_GT(connection.AnswersLeft(), 80u);
 }
 
+TEST_F(VelmarCommand, APromptOfMegabytesEndsItWithTheFirstBuffer) {
+  connection.GiveRead("\r\n<OK\r\n[" + std::string(3 << 20, 'C'));
+  CVelmarCommand command("x", 0);
+  EXPECT_EQ(command.Execute(&connection, nullptr), S_OK);
+  EXPECT_EQ(command.Response(), RESPONSE_INCOMPLETE);
+  EXPECT_THAT(connection.calls, ElementsAre("flush", "write x", "read 8192 30000"));
+  EXPECT_EQ(command.GetReplyLength(), 8192u);
+  EXPECT_EQ(clock.paused, 500u);
+}
+
+TEST_F(VelmarCommand, AReplyThatJustFillsTheBufferIsRead) {
+  constexpr size_t kAroundPrompt = 9;
+  const std::string reply = "\r\n<OK\r\n[" + std::string(8192 - kAroundPrompt, 'C') + "]";
+  ASSERT_EQ(reply.size(), 8192u);
+  connection.GiveRead(reply.substr(0, 5000));
+  connection.GiveRead(reply.substr(5000));
+  CVelmarCommand command("x", 0);
+  EXPECT_EQ(command.Execute(&connection, nullptr), S_OK);
+  EXPECT_EQ(command.Response(), RESPONSE_OK);
+  EXPECT_EQ(connection.calls.back(), "read 3192 30000");
+}
+
+TEST_F(VelmarCommand, ACancelEndsItAtEachCheckpoint) {
+  CVelmarCommand early("x", 0);
+  early.Cancel();
+  EXPECT_EQ(early.Execute(&connection, nullptr), S_FALSE);
+  EXPECT_TRUE(connection.calls.empty());
+
+  CVelmarCommand written("x", 0);
+  connection.on_write = [&](std::string_view) {
+    written.Cancel();
+    return S_OK;
+  };
+  EXPECT_EQ(written.Execute(&connection, nullptr), S_FALSE);
+  EXPECT_THAT(connection.calls, ElementsAre("flush", "write x"));
+  connection.on_write = nullptr;
+
+  CVelmarCommand reading("x", 0);
+  reading.SetReply("before");
+  connection.Give({S_OK, kOkPrompt, [&] { reading.Cancel(); }});
+  EXPECT_EQ(reading.Execute(&connection, nullptr), S_FALSE);
+  EXPECT_EQ(Reply(reading), "before");
+
+  // Also where the read timed out.
+  CVelmarCommand waiting("x", 0);
+  connection.Give({kTimedOut, "", [&] { waiting.Cancel(); }});
+  EXPECT_EQ(waiting.Execute(&connection, nullptr), S_FALSE);
+  EXPECT_EQ(clock.paused, 0u);
+}
+
+// A command without a reply has been sent when the cancel comes.
+TEST_F(VelmarCommand, ACancelBehindASendOnlyCommandIsTooLate) {
+  CVelmarCommand command("x", kSendOnly);
+  connection.on_write = [&](std::string_view) {
+    command.Cancel();
+    return S_OK;
+  };
+  EXPECT_EQ(command.Execute(&connection, nullptr), S_OK);
+}
+
 TEST_F(VelmarCommand, IsCancelledAtEachCheckpoint) {
   const KernelHandle event(CreateEventW(nullptr, TRUE, TRUE, nullptr));
   EXPECT_EQ(CVelmarCommand("x", 0).Execute(&connection, event.get()), S_FALSE);
@@ -197,7 +313,212 @@ TEST_F(VelmarCommand, IsCancelledAtEachCheckpoint) {
   EXPECT_EQ(clock.paused, 0u);
 }
 
-// --- The parse operations that no exchange reaches
+// --- Parsers that consume
+
+// Takes bytes off the front, as many at each call as it was told, and keeps what it saw.
+class Eater : public CVelmarCommand {
+ public:
+  Eater(std::vector<uint32_t> bites, uint32_t flags)
+      : CVelmarCommand("x", flags), bites_(std::move(bites)) {}
+
+  HRESULT ParseReply(const char* bytes, uint32_t length, bool* done, uint32_t* consumed) override {
+    EXPECT_FALSE(*done);
+    EXPECT_EQ(*consumed, 0u);
+    seen.emplace_back(bytes, length);
+    SetResponse(response);
+    if (seen.size() <= bites_.size()) *consumed = bites_[seen.size() - 1];
+    *done = seen.size() == done_at;
+    return seen.size() == fail_at ? E_ACCESSDENIED : S_OK;
+  }
+
+  std::vector<std::string> seen;
+  ResponseType response = RESPONSE_INCOMPLETE;
+  size_t done_at = 0;  // calls count from 1
+  size_t fail_at = 0;
+
+ private:
+  std::vector<uint32_t> bites_;
+};
+
+TEST_F(VelmarCommand, WhatIsLeftIsParsedBeforeMoreIsRead) {
+  connection.GiveRead("abcdef");
+  connection.GiveRead("gh");
+  Eater command({2, 1}, kStreamed);
+  command.done_at = 4;
+  EXPECT_EQ(command.Execute(&connection, nullptr), S_OK);
+  EXPECT_THAT(command.seen, ElementsAre("abcdef", "cdef", "def", "defgh"));
+  EXPECT_THAT(connection.calls,
+              ElementsAre("flush", "write x", "read 8192 30000", "read 8189 30000"));
+  EXPECT_EQ(command.GetReplyLength(), 0u);
+}
+
+TEST_F(VelmarCommand, WhatIsLeftIsKeptOnceMoreWithTheNextRead) {
+  connection.GiveRead("abcdef");
+  connection.GiveRead("gh");
+  Eater command({2, 1}, 0);
+  command.done_at = 4;
+  EXPECT_EQ(command.Execute(&connection, nullptr), S_OK);
+  EXPECT_EQ(Reply(command), "abcdefdefgh");
+}
+
+TEST_F(VelmarCommand, AStreamedReplyLeavesTheOldOne) {
+  connection.GiveRead("abcdef");
+  Eater command({}, kStreamed);
+  command.SetReply("before");
+  command.done_at = 1;
+  EXPECT_EQ(command.Execute(&connection, nullptr), S_OK);
+  EXPECT_EQ(Reply(command), "before");
+}
+
+TEST_F(VelmarCommand, NoMoreIsConsumedThanHasCome) {
+  connection.GiveRead("abc");
+  connection.GiveRead("de");
+  Eater command({1000000}, kStreamed);
+  command.done_at = 3;
+  EXPECT_EQ(command.Execute(&connection, nullptr), S_OK);
+  EXPECT_THAT(command.seen, ElementsAre("abc", "", "de"));
+  EXPECT_EQ(connection.calls.back(), "read 8192 30000");
+}
+
+TEST_F(VelmarCommand, AFullBufferThatIsConsumedGoesOn) {
+  connection.GiveRead(std::string(8192, 'a') + "b");
+  Eater command({8192}, kStreamed);
+  command.done_at = 3;
+  EXPECT_EQ(command.Execute(&connection, nullptr), S_OK);
+  EXPECT_EQ(command.seen.back(), "b");
+}
+
+// It is the parser's failure that counts, not what it set beside it.
+TEST_F(VelmarCommand, AFailingParserEndsIt) {
+  connection.GiveRead("abc");
+  Eater command({}, 0);
+  command.fail_at = 1;
+  command.done_at = 1;
+  EXPECT_EQ(command.Execute(&connection, nullptr), E_ACCESSDENIED);
+  EXPECT_EQ(clock.paused, 0u);
+}
+
+TEST_F(VelmarCommand, AnUnknownReplyIsReportedThoughItIsDone) {
+  connection.GiveRead("abc");
+  Eater command({}, 0);
+  command.response = RESPONSE_UNKNOWN;
+  command.done_at = 1;
+  EXPECT_EQ(command.Execute(&connection, nullptr), S_OK);
+  EXPECT_TRUE(report.Has("CVelmarCommand::Execute - unknown response type"));
+}
+
+// --- The parse operations one by one
+
+// Keeps the body that it is given.
+class Bodies : public CVelmarCommand {
+ public:
+  explicit Bodies(uint32_t flags = 0) : CVelmarCommand("x", flags) {}
+  HRESULT ParseLogBody(const char* bytes, uint32_t length, bool* done, uint32_t*) override {
+    body = std::string(bytes, length);
+    *done = true;
+    return E_PENDING;  // something to be handed on
+  }
+  std::string body = "none";
+};
+
+TEST_F(VelmarCommand, ParsesNothingOfNothing) {
+  CVelmarCommand command("x", 0);
+  command.ParseAcknowledgement("<OK");
+  uint32_t consumed = 0;
+  bool done = true;
+  EXPECT_EQ(command.ParseReply(nullptr, 5, &done, &consumed), S_FALSE);
+  EXPECT_FALSE(done);
+  done = true;
+  EXPECT_EQ(command.ParseReply("\r", 0, &done, &consumed), S_FALSE);
+  EXPECT_FALSE(done);
+  EXPECT_EQ(command.Response(), RESPONSE_OK);  // as it was
+  EXPECT_EQ(command.ParseReply("x", 1, &done, &consumed), S_FALSE);
+  EXPECT_EQ(command.Response(), RESPONSE_UNKNOWN);
+}
+
+TEST_F(VelmarCommand, AStreamedReplyConsumesThePromptOnceMoreHasCome) {
+  for (const uint32_t flags : {0u, kStreamed}) {
+    Bodies command(flags);
+    bool done = false;
+    uint32_t consumed = 0;
+    const auto length = static_cast<uint32_t>(kOkPrompt.size());
+    EXPECT_EQ(command.ParseResponse(kOkPrompt.data(), length, &done, &consumed), S_OK);
+    EXPECT_TRUE(done);
+    EXPECT_EQ(consumed, 0u);
+    const std::string more = kOkPrompt + "\xAA";
+    EXPECT_EQ(command.ParseResponse(more.data(), length + 1, &done, &consumed), S_FALSE);
+    EXPECT_FALSE(done);
+    EXPECT_EQ(consumed, flags == kStreamed ? length : 0u);
+    EXPECT_EQ(command.Response(), RESPONSE_OK);
+  }
+}
+
+TEST_F(VelmarCommand, AsciiLogsNeedTheirHeader) {
+  for (const std::string log :
+       {"", "#A", "#A,COM1,0,1,2,3,4,5,6,7", "#A,COM1,0;b", "a,b,c;d,e,f,g"}) {
+    Bodies command;
+    bool done = true;
+    uint32_t consumed = 0;
+    const auto length = static_cast<uint32_t>(log.size());
+    EXPECT_EQ(command.ParseAsciiLog(log.data(), length, &done, &consumed), S_FALSE) << log;
+    EXPECT_FALSE(done) << log;
+    EXPECT_EQ(command.Response(), RESPONSE_INCOMPLETE) << log;
+    EXPECT_EQ(command.body, "none") << log;
+    EXPECT_EQ(command.Header().message_name, L"") << log;
+  }
+}
+
+TEST_F(VelmarCommand, AsciiLogsAreHeaderAndBody) {
+  Bodies command;
+  bool done = false;
+  uint32_t consumed = 0;
+  const std::string log = "#NAMEA,COM3,-4,x,\"y,z\",1888,405078.5,7,8,9;a,b;c*crc\r\n";
+  const auto length = static_cast<uint32_t>(log.size());
+  EXPECT_EQ(command.ParseAsciiLog(log.data(), length, &done, &consumed), E_PENDING);
+  EXPECT_EQ(command.body, "a,b;c*crc\r\n");
+  EXPECT_EQ(command.Header().message_name, L"#NAMEA");
+  EXPECT_EQ(command.Port(), L"COM3");
+  EXPECT_EQ(command.Header().sequence, -4);
+  EXPECT_EQ(command.Header().gps_week, 1888);
+  EXPECT_EQ(command.Header().gps_seconds, 405078.5);
+}
+
+// As long as its three lengths say, with a body that begins behind 36 bytes whatever they say.
+TEST_F(VelmarCommand, BinaryLogsAreWaitedForByTheirLengths) {
+  for (const uint8_t header : std::vector<uint8_t>{0, 28, 36, 255}) {
+    for (const int message : {0, 8, 11, 60, 300}) {
+      std::string log = BinaryLog{"abc", 7, message, header}.Bytes();
+      const size_t told = static_cast<size_t>(message) + 4 + header;
+      const size_t needed = std::max<size_t>(told, 36);
+      log.resize(needed, '.');
+      for (const size_t missing : {size_t{0}, size_t{1}, needed}) {
+        SCOPED_TRACE(std::to_string(header) + " " + std::to_string(message));
+        const GuardedBytes guarded(std::string_view(log).substr(0, needed - missing));
+        Bodies command;
+        bool done = true;
+        uint32_t consumed = 0;
+        const HRESULT result = command.ParseBinaryLog(
+            guarded.View().data(), static_cast<uint32_t>(guarded.View().size()), &done, &consumed);
+        EXPECT_EQ(result, missing == 0 ? E_PENDING : S_FALSE);
+        EXPECT_EQ(done, missing == 0);
+        EXPECT_EQ(command.body, missing == 0 ? log.substr(36) : "none");
+        EXPECT_EQ(consumed, 0u);
+      }
+    }
+  }
+}
+
+TEST_F(VelmarCommand, ALogThatNobodyReadsIsDone) {
+  for (const std::string& log : {AsciiLog("A", "body"), BinaryLog{"chunk"}.Bytes()}) {
+    connection.GiveRead(kOkPrompt + log);
+    CVelmarCommand command("x", 0);
+    EXPECT_EQ(command.Execute(&connection, nullptr), S_OK);
+    EXPECT_EQ(connection.AnswersLeft(), 0u);
+  }
+  EXPECT_THAT(
+      connection.calls,
+      ElementsAre("flush", "write x", "read 8192 30000", "flush", "write x", "read 8192 30000"));
+}
 
 TEST_F(VelmarCommand, AcknowledgementsAsText) {
   const auto parse = [](const char* text) {
@@ -213,6 +534,14 @@ TEST_F(VelmarCommand, AcknowledgementsAsText) {
   EXPECT_EQ(parse("<OK\r\n"), std::tuple(1, 0, ""));
   EXPECT_EQ(parse("<OK\r\nx"), std::tuple(1, 0, ""));
   EXPECT_EQ(parse("<OK\r\ntext"), std::tuple(0, 1, "text"));
+  EXPECT_EQ(parse("\r\n\r\n<OK\r\n\r\nab"), std::tuple(0, 1, "ab"));
+  EXPECT_EQ(parse("<OKab"), std::tuple(0, 1, "ab"));
+  EXPECT_EQ(parse("<OK\r\nab\r\n"), std::tuple(0, 1, "ab\r\n"));
+  EXPECT_EQ(parse("<OK\r\n\r"), std::tuple(1, 0, ""));
+  EXPECT_EQ(parse("<OK\r\n\r\n"), std::tuple(1, 0, ""));
+  EXPECT_EQ(parse("\r\n\r\n"), std::tuple(0, 3, ""));
+  EXPECT_EQ(parse("x"), std::tuple(0, 3, ""));
+  EXPECT_EQ(parse("<ok"), std::tuple(1, 2, ""));
   EXPECT_EQ(parse("<ERROR"), std::tuple(1, 2, ""));
   EXPECT_EQ(parse("text"), std::tuple(1, 4, ""));
 }
@@ -233,8 +562,47 @@ TEST_F(VelmarCommand, AsciiMessages) {
   EXPECT_EQ(command.ParseAsciiHeader("a,b,c", 5), S_FALSE);
 }
 
+// What the two halves of a message give.
+class Halves : public CVelmarCommand {
+ public:
+  Halves() : CVelmarCommand("x", 0) {}
+  HRESULT ParseAsciiHeader(const char* text, uint32_t length) override {
+    header = std::string(text, length);
+    return header_result;
+  }
+  HRESULT ParseMessageBody(const char* text, uint32_t length, bool* done) override {
+    body = std::string(text, length);
+    *done = true;
+    return body_result;
+  }
+  std::string header;
+  std::string body;
+  HRESULT header_result = S_OK;
+  HRESULT body_result = S_OK;
+};
+
+TEST_F(VelmarCommand, AsciiMessagesFailWithTheirHalves) {
+  const auto parse = [](HRESULT header, HRESULT body) {
+    Halves command;
+    command.header_result = header;
+    command.body_result = body;
+    bool done = false;
+    const HRESULT result = command.ParseAsciiMessage("#A,b;c;d", &done);
+    EXPECT_EQ(command.header, "#A,b");
+    EXPECT_EQ(command.body, FAILED(header) ? "" : "c;d");
+    EXPECT_EQ(done, !FAILED(header));
+    return result;
+  };
+  EXPECT_EQ(parse(S_OK, S_OK), S_OK);
+  EXPECT_EQ(parse(S_FALSE, S_OK), S_OK);  // too few fields are no failure
+  EXPECT_EQ(parse(S_OK, S_FALSE), S_OK);
+  EXPECT_EQ(parse(E_ACCESSDENIED, S_OK), E_ACCESSDENIED);
+  EXPECT_EQ(parse(S_OK, E_HANDLE), E_HANDLE);
+}
+
 TEST_F(VelmarCommand, ReservedOperationsAreNotOffered) {
   CVelmarCommand command("x", 0);
+  EXPECT_EQ(command.ParseAbbreviatedLog(nullptr, 0, nullptr, nullptr), E_NOTIMPL);
   EXPECT_EQ(command.ParseReserved(nullptr, 0, nullptr, nullptr), E_NOTIMPL);
 }
 

@@ -12,6 +12,7 @@
 #include <utility>
 #include <vector>
 
+#include "tests/support/driver_lock.h"
 #include "tests/support/manual_clock.h"
 #include "tests/support/report_capture.h"
 #include "tests/support/scripted_connection.h"
@@ -37,15 +38,19 @@ class VelmarDriver : public testing::Test, public CIProtocolCallback {
     };
   }
 
-  void OnProgress(BYTE percent) override { percents.push_back(percent); }
+  void OnProgress(BYTE percent) override {
+    percents.push_back(percent);
+    if (on_percent) on_percent(percent);
+  }
 
   ManualClock clock;
   ReportCapture report;
   ScriptedConnection* connection;  // the driver's
-  CVelmarProtocol driver;
+  WithLockText<CVelmarProtocol> driver;
   std::map<std::string, std::string> answers;  // by command; silence for the others
   std::function<void(const std::string& command)> before_command;
   std::vector<int> percents;
+  std::function<void(int percent)> on_percent;  // may be empty
 };
 
 #endif  // RCVLINK_TESTS_VELMAR_VELMAR_DRIVER_H_

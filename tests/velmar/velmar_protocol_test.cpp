@@ -4,6 +4,7 @@
 
 #include "platform/handle.h"
 #include "platform/hresult.h"
+#include "tests/support/memory_stream.h"
 #include "tests/velmar/velmar_driver.h"
 
 namespace {
@@ -33,17 +34,6 @@ class Event : public KernelHandle {
   explicit Event(bool signalled) : KernelHandle(CreateEventW(nullptr, TRUE, signalled, nullptr)) {}
 };
 
-// Whether another thread could take the connection.
-bool IsFree(CVelmarProtocol& driver) {
-  HRESULT result = E_FAIL;
-  std::thread([&] {
-    const Event at_once(true);
-    result = driver.LockConnection(at_once.get());
-    if (result == S_OK) driver.UnlockConnection();
-  }).join();
-  return result == S_OK;
-}
-
 // --- The probe
 
 TEST_F(VelmarDriver, AnswersTheProbe) {
@@ -52,7 +42,7 @@ TEST_F(VelmarDriver, AnswersTheProbe) {
   EXPECT_EQ(driver.CheckConnection(nullptr, &answer), S_OK);
   EXPECT_EQ(answer, -1);
   EXPECT_THAT(connection->Writes(), ElementsAre(kInterfaceMode, kUnlogAll));
-  EXPECT_TRUE(IsFree(driver));
+  EXPECT_TRUE(IsFreeForOthers(driver));
 }
 
 TEST_F(VelmarDriver, ARefusalOrSilenceIsNoReceiver) {
@@ -83,25 +73,56 @@ TEST_F(VelmarDriver, TheEventIsLookedAtBehindTheFirstCommand) {
   EXPECT_THAT(connection->Writes(), ElementsAre(kInterfaceMode));
 }
 
+// Only that the first of the two commands could be sent counts.
+TEST_F(VelmarDriver, TheAnswerToTheFirstProbeCommandIsNotLookedAt) {
+  answers = {{kInterfaceMode, kErrorPrompt}, {kUnlogAll, kOkPrompt}};
+  short answer = 0;
+  EXPECT_EQ(driver.CheckConnection(nullptr, &answer), S_OK);
+  EXPECT_EQ(answer, -1);
+  EXPECT_THAT(
+      connection->calls,
+      ElementsAre(
+          "flush", "write " + kInterfaceMode, "flush", "write " + kUnlogAll, "read 8192 8000"));
+  EXPECT_EQ(clock.paused, 500u);
+}
+
+// Whatever an answer is but an acknowledgement alone.
+TEST_F(VelmarDriver, ALogIsNoAnswerToTheProbe) {
+  answers = {{kUnlogAll, kOkPrompt + AsciiLog("A", "body")}};
+  short answer = 99;
+  EXPECT_EQ(driver.CheckConnection(nullptr, &answer), S_OK);
+  EXPECT_EQ(answer, 0);
+}
+
+TEST_F(VelmarDriver, AFailedSecondProbeCommandIsNoReceiver) {
+  answers = {{kUnlogAll, kOkPrompt + "<STATUS"}};
+  short answer = 99;
+  EXPECT_EQ(driver.CheckConnection(nullptr, &answer), S_OK);
+  EXPECT_EQ(answer, 0);
+  EXPECT_TRUE(report.Has("CVelmarProtocol::DumpInvalidResponse - [0x80004001] [] [COM7]"));
+  EXPECT_TRUE(IsFreeForOthers(driver));
+}
+
+TEST_F(VelmarDriver, TheProbeWatchesTheEventWhileItWaits) {
+  const Event event(false);
+  HANDLE watched = nullptr;
+  before_command = [&](const std::string&) { watched = connection->abort_event; };
+  short answer = 99;
+  driver.CheckConnection(event.get(), &answer);
+  EXPECT_EQ(watched, event.get());
+  EXPECT_EQ(connection->abort_event, nullptr);
+}
+
+TEST(VelmarProbe, WithoutAConnectionIsNo) {
+  EXPECT_FALSE(CVelmarProtocol::Probe(nullptr, nullptr));
+}
+
 TEST_F(VelmarDriver, AFailedProbeCommandIsNoReceiver) {
   connection->on_write = [](std::string_view) { return E_HANDLE; };
   short answer = 99;
   EXPECT_EQ(driver.CheckConnection(nullptr, &answer), S_OK);
   EXPECT_EQ(answer, 0);
   EXPECT_TRUE(report.Has("CVelmarProtocol::DumpInvalidResponse - [0x80070006] [] [COM7]"));
-}
-
-TEST_F(VelmarDriver, ACheckThatCannotHaveTheLockIsCancelled) {
-  driver.LockConnection(nullptr);
-  short answer = 99;
-  std::thread([&] {
-    const Event event(true);
-    EXPECT_EQ(driver.CheckConnection(event.get(), &answer), S_FALSE);
-  }).join();
-  EXPECT_EQ(answer, 99);
-  EXPECT_TRUE(report.HasStart("CVelmarProtocol::LockConnection - is cancelled [0x"));
-  EXPECT_EQ(driver.UnlockConnection(), 1);
-  EXPECT_EQ(driver.UnlockConnection(), 0);
 }
 
 // --- GetReceiverInfo
@@ -118,8 +139,61 @@ TEST_F(VelmarDriver, ReadsTheIdentity) {
   EXPECT_EQ(info.dwProtocol, 2u);
   EXPECT_EQ(info.dwVariant, 2u);
   EXPECT_THAT(percents, ElementsAre(0, 100));
-  EXPECT_TRUE(IsFree(driver));
-  EXPECT_TRUE(report.Has("CVelmarProtocol::GetReceiverInfo - OK"));
+  EXPECT_THAT(
+      report.Lines(),
+      ElementsAre("CVelmarProtocol::GetReceiverInfo",
+                  "CVelmarProtocol::LockConnection - connection is locked " + driver.LockText(),
+                  "CGetReceiverInfoCmd::CGetReceiverInfoCmd",
+                  "CVelmarProtocol::UnlockConnection - connection is unlocked " + driver.LockText(),
+                  "CVelmarProtocol::GetReceiverInfo - OK"));
+  EXPECT_TRUE(IsFreeForOthers(driver));
+}
+
+TEST_F(VelmarDriver, HoldsTheConnectionFromTheFirstToTheLastReportOfTheIdentity) {
+  answers = {{kVersion, VersionReply()}};
+  std::vector<bool> free;
+  on_percent = [&](int) { free.push_back(IsFreeForOthers(driver)); };
+  CReceiverInfo info{};
+  EXPECT_EQ(driver.GetReceiverInfo(nullptr, &info), S_OK);
+  const UniqueBstr id(info.bstrReceiverId);
+  const UniqueBstr model(info.bstrModel);
+  EXPECT_THAT(free, ElementsAre(false, true));
+}
+
+// A receiver without components has an identity, an empty one.
+TEST_F(VelmarDriver, ReadsAnIdentityOfNothing) {
+  answers = {{kVersion, kOkPrompt + AsciiLog("VERSIONA", "0")}};
+  CReceiverInfo info{};
+  EXPECT_EQ(driver.GetReceiverInfo(nullptr, &info), S_OK);
+  const UniqueBstr id(info.bstrReceiverId);
+  const UniqueBstr model(info.bstrModel);
+  EXPECT_STREQ(info.bstrReceiverId, L"");
+  EXPECT_STREQ(info.bstrModel, L"");
+}
+
+TEST_F(VelmarDriver, AnIdentityThatFailsGivesItsCode) {
+  answers = {{kVersion, kOkPrompt + "<VERSION"}};
+  CReceiverInfo info{};
+  info.dwFeatures = 77;
+  EXPECT_EQ(driver.GetReceiverInfo(nullptr, &info), E_NOTIMPL);
+  EXPECT_EQ(info.bstrModel, nullptr);
+  EXPECT_EQ(info.dwFeatures, 77u);
+  EXPECT_THAT(percents, ElementsAre(0));
+  EXPECT_TRUE(IsFreeForOthers(driver));
+  EXPECT_FALSE(report.Has("CVelmarProtocol::GetReceiverInfo - OK"));
+}
+
+TEST_F(VelmarDriver, AnAbortEndsTheIdentityAndIsUsedUp) {
+  answers = {{kVersion, VersionReply()}};
+  driver.Abort();
+  CReceiverInfo info{};
+  EXPECT_EQ(driver.GetReceiverInfo(nullptr, &info), S_FALSE);
+  EXPECT_EQ(info.bstrModel, nullptr);
+  EXPECT_THAT(connection->Writes(), ElementsAre(kVersion));
+  EXPECT_THAT(percents, ElementsAre(0));
+  EXPECT_EQ(driver.GetReceiverInfo(nullptr, &info), S_OK);
+  const UniqueBstr id(info.bstrReceiverId);
+  const UniqueBstr model(info.bstrModel);
 }
 
 TEST_F(VelmarDriver, WithoutVersionDataThereIsNoIdentity) {
@@ -131,7 +205,7 @@ TEST_F(VelmarDriver, WithoutVersionDataThereIsNoIdentity) {
   EXPECT_EQ(driver.GetReceiverInfo(nullptr, &info), S_FALSE);
   EXPECT_EQ(info.bstrReceiverId, nullptr);
   EXPECT_EQ(info.bstrModel, nullptr);
-  EXPECT_TRUE(IsFree(driver));  // this family lets go after a failure
+  EXPECT_TRUE(IsFreeForOthers(driver));  // this family lets go after a failure
 }
 
 // It is unlocked whether or not it was locked, and the report shows it.
@@ -143,7 +217,7 @@ TEST_F(VelmarDriver, UnlocksWithoutALock) {
     EXPECT_EQ(driver.GetReceiverInfo(event.get(), &info), S_FALSE);
   }).join();
   EXPECT_TRUE(report.HasStart("CVelmarProtocol::UnlockConnection - connection is unlocked"));
-  EXPECT_FALSE(IsFree(driver));
+  EXPECT_FALSE(IsFreeForOthers(driver));
   driver.UnlockConnection();
 }
 
@@ -161,6 +235,84 @@ TEST_F(VelmarDriver, ListsFilesAndReportsTheirShare) {
   EXPECT_STREQ(files.At(0).bstrName, L"f3");
   EXPECT_EQ(files.At(0).stTime2.wYear, 2012);
   EXPECT_THAT(percents, ElementsAre(0, 90, 90, 92, 95, 97));
+}
+
+TEST_F(VelmarDriver, FillsTheRecordOfAFile) {
+  answers = {{kDirectory, kOkPrompt + AsciiLog("DIRENTA", "\"a b\",1000,7,20130709,010203")}};
+  CFileList files;
+  EXPECT_EQ(driver.GetFiles(&files), S_OK);
+  ASSERT_EQ(files.Count(), 1);
+  const CFileInfo& file = files.At(0);
+  EXPECT_EQ(file.dwSize, 1000u);
+  EXPECT_STREQ(file.bstrName, L"a b");
+  EXPECT_EQ(file.qwReserved, 0u);
+  for (const SYSTEMTIME& time : {file.stTime1, file.stTime2}) {
+    EXPECT_EQ(time.wYear, 2013);
+    EXPECT_EQ(time.wMonth, 7);
+    EXPECT_EQ(time.wDay, 9);
+    EXPECT_EQ(time.wHour, 1);
+    EXPECT_EQ(time.wMinute, 2);
+    EXPECT_EQ(time.wSecond, 3);
+  }
+}
+
+// The list is the host's: what is in it stays.
+TEST_F(VelmarDriver, AppendsToTheList) {
+  answers = {{kDirectory, kOkPrompt + AsciiLog("DIRENTA", "a,1,0,20121231,235959")}};
+  CFileList files;
+  driver.GetFiles(&files);
+  EXPECT_EQ(driver.GetFiles(&files), S_OK);
+  EXPECT_EQ(files.Count(), 2);
+}
+
+// What had come when the logs stopped following each other is listed all the same.
+TEST_F(VelmarDriver, ADirectoryWithAGapIsListedAsFarAsItWent) {
+  answers = {{kDirectory,
+              kOkPrompt + AsciiLog("DIRENTA", "a,1,0,20121231,235959", 3) +
+                  AsciiLog("DIRENTA", "b,1,0,20121231,235959", 1)}};
+  CFileList files;
+  EXPECT_EQ(driver.GetFiles(&files), S_OK);
+  EXPECT_EQ(files.Count(), 2);
+  EXPECT_THAT(percents, ElementsAre(0, 90, 90, 95));
+}
+
+TEST_F(VelmarDriver, ADirectoryThatIsRefusedIsAnEmptyOne) {
+  for (const std::string& refusal : {kErrorPrompt, kErrorTextPrompt, std::string()}) {
+    answers = {{kDirectory, refusal}};
+    CFileList files;
+    EXPECT_EQ(driver.GetFiles(&files), S_OK);
+    EXPECT_EQ(files.Count(), 0);
+  }
+}
+
+TEST_F(VelmarDriver, ADirectoryThatFailsGivesItsCode) {
+  answers = {{kDirectory, kOkPrompt + "<DIRENT"}};
+  CFileList files;
+  EXPECT_EQ(driver.GetFiles(&files), E_NOTIMPL);
+  EXPECT_THAT(percents, ElementsAre(0));
+  EXPECT_TRUE(IsFreeForOthers(driver));
+}
+
+TEST_F(VelmarDriver, AnAbortLeavesTheListAlone) {
+  answers = {{kDirectory, kOkPrompt + AsciiLog("DIRENTA", "a,1,0,20121231,235959")}};
+  driver.Abort();
+  CFileList files;
+  EXPECT_EQ(driver.GetFiles(&files), S_FALSE);
+  EXPECT_EQ(files.Count(), 0);
+  EXPECT_THAT(percents, ElementsAre(0));
+  EXPECT_TRUE(IsFreeForOthers(driver));
+  EXPECT_EQ(driver.GetFiles(&files), S_OK);
+  EXPECT_EQ(files.Count(), 1);
+}
+
+TEST_F(VelmarDriver, HoldsTheConnectionWhileItLists) {
+  answers = {{kDirectory, kOkPrompt + AsciiLog("DIRENTA", "a,1,0,20121231,235959")}};
+  std::vector<bool> free;
+  on_percent = [&](int) { free.push_back(IsFreeForOthers(driver)); };
+  CFileList files;
+  driver.GetFiles(&files);
+  EXPECT_THAT(free, ElementsAre(false, false, false));
+  EXPECT_TRUE(IsFreeForOthers(driver));
 }
 
 TEST_F(VelmarDriver, AnEmptyDirectoryEndsAtNinety) {
@@ -185,6 +337,40 @@ TEST_F(VelmarDriver, ARefusedDeletionCountsAsDone) {
   EXPECT_EQ(driver.DeleteFile(L"a"), S_OK);
 }
 
+TEST_F(VelmarDriver, AChangeThatCannotBeSentGivesItsCode) {
+  connection->on_write = [](std::string_view) { return E_HANDLE; };
+  EXPECT_EQ(driver.DeleteFile(L"a"), E_HANDLE);
+  EXPECT_EQ(driver.RenameFile(L"a", L"b"), E_HANDLE);
+  EXPECT_THAT(percents, ElementsAre(0, 0));
+  EXPECT_TRUE(IsFreeForOthers(driver));
+}
+
+TEST_F(VelmarDriver, HoldsTheConnectionWhileItChangesAFile) {
+  std::vector<bool> free;
+  on_percent = [&](int) { free.push_back(IsFreeForOthers(driver)); };
+  driver.DeleteFile(L"a");
+  driver.RenameFile(L"a", L"b");
+  EXPECT_THAT(free, ElementsAre(false, false, false, false));
+  EXPECT_TRUE(IsFreeForOthers(driver));
+}
+
+// Names go out in the code page of the thread, as they are.
+TEST_F(VelmarDriver, NamesAreInTheCodePageOfTheThread) {
+  constexpr LCID kGreek = 0x0408;
+  const LCID before = GetThreadLocale();
+  SetThreadLocale(kGreek);
+  driver.DeleteFile(L"\x3B1 \"%s\"");
+  driver.RenameFile(L"\x3B1", L"\x3B2");
+  SetThreadLocale(before);
+  EXPECT_THAT(connection->Writes(), ElementsAre("del file \xE1 \"%s\"\r", "rename \xE1 \xE2\r"));
+}
+
+TEST_F(VelmarDriver, EmptyNamesAreSentToo) {
+  EXPECT_EQ(driver.DeleteFile(L""), S_OK);
+  EXPECT_EQ(driver.RenameFile(L"", L""), S_OK);
+  EXPECT_THAT(connection->Writes(), ElementsAre("del file \r", "rename  \r"));
+}
+
 TEST_F(VelmarDriver, AnAbortBetweenOperationsEndsTheNextAfterItsCommand) {
   driver.Abort();
   EXPECT_EQ(driver.DeleteFile(L"a"), S_FALSE);
@@ -196,7 +382,8 @@ TEST_F(VelmarDriver, AnAbortDuringARenameEndsIt) {
   before_command = [&](const std::string&) { driver.Abort(); };
   EXPECT_EQ(driver.RenameFile(L"a", L"b"), S_FALSE);
   EXPECT_THAT(connection->calls, Contains("cancel"));
-  EXPECT_TRUE(IsFree(driver));
+  EXPECT_THAT(percents, ElementsAre(0));
+  EXPECT_TRUE(IsFreeForOthers(driver));
 }
 
 // --- Port settings
@@ -228,6 +415,174 @@ TEST_F(VelmarDriver, AnAbortEndsAPortSettingBeforeItIsSent) {
   EXPECT_THAT(connection->Writes(), ElementsAre(kConfig));
 }
 
+TEST_F(VelmarDriver, APortSettingUsesTheAbortUp) {
+  answers = {{kConfig, ConfigReply()}};
+  driver.Abort();
+  EXPECT_EQ(driver.DCSetRcvBaudrate(57600), S_FALSE);
+  EXPECT_TRUE(IsFreeForOthers(driver));
+  EXPECT_EQ(driver.DCSetRcvBaudrate(57600), S_OK);
+  EXPECT_THAT(connection->Writes(), ElementsAre(kConfig, kConfig, "COM 57600 E 7 2 XON\r"));
+}
+
+// It is looked for between the two commands only: one that comes with the second stays for the next
+// operation.
+TEST_F(VelmarDriver, AnAbortWithTheSettingItselfOutlivesIt) {
+  answers = {{kConfig, ConfigReply()}};
+  before_command = [&](const std::string& command) {
+    if (command.starts_with("COM ")) driver.Abort();
+  };
+  EXPECT_EQ(driver.DCSetRcvStopbits(1), S_OK);
+  before_command = nullptr;
+  EXPECT_EQ(driver.DeleteFile(L"a"), S_FALSE);
+  EXPECT_EQ(driver.DeleteFile(L"a"), S_OK);
+}
+
+TEST_F(VelmarDriver, APortSettingThatCannotBeReadGivesItsCode) {
+  answers = {{kConfig, kOkPrompt + "<COMCONFIG"}};
+  EXPECT_EQ(driver.DCSetRcvBaudrate(1), E_NOTIMPL);
+  EXPECT_EQ(driver.DCSetRcvParity(1), E_NOTIMPL);
+  EXPECT_EQ(driver.DCSetRcvStopbits(1), E_NOTIMPL);
+  EXPECT_THAT(connection->Writes(), ElementsAre(kConfig, kConfig, kConfig));
+  EXPECT_TRUE(IsFreeForOthers(driver));
+}
+
+TEST_F(VelmarDriver, APortSettingThatCannotBeSentGivesItsCode) {
+  answers = {{kConfig, ConfigReply()}, {"COM 9600 N 7 2 XON\r", kOkPrompt + "<"}};
+  EXPECT_EQ(driver.DCSetRcvParity(0), E_NOTIMPL);
+  EXPECT_TRUE(IsFreeForOthers(driver));
+}
+
+TEST_F(VelmarDriver, APortSettingThatIsRefusedCountsAsDone) {
+  for (const std::string& refusal : {kErrorPrompt, kErrorTextPrompt, std::string()}) {
+    answers = {{kConfig, ConfigReply()}, {"COM 9600 O 7 2 XON\r", refusal}};
+    EXPECT_EQ(driver.DCSetRcvParity(2), S_OK);
+  }
+}
+
+TEST_F(VelmarDriver, SendsItsSettingsAsTheyAre) {
+  answers = {{kConfig, ConfigReply()}};
+  EXPECT_EQ(driver.DCSetRcvBaudrate(4294967295), S_OK);
+  EXPECT_EQ(driver.DCSetRcvBaudrate(0), S_OK);
+  EXPECT_EQ(driver.DCSetRcvParity(0), S_OK);
+  EXPECT_EQ(driver.DCSetRcvParity(1), S_OK);
+  EXPECT_EQ(driver.DCSetRcvParity(255), S_OK);
+  EXPECT_EQ(driver.DCSetRcvStopbits(255), S_OK);
+  std::vector<std::string> sent;
+  for (const std::string& command : connection->Writes()) {
+    if (command != kConfig) sent.push_back(command);
+  }
+  EXPECT_THAT(sent,
+              ElementsAre("COM 4294967295 E 7 2 XON\r",
+                          "COM 0 E 7 2 XON\r",
+                          "COM 9600 N 7 2 XON\r",
+                          "COM 9600 E 7 2 XON\r",
+                          "COM 9600 N 7 2 XON\r",
+                          "COM 9600 E 7 255 XON\r"));
+}
+
+// The port that the receiver is talked to on is in the header of its log.
+TEST_F(VelmarDriver, ChangesThePortThatItTalksOn) {
+  const std::string ports =
+      "2,COM1,9600,N,8,1,N,ON,OFF,NOVATEL,NOVATEL,ON,COM2,38400,O,7,2,CTS,ON,OFF,NOVATEL,NOVATEL,"
+      "ON";
+  answers = {{kConfig, kOkPrompt + AsciiLog("COMCONFIGA", ports, 0, "COM2")}};
+  EXPECT_EQ(driver.DCSetRcvBaudrate(115200), S_OK);
+  EXPECT_THAT(connection->Writes(), ElementsAre(kConfig, "COM 115200 O 7 2 CTS\r"));
+}
+
+TEST_F(VelmarDriver, PortSettingsReportNoProgress) {
+  answers = {{kConfig, ConfigReply()}};
+  driver.DCSetRcvParity(1);
+  EXPECT_THAT(percents, IsEmpty());
+}
+
+TEST_F(VelmarDriver, PortSettingsHoldTheConnection) {
+  answers = {{kConfig, ConfigReply()}};
+  std::vector<bool> free;
+  before_command = [&](const std::string&) { free.push_back(IsFreeForOthers(driver)); };
+  driver.DCSetRcvBaudrate(1);
+  driver.DCSetRcvParity(1);
+  driver.DCSetRcvStopbits(1);
+  EXPECT_THAT(free, ElementsAre(false, false, false, false, false, false));
+  EXPECT_TRUE(IsFreeForOthers(driver));
+}
+
+// --- One command
+
+// Ends as it is told, with a reply of its own.
+class Ending : public VelmarCommands::CVelmarCommand {
+ public:
+  explicit Ending(HRESULT result) : CVelmarCommand("x", 0), result_(result) {}
+  HRESULT Execute(CIConnection* connection, HANDLE abort_event) override {
+    EXPECT_NE(connection, nullptr);
+    EXPECT_EQ(abort_event, nullptr);
+    if (during) during();
+    return result_;
+  }
+  std::function<void()> during;
+
+ private:
+  HRESULT result_;
+};
+
+TEST_F(VelmarDriver, WritesTheReplyOfAFailedCommandToTheReport) {
+  Ending command(E_ACCESSDENIED);
+  command.SetReply("some%s\x80text");
+  EXPECT_EQ(driver.ExecuteCommand(command), E_ACCESSDENIED);
+  EXPECT_TRUE(
+      report.Has("CVelmarProtocol::DumpInvalidResponse - [0x80070005] [some%s\x80text] [COM7]"));
+}
+
+TEST_F(VelmarDriver, WritesNothingOfACommandThatDidNotFail) {
+  for (const HRESULT result : {S_OK, S_FALSE}) {
+    Ending command(result);
+    command.SetReply("text");
+    EXPECT_EQ(driver.ExecuteCommand(command), result);
+  }
+  EXPECT_THAT(report.Lines(), IsEmpty());
+}
+
+TEST_F(VelmarDriver, AConnectionWithoutANameHasAnEmptyOne) {
+  connection->name_result = E_FAIL;
+  Ending command(E_ACCESSDENIED);
+  driver.ExecuteCommand(command);
+  EXPECT_THAT(report.Lines(),
+              ElementsAre("CVelmarProtocol::DumpInvalidResponse - [0x80070005] [] []"));
+}
+
+TEST_F(VelmarDriver, AReplyThatIsNotThereCannotBeWritten) {
+  Ending command(E_ACCESSDENIED);
+  command.SetReply("text");
+  command.FreeReply();
+  HRESULT raised = S_OK;
+  try {
+    driver.ExecuteCommand(command);
+  } catch (const HResultError& error) {
+    raised = error.code();
+  }
+  EXPECT_EQ(raised, E_INVALIDARG);
+}
+
+TEST_F(VelmarDriver, AnAbortReachesTheCommandThatRuns) {
+  Ending command(S_OK);
+  command.during = [&] {
+    EXPECT_FALSE(command.IsCancelled(nullptr));
+    driver.Abort();
+    EXPECT_TRUE(command.IsCancelled(nullptr));
+  };
+  driver.ExecuteCommand(command);
+  Ending next(S_OK);
+  driver.ExecuteCommand(next);
+  driver.Abort();
+  EXPECT_FALSE(next.IsCancelled(nullptr));
+}
+
+TEST_F(VelmarDriver, WithoutACallbackNobodyIsTold) {
+  driver.SetCallback(nullptr);
+  EXPECT_EQ(driver.DeleteFile(L"a"), S_OK);
+  EXPECT_THAT(percents, IsEmpty());
+}
+
 TEST_F(VelmarDriver, DoesNotOfferUploadsAndRts) {
   EXPECT_EQ(driver.UploadFile(nullptr, nullptr), static_cast<HRESULT>(0x80004001));
   EXPECT_EQ(driver.DCSetRcvRTSControl(1), static_cast<HRESULT>(0x80004001));
@@ -241,9 +596,13 @@ TEST_F(VelmarDriver, NullArgumentsAreRefused) {
   EXPECT_EQ(driver.DeleteFile(nullptr), E_INVALIDARG);
   EXPECT_EQ(driver.RenameFile(nullptr, L"b"), E_INVALIDARG);
   EXPECT_EQ(driver.RenameFile(L"a", nullptr), E_INVALIDARG);
+  MemoryStream stream;
   EXPECT_EQ(driver.DownloadFile(nullptr, nullptr, nullptr), E_INVALIDARG);
+  EXPECT_EQ(driver.DownloadFile(L"a", nullptr, nullptr), E_INVALIDARG);
+  EXPECT_EQ(driver.DownloadFile(nullptr, &stream, nullptr), E_INVALIDARG);
   EXPECT_EQ(driver.OnDataReceived(nullptr), E_INVALIDARG);
   EXPECT_THAT(connection->calls, IsEmpty());
+  EXPECT_THAT(percents, IsEmpty());
 }
 
 TEST(VelmarDriverWithoutConnection, IsNotConnected) {
