@@ -3,7 +3,7 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
-#include "tests/quorin/user_settings.h"
+#include "tests/support/user_settings.h"
 #include "tests/support/report_capture.h"
 
 using testing::ElementsAre;

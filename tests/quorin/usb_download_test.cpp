@@ -12,7 +12,7 @@
 
 #include "platform/hresult.h"
 #include "tests/quorin/usb_download_fixture.h"
-#include "tests/quorin/user_settings.h"
+#include "tests/support/user_settings.h"
 #include "tests/support/report_capture.h"
 
 using testing::Each;

@@ -44,7 +44,7 @@ Receiver::Receiver(const bed::SimulatedPort& port, DWORD speed) : port_(port) {
   std::wstring name = port.name();
   DCB settings = Settings(speed);
   const long result =
-      devapi::CreateReceiverOnSerial(name.data(), eProtocolQuorin, &settings, nullptr, &handle_);
+      devapi::CreateReceiverOnSerial(name.data(), eProtocolQuorin, &settings, nullptr, out());
   if (result != S_OK) {
     throw bed::Error("no receiver answers, " + std::to_string(result) + ":\n" + port.Transcript());
   }
@@ -52,7 +52,17 @@ Receiver::Receiver(const bed::SimulatedPort& port, DWORD speed) : port_(port) {
   greeting_ = WireLines(port.Transcript()).size();
 }
 
-Receiver::~Receiver() {
+UsbReceiver::UsbReceiver(const bed::SimulatedUsb& usb) : usb_(usb) {
+  std::wstring device = usb.device();
+  const long result = devapi::CreateReceiverOnUSB(device.data(), eProtocolQuorin, nullptr, out());
+  if (result != S_OK) {
+    throw bed::Error("no receiver answers, " + std::to_string(result) + ":\n" + usb.Transcript());
+  }
+  usb.WaitForTranscript(kEndOfGreeting);
+  greeting_ = WireLines(usb.Transcript()).size();
+}
+
+OpenReceiver::~OpenReceiver() {
   if (handle_ != nullptr) devapi::CloseReceiver(handle_);
 }
 
@@ -74,13 +84,15 @@ void Receiver::WaitUntil(const std::function<bool(const Lines& sent)>& done) con
   }
 }
 
-HRESULT Receiver::Download(const std::wstring& name, IStream& stream, Progress* progress) const {
+HRESULT OpenReceiver::Download(const std::wstring& name,
+                               IStream& stream,
+                               Progress* progress) const {
   std::wstring file = name;
   return devapi::DownloadFile(
       handle_, file.data(), &stream, progress == nullptr ? nullptr : progress->record());
 }
 
-Identity Receiver::Identify() const {
+Identity OpenReceiver::Identify() const {
   CReceiverInfo info{};
   Identity identity;
   identity.result = devapi::GetReceiverInfo(handle_, nullptr, &info);
@@ -91,7 +103,7 @@ Identity Receiver::Identify() const {
   return identity;
 }
 
-long Receiver::Check() const {
+long OpenReceiver::Check() const {
   short answer = 7;
   const long result = devapi::CheckConnection(handle_, nullptr, &answer);
   return result == S_OK ? answer : result;

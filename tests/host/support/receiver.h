@@ -14,6 +14,7 @@
 #include "tests/host/support/memory_stream.h"
 #include "tests/host/support/progress.h"
 #include "tests/host/support/simulated_port.h"
+#include "tests/host/support/simulated_usb.h"
 #include "tests/host/support/wire.h"
 
 namespace host {
@@ -56,18 +57,33 @@ struct Identity {
   std::wstring model;
 };
 
-// The receiver on a simulated port, closed at the end.
-class Receiver {
+// A receiver's handle, closed at the end.
+class OpenReceiver {
+ public:
+  OpenReceiver() = default;
+  OpenReceiver(const OpenReceiver&) = delete;
+  OpenReceiver& operator=(const OpenReceiver&) = delete;
+  ~OpenReceiver();
+
+  void* get() const { return handle_; }
+  void** out() { return &handle_; }
+  // Gives the handle away.
+  void* Release() { return std::exchange(handle_, nullptr); }
+
+  HRESULT Download(const std::wstring& name, IStream& stream, Progress* progress = nullptr) const;
+  Identity Identify() const;
+  // The answer of CheckConnection, or its result when that is not S_OK.
+  long Check() const;
+
+ private:
+  void* handle_ = nullptr;
+};
+
+// The receiver on a simulated port.
+class Receiver : public OpenReceiver {
  public:
   // Raises bed::Error when it does not answer. Returns when the whole greeting has passed.
   explicit Receiver(const bed::SimulatedPort& port, DWORD speed = CBR_9600);
-  Receiver(const Receiver&) = delete;
-  Receiver& operator=(const Receiver&) = delete;
-  ~Receiver();
-
-  void* get() const { return handle_; }
-  // Gives the handle away.
-  void* Release() { return std::exchange(handle_, nullptr); }
 
   // What has passed since the greeting.
   Lines WireSince() const { return WireLines(port_.Transcript(), greeting_); }
@@ -77,17 +93,26 @@ class Receiver {
   void WaitForSent(size_t count) const;
   void WaitForLastSent(std::string_view line) const;
 
-  HRESULT Download(const std::wstring& name, IStream& stream, Progress* progress = nullptr) const;
-  Identity Identify() const;
-  // The answer of CheckConnection, or its result when that is not S_OK.
-  long Check() const;
-
  private:
   void WaitUntil(const std::function<bool(const Lines& sent)>& done) const;
 
   const bed::SimulatedPort& port_;
-  void* handle_ = nullptr;
   size_t greeting_ = 0;  // how many lines of the transcript it took
+};
+
+// The receiver on a simulated USB device.
+class UsbReceiver : public OpenReceiver {
+ public:
+  // Raises bed::Error when it does not answer.
+  explicit UsbReceiver(const bed::SimulatedUsb& usb);
+
+  // What has passed since it was found.
+  Lines WireSince() const { return WireLines(usb_.Transcript(), greeting_); }
+  Lines SentSince() const { return SentByHost(usb_.Transcript(), greeting_); }
+
+ private:
+  const bed::SimulatedUsb& usb_;
+  size_t greeting_ = 0;
 };
 
 // Bytes of which no two blocks look alike.

@@ -1,12 +1,12 @@
 // The current user's settings, made for the length of a test: the real ones are out of sight.
-#ifndef RCVLINK_TESTS_QUORIN_USER_SETTINGS_H_
-#define RCVLINK_TESTS_QUORIN_USER_SETTINGS_H_
+#ifndef RCVLINK_TESTS_SUPPORT_USER_SETTINGS_H_
+#define RCVLINK_TESTS_SUPPORT_USER_SETTINGS_H_
 
 #include <gtest/gtest.h>
 
 #include <string>
 
-#include "platform/win32.h"
+#include <windows.h>
 
 class UserSettings {
  public:
@@ -41,4 +41,4 @@ class UserSettings {
   std::wstring path_;
 };
 
-#endif  // RCVLINK_TESTS_QUORIN_USER_SETTINGS_H_
+#endif  // RCVLINK_TESTS_SUPPORT_USER_SETTINGS_H_
