@@ -87,6 +87,23 @@ TEST_F(ApiUsb, AsksNothingAfterAnAbort) {
   EXPECT_THAT(Heard(), IsEmpty());
 }
 
+TEST_F(ApiUsb, FindsNothingWhereNothingIs) {
+  path += L"-missing";
+  EXPECT_EQ(Create(eProtocolAny), S_FALSE);
+  EXPECT_EQ(handle, nullptr);
+  EXPECT_THAT(Lines(),
+              ElementsAre("CreateReceiverOnUSB - opening USB [" + Narrow() + "]",
+                          "CreateReceiverOnUSB - looking for Quorin receiver [" + Narrow() + "]"));
+  void* registered = nullptr;
+  EXPECT_EQ(devapi::OpenReceiver(path.data(), &registered), S_FALSE);
+}
+
+TEST_F(ApiUsb, NeedsAPathAndAPlaceForTheHandle) {
+  EXPECT_EQ(devapi::CreateReceiverOnUSB(nullptr, eProtocolAny, nullptr, &handle), E_INVALIDARG);
+  EXPECT_EQ(devapi::CreateReceiverOnUSB(path.data(), eProtocolAny, nullptr, nullptr), E_INVALIDARG);
+  EXPECT_THAT(report.Lines(), IsEmpty());
+}
+
 TEST_F(ApiUsb, DownloadsAFile) {
   ASSERT_EQ(Create(eProtocolQuorin), S_OK);
   MemoryStream stream;
