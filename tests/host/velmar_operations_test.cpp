@@ -14,79 +14,15 @@
 #include "rcvlink.h"
 #include "tests/host/support/file_list.h"
 #include "tests/host/support/receiver.h"
+#include "tests/host/support/velmar.h"
 
+using host::Velmar;
 using testing::ElementsAre;
 using testing::IsEmpty;
 
 namespace {
 
-constexpr size_t kQuestionsOfGreeting = 2;
 constexpr unsigned kFilled = 0xCDCDCDCD;
-
-// A Velmar receiver on a port, opened and closed.
-class Velmar {
- public:
-  explicit Velmar(std::vector<std::string> switches,
-                  const std::map<std::string, std::string>& files = {},
-                  DWORD speed = CBR_9600)
-      : port(Arguments(std::move(switches), speed), files) {
-    std::wstring name = port.name();
-    DCB settings = host::Settings(speed);
-    const long result =
-        devapi::CreateReceiverOnSerial(name.data(), eProtocolVelmar, &settings, nullptr, &handle_);
-    if (result != S_OK) throw bed::Error("no receiver answers:\n" + port.Transcript());
-  }
-  Velmar(const Velmar&) = delete;
-  Velmar& operator=(const Velmar&) = delete;
-  ~Velmar() {
-    if (handle_ != nullptr) devapi::CloseReceiver(handle_);
-  }
-
-  void* get() const { return handle_; }
-
-  // What the host said since the greeting.
-  host::Lines Sent() const {
-    host::Lines sent = host::SentByHost(port.Transcript());
-    EXPECT_GE(sent.size(), kQuestionsOfGreeting);
-    sent.erase(sent.begin(), sent.begin() + kQuestionsOfGreeting);
-    return sent;
-  }
-  // The same, with the pieces of files and the speeds that took hold in between.
-  host::Lines SentAndMoved() const {
-    host::Lines lines;
-    size_t questions = 0;
-    for (const std::string& line : host::WireLines(port.Transcript())) {
-      const bool said = line.starts_with("> ");
-      if (said && ++questions <= kQuestionsOfGreeting) continue;
-      if (said || line.starts_with("= speed") || line.starts_with("< log FILETRANSFERB")) {
-        lines.push_back(line);
-      }
-    }
-    return lines;
-  }
-  std::vector<std::wstring> Names() const {
-    const host::FileList list(handle_);
-    EXPECT_EQ(list.result(), S_OK);
-    std::vector<std::wstring> names;
-    for (long i = 0; i < list.Count(); ++i) names.push_back(list.At(i).name);
-    return names;
-  }
-  long Download(std::wstring name, host::MemoryStream& stream, host::Progress* progress = nullptr) {
-    return devapi::DownloadFile(
-        handle_, name.data(), &stream, progress == nullptr ? nullptr : progress->record());
-  }
-  long Delete(std::wstring name) const { return devapi::DeleteFileW(handle_, name.data()); }
-
-  const bed::SimulatedPort port;
-
- private:
-  static std::vector<std::string> Arguments(std::vector<std::string> switches, DWORD speed) {
-    switches.insert(switches.begin(), {"velmar", "--speed", std::to_string(speed)});
-    return switches;
-  }
-
-  void* handle_ = nullptr;
-};
 
 TEST(ApiVelmarInfo, FillsTheRecordAndNothingElse) {
   const Velmar receiver({"--id", "VM7", "--model", "VR9 X"});

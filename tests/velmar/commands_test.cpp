@@ -388,6 +388,21 @@ TEST_F(VelmarExchange, TheCurrentFileIsNotSetBeforeThePromptHasEnded) {
   }
 }
 
+// Of a command that reads a log behind its acknowledgement and is not done with it.
+TEST_F(VelmarExchange, TheCurrentFileIsSetOnceDataHasCome) {
+  struct WithData : CSetCurrentFileCmd {
+    using CSetCurrentFileCmd::CSetCurrentFileCmd;
+    HRESULT ParseLogBody(const char*, uint32_t, bool* done, uint32_t*) override {
+      SetResponse(RESPONSE_DATA);
+      *done = false;
+      return S_FALSE;
+    }
+  } command("a");
+  EXPECT_EQ(Run(command, {kOkPrompt + AsciiLog("A", "body")}), S_OK);
+  EXPECT_EQ(command.Response(), RESPONSE_DATA);
+  EXPECT_EQ(connection.calls.size(), 3u);
+}
+
 TEST_F(VelmarExchange, TheCurrentFileFailsWithAnAbbreviatedLog) {
   CSetCurrentFileCmd command("a");
   EXPECT_EQ(Run(command, {kOkPrompt + "<"}), E_NOTIMPL);
@@ -620,17 +635,24 @@ TEST_F(FileTransfer, ALastChunkOfLessThanFourBytesIsWaitedForInVain) {
 
 // Success of any kind goes on.
 TEST_F(FileTransfer, AHostThatIsContentGoesOn) {
-  struct Content : CReadFileCmdCallback {
-    HRESULT OnDataReceived(void*) override {
-      ++calls;
+  struct Content : Chunks {
+    HRESULT OnDataReceived(void* context) override {
+      Chunks::OnDataReceived(context);
       return S_FALSE;
     }
-    int calls = 0;
   } content;
-  CReadFileCmd read(&content, nullptr);
-  EXPECT_EQ(Run(read, {kOkPrompt + BinaryLog{"data", 1}.Bytes() + BinaryLog{"data", 0}.Bytes()}),
+  CReadFileCmd read(&content, &content);
+  content.command = &read;
+  EXPECT_EQ(Run(read, {kOkPrompt + BinaryLog{"data", 1}.Bytes() + BinaryLog{"more", 0}.Bytes()}),
             S_OK);
-  EXPECT_EQ(content.calls, 2);
+  EXPECT_EQ(read.Response(), RESPONSE_DATA);
+  EXPECT_THAT(content.chunks, ElementsAre("data", "more"));
+}
+
+TEST_F(FileTransfer, ALogThatWasNotAcknowledgedIsNone) {
+  EXPECT_EQ(Transfer({BinaryLog{"data", 0}.Bytes()}), S_OK);
+  EXPECT_EQ(command.Response(), RESPONSE_UNKNOWN);
+  EXPECT_TRUE(chunks.chunks.empty());
 }
 
 TEST_F(FileTransfer, ASequenceThatNeverEndsTimesOut) {

@@ -188,6 +188,14 @@ TEST(DirectoryLogs, AreFoundAmongOtherFields) {
   EXPECT_THAT(Names(entries), testing::ElementsAre(L"a", L"b"));  // behind the last is nothing
 }
 
+// A file may be called like the log.
+TEST(DirectoryLogs, NoLogBeginsInsideAnother) {
+  std::vector<FileEntry> entries;
+  const std::string text = AsciiLog("DIRENTA", "#DIRENTA,1,0,20121231,235959", 1) + Entry("b", 0);
+  EXPECT_EQ(DecodeDirectory(text, entries), Progress::kComplete);
+  EXPECT_THAT(Names(entries), testing::ElementsAre(L"#DIRENTA", L"b"));
+}
+
 TEST(DirectoryLogs, WithoutALogWaitForMore) {
   std::vector<FileEntry> entries;
   EXPECT_EQ(DecodeDirectory("#", entries), Progress::kMore);

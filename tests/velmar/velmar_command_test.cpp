@@ -140,6 +140,30 @@ TEST_F(VelmarCommand, AnEmptyReadEndsIt) {
   EXPECT_EQ(connection.calls.back(), "read 8192 30000");
 }
 
+// Whatever ended it: a read that gives nothing ends the exchange with what had come, once.
+TEST_F(VelmarCommand, AnEmptyReadInBetweenEndsIt) {
+  for (const HRESULT result : {S_OK, S_FALSE, kTimedOut}) {
+    connection.DropAnswers();
+    connection.GiveRead("\r\n<OK\r");
+    connection.GiveResult(result);
+    connection.GiveRead("\n[COM1]");
+    CVelmarCommand command("x", 0);
+    EXPECT_EQ(command.Execute(&connection, nullptr), S_OK);
+    EXPECT_EQ(command.Response(), RESPONSE_INCOMPLETE);
+    EXPECT_EQ(Reply(command), "\r\n<OK\r");
+    EXPECT_EQ(connection.AnswersLeft(), 1u);
+  }
+}
+
+// A link that has nothing to flush says so.
+TEST_F(VelmarCommand, AFlushThatDoesNothingIsNoFailure) {
+  connection.on_flush = [] { return S_FALSE; };
+  connection.GiveRead(kOkPrompt);
+  CVelmarCommand command("x", 0);
+  EXPECT_EQ(command.Execute(&connection, nullptr), S_OK);
+  EXPECT_EQ(command.Response(), RESPONSE_OK);
+}
+
 // Reports have always shown what stood in the buffer at each read, so the beginning stands twice.
 TEST_F(VelmarCommand, TheKeptReplyRepeatsWhatWasHeld) {
   connection.GiveRead("\r\n<OK\r");
@@ -210,10 +234,14 @@ TEST_F(VelmarCommand, AnAbbreviatedLogIsNotOffered) {
 }
 
 TEST_F(VelmarCommand, ALineEndBehindThePromptEndsIt) {
-  connection.GiveRead(kOkPrompt + "\r\n");
-  CVelmarCommand command("x", 0);
-  EXPECT_EQ(command.Execute(&connection, nullptr), S_OK);
-  EXPECT_EQ(command.Response(), RESPONSE_OK);
+  for (const std::string& prompt : {kOkPrompt, kErrorPrompt}) {
+    connection.calls.clear();
+    connection.GiveRead(prompt + "\r\n");
+    CVelmarCommand command("x", 0);
+    EXPECT_EQ(command.Execute(&connection, nullptr), S_OK);
+    EXPECT_EQ(command.Response(), prompt == kOkPrompt ? RESPONSE_OK : RESPONSE_ERROR);
+    EXPECT_EQ(connection.calls.size(), 3u);
+  }
 }
 
 TEST_F(VelmarCommand, OtherBytesBehindThePromptAreUnknown) {
@@ -454,8 +482,12 @@ TEST_F(VelmarCommand, AStreamedReplyConsumesThePromptOnceMoreHasCome) {
 }
 
 TEST_F(VelmarCommand, AsciiLogsNeedTheirHeader) {
-  for (const std::string log :
-       {"", "#A", "#A,COM1,0,1,2,3,4,5,6,7", "#A,COM1,0;b", "a,b,c;d,e,f,g"}) {
+  for (const std::string log : {"",
+                                "#A",
+                                "#A,COM1,0,3,4,5,6,7,8,9",
+                                "#A,COM1,0,3,4,5,6,7,8;body",
+                                "#A,COM1,0;b",
+                                "a,b,c;d,e,f,g"}) {
     Bodies command;
     bool done = true;
     uint32_t consumed = 0;

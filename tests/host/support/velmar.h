@@ -1,0 +1,87 @@
+// Velmar receivers opened through the library's exports.
+#ifndef RCVLINK_TESTS_HOST_SUPPORT_VELMAR_H_
+#define RCVLINK_TESTS_HOST_SUPPORT_VELMAR_H_
+
+#include <gtest/gtest.h>
+#include <windows.h>
+
+#include <map>
+#include <string>
+#include <vector>
+
+#include "rcvlink.h"
+#include "tests/host/support/file_list.h"
+#include "tests/host/support/receiver.h"
+
+namespace host {
+
+// A Velmar receiver on a port, opened and closed.
+class Velmar {
+ public:
+  explicit Velmar(std::vector<std::string> switches,
+                  const std::map<std::string, std::string>& files = {},
+                  DWORD speed = CBR_9600)
+      : port(Arguments(std::move(switches), speed), files) {
+    std::wstring name = port.name();
+    DCB settings = Settings(speed);
+    const long result =
+        devapi::CreateReceiverOnSerial(name.data(), eProtocolVelmar, &settings, nullptr, &handle_);
+    if (result != S_OK) throw bed::Error("no receiver answers:\n" + port.Transcript());
+  }
+  Velmar(const Velmar&) = delete;
+  Velmar& operator=(const Velmar&) = delete;
+  ~Velmar() {
+    if (handle_ != nullptr) devapi::CloseReceiver(handle_);
+  }
+
+  void* get() const { return handle_; }
+
+  // What the host said since the greeting.
+  Lines Sent() const {
+    Lines sent = SentByHost(port.Transcript());
+    EXPECT_GE(sent.size(), kQuestionsOfGreeting);
+    sent.erase(sent.begin(), sent.begin() + kQuestionsOfGreeting);
+    return sent;
+  }
+  // The same, with the pieces of files and the speeds that took hold in between.
+  Lines SentAndMoved() const {
+    Lines lines;
+    size_t questions = 0;
+    for (const std::string& line : WireLines(port.Transcript())) {
+      const bool said = line.starts_with("> ");
+      if (said && ++questions <= kQuestionsOfGreeting) continue;
+      if (said || line.starts_with("= speed") || line.starts_with("< log FILETRANSFERB")) {
+        lines.push_back(line);
+      }
+    }
+    return lines;
+  }
+  std::vector<std::wstring> Names() const {
+    const FileList list(handle_);
+    EXPECT_EQ(list.result(), S_OK);
+    std::vector<std::wstring> names;
+    for (long i = 0; i < list.Count(); ++i) names.push_back(list.At(i).name);
+    return names;
+  }
+  long Download(std::wstring name, MemoryStream& stream, Progress* progress = nullptr) {
+    return devapi::DownloadFile(
+        handle_, name.data(), &stream, progress == nullptr ? nullptr : progress->record());
+  }
+  long Delete(std::wstring name) const { return devapi::DeleteFileW(handle_, name.data()); }
+
+  const bed::SimulatedPort port;
+
+ private:
+  static constexpr size_t kQuestionsOfGreeting = 2;
+
+  static std::vector<std::string> Arguments(std::vector<std::string> switches, DWORD speed) {
+    switches.insert(switches.begin(), {"velmar", "--speed", std::to_string(speed)});
+    return switches;
+  }
+
+  void* handle_ = nullptr;
+};
+
+}  // namespace host
+
+#endif  // RCVLINK_TESTS_HOST_SUPPORT_VELMAR_H_

@@ -1,0 +1,145 @@
+// Downloads at raised speed that are broken off in the middle of the file: both ends are at the old
+// speed afterwards, whether the receiver goes on sending or not, and the next operation works.
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+#include <windows.h>
+
+#include <algorithm>
+#include <chrono>
+#include <future>
+#include <ostream>
+#include <string>
+#include <vector>
+
+#include "rcvlink.h"
+#include "tests/host/support/receiver.h"
+#include "tests/host/support/velmar.h"
+
+using testing::ElementsAre;
+
+namespace {
+
+// Paced, this takes the best part of a minute: no download ends before it is broken off.
+constexpr size_t kEndless = 600000;
+constexpr auto kMuchLess = std::chrono::seconds(20);
+
+struct Behaviour {
+  std::string name;
+  std::vector<std::string> switches;
+};
+
+std::ostream& operator<<(std::ostream& out, const Behaviour& behaviour) {
+  return out << behaviour.name;
+}
+
+class ApiVelmarBrokenDownload : public testing::TestWithParam<Behaviour> {
+ protected:
+  auto Start(host::Progress* progress = nullptr) {
+    return host::OnThread(
+        [this, progress] { return receiver_.Download(L"A.log", stream_, progress); });
+  }
+
+  // The receiver is back at its speed, was told so at the higher one, and the host is there too.
+  void ExpectBothAtTheOldSpeed() {
+    receiver_.port.WaitForTranscript("= speed 9600\n");
+    host::Lines speeds;
+    for (const std::string& line : receiver_.SentAndMoved()) {
+      if (line.starts_with("> COM") || line.starts_with("=")) speeds.push_back(line);
+    }
+    EXPECT_THAT(speeds,
+                ElementsAre(R"(> COM 115200 N 8 1 N\r)",
+                            "= speed 115200",
+                            R"(> COM 9600 N 8 1 N\r)",
+                            "= speed 9600"))
+        << receiver_.port.Transcript();
+    EXPECT_TRUE(content_.starts_with(stream_.bytes));
+    EXPECT_LT(stream_.bytes.size(), content_.size());
+    EXPECT_EQ(stream_.bytes.size() % 1024, 0U);
+  }
+  void ExpectAllWorks() {
+    EXPECT_THAT(receiver_.Names(), ElementsAre(L"A.log", L"B.log", L"C.log"))
+        << receiver_.port.Transcript();
+    ExpectNextDownloadWorks();
+    EXPECT_EQ(receiver_.Delete(L"B.log"), S_OK);
+    EXPECT_THAT(receiver_.Names(), ElementsAre(L"A.log", L"C.log"));
+  }
+  void ExpectNextDownloadWorks() {
+    host::MemoryStream next;
+    EXPECT_EQ(receiver_.Download(L"C.log", next), S_OK);
+    EXPECT_EQ(next.bytes, "the next one") << receiver_.port.Transcript();
+  }
+
+  static std::vector<std::string> Switches() {
+    std::vector<std::string> switches = GetParam().switches;
+    switches.push_back("--pace");
+    return switches;
+  }
+
+  const std::string content_ = host::Content(kEndless);
+  host::Velmar receiver_{Switches(),
+                         {{"A.log", content_}, {"B.log", "b"}, {"C.log", "the next one"}}};
+  host::MemoryStream stream_;
+};
+
+// The put-back's result takes the place of the failure.
+TEST_P(ApiVelmarBrokenDownload, ByAStreamThatFails) {
+  stream_.fail_at_write = 2;
+  EXPECT_EQ(receiver_.Download(L"A.log", stream_), S_OK);
+  EXPECT_EQ(stream_.writes, 3U);
+  EXPECT_EQ(stream_.bytes.size(), 2048U);
+  ExpectBothAtTheOldSpeed();
+  ExpectAllWorks();
+}
+
+TEST_P(ApiVelmarBrokenDownload, ByAStreamThatFailsAtOnce) {
+  stream_.fail_at_write = 0;
+  EXPECT_EQ(receiver_.Download(L"A.log", stream_), S_OK);
+  EXPECT_EQ(stream_.bytes, "");
+  ExpectBothAtTheOldSpeed();
+  ExpectAllWorks();
+}
+
+// The flag of an abort outlives the download: the next operation sends its command and ends with it.
+TEST_P(ApiVelmarBrokenDownload, ByAnAbortFromAnotherThread) {
+  auto download = Start();
+  receiver_.port.WaitForTranscript(" offset=5120 ");
+  EXPECT_EQ(devapi::Abort(receiver_.get()), S_OK);
+  EXPECT_EQ(download.wait_for(kMuchLess), std::future_status::ready);
+  EXPECT_EQ(download.get(), S_OK);
+  ExpectBothAtTheOldSpeed();
+  EXPECT_EQ(receiver_.Delete(L"X.log"), S_FALSE);
+  EXPECT_EQ(receiver_.Sent().back(), R"(del file X.log\r)") << receiver_.port.Transcript();
+  ExpectAllWorks();
+}
+
+TEST_P(ApiVelmarBrokenDownload, ByAnAbortFromItsOwnProgress) {
+  host::Progress progress([&](int percent) {
+    if (percent == 1) devapi::Abort(receiver_.get());
+  });
+  auto download = Start(&progress);
+  EXPECT_EQ(download.wait_for(kMuchLess), std::future_status::ready);
+  EXPECT_EQ(download.get(), S_OK);
+  ExpectBothAtTheOldSpeed();
+  EXPECT_EQ(receiver_.Delete(L"X.log"), S_FALSE);
+  ExpectAllWorks();
+}
+
+// A download is no operation that looks at the flag: it is whole, and the flag is still there.
+TEST_P(ApiVelmarBrokenDownload, IsFollowedByAWholeOneThatKeepsTheAbort) {
+  auto download = Start();
+  receiver_.port.WaitForTranscript(" offset=2048 ");
+  EXPECT_EQ(devapi::Abort(receiver_.get()), S_OK);
+  EXPECT_EQ(download.get(), S_OK);
+  ExpectBothAtTheOldSpeed();
+  ExpectNextDownloadWorks();
+  EXPECT_EQ(receiver_.Delete(L"X.log"), S_FALSE);
+  ExpectAllWorks();
+}
+
+INSTANTIATE_TEST_SUITE_P(Receivers,
+                         ApiVelmarBrokenDownload,
+                         testing::Values(Behaviour{"SendsOn", {}},
+                                         Behaviour{"StopsForCommands", {"--stop-for-commands"}}),
+                         [](const auto& behaviour) { return behaviour.param.name; });
+
+}  // namespace
