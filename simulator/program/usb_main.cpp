@@ -81,7 +81,7 @@ void Run(const sim::QuorinOptions& options,
       options, sim::FileStore::FromFolder(port_options.files.folder), &transcript);
   sim::UsbDevice device(usb_options, receiver, transcript);
   sim::UsbPort port(std::wstring(port_options.device.begin(), port_options.device.end()));
-  std::cout << "\\\\.\\" << port_options.device << std::endl;
+  std::cout << "\\\\?\\" << port_options.device << std::endl;
   SetConsoleCtrlHandler(StopForControl, TRUE);
   std::thread(StopAtEndOfInput).detach();
   port.Serve(device, receiver, StopEvent());
@@ -102,7 +102,7 @@ int main() {
   quorin.identity.port_name = kUsbPortName;
   CLI::App* const command = app.add_subcommand("quorin", "a Quorin receiver");
   sim::AddFileOptions(*command, port.files);
-  command->add_option("--device", port.device, "the name of the device, opened as \\\\.\\NAME")
+  command->add_option("--device", port.device, "the name of the device, opened as \\\\?\\NAME")
       ->required()
       ->type_name("NAME")
       ->group(sim::kPortGroup);

@@ -22,8 +22,7 @@ class UsbCli : public Cli {
     return Run(arguments);
   }
   static std::string DeviceOf(const bed::SimulatedUsb& usb) {
-    // As the paths of real devices begin; the other form is that of COM ports.
-    const std::wstring device = usb.device().replace(0, 4, LR"(\\?\)");
+    const std::wstring device = usb.device();
     return {device.begin(), device.end()};
   }
 };

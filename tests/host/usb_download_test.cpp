@@ -250,7 +250,7 @@ INSTANTIATE_TEST_SUITE_P(
     testing::Values(Ending{"EndBlock", {"--end-block", "2"}, S_FALSE, 2},
                     Ending{"NegativeLength", {"--negative-length", "1"}, host::kNotConnected, 4},
                     Ending{"Silence", {"--block-silence", "1:60"}, host::kTimedOut, 1},
-                    Ending{"NoSuchFile", {"--refuse", "get"}, E_FAIL, 0}),
+                    Ending{"ARefusedGet", {"--refuse", "get@1"}, host::kNotConnected, 0}),
     [](const auto& ending) { return ending.param.name; });
 
 // Over USB a failure of the host's stream is passed on, other than on a serial port.

@@ -160,7 +160,7 @@ SimulatedUsb::~SimulatedUsb() {
   if (process_) Unplug();
 }
 
-std::wstring SimulatedUsb::device() const { return L"\\\\.\\" + FromUtf8(name_); }
+std::wstring SimulatedUsb::device() const { return LR"(\\?\)" + FromUtf8(name_); }
 
 int SimulatedUsb::Unplug() {
   input_.reset();
@@ -184,7 +184,7 @@ void SimulatedUsb::Start(std::vector<std::string> arguments) {
                    {"--device", name_, "--transcript", ToUtf8(notes_ / kTranscript)});
   Started started = StartProgram(arguments);
   std::string first_line;
-  if (!ReadLine(started.output.get(), first_line) || !first_line.starts_with("\\\\.\\")) {
+  if (!ReadLine(started.output.get(), first_line) || !first_line.starts_with(R"(\\?\)")) {
     started.input.reset();
     const std::string output = first_line + '\n' + ReadRest(started.output.get());
     WaitForSingleObject(started.process.get(), INFINITE);

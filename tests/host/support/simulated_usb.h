@@ -37,7 +37,7 @@ class SimulatedUsb {
   // Unplugs the device.
   ~SimulatedUsb();
 
-  // L"\\\\.\\rcvlink-usb-12-3", as CreateFileW wants it. Plugged in again, the device has the same.
+  // L"\\\\?\\rcvlink-usb-12-3", as CreateFileW wants it. Plugged in again, the device has the same.
   std::wstring device() const;
 
   // The folder that the receiver serves.
