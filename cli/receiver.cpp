@@ -38,8 +38,8 @@ long ReadEntry(void* list, long index, RemoteFile& file) {
   return S_OK;
 }
 
-/// Whether so many files may have filled the library's buffer for a Velmar directory, so that more of
-/// them got lost: from the lengths of their lines at the longest.
+/// Whether so many files may have filled the library's buffer for a Velmar directory, so that more
+/// of them got lost: from the lengths of their lines at the longest.
 bool MayBeCut(const std::vector<RemoteFile>& files) {
   constexpr std::size_t kBuffer = 8192;
   constexpr std::size_t kLongestLineBesidesName = 125;

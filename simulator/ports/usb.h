@@ -30,7 +30,8 @@ class BusCall {
   bool on_its_way() const { return on_its_way_; }
   // Set when it has ended.
   HANDLE event() const { return event_.get(); }
-  // Waits for the end; gives the length of the output. Throws std::system_error when the call failed.
+  // Waits for the end; gives the length of the output. Throws std::system_error when the call
+  // failed.
   size_t Finish();
 
  private:

@@ -252,9 +252,9 @@ HRESULT CQuorinProtocol::DownloadOverUSB(IStream* stream, int size, DWORD block_
   }
 }
 
-// One round of the transfer over USB. It differs from the serial one in that a block is read whole, all
-// that is wrong with it is written to the report, the time-outs are counted over the whole download,
-// progress is told in steps, and a failure of the host's stream is passed on.
+// One round of the transfer over USB. It differs from the serial one in that a block is read whole,
+// all that is wrong with it is written to the report, the time-outs are counted over the whole
+// download, progress is told in steps, and a failure of the host's stream is passed on.
 std::optional<HRESULT> CQuorinProtocol::TakeUsbBlock(Download& download,
                                                      IStream* stream,
                                                      uint32_t size) {
@@ -314,8 +314,8 @@ std::optional<HRESULT> CQuorinProtocol::TakeUsbBlock(Download& download,
   return std::nullopt;
 }
 
-// In pieces of no more than a bulk packet, until all is there, a read does not succeed or an abort is
-// seen.
+// In pieces of no more than a bulk packet, until all is there, a read does not succeed or an abort
+// is seen.
 HRESULT CQuorinProtocol::ReadWholeBlock(Block& block) {
   constexpr DWORD kMaxPiece = 512;
   DWORD held = 0;

@@ -15,8 +15,8 @@ class CQuorinProtocol : public CAbstractProtocol {
  public:
   explicit CQuorinProtocol(std::unique_ptr<CIConnection> connection);
 
-  // Whether a Quorin receiver, in whatever state, answers on the connection. The abort event (may be
-  // null) is looked at between the steps and ends the wait for an answer.
+  // Whether a Quorin receiver, in whatever state, answers on the connection. The abort event (may
+  // be null) is looked at between the steps and ends the wait for an answer.
   static bool Probe(CIConnection* connection, HANDLE abort_event);
 
   HRESULT CheckConnection(HANDLE abort_event, short* answer) override;

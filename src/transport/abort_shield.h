@@ -1,7 +1,7 @@
 // Keeps a cancel from cutting a transfer in half: what a receiver must get whole is written behind
-// one. A cancel that comes meanwhile is kept, and ends the first wait after the shield.
-// AbortWatch is the opposite: waits end when the host's own event is signalled. A connection has room
-// for one abort event, so neither goes inside another.
+// one. A cancel that comes meanwhile is kept, and ends the first wait after the shield. AbortWatch
+// is the opposite: waits end when the host's own event is signalled. A connection has room for one
+// abort event, so neither goes inside another.
 #ifndef RCVLINK_TRANSPORT_ABORT_SHIELD_H_
 #define RCVLINK_TRANSPORT_ABORT_SHIELD_H_
 

@@ -38,8 +38,8 @@ class CAbstractConnection : public CIConnection {
   UniqueBstr name_;
 
  private:
-  // Waits for a pending transfer. Whatever ends the wait, the transfer is over when this returns, so
-  // its block and buffer may go. S_OK only when its own event ended the wait.
+  // Waits for a pending transfer. Whatever ends the wait, the transfer is over when this returns,
+  // so its block and buffer may go. S_OK only when its own event ended the wait.
   HRESULT WaitForTransfer(HANDLE handle, OVERLAPPED& block, DWORD timeout_ms);
   void CancelTransfer(HANDLE handle, OVERLAPPED& block);
 

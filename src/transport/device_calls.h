@@ -39,8 +39,8 @@ class DeviceCalls {
 // The system's own, unless a test has put others in their place.
 DeviceCalls& SystemCalls();
 
-// Answers for the system in a scope; for tests, on one thread. A connection keeps the calls that it was
-// made with.
+// Answers for the system in a scope; for tests, on one thread. A connection keeps the calls that it
+// was made with.
 class SystemCallsOverride {
  public:
   explicit SystemCallsOverride(DeviceCalls& calls);

@@ -1,5 +1,5 @@
-// The link over USB, through the USBIO kernel driver: one handle on the device for each direction, each
-// bound to a bulk endpoint.
+// The link over USB, through the USBIO kernel driver: one handle on the device for each direction,
+// each bound to a bulk endpoint.
 #ifndef RCVLINK_TRANSPORT_USB_CONNECTION_H_
 #define RCVLINK_TRANSPORT_USB_CONNECTION_H_
 
@@ -29,9 +29,9 @@ class CUSBConnection : public CAbstractConnection {
 
   // Opens the device by its path, which is taken as it is. A device that cannot be opened or
   // configured is written to the report and tried all the same, since another handle may have
-  // configured it. S_OK; E_INVALIDARG for a null path; S_FALSE, a success, when the descriptors have
-  // another layout than those of the receivers: the pipes are not bound then; the plain Win32 error,
-  // a success as well, when the device does not give its descriptor; else the failure.
+  // configured it. S_OK; E_INVALIDARG for a null path; S_FALSE, a success, when the descriptors
+  // have another layout than those of the receivers: the pipes are not bound then; the plain Win32
+  // error, a success as well, when the device does not give its descriptor; else the failure.
   virtual HRESULT Open(const wchar_t* device);
 
  protected:

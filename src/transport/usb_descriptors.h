@@ -1,5 +1,5 @@
-// Where the bulk pipes of a device are: a walk through its configuration descriptor (USB 2.0, chapter
-// 9.6).
+// Where the bulk pipes of a device are: a walk through its configuration descriptor (USB 2.0,
+// chapter 9.6).
 #ifndef RCVLINK_TRANSPORT_USB_DESCRIPTORS_H_
 #define RCVLINK_TRANSPORT_USB_DESCRIPTORS_H_
 
@@ -21,10 +21,10 @@ struct BulkEndpoints {
   bool operator==(const BulkEndpoints&) const = default;
 };
 
-// The bulk OUT and bulk IN endpoint of a whole configuration descriptor, which is read until both are
-// there; of several of one direction ahead of the other's first, the last. Devices of these receivers
-// have one interface, and behind it its endpoints (two at least) and nothing else; any other layout
-// gives none.
+// The bulk OUT and bulk IN endpoint of a whole configuration descriptor, which is read until both
+// are there; of several of one direction ahead of the other's first, the last. Devices of these
+// receivers have one interface, and behind it its endpoints (two at least) and nothing else; any
+// other layout gives none.
 std::optional<BulkEndpoints> FindBulkEndpoints(std::span<const uint8_t> descriptors);
 
 #endif  // RCVLINK_TRANSPORT_USB_DESCRIPTORS_H_

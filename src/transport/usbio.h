@@ -1,5 +1,5 @@
-// What is used of the USBIO kernel driver's interface: control codes for DeviceIoControl and the records
-// that go with them. All numbers are little-endian, as on the wire.
+// What is used of the USBIO kernel driver's interface: control codes for DeviceIoControl and the
+// records that go with them. All numbers are little-endian, as on the wire.
 #ifndef RCVLINK_TRANSPORT_USBIO_H_
 #define RCVLINK_TRANSPORT_USBIO_H_
 

@@ -162,8 +162,8 @@ void CVelmarProtocol::SetCallback(CIProtocolCallback* callback) {
   callback_ = callback;
 }
 
-// An abort between operations does not keep the next one's command from being sent: its flag is found
-// afterwards.
+// An abort between operations does not keep the next one's command from being sent: its flag is
+// found afterwards.
 void CVelmarProtocol::DropEarlierCancel() {
   UseUpCancel();
   if (IsAborted()) DropCancel();

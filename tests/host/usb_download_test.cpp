@@ -192,7 +192,7 @@ TEST(ApiUsbDownload, ReportsAtMostTwiceASecond) {
   host::MemoryStream stream;
   std::vector<DWORD> times;
   host::Progress progress([&](int percent) {
-    // Held at its third, the transfer is late; the fourth may follow at once, no fifth.
+    // The first two are told by the steps ahead of the transfer.
     if (percent > 1) times.push_back(GetTickCount());
   });
   EXPECT_EQ(receiver.Download(L"A.log", stream, &progress), S_OK);

@@ -99,7 +99,8 @@ TEST_P(ApiVelmarBrokenDownload, ByAStreamThatFailsAtOnce) {
   ExpectAllWorks();
 }
 
-// The flag of an abort outlives the download: the next operation sends its command and ends with it.
+// The flag of an abort outlives the download: the next operation sends its command and ends with
+// it.
 TEST_P(ApiVelmarBrokenDownload, ByAnAbortFromAnotherThread) {
   auto download = Start();
   receiver_.port.WaitForTranscript(" offset=5120 ");

@@ -13,10 +13,11 @@ using testing::ElementsAreArray;
 
 namespace {
 
-// The receiver hears 19200 only and overlooks the first questions that reach it: at the last speed of
-// the first mode, at the same speed as the port's current one in the second mode, and at the last of
-// the second. The third mode begins with that speed once more. (It never answers the first of the two
-// questions: nobody waits for that answer, and a late one would do for the second question's.)
+// The receiver hears 19200 only and overlooks the first questions that reach it: at the last speed
+// of the first mode, at the same speed as the port's current one in the second mode, and at the
+// last of the second. The third mode begins with that speed once more. (It never answers the first
+// of the two questions: nobody waits for that answer, and a late one would do for the second
+// question's.)
 TEST(ApiVelmarSweep, FindsAReceiverInTheThirdMode) {
   const bed::SimulatedPort port(
       {"velmar", "--speed", "19200", "--mute", "interfacemode", "--mute", "unlogall@3"});

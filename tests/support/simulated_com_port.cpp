@@ -46,7 +46,8 @@ BOOL SimulatedComPort::WriteFile(
   return TRUE;
 }
 
-// A read ends when it has all it asked for, when the line was quiet for the interval, or at its limit.
+// A read ends when it has all it asked for, when the line was quiet for the interval, or at its
+// limit.
 DWORD SimulatedComPort::WaitForMultipleObjects(DWORD, const HANDLE* handles, DWORD timeout_ms) {
   if (WaitForSingleObject(handles[0], 0) == WAIT_OBJECT_0) return WAIT_OBJECT_0;
   Follow();

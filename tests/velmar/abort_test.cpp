@@ -152,7 +152,8 @@ INSTANTIATE_TEST_SUITE_P(All,
                                           testing::Bool(),
                                           testing::Bool()));
 
-// A receiver that went silent may go on when nobody expects it: it is stopped ahead of the put-back.
+// A receiver that went silent may go on when nobody expects it: it is stopped ahead of the
+// put-back.
 TEST(VelmarBrokenDownload, StopsAReceiverThatWentSilent) {
   sim::VelmarOptions options;
   options.faults.chunks = {{sim::VelmarChunkFaultKind::kSilence, /*chunk=*/1, /*times=*/1, 45000}};

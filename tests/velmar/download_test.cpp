@@ -74,8 +74,8 @@ TEST_F(VelmarDownload, HoldsTheConnectionUntilAllIsDone) {
   EXPECT_TRUE(IsFreeForOthers(driver));
 }
 
-// Each chunk is in the stream before its percent is told, and the last percent is told while the link
-// is still fast.
+// Each chunk is in the stream before its percent is told, and the last percent is told while the
+// link is still fast.
 TEST_F(VelmarDownload, TellsThePercentOfWhatIsWritten) {
   Serve(2);
   connection->speed = 9600;
@@ -161,8 +161,8 @@ TEST_F(VelmarDownload, AnySlowerLinkIsRaised) {
   }
 }
 
-// A host that knows no speed of its own, or one that is negative as a number, is raised, and nothing is
-// put back.
+// A host that knows no speed of its own, or one that is negative as a number, is raised, and
+// nothing is put back.
 TEST_F(VelmarDownload, StrangeSpeedsAreNotPutBack) {
   for (const DWORD speed : {0ul, 0x80000000ul, 0xFFFFFFFFul}) {
     ScriptedConnection* const link = connection;
@@ -431,8 +431,8 @@ TEST_F(VelmarDownload, AnAbortAtRaisedSpeedPutsTheSpeedBack) {
   EXPECT_EQ(driver.DeleteFile(L"a"), S_FALSE);
 }
 
-// A file that turns out longer than its header said: the percent is kept in a byte, and told as 100 at
-// the most.
+// A file that turns out longer than its header said: the percent is kept in a byte, and told as 100
+// at the most.
 TEST_F(VelmarDownload, ThePercentOfAFileThatIsLongerThanSaid) {
   Serve(3);
   answers[kHeader] = HeaderReply("100");
@@ -447,8 +447,8 @@ TEST_F(VelmarDownload, APercentThatDoesNotChangeIsNotTold) {
   EXPECT_THAT(percents, ElementsAre(0, 1, 2, 100));
 }
 
-// Sizes of 2 GB and more do not fit the number of the header, which ends at its largest; a negative one
-// is a very large one.
+// Sizes of 2 GB and more do not fit the number of the header, which ends at its largest; a negative
+// one is a very large one.
 TEST_F(VelmarDownload, SizesBeyondTheNumberAreTakenAsTheyCome) {
   for (const char* size : {"4000000000", "-1"}) {
     Serve(1);

@@ -1,5 +1,5 @@
-// A whole search for a Velmar receiver: discovery, connection and both probes as they are, on a port in
-// memory whose clock is moved by the waits.
+// A whole search for a Velmar receiver: discovery, connection and both probes as they are, on a
+// port in memory whose clock is moved by the waits.
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
@@ -157,8 +157,8 @@ TEST_F(VelmarSearch, FindsTheLastSpeedInTheLastMode) {
   ExpectReceiver();
 }
 
-// Each silent try takes the answer's time-out and the pause behind an exchange, and the last one the
-// quiet second that ends a read.
+// Each silent try takes the answer's time-out and the pause behind an exchange, and the last one
+// the quiet second that ends a read.
 TEST_F(VelmarSearch, OfThisFamilyAloneSaysNothingElseOnTheLine) {
   EXPECT_EQ(Search(eProtocolVelmar), S_OK);
   ExpectTries(AllTries(kLeftAt), eProtocolVelmar, true);
@@ -173,7 +173,8 @@ TEST_F(VelmarSearch, OfThisFamilyAloneSaysNothingElseOnTheLine) {
   ExpectReceiver();
 }
 
-// A port that keeps what was set last has the right speed as its current one once the mode is right.
+// A port that keeps what was set last has the right speed as its current one once the mode is
+// right.
 TEST_F(VelmarSearch, APortThatRemembersIsTriedAtTheSpeedThatWasTriedLast) {
   port_.forgets = false;
   EXPECT_EQ(Search(eProtocolVelmar), S_OK);

@@ -1,4 +1,5 @@
-// The driver with the simulated receiver, which answers as a real one does: in pieces, late, or wrongly.
+// The driver with the simulated receiver, which answers as a real one does: in pieces, late, or
+// wrongly.
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
@@ -294,7 +295,8 @@ TEST(VelmarSimulatedReceiver, DamagedChunksAreTakenAsTheyAre) {
   }
 }
 
-// Whatever its lengths tell, the download ends, the speed is the old one, and the next one is whole.
+// Whatever its lengths tell, the download ends, the speed is the old one, and the next one is
+// whole.
 TEST(VelmarSimulatedReceiver, WhoseLengthsLieIsLeftInOrder) {
   using Kind = sim::VelmarChunkFaultKind;
   for (const Kind kind : {Kind::kMessageLength, Kind::kBodyLength, Kind::kHeaderLength}) {
