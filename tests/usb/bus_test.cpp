@@ -351,6 +351,20 @@ TEST_F(UsbBus, EndsTheWaitWhenTheDeviceIsUnplugged) {
   EXPECT_EQ(waiting.Finish().error, kGone);
 }
 
+// The driver uses its device objects again, but not while a handle of an unplugged device is open.
+TEST_F(UsbBus, KeepsOldHandlesFromNewDevices) {
+  constexpr int kNewDevices = 50;
+  PlugIn();
+  const File old = OpenDevice();
+  EXPECT_EQ(bus.Control(usb_bus::kUnplug).error, kDone);
+  std::vector<File> buses;
+  for (int i = 0; i < kNewDevices; ++i) {
+    buses.push_back(OpenBus());
+    ASSERT_EQ(buses.back().Control(usb_bus::kPlugIn, BytesOf(DeviceName())).error, kDone);
+  }
+  EXPECT_EQ(old.Write("x").error, kGone);
+}
+
 TEST_F(UsbBus, UnplugsWhenItsHandleIsClosed) {
   PlugIn();
   const File host = OpenDevice();

@@ -161,7 +161,10 @@ TEST_F(UsbPipe, KnowsNoOtherRequests) {
     const auto result = reader_->Control(kUnknown + method, Bytes(10), 10);
     EXPECT_EQ(result.error, DWORD{ERROR_INVALID_FUNCTION}) << method;
   }
-  EXPECT_THAT(usb_->Transcript(), HasSubstr("- refused request 0x80942200\n"));
+  // Of the last one, whose buffers are the caller's memory, the driver does not even tell.
+  EXPECT_EQ(usb_->Transcript(),
+            "- refused request 0x80942200\n- refused request 0x80942201\n"
+            "- refused request 0x80942202\n");
 }
 
 // The receiver is on the first bulk endpoints; an interrupt endpoint never has anything to say.

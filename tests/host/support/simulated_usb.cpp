@@ -163,6 +163,7 @@ SimulatedUsb::~SimulatedUsb() {
 std::wstring SimulatedUsb::device() const { return LR"(\\?\)" + FromUtf8(name_); }
 
 int SimulatedUsb::Unplug() {
+  if (!process_) throw Error("nothing is plugged in");
   input_.reset();
   WaitForSingleObject(process_.get(), INFINITE);
   const int status = ExitStatus(process_.get());
