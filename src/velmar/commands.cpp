@@ -47,6 +47,7 @@ HRESULT CLogCommand::Conclude(Progress progress, bool* done) {
     case Progress::kMore:
       SetResponse(RESPONSE_DATA);
       return S_FALSE;
+    case Progress::kMoreLogs:
     case Progress::kComplete:
       SetResponse(RESPONSE_DATA);
       return S_OK;

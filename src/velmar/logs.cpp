@@ -122,7 +122,7 @@ Progress DecodeDirectory(std::string_view text, std::vector<FileEntry>& entries)
     previous = sequence;
     i += kLogFields;
   }
-  return Progress::kMore;
+  return Progress::kMoreLogs;
 }
 
 Progress DecodeFileHeader(std::string_view body, FileHeaderLog& log) {

@@ -14,8 +14,9 @@
 namespace VelmarCommands {
 
 enum class Progress {
-  kNothing,  // not a field has come
-  kMore,     // fields are missing
+  kNothing,   // not a field has come
+  kMore,      // fields are missing
+  kMoreLogs,  // all logs so far are whole, and more of them follow
   kComplete,
   kContradiction,  // the logs do not follow each other
   kNoMemory

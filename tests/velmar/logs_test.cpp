@@ -198,8 +198,17 @@ TEST(DirectoryLogs, NoLogBeginsInsideAnother) {
 
 TEST(DirectoryLogs, WithoutALogWaitForMore) {
   std::vector<FileEntry> entries;
-  EXPECT_EQ(DecodeDirectory("#", entries), Progress::kMore);
+  EXPECT_EQ(DecodeDirectory("#", entries), Progress::kMoreLogs);
   EXPECT_EQ(DecodeDirectory("\"#DIRENTA", entries), Progress::kNothing);
+}
+
+// A log that is cut off is told from a whole one that is not the last.
+TEST(DirectoryLogs, WaitForTheRestOfALogOrForTheNext) {
+  std::vector<FileEntry> entries;
+  const std::string whole = Entry("a", 1);
+  EXPECT_EQ(DecodeDirectory(whole, entries), Progress::kMoreLogs);
+  EXPECT_EQ(DecodeDirectory(whole + "#DIRENTA,COM1,0", entries), Progress::kMore);
+  EXPECT_EQ(entries.size(), 1u);
 }
 
 TEST(DirectoryLogs, CountDownToTheLast) {
@@ -228,7 +237,7 @@ TEST(DirectoryLogs, EveryBeginningWaitsForMore) {
   for (size_t length = 0; length < text.size(); ++length) {
     std::vector<FileEntry> entries;
     const Progress progress = DecodeDirectory(text.substr(0, length), entries);
-    EXPECT_TRUE(progress == Progress::kMore || progress == Progress::kNothing) << length;
+    EXPECT_TRUE(progress == Progress::kMore || progress == Progress::kMoreLogs) << length;
     EXPECT_EQ(entries.size(), length < first ? 0u : 1u) << length;
   }
   std::vector<FileEntry> entries;
@@ -245,7 +254,7 @@ TEST(DirectoryLogs, TheSameNumberTwiceContradicts) {
 // A number below 0 is no last one.
 TEST(DirectoryLogs, CountOnBelowZero) {
   std::vector<FileEntry> entries;
-  EXPECT_EQ(DecodeDirectory(Entry("a", -1) + Entry("b", -2), entries), Progress::kMore);
+  EXPECT_EQ(DecodeDirectory(Entry("a", -1) + Entry("b", -2), entries), Progress::kMoreLogs);
   EXPECT_EQ(entries.size(), 2u);
 }
 
