@@ -41,7 +41,8 @@ FileStore FileStore::FromFolder(const std::filesystem::path& folder) {
   FileStore store;
   for (const auto& file : std::filesystem::directory_iterator(folder)) {
     if (file.is_regular_file()) {
-      FileEntry entry{file.path().filename().string(), file.file_size(), ModifiedAt(file)};
+      const std::u8string name = file.path().filename().u8string();
+      FileEntry entry{std::string(name.begin(), name.end()), file.file_size(), ModifiedAt(file)};
       store.files_.push_back({std::move(entry), file.path()});
     }
   }

@@ -69,7 +69,7 @@ void Run(const FamilyOptions& options, const PortOptions& port_options) {
   std::ofstream file = sim::OpenTranscript(port_options.files.transcript);
   sim::Transcript transcript = file.is_open() ? sim::Transcript(file) : sim::Transcript();
   FamilyReceiver receiver(
-      options, sim::FileStore::FromFolder(port_options.files.folder), &transcript);
+      options, sim::FileStore::FromFolder(sim::ToPath(port_options.files.folder)), &transcript);
   sim::PtyPort port(port_options.link);
   std::cout << port.slave_name() << std::endl;
   port.Serve(receiver, stop_requested, wait_mask);

@@ -1,14 +1,24 @@
 #include "simulator/program/port_options.h"
 
-#include <filesystem>
 #include <stdexcept>
 
 namespace sim {
+namespace {
+
+std::string RefuseMissingFolder(const std::string& text) {
+  return std::filesystem::is_directory(ToPath(text)) ? "" : "there is no folder " + text;
+}
+
+}  // namespace
+
+std::filesystem::path ToPath(const std::string& text) {
+  return std::filesystem::path(std::u8string(text.begin(), text.end()));
+}
 
 void AddFileOptions(CLI::App& command, FileOptions& files) {
   command.add_option("--folder", files.folder, "the files to serve")
       ->required()
-      ->check(CLI::ExistingDirectory)
+      ->check(RefuseMissingFolder)
       ->type_name("DIR");
   command.add_option("--transcript", files.transcript, "write down what passes")->type_name("FILE");
 }
@@ -27,7 +37,7 @@ void AddPieceOptions(CLI::App& command, LineOptions& line) {
 std::ofstream OpenTranscript(const std::string& path) {
   std::ofstream file;
   if (!path.empty()) {
-    file.open(std::filesystem::path(path), std::ios::binary | std::ios::trunc);
+    file.open(ToPath(path), std::ios::binary | std::ios::trunc);
     if (!file) {
       throw std::runtime_error("cannot write the transcript " + path);
     }

@@ -2,6 +2,7 @@
 #define SIMULATOR_PROGRAM_PORT_OPTIONS_H_
 
 #include <CLI/CLI.hpp>
+#include <filesystem>
 #include <fstream>
 #include <string>
 
@@ -11,6 +12,9 @@ namespace sim {
 
 inline constexpr int kExitFailure = 2;
 inline constexpr const char* kPortGroup = "Port";
+
+// The path that a command line in UTF-8 names.
+std::filesystem::path ToPath(const std::string& text);
 
 // What is asked about the files, whatever the family and the port.
 struct FileOptions {

@@ -78,7 +78,7 @@ void Run(const sim::QuorinOptions& options,
   std::ofstream file = sim::OpenTranscript(port_options.files.transcript);
   sim::Transcript transcript = file.is_open() ? sim::Transcript(file) : sim::Transcript();
   sim::QuorinReceiver receiver(
-      options, sim::FileStore::FromFolder(port_options.files.folder), &transcript);
+      options, sim::FileStore::FromFolder(sim::ToPath(port_options.files.folder)), &transcript);
   sim::UsbDevice device(usb_options, receiver, transcript);
   sim::UsbPort port(std::wstring(port_options.device.begin(), port_options.device.end()));
   std::cout << "\\\\?\\" << port_options.device << std::endl;

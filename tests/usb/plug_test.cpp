@@ -4,6 +4,7 @@
 
 #include <ctime>
 #include <filesystem>
+#include <fstream>
 #include <optional>
 #include <string>
 
@@ -173,6 +174,18 @@ TEST(UsbPlug, ServesTheFolderThatIsGiven) {
   const Connected host(usb.device());
   host.writer.Write("%1%print,/log/&[name,size,time]\r\n");
   EXPECT_THAT(host.reader.Read(200).text(), HasSubstr("{{B0202.log,3," + ModifiedText() + "}"));
+}
+
+TEST(UsbPlug, ServesNamesInAnyAlphabet) {
+  const bed::TempFolder folder;
+  const std::filesystem::path served = folder / "served" / u8"\u00E4\u0431";
+  std::filesystem::create_directories(served);
+  std::ofstream(served / u8"\u0436.log") << "xyz";
+  const std::u8string path = served.u8string();
+  const bed::SimulatedUsb usb({"quorin", "--folder", std::string(path.begin(), path.end())});
+  const Connected host(usb.device());
+  host.writer.Write("%1%print,/log/&[name,size,time]\r\n");
+  EXPECT_THAT(host.reader.Read(200).text(), HasSubstr("{{\xD0\xB6.log,3,"));
 }
 
 TEST(UsbPlug, OpensAndClosesManyTimes) {
