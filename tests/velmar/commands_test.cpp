@@ -235,6 +235,22 @@ TEST_F(VelmarExchange, ALogThatStaysIncompleteEndsWithTheTimeOut) {
   EXPECT_EQ(config.Config().port_name, L"");
 }
 
+TEST_F(VelmarExchange, ADirectoryTellsALogThatIsCutOffFromOneThatIsNotTheLast) {
+  CGetFileListCmd command;
+  const std::string log = AsciiLog("DIRENTA", "a,1,0,1,1", 1);
+  const auto parse = [&](const std::string& text) {
+    bool done = true;
+    uint32_t consumed = 0;
+    const HRESULT result =
+        command.ParseAsciiLog(text.data(), static_cast<uint32_t>(text.size()), &done, &consumed);
+    EXPECT_FALSE(done);
+    EXPECT_EQ(command.Response(), RESPONSE_DATA);
+    return result;
+  };
+  EXPECT_EQ(parse(log), S_OK);
+  EXPECT_EQ(parse(log + "#DIRENTA,COM1"), S_FALSE);
+}
+
 TEST_F(VelmarExchange, ARefusalWithoutTextEndsTheWaitForALog) {
   CGetReceiverInfoCmd command;
   EXPECT_EQ(Run(command, {kErrorPrompt}), S_OK);
