@@ -53,7 +53,7 @@ PROGRAMS = [
     Program("cli_unit_tests", "build/release/bin/cli_unit_tests.exe", WINE),
     Program("msvc_host", "build/release/bin/msvc_host.exe", WINE_SCRIPT),
     Program("cli_tests", "build/release/bin/cli_tests.exe", BED, shards=8, time_limit=300),
-    Program("host_tests", "build/release/bin/host_tests.exe", BED, shards=8, time_limit=300),
+    Program("host_tests", "build/release/bin/host_tests.exe", BED, shards=8, time_limit=600),
 ]
 
 
