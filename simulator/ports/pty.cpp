@@ -174,15 +174,18 @@ void PtyPort::TakeInput(Receiver& receiver) {
     }
     // The first byte of each packet tells what it is.
     if (buffer[0] == TIOCPKT_DATA) {
+      // A change that was made while the read was under way is told only after the bytes that were
+      // written behind it.
+      NoteSpeed();
       Deliver(receiver, std::span(buffer).subspan(1, static_cast<size_t>(count) - 1));
     } else if ((buffer[0] & TIOCPKT_IOCTL) != 0) {
-      NoteChange();
+      AnnounceChanges();
+      NoteSpeed();
     }
   }
 }
 
-void PtyPort::NoteChange() {
-  AnnounceChanges();
+void PtyPort::NoteSpeed() {
   const uint32_t speed = HostSpeed(master_.get());
   if (speed != host_speed_) {
     earlier_speed_ = std::exchange(host_speed_, speed);

@@ -62,7 +62,7 @@ class PtyPort {
   uint64_t NowMs() const;
   void Wait(const Receiver& receiver, const sigset_t& wait_mask) const;
   void TakeInput(Receiver& receiver);
-  void NoteChange();
+  void NoteSpeed();
   void Deliver(Receiver& receiver, std::span<const uint8_t> bytes);
   void SendDue(Receiver& receiver);
   void Write(std::span<const uint8_t> bytes);

@@ -54,7 +54,7 @@ PROGRAMS = [
     Program("msvc_host", "build/release/bin/msvc_host.exe", WINE_SCRIPT),
     Program("usb_tests", "build/release/bin/usb_tests.exe", BED, shards=4),
     Program("cli_tests", "build/release/bin/cli_tests.exe", BED, shards=8, time_limit=300),
-    Program("host_tests", "build/release/bin/host_tests.exe", BED, shards=8, time_limit=300),
+    Program("host_tests", "build/release/bin/host_tests.exe", BED, shards=8, time_limit=600),
 ]
 
 
