@@ -2,7 +2,7 @@
 
 #include <algorithm>
 #include <new>
-#include <string_view>
+#include <utility>
 
 #include "platform/text.h"
 #include "report/report_file.h"
@@ -104,7 +104,8 @@ HRESULT CReadFileCmd::ParseReply(const char* bytes,
                                  uint32_t length,
                                  bool* done,
                                  uint32_t* consumed) {
-  // The prompt is consumed as soon as it is whole: a first log that comes later stands alone.
+  // The prompt is consumed with the first byte behind it: a first log that comes in pieces stands
+  // alone from its second piece on.
   const bool at_log = length != 0 && static_cast<uint8_t>(bytes[0]) == BinaryHeader::kSync;
   const bool acknowledged = Response() == RESPONSE_OK && at_log;
   if (!chunk_ && !acknowledged) return CLogCommand::ParseReply(bytes, length, done, consumed);

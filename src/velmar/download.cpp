@@ -2,7 +2,8 @@
 // receiver, its size asked for, and its log taken chunk by chunk.
 #include <algorithm>
 #include <cstdint>
-#include <string>
+#include <memory>
+#include <span>
 #include <string_view>
 
 #include "platform/hresult.h"
@@ -39,11 +40,13 @@ uint8_t Percent(uint32_t total, uint32_t remaining) {
 }
 
 // Whether the receiver refused, with an error text or without: the response type tells only the
-// second.
+// second. A reply that came in pieces is kept with its beginning repeated, and stands whole at its
+// end.
 bool IsRefusal(const CVelmarCommand& command) {
   constexpr std::string_view kRefusal = "\r\n<ERROR:";
   const uint8_t* const reply = command.GetReply();
-  return reply && std::string(reply, reply + command.GetReplyLength()).starts_with(kRefusal);
+  if (!reply) return false;
+  return !std::ranges::search(std::span(reply, command.GetReplyLength()), kRefusal).empty();
 }
 
 }  // namespace
@@ -145,7 +148,12 @@ HRESULT CVelmarProtocol::Transfer(const wchar_t* name, IStream* stream, bool* is
     ThrowIfFailed(result);
     if (get_header.Response() == RESPONSE_DATA) {
       const auto total = static_cast<uint32_t>(get_header.FileHeader().file_size);
-      TransferContext context{this, nullptr, AddReference(stream), total, total, 0};
+      TransferContext context{.driver = this,
+                              .read_command = nullptr,
+                              .stream = AddReference(stream),
+                              .total = total,
+                              .remaining = total,
+                              .last_percent = 0};
       CReadFileCmd read_file(this, &context);
       context.read_command = &read_file;
       *is_sending = true;

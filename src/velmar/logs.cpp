@@ -77,10 +77,10 @@ Progress DecodeVersion(std::string_view body, VersionLog& log) {
   const int count = ToInteger(fields[0]);
   if (!HasAllItems(fields, count, kComponentFields)) return Progress::kMore;
   for (int k = 0; k < count; ++k) {
-    const auto field = [&](size_t i) {
+    const auto field = [&](size_t i) -> const std::wstring& {
       return fields[i + static_cast<size_t>(k) * kComponentFields];
     };
-    const std::wstring type = field(1);
+    const std::wstring& type = field(1);
     if (type == L"GPSCARD") {
       log.model = field(2);
       log.serial_number = field(3);
@@ -144,7 +144,9 @@ Progress DecodePortConfig(std::string_view body, std::wstring_view port, PortCon
   const int count = ToInteger(fields[0]);
   if (!HasAllItems(fields, count, kPortFields)) return Progress::kMore;
   for (int k = 0; k < count; ++k) {
-    const auto field = [&](size_t i) { return fields[i + static_cast<size_t>(k) * kPortFields]; };
+    const auto field = [&](size_t i) -> const std::wstring& {
+      return fields[i + static_cast<size_t>(k) * kPortFields];
+    };
     if (field(1) != port) continue;
     log.port_name = field(1);
     log.baud = ToInteger(field(2));

@@ -31,8 +31,8 @@ struct VersionLog {
 };
 Progress DecodeVersion(std::string_view body, VersionLog& log);
 
-// DIRENT: one log a file, counting down to 0. The entries are those of all complete logs in the
-// text, also when more are to come or a log is missing.
+// DIRENT: one log a file, counting down to 0. The entries are those of the complete logs from
+// the first on, up to number 0 or to the one behind a gap, also when more are to come.
 Progress DecodeDirectory(std::string_view text, std::vector<FileEntry>& entries);
 
 // FILEHDR: the file that is current.

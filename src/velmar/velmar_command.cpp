@@ -82,7 +82,6 @@ class CVelmarCommand::Receiving {
 
 HRESULT CVelmarCommand::ReceiveReply(CIConnection* connection, HANDLE abort_event) {
   const bool keep_reply = (GetFlags() & kStreamed) == 0;
-  Clock& clock = CurrentClock();
   Receiving receiving;
   bool need_data = true;
   bool done = false;
@@ -118,7 +117,7 @@ HRESULT CVelmarCommand::ReceiveReply(CIConnection* connection, HANDLE abort_even
     const HRESULT result = AppendReply(kept.data(), static_cast<uint32_t>(kept.size()));
     if (FAILED(result)) return result;
   }
-  clock.Pause(kPauseMs);
+  CurrentClock().Pause(kPauseMs);
   return S_OK;
 }
 

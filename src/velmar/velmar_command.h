@@ -50,7 +50,8 @@ class CVelmarCommand : public CReceiverCmd {
   virtual HRESULT ParseLogBody(const char* bytes, uint32_t length, bool* done, uint32_t* consumed);
   virtual HRESULT ParseAsciiHeader(const char* text, uint32_t length);
   virtual HRESULT ParseMessageBody(const char* text, uint32_t length, bool* done);
-  // A whole reply as text; 0 or 1.
+  // Sorts a whole reply, a text that ends in 0, by its acknowledgement. 0 when it is no end
+  // (nothing has come, or something follows the OK, which is kept as ErrorText); else 1.
   virtual int ParseAcknowledgement(const char* text);
 
   ResponseType Response() const { return response_; }

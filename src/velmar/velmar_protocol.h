@@ -48,8 +48,8 @@ class CVelmarProtocol : public CAbstractProtocol, public VelmarCommands::CReadFi
   HRESULT ChangePort(Change change);
 
   // The same for a download, which has to know what became of it: `*changed` tells whether the new
-  // speed was sent and not refused. The question is cut off by an abort (S_FALSE) or not, the
-  // change itself never is: it would leave the two ends at different speeds.
+  // speed was sent and not refused (no answer counts as none). The question is cut off by an abort
+  // (S_FALSE) or not, the change itself never is: it would leave the two ends at different speeds.
   enum class OnAbort { kEnd, kKeep };
   HRESULT ChangeReceiverSpeed(DWORD speed, OnAbort on_abort, bool* changed);
   // Runs a command that no abort reaches.

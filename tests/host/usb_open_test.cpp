@@ -107,6 +107,16 @@ TEST_F(ApiUsb, AnyLinkGoesOnToUsb) {
   EXPECT_TRUE(report_.LinesWith("SearchReceiver - CreateReceiverOnUSB failed").empty());
 }
 
+TEST_F(ApiUsb, AnyLinkReportsTheFailureOfEach) {
+  const bed::SimulatedUsb usb({"quorin", "--refuse-bind", "0x81"});
+  const std::string device = host::Narrow(usb.device());
+  EXPECT_EQ(Search(usb, eInstanceAny, eProtocolAny), static_cast<HRESULT>(0x80070057));
+  EXPECT_TRUE(
+      report_.Has("SearchReceiver - SearchReceiverOnSerial failed[" + device + "] [0x8007007B]"));
+  EXPECT_TRUE(
+      report_.Has("SearchReceiver - CreateReceiverOnUSB failed[" + device + "] [0x80070057]"));
+}
+
 TEST_F(ApiUsb, ASignalledEventEndsItAfterTheOpen) {
   const bed::SimulatedUsb usb({"quorin"});
   const host::Event event(true);

@@ -186,6 +186,25 @@ TEST_F(VelmarDownload, ASpeedBelowTheSignIsFastEnough) {
   EXPECT_EQ(connection->speed, 0x7FFFFFFFu);
 }
 
+// The kept reply then repeats its beginning.
+TEST_F(VelmarDownload, ARefusalOfTheSpeedIsSeenWhereverItIsCut) {
+  for (const std::string& refusal : {kErrorPrompt, kErrorTextPrompt}) {
+    for (size_t cut = 1; cut < refusal.size(); ++cut) {
+      Serve(1);
+      connection->speed = 9600;
+      connection->calls.clear();
+      before_command = [&](const std::string& command) {
+        if (command == kRaise) connection->GiveRead(refusal.substr(0, cut));
+      };
+      answers[kRaise] = refusal.substr(cut);
+      stream.bytes.clear();
+      EXPECT_EQ(Download(), S_OK) << cut;
+      EXPECT_THAT(connection->calls, testing::Not(testing::Contains("speed 115200"))) << cut;
+      EXPECT_EQ(stream.bytes.size(), 100u) << cut;
+    }
+  }
+}
+
 // It was not raised: raising the host would cut the link.
 TEST_F(VelmarDownload, AReceiverThatNamesNoPortStaysSlow) {
   Serve(1);
