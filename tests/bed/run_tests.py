@@ -13,6 +13,7 @@ import concurrent.futures
 import contextlib
 import json
 import os
+import queue
 import re
 import signal
 import subprocess
@@ -43,7 +44,10 @@ class Program:
     time_limit: int = 120
 
 
-# Each shard has three serial ports, COM10 to COM12 for the first, and there are ports for eight.
+# Sets of three serial ports, COM10 to COM12 the first. A shard that runs has one of them.
+PORT_SETS = 8
+
+# Those with ports run side by side at the end, the longest first.
 PROGRAMS = [
     Program("check_layers", "tests/bed/check_layers.py", SCRIPT),
     Program("check_exports", "tests/bed/check_exports.py", SCRIPT),
@@ -52,9 +56,9 @@ PROGRAMS = [
     Program("unit_tests", "build/release/bin/unit_tests.exe", WINE),
     Program("cli_unit_tests", "build/release/bin/cli_unit_tests.exe", WINE),
     Program("msvc_host", "build/release/bin/msvc_host.exe", WINE_SCRIPT),
-    Program("usb_tests", "build/release/bin/usb_tests.exe", BED, shards=4),
-    Program("cli_tests", "build/release/bin/cli_tests.exe", BED, shards=8, time_limit=300),
     Program("host_tests", "build/release/bin/host_tests.exe", BED, shards=8, time_limit=600),
+    Program("cli_tests", "build/release/bin/cli_tests.exe", BED, shards=8, time_limit=300),
+    Program("usb_tests", "build/release/bin/usb_tests.exe", BED, shards=4),
 ]
 
 
@@ -267,31 +271,47 @@ def outcome_of(program, name, status, results, log):
     return outcome
 
 
-def run_program(program, gtest_filter, environment):
+def run_programs(programs, gtest_filter, environment):
+    """Runs the shards of these programs side by side, as many as there are sets of ports."""
     start = time.monotonic()
-    outcome = Outcome()
-    with concurrent.futures.ThreadPoolExecutor(program.shards) as pool:
+    port_sets = queue.SimpleQueue()
+    for number in range(PORT_SETS):
+        port_sets.put(number)
+
+    def run(program, shard):
+        ports = port_sets.get()
+        try:
+            own = dict(environment, RCVLINK_PORT_SET=str(ports))
+            return run_shard(program, shard, gtest_filter, own)
+        finally:
+            port_sets.put(ports)
+
+    total = Outcome()
+    with concurrent.futures.ThreadPoolExecutor(PORT_SETS) as pool:
         runs = [
-            pool.submit(run_shard, program, shard, gtest_filter, environment)
-            for shard in range(program.shards)
+            [pool.submit(run, program, shard) for shard in range(program.shards)]
+            for program in programs
         ]
         try:
-            for run in runs:
-                shard_outcome, log = run.result()
-                if shard_outcome.failures:
-                    show(log)
-                outcome.add(shard_outcome)
+            for program, shards in zip(programs, runs):
+                outcome = Outcome()
+                for shard in shards:
+                    shard_outcome, log = shard.result()
+                    if shard_outcome.failures:
+                        show(log)
+                    outcome.add(shard_outcome)
+                seconds = time.monotonic() - start
+                print(
+                    f"{program.name}: {outcome.passed} passed, {len(outcome.failures)} failed, "
+                    f"{outcome.skipped} skipped after {seconds:.1f} s",
+                    flush=True,
+                )
+                total.add(outcome)
         except BaseException:
             pool.shutdown(wait=False, cancel_futures=True)
             end_all_processes()
             raise
-    seconds = time.monotonic() - start
-    print(
-        f"{program.name}: {outcome.passed} passed, {len(outcome.failures)} failed, "
-        f"{outcome.skipped} skipped in {seconds:.1f} s",
-        flush=True,
-    )
-    return outcome
+    return total
 
 
 def chosen_programs(argument):
@@ -314,8 +334,10 @@ def run_all(programs, gtest_filter):
         if any(program.kind == BED for program in programs):
             bed_environment = stack.enter_context(bed_server(environment))
         for program in programs:
-            chosen = bed_environment if program.kind == BED else environment
-            outcome.add(run_program(program, gtest_filter, chosen))
+            if program.kind != BED:
+                outcome.add(run_programs([program], gtest_filter, environment))
+        with_ports = [program for program in programs if program.kind == BED]
+        outcome.add(run_programs(with_ports, gtest_filter, bed_environment))
     return outcome
 
 

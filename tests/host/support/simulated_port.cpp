@@ -11,15 +11,16 @@ namespace bed {
 namespace {
 
 constexpr int kFirstPort = 10;
-constexpr int kPortsPerShard = 3;
+constexpr int kPortsPerSet = 3;
 constexpr const char* kTranscript = "transcript.txt";
 constexpr auto kPollInterval = std::chrono::milliseconds(5);
 
 std::mutex slots_mutex;
-std::array<bool, kPortsPerShard> slots_in_use{};
+std::array<bool, kPortsPerSet> slots_in_use{};
 
-int ShardIndex() {
-  const char* const value = std::getenv("GTEST_SHARD_INDEX");
+// Which set of ports is this process's.
+int PortSet() {
+  const char* const value = std::getenv("RCVLINK_PORT_SET");
   return value == nullptr ? 0 : std::atoi(value);
 }
 
@@ -43,7 +44,7 @@ PortLease::~PortLease() {
 }
 
 std::string PortLease::name() const {
-  return "COM" + std::to_string(kFirstPort + kPortsPerShard * ShardIndex() + slot_);
+  return "COM" + std::to_string(kFirstPort + kPortsPerSet * PortSet() + slot_);
 }
 
 SimulatedPort::SimulatedPort(std::vector<std::string> arguments,

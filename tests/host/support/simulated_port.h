@@ -14,8 +14,8 @@
 
 namespace bed {
 
-// The right to use one of the serial ports of this test process. Each shard of a test program has
-// three of its own, so shards that run side by side do not meet. Nothing is plugged in.
+// The right to use one of the serial ports of this test process. Each that runs has three of its
+// own, so those that run side by side do not meet. Nothing is plugged in.
 class PortLease {
  public:
   // Raises Error when all three are in use.
