@@ -91,8 +91,9 @@ bool IsMissing(long code) {
 Failure SearchFailure(const Arguments& arguments, EInstanceType link, long code) {
   const bool on_usb = link == eInstanceUSB;
   const std::string port = Printable(arguments.port);
-  if (on_usb && SUCCEEDED(code) && FAILED(WhyNotOpened(arguments.port))) {
-    code = WhyNotOpened(arguments.port);
+  if (on_usb && SUCCEEDED(code)) {
+    const long opening = WhyNotOpened(arguments.port);
+    if (FAILED(opening)) code = opening;
   }
   Failure failure{.exit = ExitCode::kNoReceiver, .tried = "find a receiver", .code = code};
   if (!on_usb && code == ResultOfWin32(ERROR_INVALID_NAME)) {

@@ -45,7 +45,7 @@ class BusCall {
 // A receiver on a simulated USB device, for as long as the object lives.
 class UsbPort {
  public:
-  // Starts the bus driver if need be, and plugs the device in: the host opens \\.\NAME. Throws
+  // Starts the bus driver if need be, and plugs the device in: the host opens \\?\NAME. Throws
   // std::system_error when there is a device of that name, or no driver.
   explicit UsbPort(const std::wstring& name);
 

@@ -172,7 +172,7 @@ namespace devapi {
 ///                   with `CloseReceiver`.
 /// @retval S_OK         found; *receiver holds the handle
 /// @retval S_FALSE      no receiver answered, or the search was aborted
-/// @retval E_INVALIDARG `receiver` is null
+/// @retval E_INVALIDARG `port` or `receiver` is null
 /// @retval E_UNEXPECTED `type` is none of the three (and the name is not registered)
 /// @return otherwise why the port could not be opened: 0x80070002 when it does not exist,
 ///         0x80070005 when another program has it. A USB device that cannot be opened at all gives

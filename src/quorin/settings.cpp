@@ -29,10 +29,12 @@ DWORD ReadDownloadReadTimeout() {
   const RegistryKey key = OpenKey();
   if (!key) return timeout_ms;
   // Four bytes of whatever type are taken as they are; only the right type is worth a line.
+  DWORD value = kDefaultTimeoutMs;
   DWORD type = REG_NONE;
-  DWORD size = sizeof(timeout_ms);
+  DWORD size = sizeof(value);
   const LSTATUS status = RegQueryValueExW(
-      key.get(), kValueName, nullptr, &type, reinterpret_cast<BYTE*>(&timeout_ms), &size);
+      key.get(), kValueName, nullptr, &type, reinterpret_cast<BYTE*>(&value), &size);
+  if (status == ERROR_SUCCESS) timeout_ms = value;
   if (status == ERROR_SUCCESS && type == REG_DWORD) {
     Trace(
         L"CQuorinProtocol::CQuorinProtocol - file download read timeout /DownloadReadTimeout/ - "

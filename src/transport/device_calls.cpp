@@ -50,7 +50,7 @@ BOOL DeviceCalls::DeviceIoControl(HANDLE device,
     return TRUE;
   }
   if (GetLastError() != ERROR_IO_PENDING) return FALSE;
-  return ::GetOverlappedResult(device, &block, returned, TRUE);
+  return ::GetOverlappedResult(device, &block, returned, TRUE);  // `done` keeps the last error
 }
 
 DWORD DeviceCalls::WaitForMultipleObjects(DWORD count, const HANDLE* handles, DWORD timeout_ms) {

@@ -122,7 +122,7 @@ TEST_F(ApiUsb, ASignalledEventEndsItAfterTheOpen) {
   const host::Event event(true);
   EXPECT_EQ(Create(usb, eProtocolAny, event.get()), S_FALSE);
   EXPECT_EQ(receiver_.get(), nullptr);
-  EXPECT_TRUE(report_.LinesWith("CUSBConnection::Create - OK").size() == 1);
+  EXPECT_EQ(report_.LinesWith("CUSBConnection::Create - OK").size(), 1U);
   EXPECT_TRUE(report_.LinesWith("CreateReceiverOnUSB - looking").empty());
   usb.WaitForTranscript("= close 0x02\n");
 }
@@ -132,8 +132,10 @@ TEST_F(ApiUsb, AnEventEndsTheWaitForAnAnswer) {
   host::Event event;
   auto creation = host::OnThread([&] { return Create(usb, eProtocolAny, event.get()); });
   usb.WaitForTranscript("%\\r\\n");  // it waits for the answer to its ping
+  const DWORD start = GetTickCount();
   event.Set();
   EXPECT_EQ(creation.get(), S_FALSE);
+  EXPECT_LT(GetTickCount() - start, 6000U) << "it waited for its time-out of 8 s";
 }
 
 TEST_F(ApiUsb, ASilentReceiverIsNone) {

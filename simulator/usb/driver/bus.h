@@ -23,7 +23,7 @@ constexpr uint32_t BufferedCode(uint32_t function) {
 }
 
 // Input: the name of the device, of 1 to kMaxNameLength UTF-16 letters, digits, '-', '_' or '.'.
-// The host then opens \\.\NAME.
+// The host then opens \\?\NAME.
 inline constexpr uint32_t kPlugIn = BufferedCode(0x800);
 // The device goes: whatever is pending fails, and so does every later request. No input. When it
 // is done, the path can no longer be opened.
