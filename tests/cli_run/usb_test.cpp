@@ -67,6 +67,16 @@ TEST_F(UsbCli, AnyLinkFindsItOnUsb) {
   EXPECT_THAT(verbose.errors, HasSubstr("could not find a receiver on a serial port"));
 }
 
+TEST_F(UsbCli, AnyLinkWillDoForAllItsCommands) {
+  const bed::SimulatedUsb usb({"quorin", "--id", "QU7"}, {{"a.log", "aa"}, {"b.log", "b"}});
+  EXPECT_THAT(RunOn(usb, {"info"}, "any").output, HasSubstr("QU7"));
+  EXPECT_THAT(RunOn(usb, {"ls"}, "any").output, HasSubstr("2 files, 3 bytes"));
+  EXPECT_EQ(RunOn(usb, {"get", "a.log"}, "any").status, kDone);
+  EXPECT_EQ(folder.Read("a.log"), "aa");
+  EXPECT_EQ(RunOn(usb, {"rm", "a.log"}, "any").status, kDone);
+  EXPECT_THAT(RunOn(usb, {"ls"}, "any").output, HasSubstr("1 file, 1 bytes"));
+}
+
 TEST_F(UsbCli, AnyLinkFindsItOnASerialPort) {
   const bed::SimulatedPort port({"quorin"});
   const auto result = Run(On(port, {"find", "--link", "any", "--json"}));

@@ -118,6 +118,31 @@ INSTANTIATE_TEST_SUITE_P(
                     Fault{"Silence", {"--block-silence", "3000:4"}, "read timeout."}),
     [](const auto& fault) { return fault.param.name; });
 
+// What does not touch the blocks does not touch the transfer either.
+class ApiUsbDownloadIgnores : public testing::TestWithParam<Fault> {};
+
+TEST_P(ApiUsbDownloadIgnores, WhatIsNoneOfItsBusiness) {
+  const std::string content = host::Content(kSeveralMb);
+  const bed::SimulatedUsb usb(Arguments(GetParam().switches), {{"A.log", content}});
+  const host::UsbReceiver receiver(usb);
+  host::MemoryStream stream;
+  EXPECT_EQ(receiver.Download(L"A.log", stream), S_OK);
+  EXPECT_TRUE(stream.bytes == content);
+  const host::Lines sent = receiver.SentSince();
+  EXPECT_EQ(host::CountOf(sent, R"(\x15)"), 1U);
+  EXPECT_EQ(host::CountOf(sent, R"(\x06)"), kSeveralMb / 512);
+  EXPECT_EQ(host::CountOf(sent, "#"), 1U);
+}
+
+INSTANTIATE_TEST_SUITE_P(
+    Faults,
+    ApiUsbDownloadIgnores,
+    testing::Values(Fault{"Pieces", {"--pieces", "300", "--piece-gap", "0"}, ""},
+                    Fault{"Garbage", {"--garbage", "17"}, ""},
+                    Fault{"OtherTagFirst", {"--other-tag-first", "*"}, ""},
+                    Fault{"Echo", {"--echo"}, ""}),
+    [](const auto& fault) { return fault.param.name; });
+
 TEST(ApiUsbDownload, TakesBlocksInPiecesOfAnySize) {
   const std::string content = host::Content(20000);
   for (const char* const length : {"1", "7", "64", "511", "513", "4096"}) {
@@ -224,7 +249,7 @@ class ApiUsbDownloadEnds : public testing::TestWithParam<Ending> {};
 TEST_P(ApiUsbDownloadEnds, WithAClearResult) {
   const ReadTimeout timeout(kShortTimeoutMs);
   const bed::SimulatedUsb usb(Arguments(GetParam().switches),
-                              {{"A.log", host::Content(kSize)}, {"B.log", "next"}});
+                              {{"A.log", host::Content(kSeveralMb)}, {"B.log", "next"}});
   const host::UsbReceiver receiver(usb);
   const host::Report report;
   host::MemoryStream stream;
@@ -241,10 +266,13 @@ TEST_P(ApiUsbDownloadEnds, WithAClearResult) {
 INSTANTIATE_TEST_SUITE_P(
     Endings,
     ApiUsbDownloadEnds,
-    testing::Values(Ending{"EndBlock", {"--end-block", "2"}, S_FALSE, 2},
-                    Ending{"NegativeLength", {"--negative-length", "1"}, host::kNotConnected, 4},
-                    Ending{"Silence", {"--block-silence", "1:60"}, host::kTimedOut, 1},
-                    Ending{"ARefusedGet", {"--refuse", "get@1"}, host::kNotConnected, 0}),
+    testing::Values(
+        Ending{"EndBlock", {"--end-block", "3000"}, S_FALSE, 3000},
+        // A lone '#' is no whole block: it is asked for until the time-outs are spent.
+        Ending{"EndByte", {"--end-byte", "3000"}, host::kTimedOut, 3000},
+        Ending{"NegativeLength", {"--negative-length", "1"}, host::kNotConnected, kSeveralMb / 512},
+        Ending{"Silence", {"--block-silence", "3000:60"}, host::kTimedOut, 3000},
+        Ending{"ARefusedGet", {"--refuse", "get@1"}, host::kNotConnected, 0}),
     [](const auto& ending) { return ending.param.name; });
 
 // Over USB a failure of the host's stream is passed on, other than on a serial port.
