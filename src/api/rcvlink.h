@@ -36,7 +36,7 @@
 ///     0x8007048F                (ERROR_DEVICE_NOT_CONNECTED) no connection, no driver, no complete
 ///                               reply, or the receiver refused the command
 ///     0x800705B4                (ERROR_TIMEOUT) the receiver stayed silent
-///     0x8007xxxx                any other Win32 error, its number in the low 16 bits
+///     0x8007xxxx                any other Win32 error, in the low 16 bits; over USB also 0xExxxxxxx
 ///
 /// @par Abort events
 /// An abort event is the host's own Win32 event, and should be manual-reset: one that resets itself
@@ -296,8 +296,8 @@ RCVLINK_API long Abort(void* receiver);
 /// @retval E_FAIL       a Quorin receiver says that the file's size is 0, or does not say it
 /// @retval 0x800705B4   a Quorin receiver stayed silent
 /// @retval 0x8007048F   a Quorin receiver refused a command, or sent a block that makes no sense
-/// @return otherwise the failing code of the connection
-/// @note A Quorin receiver that falls silent between two blocks is asked again without end on a port
+/// @return otherwise the failing code of the connection, or over USB of the stream's Write
+/// @note A Quorin receiver that falls silent between two blocks is asked without end on a serial port
 ///       whose reads end empty, as those of Windows do: a host that has no patience calls `Abort`.
 /// @note Quorin blocks are numbered with 16 bits: a file of more than 65536 blocks of 512 bytes
 ///       (33554432 bytes) does not come to its end.

@@ -3,8 +3,8 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
-#include "tests/support/user_settings.h"
 #include "tests/support/report_capture.h"
+#include "tests/support/user_settings.h"
 
 using testing::ElementsAre;
 

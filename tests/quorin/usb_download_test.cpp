@@ -12,8 +12,8 @@
 
 #include "platform/hresult.h"
 #include "tests/quorin/usb_download_fixture.h"
-#include "tests/support/user_settings.h"
 #include "tests/support/report_capture.h"
+#include "tests/support/user_settings.h"
 
 using testing::Each;
 using testing::ElementsAre;
