@@ -28,9 +28,8 @@ FileLists& OpenLists() {
 namespace devapi {
 
 long OpenFileList(void* receiver, void** fileList) {
-  if (!fileList) return E_INVALIDARG;
   const std::shared_ptr<CIReceiver> found = Receivers().Find(receiver);
-  if (!found) return E_INVALIDARG;
+  if (!fileList || !found) return E_INVALIDARG;
   return CatchResult([&] {
     auto files = std::make_unique<CFileList>();
     const HRESULT result = found->GetFiles(files.get());
