@@ -194,9 +194,6 @@ void CSerialConnection::WaitUntilSent() {
       last_queued = status.cbOutQue;
       last_progress = now;
     } else if (now - last_progress > kDrainLimitMs) {
-      Trace(L"CSerialConnection::Flush - output queue does not drain [%u] [%s]\r\n",
-            status.cbOutQue,
-            name_.get());
       return;
     }
   }

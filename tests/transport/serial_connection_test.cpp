@@ -249,7 +249,6 @@ TEST_F(SerialConnection, FlushGivesUpAQueueThatStandsStill) {
   };
   EXPECT_EQ(connection.Flush(), S_OK);
   EXPECT_EQ(device.calls.back(), "PurgeComm");
-  EXPECT_TRUE(report.Has("CSerialConnection::Flush - output queue does not drain [30] [COM12]"));
   EXPECT_GT(clock.now, 3000u);
 }
 
