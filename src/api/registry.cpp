@@ -79,7 +79,10 @@ HRESULT ReceiverRegistry::Destroy(const wchar_t* port) {
     // Every equal-named receiver that is passed loses one user, and nothing is written for it.
     if (--entry->second.use_count != 0) continue;
     Trace(L"DestroyReceiver - removed [%s]\r\n", port);
+    const std::shared_ptr<CIReceiver> receiver = std::move(entry->second.receiver);
     entries_.erase(entry);
+    // A call that is running keeps the receiver, and no host can reach it any more to abort it.
+    if (receiver.use_count() > 1) receiver->Stop();
     return S_OK;
   }
   return S_FALSE;

@@ -126,6 +126,10 @@ HRESULT CAbstractReceiver::SetProgressCallback(ProgressFunction function, void* 
   return S_OK;
 }
 
+void CAbstractReceiver::Stop() {
+  if (driver_) driver_->Abort();
+}
+
 void CAbstractReceiver::OnProgress(BYTE percent) {
   const std::scoped_lock lock(lock_);
   if (progress_function_) progress_function_(progress_context_, percent);

@@ -32,6 +32,7 @@ class CAbstractReceiver : public CIReceiver, public CIProtocolCallback {
   HRESULT DCSetRcvParity(BYTE parity) override;
   HRESULT DCSetRcvStopbits(BYTE stop_bits) override;
   HRESULT SetProgressCallback(ProgressFunction function, void* context) override;
+  void Stop() override;
 
   void OnProgress(BYTE percent) override;
 

@@ -45,6 +45,7 @@ class StubReceiver : public CIReceiver {
   HRESULT SetProgressCallback(ProgressFunction, void*) override {
     return Called("SetProgressCallback");
   }
+  void Stop() override { calls.push_back("Stop"); }
 
  private:
   HRESULT Called(const char* name) {
