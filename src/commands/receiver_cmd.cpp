@@ -6,6 +6,7 @@
 #include <new>
 
 #include "platform/event.h"
+#include "transport/wait_scope.h"
 
 namespace {
 
@@ -85,3 +86,9 @@ bool CReceiverCmd::IsCancelled(HANDLE abort_event) const {
 }
 
 void CReceiverCmd::Cancel() { cancelled_ = true; }
+
+HRESULT CReceiverCmd::Send(CIConnection* connection, const void* bytes, uint32_t length) const {
+  if (!sends_whole_) return connection->Write(bytes, length, write_timeout_ms_);
+  const WaitScope shield = WaitScope::Shielded(connection);
+  return connection->Write(bytes, length, write_timeout_ms_);
+}

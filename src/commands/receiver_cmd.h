@@ -55,6 +55,15 @@ class CReceiverCmd {
   // Marks the command for good; Execute ends at its next checkpoint.
   virtual void Cancel();
 
+  // Makes Execute send the command whole once it begins: an abort then ends only the wait for the
+  // reply. For commands after which the receiver must be in a known state.
+  void SendWhole() { sends_whole_ = true; }
+
+ protected:
+  bool SendsWhole() const { return sends_whole_; }
+  // Writes bytes of the command with its write time-out; results as the connection's Write.
+  HRESULT Send(CIConnection* connection, const void* bytes, uint32_t length) const;
+
  private:
   uint32_t flags_;
   std::unique_ptr<uint8_t[]> command_;
@@ -64,6 +73,7 @@ class CReceiverCmd {
   std::unique_ptr<uint8_t[]> reply_;
   uint32_t reply_length_ = 0;
   std::atomic<bool> cancelled_ = false;
+  bool sends_whole_ = false;
 };
 
 #endif  // RCVLINK_COMMANDS_RECEIVER_CMD_H_

@@ -16,13 +16,12 @@
 #include "quorin/protocol_flags.h"
 #include "quorin/quorin_protocol.h"
 #include "report/report_file.h"
-#include "transport/abort_shield.h"
+#include "transport/wait_scope.h"
 
 using namespace QuorinCommands;
 
 namespace {
 
-constexpr DWORD kTransferSpeed = 115200;
 constexpr DWORD kSerialReadTimeoutMs = 3000;
 constexpr int kMaxTimeouts = 3;
 
@@ -37,7 +36,6 @@ uint8_t UsbPercent(uint32_t delivered, uint32_t size) {
 }
 
 HRESULT WriteToStream(IStream* stream, std::span<const uint8_t> bytes) {
-  if (bytes.empty()) return S_OK;
   ULONG written = 0;
   return stream->Write(bytes.data(), static_cast<ULONG>(bytes.size()), &written);
 }
@@ -47,7 +45,7 @@ HRESULT WriteToStream(IStream* stream, std::span<const uint8_t> bytes) {
 HRESULT CQuorinProtocol::DownloadFile(const wchar_t* name, IStream* stream, CProgressCallback*) {
   if (!name || !stream) return E_INVALIDARG;
   if (!connection()) return kNotConnected;
-  if (TakeAbort()) return S_FALSE;
+  if (abort_.Take()) return S_FALSE;
   return CatchResult([&] {
     const MutexGuard guard(connection_lock_);
     Trace(L"CQuorinProtocol::DownloadFile - connection is locked [0x%p]\r\n",
@@ -57,39 +55,33 @@ HRESULT CQuorinProtocol::DownloadFile(const wchar_t* name, IStream* stream, CPro
     EInstanceType link = eInstanceAny;
     ThrowIfFailed(connection()->GetInstanceType(&link));
 
-    const DWORD saved_speed = link == eInstanceSerial ? RaiseSpeed() : 0;
+    DWORD saved_speed = 0;
+    if (link == eInstanceSerial) {
+      DWORD speed = 0;
+      ThrowIfFailed(connection()->GetSpeed(&speed));
+      if (speed < kTransferSpeed && RaiseSpeed(speed)) saved_speed = speed;
+    }
     const HRESULT result = CatchResult([&] { return Transfer(name, stream, link); });
     if (FAILED(result)) {
       Trace(L"CQuorinProtocol::DownloadFile - download [%s] is failed [0x%08X]\r\n", name, result);
     }
     RestoreSpeed(saved_speed);
-    return TakeAbort() ? S_FALSE : result;
+    return abort_.Take() ? S_FALSE : result;
   });
 }
 
-// Raises the receiver, then the host. Gives the speed to go back to, 0 when nothing was raised: the
-// transfer then runs at the old speed.
-DWORD CQuorinProtocol::RaiseSpeed() {
-  DWORD speed = 0;
-  ThrowIfFailed(connection()->GetSpeed(&speed));
-  if (speed >= kTransferSpeed) return 0;
-
-  // A receiver that did not name its port (S_FALSE) was not raised either.
-  const HRESULT raised = ChangeReceiverSpeed(kTransferSpeed);
-  if (raised != S_OK) {
-    Trace(L"CQuorinProtocol::DownloadFile - receiver speed up is failed [0x%08X]\r\n", raised);
-    return 0;
+// An abort while the receiver is asked for its port cuts that off: it is asked once more.
+void CQuorinProtocol::SetReceiverBack(DWORD speed) {
+  constexpr int kTries = 2;
+  for (int i = 0; i < kTries; ++i) {
+    abort_.ClearCancel();
+    CGetPortCmd get_port(kCommandFlags);
+    ExecuteCommand(get_port);
+    const int port_index = get_port.PortIndex();
+    if (port_index >= 0) SendPortSetting(CChangeBaudRateCmd(port_index, speed, kCommandFlags));
+    const bool cut_off = port_index < 0 && get_port.IsCancelled(nullptr);
+    if (!cut_off) return;
   }
-  const HRESULT followed = connection()->SetSpeed(kTransferSpeed);
-  if (FAILED(followed)) {
-    Trace(L"CQuorinProtocol::DownloadFile - host speed up is failed [0x%08X]\r\n", followed);
-    // Once more when an abort cut the first try off.
-    if (ChangeReceiverSpeed(speed, OnAbort::kKeep) != S_OK) {
-      ChangeReceiverSpeed(speed, OnAbort::kKeep);
-    }
-    return 0;
-  }
-  return speed;
 }
 
 void CQuorinProtocol::RestoreSpeed(DWORD saved_speed) {
@@ -102,11 +94,15 @@ void CQuorinProtocol::RestoreSpeed(DWORD saved_speed) {
 
 HRESULT CQuorinProtocol::Transfer(const wchar_t* name, IStream* stream, EInstanceType link) {
   ThrowIfAborted();
+  // What is sent at the raised speed is sent whole: half a line in front of it would spoil the command
+  // that puts the speed back.
   CQuorinCommand line_end("\n", kCommandFlags);
+  line_end.SendWhole();
   ThrowIfFailed(ExecuteCommand(line_end));
 
   const std::string narrow_name = ToNarrow(name);
   CGetFileSizeCmd get_size(narrow_name, kCommandFlags);
+  get_size.SendWhole();
   ThrowIfFailed(ExecuteCommand(get_size));
   ThrowIfAborted();
   const int size = get_size.Size();
@@ -119,7 +115,7 @@ HRESULT CQuorinProtocol::Transfer(const wchar_t* name, IStream* stream, EInstanc
   CGetFileCmd get_file(narrow_name, kBlockPayload, kCommandFlags);
   get_file.SendWhole();
   ThrowIfFailed(ExecuteCommand(get_file));
-  if (TakeAbort()) {
+  if (abort_.Take()) {
     EndTransfer();  // the receiver has heard the command and waits for a control byte
     return S_FALSE;
   }
@@ -152,7 +148,7 @@ std::optional<HRESULT> CQuorinProtocol::AskAgain(const wchar_t* trace_line) {
 
 // The receiver must hear that it is over, whatever cancels are on their way.
 HRESULT CQuorinProtocol::EndTransfer() {
-  const AbortShield shield(connection());
+  const WaitScope shield = WaitScope::Shielded(connection());
   return WriteControl(kEndOfTransfer);
 }
 
@@ -189,13 +185,14 @@ std::optional<HRESULT> CQuorinProtocol::TakeSerialBlock(Download& download,
   constexpr wchar_t kCancelled[] =
       L"CQuorinProtocol::DownloadOverSerial - download is cancelled\r\n";
   constexpr wchar_t kTimeout[] = L"CQuorinProtocol::DownloadOverSerial - read timeout\r\n";
-  if (TakeAbort()) return EndCancelledDownload(kCancelled);
+  if (abort_.Take()) return EndCancelledDownload(kCancelled);
 
   Block block;
   DWORD count = 0;
-  HRESULT read = connection()->Read(block.data(), kBlockHeader, &count, kSerialReadTimeoutMs);
-  if (FAILED(read)) return AfterFailedRead(read, download, kTimeout);
-  if (TakeAbort()) return EndCancelledDownload(kCancelled);
+  HRESULT read_result =
+      connection()->Read(block.data(), kBlockHeader, &count, kSerialReadTimeoutMs);
+  if (FAILED(read_result)) return AfterFailedRead(read_result, download, kTimeout);
+  if (abort_.Take()) return EndCancelledDownload(kCancelled);
 
   if (count < kBlockHeader) return AskAgain();
   switch (block.Type()) {
@@ -213,8 +210,9 @@ std::optional<HRESULT> CQuorinProtocol::TakeSerialBlock(Download& download,
   if (!payload_length) return kNotConnected;
 
   constexpr DWORD kRest = kBlockLength - kBlockHeader;
-  read = connection()->Read(block.data() + kBlockHeader, kRest, &count, kSerialReadTimeoutMs);
-  if (FAILED(read)) return AfterFailedRead(read, download, kTimeout);
+  read_result =
+      connection()->Read(block.data() + kBlockHeader, kRest, &count, kSerialReadTimeoutMs);
+  if (FAILED(read_result)) return AfterFailedRead(read_result, download, kTimeout);
   if (count < kRest || !block.HasEndByte() || !block.IsChainedTo(download.crc)) return AskAgain();
 
   download.crc = block.Crc();
@@ -231,11 +229,11 @@ std::optional<HRESULT> CQuorinProtocol::TakeSerialBlock(Download& download,
     EndTransfer();
     return S_OK;
   }
-  if (TakeAbort()) return EndCancelledDownload(kCancelled);
-  const HRESULT sent = WriteControl(kAck);
-  if (FAILED(sent)) return sent;
+  if (abort_.Take()) return EndCancelledDownload(kCancelled);
+  const HRESULT write_result = WriteControl(kAck);
+  if (FAILED(write_result)) return write_result;
   // Cut off by an abort: the receiver still waits for its answer, and must hear that it is over.
-  if (sent != S_OK) return TakeAbort() ? EndCancelledDownload(kCancelled) : S_OK;
+  if (write_result != S_OK) return abort_.Take() ? EndCancelledDownload(kCancelled) : S_OK;
   ++download.expected_sequence;
   download.timeouts = 0;
   return std::nullopt;
@@ -260,12 +258,12 @@ std::optional<HRESULT> CQuorinProtocol::TakeUsbBlock(Download& download,
                                                      uint32_t size) {
   constexpr wchar_t kCancelled[] = L"CQuorinProtocol::DownloadOverUSB - download is cancelled\r\n";
   constexpr wchar_t kTimeout[] = L"CQuorinProtocol::DownloadOverUSB - read timeout.\r\n";
-  if (TakeAbort()) return EndCancelledDownload(kCancelled);
+  if (abort_.Take()) return EndCancelledDownload(kCancelled);
 
   Block block;
-  const HRESULT read = ReadWholeBlock(block);
-  if (TakeAbort()) return EndCancelledDownload(kCancelled);
-  if (FAILED(read)) return AfterFailedRead(read, download, kTimeout);
+  const HRESULT read_result = ReadWholeBlock(block);
+  if (abort_.Take()) return EndCancelledDownload(kCancelled);
+  if (FAILED(read_result)) return AfterFailedRead(read_result, download, kTimeout);
 
   switch (block.Type()) {
     case BlockType::kEnd:
@@ -284,7 +282,7 @@ std::optional<HRESULT> CQuorinProtocol::TakeUsbBlock(Download& download,
   }
   const std::optional<size_t> payload_length = block.PayloadLength();
   if (!payload_length) return kNotConnected;
-  if (read != S_OK) return read;
+  if (read_result != S_OK) return read_result;
   if (!block.HasEndByte()) {
     return AskAgain(L"CQuorinProtocol::DownloadOverUSB - eob character is missed\r\n");
   }
@@ -293,23 +291,23 @@ std::optional<HRESULT> CQuorinProtocol::TakeUsbBlock(Download& download,
   }
 
   download.crc = block.Crc();
-  const HRESULT stored = WriteToStream(stream, block.Payload().first(*payload_length));
-  if (FAILED(stored)) {
-    Trace(L"CQuorinProtocol::DownloadOverUSB - write to stream failed [0x%08X]\r\n", stored);
+  const HRESULT store_result = WriteToStream(stream, block.Payload().first(*payload_length));
+  if (FAILED(store_result)) {
+    Trace(L"CQuorinProtocol::DownloadOverUSB - write to stream failed [0x%08X]\r\n", store_result);
     EndTransfer();
-    return stored;
+    return store_result;
   }
   download.delivered += static_cast<uint32_t>(*payload_length);
   ReportUsbProgress(download, size);
 
   if (block.Type() == BlockType::kLast) {
     EndTransfer();
-    return stored;
+    return store_result;
   }
-  if (TakeAbort()) return EndCancelledDownload(kCancelled);
-  const HRESULT sent = WriteControl(kAck);
-  if (FAILED(sent)) return sent;
-  if (sent != S_OK) return TakeAbort() ? EndCancelledDownload(kCancelled) : sent;
+  if (abort_.Take()) return EndCancelledDownload(kCancelled);
+  const HRESULT write_result = WriteControl(kAck);
+  if (FAILED(write_result)) return write_result;
+  if (write_result != S_OK) return abort_.Take() ? EndCancelledDownload(kCancelled) : write_result;
   ++download.expected_sequence;
   return std::nullopt;
 }
@@ -319,12 +317,12 @@ std::optional<HRESULT> CQuorinProtocol::TakeUsbBlock(Download& download,
 HRESULT CQuorinProtocol::ReadWholeBlock(Block& block) {
   constexpr DWORD kMaxPiece = 512;
   DWORD held = 0;
-  while (held < kBlockLength && !IsAborted()) {
+  while (held < kBlockLength && !abort_.IsSet()) {
     const DWORD piece = std::min<DWORD>(kBlockLength - held, kMaxPiece);
     DWORD count = 0;
-    const HRESULT read =
+    const HRESULT read_result =
         connection()->Read(block.data() + held, piece, &count, download_read_timeout_ms_);
-    if (read != S_OK) return read;
+    if (read_result != S_OK) return read_result;
     held += std::min(count, piece);
   }
   return S_OK;

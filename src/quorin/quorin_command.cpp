@@ -9,7 +9,6 @@
 #include "platform/hresult.h"
 #include "platform/text.h"
 #include "report/report_file.h"
-#include "transport/abort_shield.h"
 
 namespace QuorinCommands {
 namespace {
@@ -33,22 +32,21 @@ HRESULT CQuorinCommand::Execute(CIConnection* connection, HANDLE abort_event) {
   if (const HRESULT result = connection->Flush(); FAILED(result)) return result;
 
   const std::string tag = GetFlags() & kTagged ? NextTag() : std::string();
-  if (const HRESULT result = Send(connection, abort_event, tag); result != S_OK) return result;
+  if (const HRESULT result = SendLine(connection, abort_event, tag); result != S_OK) return result;
   if (GetFlags() & kNoReply) return S_OK;
   return ReceiveReply(connection, abort_event, tag);
 }
 
 // A write that was aborted (S_FALSE) ends the command as much as one that failed.
-HRESULT CQuorinCommand::Send(CIConnection* connection, HANDLE abort_event, std::string_view tag) {
-  std::optional<AbortShield> shield;
-  if (send_whole_) shield.emplace(connection);
+HRESULT CQuorinCommand::SendLine(CIConnection* connection,
+                                 HANDLE abort_event,
+                                 std::string_view tag) {
   if (!tag.empty()) {
-    const HRESULT result =
-        connection->Write(tag.data(), static_cast<DWORD>(tag.size()), GetWriteTimeout());
+    const HRESULT result = Send(connection, tag.data(), static_cast<uint32_t>(tag.size()));
     if (result != S_OK) return result;
   }
-  if (!send_whole_ && IsCancelled(abort_event)) return S_FALSE;
-  return connection->Write(GetCommand(), GetCommandLength(), GetWriteTimeout());
+  if (!SendsWhole() && IsCancelled(abort_event)) return S_FALSE;
+  return Send(connection, GetCommand(), GetCommandLength());
 }
 
 // What has come of a reply so far, and how far it has been searched.

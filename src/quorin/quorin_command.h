@@ -27,10 +27,6 @@ class CQuorinCommand : public CReceiverCmd {
   // connection. 0x8007048F: the reply did not become whole in time, or is too long for the buffer.
   HRESULT Execute(CIConnection* connection, HANDLE abort_event) override;
 
-  // Makes Execute send the command whole, whatever comes: an abort ends only the wait for the
-  // reply. For commands after which the host must know what the receiver has heard.
-  void SendWhole() { send_whole_ = true; }
-
   // Takes the body of one message; `done` is set when the command needs no further one.
   virtual HRESULT ParseReply(const char* body, uint32_t length, ReplyKind kind, bool* done);
 
@@ -47,10 +43,9 @@ class CQuorinCommand : public CReceiverCmd {
  private:
   class Receiving;
 
-  HRESULT Send(CIConnection* connection, HANDLE abort_event, std::string_view tag);
+  HRESULT SendLine(CIConnection* connection, HANDLE abort_event, std::string_view tag);
   HRESULT ReceiveReply(CIConnection* connection, HANDLE abort_event, std::string_view tag);
 
-  bool send_whole_ = false;
   HRESULT result_ = S_OK;
   ReplyKind kind_ = ReplyKind::kNone;
 };

@@ -10,7 +10,7 @@
 #include "quorin/protocol_flags.h"
 #include "quorin/settings.h"
 #include "report/report_file.h"
-#include "transport/abort_shield.h"
+#include "transport/wait_scope.h"
 
 using namespace QuorinCommands;
 
@@ -55,12 +55,12 @@ HRESULT CQuorinProtocol::ExecuteCommand(CQuorinCommand& command) {
 }
 
 bool CQuorinProtocol::Probe(CIConnection* connection, HANDLE abort_event) {
-  const AbortWatch watch(connection, abort_event);
-  // False ends the handshake with no receiver found.
+  const WaitScope watching = WaitScope::Watching(connection, abort_event);
+  // False ends the handshake with no receiver found: the command failed or was cancelled.
   const auto run = [&](CQuorinCommand& command) {
     const HRESULT result = command.Execute(connection, abort_event);
     DumpInvalidResponse(connection, command);
-    return SUCCEEDED(result);
+    return result == S_OK;
   };
   const auto aborted = [&] { return IsSignalled(abort_event); };
 
@@ -86,21 +86,6 @@ bool CQuorinProtocol::Probe(CIConnection* connection, HANDLE abort_event) {
   return run(disable_echo);
 }
 
-HRESULT CQuorinProtocol::CheckConnection(HANDLE abort_event, short* answer) {
-  if (!answer) return E_INVALIDARG;
-  if (!connection()) return kNotConnected;
-  if (const HRESULT locked = LockConnection(abort_event); locked < 0 || locked == S_FALSE) {
-    return locked;
-  }
-  UseUpCancel();
-  const HRESULT result = CatchResult([&] {
-    *answer = Probe(connection(), abort_event) ? VARIANT_TRUE : VARIANT_FALSE;
-    return S_OK;
-  });
-  UnlockConnection();
-  return result;
-}
-
 HRESULT CQuorinProtocol::GetReceiverInfo(HANDLE abort_event, CReceiverInfo* info) {
   Trace(L"CQuorinProtocol::GetReceiverInfo\r\n");
   if (!info) return E_INVALIDARG;
@@ -108,8 +93,8 @@ HRESULT CQuorinProtocol::GetReceiverInfo(HANDLE abort_event, CReceiverInfo* info
   info->bstrReceiverId = nullptr;
   info->bstrModel = nullptr;
   return CatchResult([&] {
-    const HRESULT locked = LockConnection(abort_event);
-    if (locked < 0 || locked == S_FALSE) return locked;
+    const HRESULT lock_result = LockConnection(abort_event);
+    if (lock_result != S_OK) return lock_result;
     // From here a failure leaves the connection locked, for the caller's UnlockConnection.
     ReadIdentity(info);
     Trace(L"CQuorinProtocol::GetReceiverInfo - OK\r\n");
@@ -188,30 +173,28 @@ HRESULT CQuorinProtocol::RenameFile(const wchar_t*, const wchar_t*) { return E_N
 // Called once, before any operation: it needs no lock.
 void CQuorinProtocol::SetCallback(CIProtocolCallback* callback) { callback_ = callback; }
 
-void CQuorinProtocol::ThrowIfAborted() {
-  if (TakeAbort()) throw HResultError(S_FALSE);
-}
-
 template <typename MakeCommand>
-HRESULT CQuorinProtocol::ChangePort(MakeCommand make_command, OnAbort on_abort) {
+HRESULT CQuorinProtocol::ChangePort(MakeCommand make_command) {
   CGetPortCmd get_port(kCommandFlags);
   if (const HRESULT result = ExecuteCommand(get_port); FAILED(result)) return result;
-  if (on_abort == OnAbort::kStop) ThrowIfAborted();
+  ThrowIfAborted();
   const int port_index = get_port.PortIndex();
-  if (port_index < 0) return S_FALSE;
-  auto command = make_command(port_index);
+  return port_index < 0 ? S_FALSE : SendPortSetting(make_command(port_index));
+}
+
+// Half a line would leave it open which setting the receiver has.
+HRESULT CQuorinProtocol::SendPortSetting(CQuorinCommand&& command) {
   command.SendWhole();
   const HRESULT result = ExecuteCommand(command);
   return FAILED(result) ? result : S_OK;
 }
 
-HRESULT CQuorinProtocol::ChangeReceiverSpeed(DWORD speed, OnAbort on_abort) {
-  return ChangePort([&](int port) { return CChangeBaudRateCmd(port, speed, kCommandFlags); },
-                    on_abort);
+HRESULT CQuorinProtocol::ChangeSpeed(DWORD speed) {
+  return ChangePort([&](int port) { return CChangeBaudRateCmd(port, speed, kCommandFlags); });
 }
 
 HRESULT CQuorinProtocol::DCSetRcvBaudrate(DWORD baud_rate) {
-  return CatchResult([&] { return ChangeReceiverSpeed(baud_rate); });
+  return CatchResult([&] { return ChangeSpeed(baud_rate); });
 }
 
 HRESULT CQuorinProtocol::DCSetRcvRTSControl(BYTE rts) {

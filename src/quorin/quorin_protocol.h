@@ -16,10 +16,9 @@ class CQuorinProtocol : public CAbstractProtocol {
   explicit CQuorinProtocol(std::unique_ptr<CIConnection> connection);
 
   // Whether a Quorin receiver, in whatever state, answers on the connection. The abort event (may
-  // be null) is looked at between the steps and ends the wait for an answer.
+  // be null) is looked at between the steps and ends the wait for an answer, as Cancel does.
   static bool Probe(CIConnection* connection, HANDLE abort_event);
 
-  HRESULT CheckConnection(HANDLE abort_event, short* answer) override;
   HRESULT GetReceiverInfo(HANDLE abort_event, CReceiverInfo* info) override;
   HRESULT GetFiles(CFileList* files) override;
   HRESULT DownloadFile(const wchar_t* name, IStream* stream, CProgressCallback* progress) override;
@@ -40,20 +39,22 @@ class CQuorinProtocol : public CAbstractProtocol {
   virtual HRESULT DownloadOverUSB(IStream* stream, int size, DWORD block_length);
 
  private:
+  bool IsAnswering(HANDLE abort_event) override { return Probe(connection(), abort_event); }
+
   // Asks for the receiver's port and sends it one setting. S_FALSE when it names none, or the
-  // command's failure. An abort that came before the setting was sent raises S_FALSE, or is kept
-  // for later: what puts a speed back is not to be stopped.
-  enum class OnAbort { kStop, kKeep };
+  // command's failure. An abort that came before the setting was sent raises S_FALSE.
   template <typename MakeCommand>
-  HRESULT ChangePort(MakeCommand make_command, OnAbort on_abort = OnAbort::kStop);
-  HRESULT ChangeReceiverSpeed(DWORD speed, OnAbort on_abort = OnAbort::kStop);
+  HRESULT ChangePort(MakeCommand make_command);
+  HRESULT SendPortSetting(QuorinCommands::CQuorinCommand&& command);
+  HRESULT ChangeSpeed(DWORD speed);
 
   void ReadIdentity(CReceiverInfo* info);
 
-  // The three parts of a download.
-  DWORD RaiseSpeed();
+  // The parts of a download.
   HRESULT Transfer(const wchar_t* name, IStream* stream, EInstanceType link);
   void RestoreSpeed(DWORD saved_speed);
+  HRESULT RaiseReceiver(DWORD speed) override { return ChangeSpeed(speed); }
+  void SetReceiverBack(DWORD speed) override;
 
   // The steps of a block transfer; one that gives a result ends it.
   struct Download;
@@ -69,8 +70,6 @@ class CQuorinProtocol : public CAbstractProtocol {
   HRESULT EndTransfer();
   HRESULT EndCancelledDownload(const wchar_t* trace_line);
   HRESULT WriteControl(uint8_t control);
-
-  void ThrowIfAborted();
 
   DWORD download_read_timeout_ms_;
 };

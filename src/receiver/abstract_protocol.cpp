@@ -11,65 +11,52 @@
 
 CAbstractProtocol::CAbstractProtocol(const wchar_t* class_name,
                                      std::unique_ptr<CIConnection> connection)
-    : class_name_(class_name), connection_(std::move(connection)) {}
+    : abort_(connection.get()), class_name_(class_name), connection_(std::move(connection)) {}
+
+HRESULT CAbstractProtocol::CheckConnection(HANDLE abort_event, short* answer) {
+  if (!answer) return E_INVALIDARG;
+  if (!connection()) return kNotConnected;
+  const HRESULT lock_result = LockConnection(abort_event);
+  if (lock_result != S_OK) return lock_result;
+  const HRESULT result = CatchResult([&] {
+    *answer = IsAnswering(abort_event) ? VARIANT_TRUE : VARIANT_FALSE;
+    return S_OK;
+  });
+  // An abort that came during the check ends no wait after it. Its flag stays for the next operation
+  // that looks for it.
+  abort_.ClearCancel();
+  UnlockConnection();
+  return result;
+}
 
 HRESULT CAbstractProtocol::UploadFile(const CFileInfo*, IStream*) { return E_NOTIMPL; }
 
-void CAbstractProtocol::SetCurrentCommand(CReceiverCmd* command) {
-  const std::scoped_lock lock(command_lock_);
-  current_command_ = command;
-}
+void CAbstractProtocol::Abort() { abort_.Abort(); }
 
 HRESULT CAbstractProtocol::ExecuteAsCurrent(CReceiverCmd& command) {
-  // Ends with the scope, also when the command raises a failure.
-  struct CurrentScope {
-    CAbstractProtocol& driver;
-    ~CurrentScope() { driver.SetCurrentCommand(nullptr); }
-  };
-  if (connection()) UseUpCancel();
-  SetCurrentCommand(&command);
-  const CurrentScope scope{*this};
+  const AbortSwitch::CurrentCommand current(abort_, command);
   return command.Execute(connection(), nullptr);
 }
 
-void CAbstractProtocol::Abort() {
-  if (!connection()) return;
-  // One step under the lock: whoever finds the abort finds its cancel signalled already.
-  const std::scoped_lock lock(command_lock_);
-  abort_ = true;
-  if (current_command_) current_command_->Cancel();
-  connection()->Cancel();
+void CAbstractProtocol::ThrowIfAborted() {
+  if (abort_.Take()) throw HResultError(S_FALSE);
 }
 
-bool CAbstractProtocol::TakeAbort() {
-  const std::scoped_lock lock(command_lock_);
-  const bool aborted = std::exchange(abort_, false);
-  if (aborted) cancel_left_over_ = true;
-  return aborted;
-}
-
-bool CAbstractProtocol::IsAborted() {
-  const std::scoped_lock lock(command_lock_);
-  return abort_;
-}
-
-void CAbstractProtocol::UseUpCancel() {
-  const std::scoped_lock lock(command_lock_);
-  // The cancel of a new abort is not for us.
-  if (std::exchange(cancel_left_over_, false) && !abort_) DropCancel();
-}
-
-void CAbstractProtocol::DropCancel() {
-  const std::scoped_lock lock(command_lock_);
-  // A read that finds nothing and does not wait takes the signal if it is still there. The bytes
-  // ahead of it belonged to what was aborted; a receiver that talks on and on is left alone.
-  constexpr int kMaxReads = 64;
-  std::array<BYTE, 512> stray{};
-  for (int i = 0; i < kMaxReads; ++i) {
-    DWORD bytes_read = 0;
-    const HRESULT result = connection()->Read(stray.data(), stray.size(), &bytes_read, 0);
-    if (result != S_OK || bytes_read == 0) return;
+bool CAbstractProtocol::RaiseSpeed(DWORD speed) {
+  const HRESULT receiver_result = RaiseReceiver(kTransferSpeed);
+  if (receiver_result != S_OK) {
+    Trace(L"%s::DownloadFile - receiver speed up is failed [0x%08X]\r\n",
+          class_name_,
+          receiver_result);
+    return false;
   }
+  const HRESULT host_result = connection()->SetSpeed(kTransferSpeed);
+  if (FAILED(host_result)) {
+    Trace(L"%s::DownloadFile - host speed up is failed [0x%08X]\r\n", class_name_, host_result);
+    SetReceiverBack(speed);
+    return false;
+  }
+  return true;
 }
 
 HRESULT CAbstractProtocol::LockConnection(HANDLE abort_event) {

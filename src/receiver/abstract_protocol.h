@@ -1,5 +1,6 @@
-// What the drivers of both families share: the connection they own, its lock, the command that is
-// running, the abort, and the way of progress upward. A driver speaks its family's commands only.
+// What the drivers of both families share: the connection they own, its lock, the abort switch, the
+// way of progress upward, and the operations and steps that are the same in both. A driver speaks
+// its family's commands only.
 #ifndef RCVLINK_RECEIVER_ABSTRACT_PROTOCOL_H_
 #define RCVLINK_RECEIVER_ABSTRACT_PROTOCOL_H_
 
@@ -11,17 +12,22 @@
 #include "commands/receiver_cmd.h"
 #include "platform/critical_section.h"
 #include "platform/mutex.h"
+#include "receiver/abort_switch.h"
 #include "receiver/protocol.h"
 #include "transport/connection.h"
 
 class CAbstractProtocol : public CIProtocol {
  public:
+  HRESULT CheckConnection(HANDLE abort_event, short* answer) override;
   HRESULT UploadFile(const CFileInfo* info, IStream* stream) override;
   void Abort() override;
   HRESULT LockConnection(HANDLE abort_event) override;
   HRESULT UnlockConnection() override;
 
  protected:
+  // The speed of file transfers on a serial port, in bit/s.
+  static constexpr DWORD kTransferSpeed = 115200;
+
   // `class_name` opens the driver's report lines and lives as long as the driver. Raises the
   // HRESULT of the Win32 error when a lock cannot be made.
   CAbstractProtocol(const wchar_t* class_name, std::unique_ptr<CIConnection> connection);
@@ -31,17 +37,13 @@ class CAbstractProtocol : public CIProtocol {
   // Executes a command as the current one, so that Abort reaches it.
   HRESULT ExecuteAsCurrent(CReceiverCmd& command);
 
-  // Whether an abort came; finding it forgets it, so one abort ends one operation.
-  bool TakeAbort();
+  // Takes the abort, if one came, and raises S_FALSE.
+  void ThrowIfAborted();
 
-  // Before commands are sent: takes the cancel of an abort that was found already, if it ended no
-  // wait, or it would end the first wait of what follows. ExecuteAsCurrent does this by itself.
-  void UseUpCancel();
-
-  // Whether an abort came that nobody has taken yet.
-  bool IsAborted();
-  // Takes a cancel that ended no wait, also that of an abort which nobody has taken yet.
-  void DropCancel();
+  // Raises the link from `speed` to kTransferSpeed, the receiver before the host. False: it could
+  // not be raised, which is written to the report, and both ends are at the old speed. Raises
+  // S_FALSE when an abort came before the receiver was told.
+  bool RaiseSpeed(DWORD speed);
 
   // Hands a directory to the host's list, the last tenth of the progress. Raises E_OUTOFMEMORY.
   void AppendEntries(const std::vector<FileEntry>& entries, CFileList& files);
@@ -49,19 +51,21 @@ class CAbstractProtocol : public CIProtocol {
   // A progress report, at most 100.
   void ReportProgress(DWORD percent);
 
+  AbortSwitch abort_;
   CriticalSection callback_lock_;  // guards callback_
   CIProtocolCallback* callback_ = nullptr;
   Mutex connection_lock_;  // held for a whole operation on the receiver
 
  private:
-  void SetCurrentCommand(CReceiverCmd* command);
+  // Whether a receiver of the family answers.
+  virtual bool IsAnswering(HANDLE abort_event) = 0;
+  // The receiver's half of RaiseSpeed. S_OK only when it was told and may have changed its speed.
+  virtual HRESULT RaiseReceiver(DWORD speed) = 0;
+  // Undoes it, for a host that could not follow. No abort that came before disturbs it.
+  virtual void SetReceiverBack(DWORD speed) = 0;
 
   const wchar_t* class_name_;
-  CriticalSection command_lock_;  // guards the three below
-  bool abort_ = false;
-  bool cancel_left_over_ = false;  // an abort was found; its cancel may still be there
-  CReceiverCmd* current_command_ = nullptr;
-  std::unique_ptr<CIConnection> connection_;  // last, so that the link goes first
+  std::unique_ptr<CIConnection> connection_;  // declared last, so that the link is closed first
 };
 
 // The name of a connection for the report, in the thread's ANSI code page; empty when it has none.

@@ -1,7 +1,9 @@
 #include "transport/abstract_connection.h"
 
 #include <array>
+#include <utility>
 
+#include "platform/event.h"
 #include "platform/hresult.h"
 #include "report/report_file.h"
 
@@ -27,7 +29,7 @@ HRESULT CAbstractConnection::Disconnect() {
     device_.Reset();
     Trace(L"CAbstractConnection::Disconnect - disconnected [%s]\r\n", name_.get());
   }
-  if (cancel_event_) ResetEvent(cancel_event_.get());
+  ClearCancel();
   return S_OK;
 }
 
@@ -45,7 +47,7 @@ HRESULT CAbstractConnection::Read(void* buffer, DWORD size, DWORD* bytes_read, D
     return HResultFromError(error);
   }
 
-  const HRESULT result = WaitForTransfer(handle, block, timeout_ms);
+  const HRESULT result = WaitForTransfer(handle, block, timeout_ms, wait_rule_.watched);
   if (result == kTimedOut) {
     Trace(L"CAbstractConnection::Read - wait timeout [%s]\r\n", name_.get());
   }
@@ -75,7 +77,8 @@ HRESULT CAbstractConnection::Write(const void* buffer, DWORD size, DWORD timeout
   }
 
   if (timeout_ms != 0) {
-    const HRESULT result = WaitForTransfer(handle, block, timeout_ms);
+    // Half a line would stand in front of the next command, so no watched event cuts it.
+    const HRESULT result = WaitForTransfer(handle, block, timeout_ms, nullptr);
     if (result == kTimedOut) {
       Trace(L"CAbstractConnection::Write - wait timeout [0x%08X] [%s]\r\n", result, name_.get());
     }
@@ -93,17 +96,23 @@ HRESULT CAbstractConnection::Write(const void* buffer, DWORD size, DWORD timeout
   return S_OK;
 }
 
-HRESULT CAbstractConnection::WaitForTransfer(HANDLE handle, OVERLAPPED& block, DWORD timeout_ms) {
-  // The abort comes first, so it wins when both are signalled.
-  const std::array<HANDLE, 2> events = {GetAbortEvent(), block.hEvent};
-  const DWORD ended =
-      calls_.WaitForMultipleObjects(static_cast<DWORD>(events.size()), events.data(), timeout_ms);
-  if (ended == WAIT_OBJECT_0 + 1) return S_OK;
+HRESULT CAbstractConnection::WaitForTransfer(HANDLE handle,
+                                             OVERLAPPED& block,
+                                             DWORD timeout_ms,
+                                             HANDLE watched) {
+  // What ends the wait early comes first, so it wins when the transfer is done too.
+  std::array<HANDLE, 3> events{};
+  DWORD done = 0;
+  if (!wait_rule_.shielded) events[done++] = GetAbortEvent();
+  if (watched) events[done++] = watched;
+  events[done] = block.hEvent;
+  const DWORD ended = calls_.WaitForMultipleObjects(done + 1, events.data(), timeout_ms);
+  if (ended == WAIT_OBJECT_0 + done) return S_OK;
 
   HRESULT result = S_FALSE;
   if (ended == WAIT_TIMEOUT) {
     result = kTimedOut;
-  } else if (ended != WAIT_OBJECT_0) {
+  } else if (ended > WAIT_OBJECT_0 + done) {
     result = HResultFromError(GetLastError());
   }
   CancelTransfer(handle, block);
@@ -135,6 +144,19 @@ HRESULT CAbstractConnection::GetName(BSTR* name) {
 }
 
 void CAbstractConnection::SetAbortEvent(HANDLE event) { abort_event_ = event; }
+
+void CAbstractConnection::ClearCancel() {
+  if (cancel_event_) ResetEvent(cancel_event_.get());
+}
+
+WaitRule CAbstractConnection::ExchangeWaitRule(const WaitRule& rule) {
+  return std::exchange(wait_rule_, rule);
+}
+
+bool CAbstractConnection::IsCancelPending() const {
+  // Looking at an auto-reset event clears it.
+  return IsSignalled(cancel_event_.get()) && SetEvent(cancel_event_.get());
+}
 
 HANDLE CAbstractConnection::GetWriteHandle() { return device_.get(); }
 

@@ -20,6 +20,8 @@ class CAbstractConnection : public CIConnection {
   void Cancel() override;
   HRESULT GetName(BSTR* name) override;
   void SetAbortEvent(HANDLE event) override;
+  void ClearCancel() override;
+  WaitRule ExchangeWaitRule(const WaitRule& rule) override;
 
   // The handles that Write writes to and Read reads from.
   virtual HANDLE GetWriteHandle();
@@ -33,20 +35,25 @@ class CAbstractConnection : public CIConnection {
   // Makes the events that do not exist yet; they outlive re-opening. S_OK or the Win32 error.
   HRESULT CreateEvents();
 
+  // Whether a Cancel has not ended a wait yet; it still will.
+  bool IsCancelPending() const;
+
   DeviceCalls& calls_;
   FileHandle device_;
   UniqueBstr name_;
 
  private:
-  // Waits for a pending transfer. Whatever ends the wait, the transfer is over when this returns,
-  // so its block and buffer may go. S_OK only when its own event ended the wait.
-  HRESULT WaitForTransfer(HANDLE handle, OVERLAPPED& block, DWORD timeout_ms);
+  // Waits for a pending transfer; `watched` (may be null) ends the wait as well. Whatever ends it,
+  // the transfer is over when this returns, so its block and buffer may go. S_OK only when its own
+  // event ended the wait.
+  HRESULT WaitForTransfer(HANDLE handle, OVERLAPPED& block, DWORD timeout_ms, HANDLE watched);
   void CancelTransfer(HANDLE handle, OVERLAPPED& block);
 
   KernelHandle write_event_;      // auto-reset
   KernelHandle read_event_;       // manual-reset
   KernelHandle cancel_event_;     // auto-reset: one Cancel ends one wait
   HANDLE abort_event_ = nullptr;  // the caller's
+  WaitRule wait_rule_;
 };
 
 #endif  // RCVLINK_TRANSPORT_ABSTRACT_CONNECTION_H_

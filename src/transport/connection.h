@@ -7,17 +7,23 @@
 
 #include <wtypes.h>
 
-// All operations but Cancel belong to the one thread that drives the receiver; Cancel may come from
-// any. The order of the operations is fixed.
+// What ends a wait of Read or Write early.
+struct WaitRule {
+  bool shielded = false;     // not Cancel nor the abort event, which are kept for a later wait
+  HANDLE watched = nullptr;  // this event of the caller's ends a Read too
+};
+
+// All operations but Cancel and ClearCancel belong to the one thread that drives the receiver; these
+// two may come from any. The order of the operations is fixed; the last two are the library's own.
 class CIConnection {
  public:
   virtual ~CIConnection() = default;
 
-  // Closes the link and forgets a cancel that nobody waited for. S_OK always.
+  // Closes the link and clears a Cancel that has not ended a wait. S_OK always.
   virtual HRESULT Disconnect() = 0;
 
   // Reads up to `size` bytes. S_OK: *bytes_read of them arrived (0 is possible); S_FALSE: ended by
-  // Cancel or the abort event; 0x800705B4: nothing came in `timeout_ms`; 0x8007048F: never opened;
+  // Cancel or an event; 0x800705B4: nothing came in `timeout_ms`; 0x8007048F: never opened;
   // else the device's error.
   virtual HRESULT Read(void* buffer, DWORD size, DWORD* bytes_read, DWORD timeout_ms) = 0;
 
@@ -40,11 +46,17 @@ class CIConnection {
   // The link's speed in bits per second; S_FALSE and 0 for a link that has none.
   virtual HRESULT GetSpeed(DWORD* speed) = 0;
 
-  // An event of the caller's that Read and Write watch instead of Cancel; null removes it.
+  // An event of the caller's that ends Read and Write instead of Cancel; null removes it.
   virtual void SetAbortEvent(HANDLE event) = 0;
 
   // S_FALSE when there was nothing to change.
   virtual HRESULT SetSpeed(DWORD speed) = 0;
+
+  // Clears a Cancel that has not ended a wait yet.
+  virtual void ClearCancel() = 0;
+
+  // Puts a rule in force for the waits that follow, and gives the one before it.
+  virtual WaitRule ExchangeWaitRule(const WaitRule& rule) = 0;
 };
 
 #endif  // RCVLINK_TRANSPORT_CONNECTION_H_

@@ -6,6 +6,7 @@
 #include "platform/hresult.h"
 #include "report/report_file.h"
 #include "transport/usbio.h"
+#include "transport/wait_scope.h"
 
 namespace {
 
@@ -137,11 +138,15 @@ HRESULT CUSBConnection::Write(const void* buffer, DWORD size, DWORD timeout_ms) 
 
 HRESULT CUSBConnection::Flush() {
   Trace(L"CUSBConnection::Flush\r\n");
-  for (;;) {
+  // These reads do not wait. A cancel is meant for the wait of the command that follows: it ends the
+  // flush, and is kept for that.
+  const WaitScope shield = WaitScope::Shielded(this);
+  while (!IsCancelPending()) {
     uint8_t waiting = 0;
     DWORD count = 0;
-    if (Read(&waiting, sizeof(waiting), &count, 0) != S_OK || count != sizeof(waiting)) return S_OK;
+    if (Read(&waiting, sizeof(waiting), &count, 0) != S_OK || count != sizeof(waiting)) break;
   }
+  return S_OK;
 }
 
 HRESULT CUSBConnection::GetInstanceType(EInstanceType* type) {

@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <new>
+#include <string_view>
 #include <utility>
 
 #include "platform/text.h"
@@ -104,6 +105,7 @@ HRESULT CReadFileCmd::ParseReply(const char* bytes,
                                  uint32_t length,
                                  bool* done,
                                  uint32_t* consumed) {
+  has_begun_ = !std::string_view(bytes, length).starts_with(kRefusal);
   // The prompt is consumed with the first byte behind it: a first log that comes in pieces stands
   // alone from its second piece on.
   const bool at_log = length != 0 && static_cast<uint8_t>(bytes[0]) == BinaryHeader::kSync;

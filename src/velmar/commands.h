@@ -87,12 +87,15 @@ class CReadFileCmd : public CLogCommand {
   CReadFileCmd(CReadFileCmdCallback* callback, void* context);
   HRESULT ParseReply(const char* bytes, uint32_t length, bool* done, uint32_t* consumed) override;
   HRESULT ParseLogBody(const char* bytes, uint32_t length, bool* done, uint32_t* consumed) override;
+  // Whether the receiver may have begun to send the file: it answered, and did not refuse.
+  bool HasBegun() const { return has_begun_; }
   const uint8_t* GetData() const { return chunk_.get(); }  // null before the first
   uint32_t GetDataSize() const { return chunk_length_; }
 
  private:
   CReadFileCmdCallback* callback_;
   void* context_;
+  bool has_begun_ = false;
   std::unique_ptr<uint8_t[]> chunk_;
   uint32_t chunk_length_ = 0;
 };

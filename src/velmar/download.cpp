@@ -9,7 +9,6 @@
 #include "platform/hresult.h"
 #include "platform/text.h"
 #include "report/report_file.h"
-#include "transport/abort_shield.h"
 #include "velmar/velmar_protocol.h"
 
 #include <objidl.h>
@@ -17,8 +16,6 @@
 using namespace VelmarCommands;
 
 namespace {
-
-constexpr DWORD kTransferSpeed = 115200;
 
 struct StreamDeleter {
   void operator()(IStream* stream) const { stream->Release(); }
@@ -43,7 +40,6 @@ uint8_t Percent(uint32_t total, uint32_t remaining) {
 // second. A reply that came in pieces is kept with its beginning repeated, and stands whole at its
 // end.
 bool IsRefusal(const CVelmarCommand& command) {
-  constexpr std::string_view kRefusal = "\r\n<ERROR:";
   const uint8_t* const reply = command.GetReply();
   if (!reply) return false;
   return !std::ranges::search(std::span(reply, command.GetReplyLength()), kRefusal).empty();
@@ -68,8 +64,9 @@ HRESULT CVelmarProtocol::DownloadFile(const wchar_t* name, IStream* stream, CPro
           connection_lock_.handle());
     ReportProgress(0);
     const HRESULT result = CatchResult([&] { return DownloadLocked(name, stream); });
-    // An abort of this download ends no wait of the next operation; its flag stays for it.
-    if (IsAborted()) DropCancel();
+    // An abort that came during the download ends no wait after it. Its flag stays for the next
+    // operation that looks for it.
+    abort_.ClearCancel();
     return result;
   });
 }
@@ -77,65 +74,73 @@ HRESULT CVelmarProtocol::DownloadFile(const wchar_t* name, IStream* stream, CPro
 HRESULT CVelmarProtocol::DownloadLocked(const wchar_t* name, IStream* stream) {
   EInstanceType link = eInstanceAny;
   ThrowIfFailed(connection()->GetInstanceType(&link));
-  const DWORD saved_speed = link == eInstanceSerial ? RaiseSpeed() : 0;
+  DWORD saved_speed = 0;
+  if (link == eInstanceSerial) {
+    DWORD speed = 0;
+    ThrowIfFailed(connection()->GetSpeed(&speed));
+    const bool is_slow = static_cast<int32_t>(speed) < static_cast<int32_t>(kTransferSpeed);
+    if (is_slow && RaiseSpeed(speed)) saved_speed = speed;
+  }
   bool is_sending = false;
   const HRESULT result = CatchResult([&] { return Transfer(name, stream, &is_sending); });
+
+  // The abort that ended the transfer does not disturb what puts the link in order. One that comes
+  // while that waits ends all its waits; what has to be sent is sent all the same.
+  abort_.ClearCancel();
+  bool is_aborted = false;
+  if (is_sending) {
+    CUnlogAllCommand stop_sending;
+    is_aborted = ExecuteCommand(stop_sending) == S_FALSE;
+  }
   if (saved_speed == 0 || saved_speed >= kTransferSpeed) return result;
   // What the put-back gives replaces what the transfer gave.
-  return RestoreSpeed(saved_speed, result == S_OK && !is_sending);
+  return RestoreSpeed(saved_speed, is_aborted);
 }
 
-// Raises the receiver, then the host. Gives the speed to go back to, 0 when nothing was raised: the
-// transfer then runs at the old speed. An abort ahead of the change raises S_FALSE.
-DWORD CVelmarProtocol::RaiseSpeed() {
-  DWORD speed = 0;
-  ThrowIfFailed(connection()->GetSpeed(&speed));
-  if (static_cast<int32_t>(speed) >= static_cast<int32_t>(kTransferSpeed)) return 0;
-
-  bool changed = false;
-  const HRESULT raised = ChangeReceiverSpeed(kTransferSpeed, OnAbort::kEnd, &changed);
-  if (raised == S_FALSE) throw HResultError(S_FALSE);
-  // A receiver that refused, or did not say on which port it is, was not raised: raising the host
-  // would cut the link.
-  if (!changed) {
-    const HRESULT failure = FAILED(raised) ? raised : S_FALSE;
-    Trace(L"CVelmarProtocol::DownloadFile - receiver speed up is failed [0x%08X]\r\n", failure);
-    return 0;
-  }
-  const HRESULT followed = connection()->SetSpeed(kTransferSpeed);
-  if (FAILED(followed)) {
-    Trace(L"CVelmarProtocol::DownloadFile - host speed up is failed [0x%08X]\r\n", followed);
-    ChangeReceiverSpeed(speed, OnAbort::kKeep, &changed);
-    return 0;
-  }
-  return speed;
+HRESULT CVelmarProtocol::RaiseReceiver(DWORD speed) {
+  CLogConfigCommand get_config;
+  const HRESULT question_result = ExecuteCommand(get_config);
+  if (question_result == S_FALSE) throw HResultError(S_FALSE);
+  if (FAILED(question_result)) return question_result;
+  raised_port_ = get_config.Config();
+  // A receiver that did not tell its port is not raised: raising the host alone would cut the link.
+  if (raised_port_.port_name.empty()) return S_FALSE;
+  PortConfigLog settings = raised_port_;
+  settings.baud = static_cast<int>(speed);
+  CSetPortParamsCmd set_port(settings);
+  const HRESULT result = ExecuteUnstopped(set_port);
+  return result == S_OK && IsRefusal(set_port) ? S_FALSE : result;
 }
 
-HRESULT CVelmarProtocol::RestoreSpeed(DWORD saved_speed, bool transfer_ended) {
-  if (!transfer_ended) {
-    // A receiver that still sends the file would answer the put-back behind it.
-    CUnlogAllCommand stop_sending;
-    ExecuteUndisturbed(stop_sending);
-  }
-  bool changed = false;
-  const HRESULT result = ChangeReceiverSpeed(saved_speed, OnAbort::kKeep, &changed);
-  return FAILED(result) ? result : connection()->SetSpeed(saved_speed);
+void CVelmarProtocol::SetReceiverBack(DWORD speed) {
+  abort_.ClearCancel();
+  TellSpeed(speed, /*is_aborted=*/false);
 }
 
-HRESULT CVelmarProtocol::ChangeReceiverSpeed(DWORD speed, OnAbort on_abort, bool* changed) {
-  *changed = false;
-  return CatchResult([&] {
+HRESULT CVelmarProtocol::RestoreSpeed(DWORD speed, bool is_aborted) {
+  const HRESULT result = TellSpeed(speed, is_aborted);
+  return FAILED(result) ? result : connection()->SetSpeed(speed);
+}
+
+// Sends the receiver its port's settings with this speed. After an abort it is not asked what they
+// are (they are those of before), and its answer is not waited for.
+HRESULT CVelmarProtocol::TellSpeed(DWORD speed, bool is_aborted) {
+  PortConfigLog settings = raised_port_;
+  if (!is_aborted) {
     CLogConfigCommand get_config;
-    const HRESULT asked =
-        on_abort == OnAbort::kEnd ? ExecuteCommand(get_config) : ExecuteUndisturbed(get_config);
-    PortConfigLog settings = get_config.Config();
-    if (asked != S_OK || settings.port_name.empty()) return asked;
-    settings.baud = static_cast<int>(speed);
-    CSetPortParamsCmd set_port(settings);
-    const HRESULT result = ExecuteUndisturbed(set_port);
-    *changed = result == S_OK && !IsRefusal(set_port);
-    return result;
-  });
+    const HRESULT result = ExecuteCommand(get_config);
+    if (FAILED(result)) return result;
+    is_aborted = result == S_FALSE;
+    if (!is_aborted) settings = get_config.Config();
+  }
+  if (settings.port_name.empty()) return S_OK;
+  settings.baud = static_cast<int>(speed);
+  CSetPortParamsCmd set_port(settings);
+  if (is_aborted) set_port.SetFlags(kSendOnly);
+  const HRESULT result = ExecuteCommand(set_port);
+  // The line must have left before the host changes its own speed; an answer would have shown that.
+  if (is_aborted || result == S_FALSE) connection()->Flush();
+  return result;
 }
 
 HRESULT CVelmarProtocol::Transfer(const wchar_t* name, IStream* stream, bool* is_sending) {
@@ -156,10 +161,11 @@ HRESULT CVelmarProtocol::Transfer(const wchar_t* name, IStream* stream, bool* is
                               .last_percent = 0};
       CReadFileCmd read_file(this, &context);
       context.read_command = &read_file;
-      *is_sending = true;
       result = ExecuteCommand(read_file);
+      // An aborted command went out whole, and the file comes although nothing has come yet.
+      const bool has_begun = read_file.HasBegun() || result == S_FALSE;
+      *is_sending = has_begun && read_file.Response() != RESPONSE_DATA;
       ThrowIfFailed(result);
-      *is_sending = read_file.Response() != RESPONSE_DATA;
     }
   }
   // Also for a file that the receiver does not know: the stream stays empty, and that is no

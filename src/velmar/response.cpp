@@ -5,7 +5,6 @@ namespace {
 
 constexpr std::string_view kOpening = "\r\n<";
 constexpr std::string_view kOk = "\r\n<OK\r\n";
-constexpr std::string_view kError = "\r\n<ERROR:";
 constexpr size_t kEnoughForOk = 8;
 constexpr size_t kEnoughForError = 10;
 
@@ -29,7 +28,7 @@ Response RecogniseResponse(std::string_view bytes) {
   if (bytes.size() < kEnoughForOk) return {RESPONSE_INCOMPLETE};
   if (bytes.starts_with(kOk)) return WithPrompt(bytes, RESPONSE_OK, kOk.size());
   if (bytes.size() < kEnoughForError) return {RESPONSE_INCOMPLETE};
-  if (bytes.starts_with(kError)) return WithPrompt(bytes, RESPONSE_ERROR, kError.size());
+  if (bytes.starts_with(kRefusal)) return WithPrompt(bytes, RESPONSE_ERROR, kRefusal.size());
   return {RESPONSE_UNKNOWN};
 }
 

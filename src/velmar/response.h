@@ -20,6 +20,9 @@ enum ResponseType : int32_t {
   RESPONSE_UNKNOWN = 4
 };
 
+// How a refusal begins.
+inline constexpr std::string_view kRefusal = "\r\n<ERROR:";
+
 struct Response {
   ResponseType type = RESPONSE_UNKNOWN;
   // Where the prompt ends; 0 while it has not ended (or never will, by the type).

@@ -22,15 +22,17 @@ constexpr std::string_view kLineEnd = "\r\n";
 }  // namespace
 
 CVelmarCommand::CVelmarCommand(const char* text, uint32_t flags)
-    : CReceiverCmd(text, flags, kWriteTimeoutMs, kReadTimeoutMs) {}
+    : CReceiverCmd(text, flags, kWriteTimeoutMs, kReadTimeoutMs) {
+  // These receivers act on a command although an abort came before it, and half a line would stand
+  // in front of the next command.
+  SendWhole();
+}
 
 HRESULT CVelmarCommand::Execute(CIConnection* connection, HANDLE abort_event) {
   if (!connection) return E_INVALIDARG;
   if (IsCancelled(abort_event)) return S_FALSE;
   if (const HRESULT result = connection->Flush(); FAILED(result)) return result;
-  // A write that was aborted (S_FALSE) ends the command as much as one that failed.
-  if (const HRESULT result = connection->Write(GetCommand(), GetCommandLength(), GetWriteTimeout());
-      result != S_OK) {
+  if (const HRESULT result = Send(connection, GetCommand(), GetCommandLength()); FAILED(result)) {
     return result;
   }
   if (GetFlags() & kAppendCrc) {
@@ -39,8 +41,8 @@ HRESULT CVelmarCommand::Execute(CIConnection* connection, HANDLE abort_event) {
                                           static_cast<uint8_t>(crc >> 8),
                                           static_cast<uint8_t>(crc >> 16),
                                           static_cast<uint8_t>(crc >> 24)};
-    const HRESULT result = connection->Write(bytes.data(), sizeof(bytes), GetWriteTimeout());
-    if (result != S_OK) return result;
+    const HRESULT result = Send(connection, bytes.data(), sizeof(bytes));
+    if (FAILED(result)) return result;
   }
   if (GetFlags() & kSendOnly) return S_OK;
   if (IsCancelled(abort_event)) return S_FALSE;
@@ -88,21 +90,21 @@ HRESULT CVelmarCommand::ReceiveReply(CIConnection* connection, HANDLE abort_even
   while (!done) {
     if (need_data) {
       DWORD count = 0;
-      const HRESULT read = receiving.Read(connection, GetReadTimeout(), &count);
-      if (FAILED(read)) {
-        Trace(L"CVelmarCommand::Execute - read failed [0x%08X]\r\n", read);
-        if (read != kTimedOut) return read;
+      const HRESULT read_result = receiving.Read(connection, GetReadTimeout(), &count);
+      if (FAILED(read_result)) {
+        Trace(L"CVelmarCommand::Execute - read failed [0x%08X]\r\n", read_result);
+        if (read_result != kTimedOut) return read_result;
       }
-      // The cancel may have come ahead of this command and ended its wait all the same.
-      if (read == S_FALSE || IsCancelled(abort_event)) return S_FALSE;
+      // An abort that came before this command ends its wait too.
+      if (read_result == S_FALSE || IsCancelled(abort_event)) return S_FALSE;
       if (count == 0) break;
       if (keep_reply && !receiving.Keep(count)) return E_OUTOFMEMORY;
       receiving.Hold(count);
-      if (read == kTimedOut) break;
+      if (read_result == kTimedOut) break;
     }
     uint32_t consumed = 0;
-    const HRESULT parsed = ParseReply(receiving.bytes(), receiving.held(), &done, &consumed);
-    if (FAILED(parsed)) return parsed;
+    const HRESULT parse_result = ParseReply(receiving.bytes(), receiving.held(), &done, &consumed);
+    if (FAILED(parse_result)) return parse_result;
     if (response_ == RESPONSE_UNKNOWN) {
       Trace(L"CVelmarCommand::Execute - unknown response type\r\n");
       break;

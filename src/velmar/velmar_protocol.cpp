@@ -4,11 +4,12 @@
 #include <string>
 #include <utility>
 
+#include "platform/clock.h"
 #include "platform/event.h"
 #include "platform/hresult.h"
 #include "platform/text.h"
 #include "report/report_file.h"
-#include "transport/abort_shield.h"
+#include "transport/wait_scope.h"
 
 using namespace VelmarCommands;
 
@@ -36,46 +37,50 @@ CVelmarProtocol::CVelmarProtocol(std::unique_ptr<CIConnection> connection)
     : CAbstractProtocol(L"CVelmarProtocol", std::move(connection)) {}
 
 HRESULT CVelmarProtocol::ExecuteCommand(CVelmarCommand& command) {
+  AwaitLateAnswer();
   const HRESULT result = ExecuteAsCurrent(command);
+  if (result == S_FALSE) cut_off_at_ = CurrentClock().Ticks();
   DumpInvalidResponse(result, connection(), command);
   return result;
 }
 
-HRESULT CVelmarProtocol::ExecuteUndisturbed(CVelmarCommand& command) {
-  const AbortShield shield(connection());
+HRESULT CVelmarProtocol::ExecuteUnstopped(CVelmarCommand& command) {
+  const WaitScope shield = WaitScope::Shielded(connection());
   const HRESULT result = command.Execute(connection(), nullptr);
   DumpInvalidResponse(result, connection(), command);
   return result;
 }
 
+void CVelmarProtocol::AwaitLateAnswer() {
+  constexpr DWORD kLatestAnswerMs = 500;
+  if (!cut_off_at_) return;
+  const DWORD passed = CurrentClock().Ticks() - *std::exchange(cut_off_at_, std::nullopt);
+  if (passed < kLatestAnswerMs) CurrentClock().Pause(kLatestAnswerMs - passed);
+}
+
+bool CVelmarProtocol::IsAnswering(HANDLE abort_event) {
+  AwaitLateAnswer();
+  const bool is_answering = Probe(connection(), abort_event);
+  if (!is_answering) cut_off_at_ = CurrentClock().Ticks();
+  return is_answering;
+}
+
 bool CVelmarProtocol::Probe(CIConnection* connection, HANDLE abort_event) {
   if (!connection) return false;
-  const AbortWatch watch(connection, abort_event);
+  const WaitScope watching = WaitScope::Watching(connection, abort_event);
   const auto run = [&](CVelmarCommand& command) {
     const HRESULT result = command.Execute(connection, abort_event);
     DumpInvalidResponse(result, connection, command);
-    return SUCCEEDED(result);
+    return result == S_OK;
   };
-  const HRESULT answered = CatchResult([&] {
+  const HRESULT result = CatchResult([&] {
     CSetInterfacemodeCommand interface_mode;
     if (!run(interface_mode) || IsSignalled(abort_event)) return S_FALSE;
     CUnlogAllCommand unlog_all;
     if (!run(unlog_all)) return S_FALSE;
     return unlog_all.Response() == RESPONSE_OK ? S_OK : S_FALSE;
   });
-  return answered == S_OK;
-}
-
-HRESULT CVelmarProtocol::CheckConnection(HANDLE abort_event, short* answer) {
-  if (!answer) return E_INVALIDARG;
-  if (!connection()) return kNotConnected;
-  if (const HRESULT locked = LockConnection(abort_event); locked < 0 || locked == S_FALSE) {
-    return locked;
-  }
-  DropEarlierCancel();
-  *answer = Probe(connection(), abort_event) ? VARIANT_TRUE : VARIANT_FALSE;
-  UnlockConnection();
-  return S_OK;
+  return result == S_OK;
 }
 
 HRESULT CVelmarProtocol::GetReceiverInfo(HANDLE abort_event, CReceiverInfo* info) {
@@ -97,10 +102,9 @@ HRESULT CVelmarProtocol::GetReceiverInfo(HANDLE abort_event, CReceiverInfo* info
 }
 
 void CVelmarProtocol::ReadIdentity(HANDLE abort_event, CReceiverInfo* info) {
-  const HRESULT locked = LockConnection(abort_event);
-  if (locked < 0 || locked == S_FALSE) throw HResultError(locked);
+  const HRESULT lock_result = LockConnection(abort_event);
+  if (lock_result != S_OK) throw HResultError(lock_result);
   ReportProgress(0);
-  DropEarlierCancel();
   CGetReceiverInfoCmd get_info;
   ThrowIfFailed(ExecuteCommand(get_info));
   ThrowIfAborted();
@@ -120,7 +124,6 @@ HRESULT CVelmarProtocol::GetFiles(CFileList* files) {
   return CatchResult([&] {
     const MutexGuard guard(connection_lock_);
     ReportProgress(0);
-    DropEarlierCancel();
     CGetFileListCmd get_list;
     ThrowIfFailed(ExecuteCommand(get_list));
     ThrowIfAborted();
@@ -136,7 +139,6 @@ HRESULT CVelmarProtocol::ChangeFile(MakeCommand make_command) {
   return CatchResult([&] {
     const MutexGuard guard(connection_lock_);
     ReportProgress(0);
-    DropEarlierCancel();
     auto command = make_command();
     ThrowIfFailed(ExecuteCommand(command));
     ThrowIfAborted();
@@ -162,23 +164,11 @@ void CVelmarProtocol::SetCallback(CIProtocolCallback* callback) {
   callback_ = callback;
 }
 
-// An abort between operations does not keep the next one's command from being sent: its flag is
-// found afterwards.
-void CVelmarProtocol::DropEarlierCancel() {
-  UseUpCancel();
-  if (IsAborted()) DropCancel();
-}
-
-void CVelmarProtocol::ThrowIfAborted() {
-  if (TakeAbort()) throw HResultError(S_FALSE);
-}
-
 template <typename Change>
 HRESULT CVelmarProtocol::ChangePort(Change change) {
   if (!connection()) return kNotConnected;
   return CatchResult([&] {
     const MutexGuard guard(connection_lock_);
-    DropEarlierCancel();
     CLogConfigCommand get_config;
     ThrowIfFailed(ExecuteCommand(get_config));
     ThrowIfAborted();

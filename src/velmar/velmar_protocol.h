@@ -4,6 +4,7 @@
 #define RCVLINK_VELMAR_VELMAR_PROTOCOL_H_
 
 #include <memory>
+#include <optional>
 
 #include "receiver/abstract_protocol.h"
 #include "velmar/commands.h"
@@ -13,10 +14,9 @@ class CVelmarProtocol : public CAbstractProtocol, public VelmarCommands::CReadFi
   explicit CVelmarProtocol(std::unique_ptr<CIConnection> connection);
 
   // Whether a Velmar receiver answers on the connection. The abort event (may be null) is looked at
-  // between the steps and ends the wait for an answer.
+  // between the steps and ends the wait for an answer, as Cancel does.
   static bool Probe(CIConnection* connection, HANDLE abort_event);
 
-  HRESULT CheckConnection(HANDLE abort_event, short* answer) override;
   HRESULT GetReceiverInfo(HANDLE abort_event, CReceiverInfo* info) override;
   HRESULT GetFiles(CFileList* files) override;
   HRESULT DownloadFile(const wchar_t* name, IStream* stream, CProgressCallback* progress) override;
@@ -36,6 +36,15 @@ class CVelmarProtocol : public CAbstractProtocol, public VelmarCommands::CReadFi
  private:
   struct TransferContext;
 
+  bool IsAnswering(HANDLE abort_event) override;
+
+  // Runs a command that no abort stops, because the host must know what became of it. An abort that
+  // comes meanwhile ends the first wait after it.
+  HRESULT ExecuteUnstopped(VelmarCommands::CVelmarCommand& command);
+
+  // Lets the answer come of a command that was cut off: answers do not tell to which command they
+  // belong, and the next command would take it for its own.
+  void AwaitLateAnswer();
   void ReadIdentity(HANDLE abort_event, CReceiverInfo* info);
   // The pattern of deleting and renaming: one command under the lock, whose answer is not looked
   // at.
@@ -47,23 +56,17 @@ class CVelmarProtocol : public CAbstractProtocol, public VelmarCommands::CReadFi
   template <typename Change>
   HRESULT ChangePort(Change change);
 
-  // The same for a download, which has to know what became of it: `*changed` tells whether the new
-  // speed was sent and not refused (no answer counts as none). The question is cut off by an abort
-  // (S_FALSE) or not, the change itself never is: it would leave the two ends at different speeds.
-  enum class OnAbort { kEnd, kKeep };
-  HRESULT ChangeReceiverSpeed(DWORD speed, OnAbort on_abort, bool* changed);
-  // Runs a command that no abort reaches.
-  HRESULT ExecuteUndisturbed(VelmarCommands::CVelmarCommand& command);
-
-  // A download and its three parts.
+  // A download and its parts.
   HRESULT DownloadLocked(const wchar_t* name, IStream* stream);
-  DWORD RaiseSpeed();
   // `*is_sending` tells whether the receiver may still be sending the file.
   HRESULT Transfer(const wchar_t* name, IStream* stream, bool* is_sending);
-  HRESULT RestoreSpeed(DWORD saved_speed, bool transfer_ended);
+  HRESULT RaiseReceiver(DWORD speed) override;
+  void SetReceiverBack(DWORD speed) override;
+  HRESULT RestoreSpeed(DWORD speed, bool is_aborted);
+  HRESULT TellSpeed(DWORD speed, bool is_aborted);
 
-  void DropEarlierCancel();
-  void ThrowIfAborted();
+  std::optional<DWORD> cut_off_at_;  // when a command's wait was ended by an abort, in ticks
+  VelmarCommands::PortConfigLog raised_port_;  // the receiver's port before its speed was raised
 };
 
 #endif  // RCVLINK_VELMAR_VELMAR_PROTOCOL_H_

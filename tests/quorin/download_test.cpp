@@ -277,11 +277,11 @@ TEST_F(QuorinDownload, FailsWithTheWayBackRatherThanWithTheTransfer) {
 TEST_F(QuorinDownload, SaysTheOldSpeedWhole) {
   bool shielded = false;
   receiver.on_hear = [&](const std::string& command) {
-    if (command == kPutBack) shielded = connection->abort_event != nullptr;
+    if (command == kPutBack) shielded = connection->wait_rule.shielded;
   };
   Download();
   EXPECT_TRUE(shielded);
-  EXPECT_EQ(connection->abort_event, nullptr);
+  EXPECT_FALSE(connection->wait_rule.shielded);
 }
 
 // Aborts at points of their own; every other point has its sweep.

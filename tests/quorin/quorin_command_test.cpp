@@ -185,27 +185,26 @@ TEST_F(QuorinCommandSentWhole, IsWrittenThoughCancelled) {
   EXPECT_EQ(connection.Writes().back(), "set\r\n");
 }
 
-TEST_F(QuorinCommandSentWhole, IsWrittenBehindAnEventThatNobodySignals) {
+TEST_F(QuorinCommandSentWhole, IsWrittenBehindAShield) {
   std::vector<bool> shielded;
   connection.on_write = [&](std::string_view) {
-    shielded.push_back(connection.abort_event != nullptr &&
-                       WaitForSingleObject(connection.abort_event, 0) == WAIT_TIMEOUT);
+    shielded.push_back(connection.wait_rule.shielded);
     return S_OK;
   };
   CQuorinCommand command("set\r\n", kTagged | kNoReply);
   command.SendWhole();
   command.Execute(&connection, nullptr);
   EXPECT_THAT(shielded, ElementsAre(true, true));
-  EXPECT_EQ(connection.abort_event, nullptr);
+  EXPECT_FALSE(connection.wait_rule.shielded);
 }
 
 TEST_F(QuorinCommandSentWhole, WaitsForItsReplyWithoutTheShield) {
-  HANDLE event_at_read = INVALID_HANDLE_VALUE;
-  connection.Give({S_OK, "RE000", [&] { event_at_read = connection.abort_event; }});
+  bool shielded_at_read = true;
+  connection.Give({S_OK, "RE000", [&] { shielded_at_read = connection.wait_rule.shielded; }});
   CQuorinCommand command("set\r\n", 0);
   command.SendWhole();
   EXPECT_EQ(command.Execute(&connection, nullptr), S_OK);
-  EXPECT_EQ(event_at_read, nullptr);
+  EXPECT_FALSE(shielded_at_read);
 }
 
 TEST_F(QuorinCommandSentWhole, DoesNotWaitForItsReplyOnceCancelled) {
@@ -221,18 +220,18 @@ TEST_F(QuorinCommandSentWhole, LeavesNoShieldBehindAFailedWrite) {
   CQuorinCommand command("set\r\n", kNoReply);
   command.SendWhole();
   EXPECT_EQ(command.Execute(&connection, nullptr), E_HANDLE);
-  EXPECT_EQ(connection.abort_event, nullptr);
+  EXPECT_FALSE(connection.wait_rule.shielded);
 }
 
 TEST_F(QuorinCommandSending, IsNotShieldedOtherwise) {
-  HANDLE event_at_write = INVALID_HANDLE_VALUE;
+  bool shielded_at_write = true;
   connection.on_write = [&](std::string_view) {
-    event_at_write = connection.abort_event;
+    shielded_at_write = connection.wait_rule.shielded;
     return S_OK;
   };
   CQuorinCommand command("dm\r\n", kNoReply);
   command.Execute(&connection, nullptr);
-  EXPECT_EQ(event_at_write, nullptr);
+  EXPECT_FALSE(shielded_at_write);
 }
 
 TEST(QuorinCommandTimeouts, AreThreeSecondsForEachWrite) {

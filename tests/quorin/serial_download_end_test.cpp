@@ -136,14 +136,13 @@ TEST_F(QuorinSerialDownloadEnd, GivesTheFailureOfTheEndAfterAnAbort) {
 TEST_F(QuorinSerialDownloadEnd, SaysTheEndWholeAfterAnAbort) {
   bool shielded = false;
   connection->on_write = [&](std::string_view) {
-    shielded = connection->abort_event != nullptr &&
-               WaitForSingleObject(connection->abort_event, 0) == WAIT_TIMEOUT;
+    shielded = connection->wait_rule.shielded;
     return S_OK;
   };
   driver.Abort();
   Download();
   EXPECT_TRUE(shielded);
-  EXPECT_EQ(connection->abort_event, nullptr);
+  EXPECT_FALSE(connection->wait_rule.shielded);
 }
 
 TEST(QuorinControlBytes, AreEachGivenThreeSeconds) {

@@ -304,8 +304,7 @@ TEST_F(QuorinUsbDownloadEnd, SaysTheEndWhole) {
   std::vector<bool> shielded;
   connection->on_write = [&](std::string_view bytes) {
     if (bytes == "#") {
-      shielded.push_back(connection->abort_event != nullptr &&
-                         WaitForSingleObject(connection->abort_event, 0) == WAIT_TIMEOUT);
+      shielded.push_back(connection->wait_rule.shielded);
     }
     return S_OK;
   };
@@ -318,7 +317,7 @@ TEST_F(QuorinUsbDownloadEnd, SaysTheEndWhole) {
   stream.fail_at_write = 0;
   Download();  // failed
   EXPECT_THAT(shielded, ElementsAre(true, true, true));
-  EXPECT_EQ(connection->abort_event, nullptr);
+  EXPECT_FALSE(connection->wait_rule.shielded);
 }
 
 TEST(QuorinUsbControlBytes, AreEachGivenThreeSeconds) {

@@ -24,8 +24,7 @@ class AbortingConnection : public CIConnection {
                      DWORD host_speed = 9600)
       : inner_(receiver, host_speed), cancelled_write_(cancelled_write) {}
 
-  // The abort comes as the call of this number begins, or as it ends. Reads of no wait are not
-  // counted: they belong to an abort.
+  // The abort comes as the call of this number begins, or as it ends.
   std::function<void()> abort;
   size_t abort_at = SIZE_MAX;
   bool at_end = false;
@@ -34,11 +33,8 @@ class AbortingConnection : public CIConnection {
   HRESULT Disconnect() override { return inner_.Disconnect(); }
   HRESULT Read(void* buffer, DWORD size, DWORD* bytes_read, DWORD timeout_ms) override {
     *bytes_read = 0;
-    const auto read = [&] {
-      if (TakeCancel()) return S_FALSE;
-      return inner_.Read(buffer, size, bytes_read, timeout_ms);
-    };
-    return timeout_ms == 0 ? read() : Call(read);
+    return Call(
+        [&] { return TakeCancel() ? S_FALSE : inner_.Read(buffer, size, bytes_read, timeout_ms); });
   }
   HRESULT Write(const void* buffer, DWORD size, DWORD timeout_ms) override {
     return Call([&] {
@@ -50,8 +46,8 @@ class AbortingConnection : public CIConnection {
     });
   }
   HRESULT Flush() override {
-    // Over USB it reads, and a cancel ends that as it ends any read.
-    return Call([&] { return Speed() == 0 && TakeCancel() ? S_OK : inner_.Flush(); });
+    // Over USB it reads: a cancel ends that, and the wait of the next command as well.
+    return Call([&] { return Speed() == 0 && cancelled_ ? S_OK : inner_.Flush(); });
   }
   void Cancel() override { cancelled_ = true; }
   HRESULT GetInstanceType(EInstanceType* type) override {
@@ -61,10 +57,12 @@ class AbortingConnection : public CIConnection {
   HRESULT GetSpeed(DWORD* speed) override {
     return Call([&] { return inner_.GetSpeed(speed); });
   }
-  void SetAbortEvent(HANDLE event) override { abort_event_ = event; }
+  void SetAbortEvent(HANDLE) override {}
   HRESULT SetSpeed(DWORD speed) override {
     return Call([&] { return inner_.SetSpeed(speed); });
   }
+  void ClearCancel() override { cancelled_ = false; }
+  WaitRule ExchangeWaitRule(const WaitRule& rule) override { return std::exchange(rule_, rule); }
 
   DWORD Speed() {
     DWORD speed = 0;
@@ -81,12 +79,12 @@ class AbortingConnection : public CIConnection {
     if (due && at_end) abort();
     return result;
   }
-  bool TakeCancel() { return !abort_event_ && std::exchange(cancelled_, false); }
+  bool TakeCancel() { return !rule_.shielded && std::exchange(cancelled_, false); }
 
   SimulatedConnection inner_;
   CancelledWrite cancelled_write_;
   bool cancelled_ = false;
-  HANDLE abort_event_ = nullptr;
+  WaitRule rule_;
 };
 
 #endif  // RCVLINK_TESTS_SUPPORT_ABORTING_CONNECTION_H_

@@ -107,7 +107,7 @@ DWORD FakeDevice::WaitForMultipleObjects(DWORD count, const HANDLE* handles, DWO
   wait_timeout = timeout_ms;
   if (on_wait) on_wait(count, handles);
   if (wait_answer == WAIT_FAILED) SetLastError(failure);
-  return wait_answer;
+  return wait_answer == kDone ? WAIT_OBJECT_0 + count - 1 : wait_answer;
 }
 
 BOOL FakeDevice::SetCommMask(HANDLE, DWORD mask) {

@@ -48,8 +48,10 @@ class FakeDevice : public DeviceCalls {
     DWORD size;  // 0 for a call that has none
   };
   std::vector<Transfer> transfer_calls;  // all calls of transfers, with the handle they were for
-  // What the wait gives (its index, WAIT_TIMEOUT, WAIT_FAILED), and runs first.
-  DWORD wait_answer = WAIT_OBJECT_0 + 1;
+  // What the wait gives (its index, WAIT_TIMEOUT, WAIT_FAILED; kDone is the transfer's own event, the
+  // last of the handles), and runs first.
+  static constexpr DWORD kDone = MAXIMUM_WAIT_OBJECTS;
+  DWORD wait_answer = kDone;
   std::function<void(DWORD count, const HANDLE* handles)> on_wait;
   DWORD wait_timeout = 0;
   DWORD overlapped_error = ERROR_SUCCESS;  // of GetOverlappedResult without waiting

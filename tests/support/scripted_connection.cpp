@@ -26,6 +26,7 @@ HRESULT ScriptedConnection::Disconnect() {
 HRESULT ScriptedConnection::Read(void* buffer, DWORD size, DWORD* bytes_read, DWORD timeout_ms) {
   calls.push_back("read " + std::to_string(size) + " " + std::to_string(timeout_ms));
   *bytes_read = 0;
+  if (!wait_rule.shielded && std::exchange(is_cancelled, false)) return S_FALSE;
   if (answers_.empty()) return kTimedOut;
   if (auto before = std::exchange(answers_.front().before, {})) before();
   Answer& answer = answers_.front();
@@ -53,6 +54,7 @@ HRESULT ScriptedConnection::Flush() {
 
 void ScriptedConnection::Cancel() {
   calls.push_back("cancel");
+  is_cancelled = true;
   if (on_cancel) on_cancel();
 }
 
@@ -71,8 +73,6 @@ HRESULT ScriptedConnection::GetSpeed(DWORD* out) {
   *out = speed;
   return speed_result;
 }
-
-void ScriptedConnection::SetAbortEvent(HANDLE event) { abort_event = event; }
 
 HRESULT ScriptedConnection::SetSpeed(DWORD rate) {
   calls.push_back("speed " + std::to_string(rate));

@@ -1,5 +1,6 @@
 // A connection whose other end is a script: it records every call in order and answers reads from a
-// queue. Nothing waits: a read that finds the queue empty times out at once.
+// queue. Nothing waits: a read that finds the queue empty times out at once. A Cancel ends the next
+// read; one that comes during a read comes as its bytes do, and is too late for it.
 #ifndef RCVLINK_TESTS_SUPPORT_SCRIPTED_CONNECTION_H_
 #define RCVLINK_TESTS_SUPPORT_SCRIPTED_CONNECTION_H_
 
@@ -7,6 +8,7 @@
 #include <functional>
 #include <string>
 #include <string_view>
+#include <utility>
 #include <vector>
 
 #include "platform/api_types.h"
@@ -45,7 +47,8 @@ class ScriptedConnection : public CIConnection {
   std::vector<std::string> Writes() const;  // the bytes of each write
   std::string Written() const;              // all of them
   std::vector<DWORD> write_timeouts;        // of each write
-  HANDLE abort_event = nullptr;
+  WaitRule wait_rule;                       // the one in force
+  bool is_cancelled = false;                // a Cancel has not ended a read yet
   size_t AnswersLeft() const { return answers_.size(); }
 
   ~ScriptedConnection() override;
@@ -57,8 +60,12 @@ class ScriptedConnection : public CIConnection {
   HRESULT GetInstanceType(EInstanceType* type) override;
   HRESULT GetName(BSTR* name) override;
   HRESULT GetSpeed(DWORD* speed) override;
-  void SetAbortEvent(HANDLE event) override;
+  void SetAbortEvent(HANDLE) override {}
   HRESULT SetSpeed(DWORD speed) override;
+  void ClearCancel() override { is_cancelled = false; }
+  WaitRule ExchangeWaitRule(const WaitRule& rule) override {
+    return std::exchange(wait_rule, rule);
+  }
 
  private:
   std::deque<Answer> answers_;

@@ -10,7 +10,7 @@ HRESULT SimulatedConnection::Read(void* buffer, DWORD size, DWORD* bytes_read, D
   constexpr uint64_t kQuietMs = 1000;
   *bytes_read = 0;
   if (before_read) before_read();
-  if (!abort_event_ && std::exchange(cancelled_, false)) return S_FALSE;
+  if (!rule_.shielded && std::exchange(cancelled_, false)) return S_FALSE;
   auto* const out = static_cast<uint8_t*>(buffer);
   while (*bytes_read < size) {
     const uint64_t wait = *bytes_read == 0 ? timeout_ms : std::min<uint64_t>(kQuietMs, timeout_ms);

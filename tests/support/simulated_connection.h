@@ -3,6 +3,7 @@
 #define RCVLINK_TESTS_SUPPORT_SIMULATED_CONNECTION_H_
 
 #include <functional>
+#include <utility>
 
 #include "platform/api_types.h"
 #include "simulator/ports/memory.h"
@@ -29,8 +30,10 @@ class SimulatedConnection : public CIConnection {
   HRESULT GetInstanceType(EInstanceType* type) override;
   HRESULT GetName(BSTR* name) override;
   HRESULT GetSpeed(DWORD* speed) override;
-  void SetAbortEvent(HANDLE event) override { abort_event_ = event; }
+  void SetAbortEvent(HANDLE) override {}
   HRESULT SetSpeed(DWORD speed) override;
+  void ClearCancel() override { cancelled_ = false; }
+  WaitRule ExchangeWaitRule(const WaitRule& rule) override { return std::exchange(rule_, rule); }
 
  private:
   bool IsUsb() const { return speed_ == 0; }
@@ -38,7 +41,7 @@ class SimulatedConnection : public CIConnection {
   sim::MemoryPort port_;
   DWORD speed_;
   bool cancelled_ = false;  // one cancel ends one read
-  HANDLE abort_event_ = nullptr;
+  WaitRule rule_;
 };
 
 #endif  // RCVLINK_TESTS_SUPPORT_SIMULATED_CONNECTION_H_

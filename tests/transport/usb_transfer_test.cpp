@@ -197,12 +197,27 @@ TEST_F(UsbFlush, EndsWithAFailureThatIsNotIts) {
                           Line("CAbstractConnection::Read - read failed [3758100489] [~]")));
 }
 
-TEST_F(UsbFlush, EndsWithACancel) {
-  device.transfers = {{0, 1}, {ERROR_IO_PENDING, 0}, {0, 1}};
-  device.wait_answer = WAIT_OBJECT_0;
+// It is meant for the wait of the command that follows, and ends that as well.
+TEST_F(UsbFlush, EndsWithACancelAndKeepsIt) {
+  device.transfers = {{0, 1}, {ERROR_IO_PENDING, 0}, {ERROR_IO_PENDING, 0}};
+  device.transferred = 1;
+  DWORD handles_of_flush = 0;
+  device.on_wait = [&](DWORD handles, const HANDLE*) {
+    handles_of_flush = handles;
+    connection->Cancel();
+  };
   EXPECT_EQ(connection->Flush(), S_OK);
   EXPECT_EQ(Reads(), 2U);
-  EXPECT_THAT(NewLines(), ElementsAre("CUSBConnection::Flush"));
+  EXPECT_EQ(handles_of_flush, 1U) << "the flush waits for its own reads only";
+
+  DWORD first = WAIT_FAILED;
+  device.on_wait = [&](DWORD, const HANDLE* handles) {
+    first = WaitForSingleObject(handles[0], 0);
+  };
+  BYTE byte = 0;
+  DWORD arrived = 0;
+  connection->Read(&byte, 1, &arrived, 1000);
+  EXPECT_EQ(first, WAIT_OBJECT_0);
 }
 
 TEST(UsbFlushUnopened, IsSoonDone) {

@@ -91,17 +91,24 @@ TEST_F(VelmarCommand, GivesTheFailureOfEachStep) {
   EXPECT_EQ(clock.paused, 0u);
 }
 
-// Nothing went out: an answer would be waited for in vain.
-TEST_F(VelmarCommand, AnAbortedWriteEndsIt) {
-  connection.on_write = [](std::string_view) { return S_FALSE; };
-  EXPECT_EQ(CVelmarCommand("x", 0).Execute(&connection, nullptr), S_FALSE);
-  EXPECT_THAT(connection.calls, ElementsAre("flush", "write x"));
+// Half a line would stand in front of the next command.
+TEST_F(VelmarCommand, IsSentWhole) {
+  std::vector<bool> shielded;
+  connection.on_write = [&](std::string_view) {
+    shielded.push_back(connection.wait_rule.shielded);
+    return S_OK;
+  };
+  bool shielded_at_read = true;
+  connection.Give({S_OK, "x", [&] { shielded_at_read = connection.wait_rule.shielded; }});
+  EXPECT_EQ(CVelmarCommand("x", kAppendCrc).Execute(&connection, nullptr), S_OK);
+  EXPECT_THAT(shielded, ElementsAre(true, true));
+  EXPECT_FALSE(shielded_at_read);
 }
 
-TEST_F(VelmarCommand, AnAbortedWriteOfTheChecksumEndsIt) {
-  connection.on_write = [](std::string_view bytes) { return bytes == "x" ? S_OK : S_FALSE; };
-  EXPECT_EQ(CVelmarCommand("x", kAppendCrc).Execute(&connection, nullptr), S_FALSE);
-  EXPECT_EQ(connection.calls.size(), 3u);
+TEST_F(VelmarCommand, AnAbortThatCameBeforeItEndsItAfterItsLine) {
+  connection.Cancel();
+  EXPECT_EQ(CVelmarCommand("x", 0).Execute(&connection, nullptr), S_FALSE);
+  EXPECT_EQ(connection.Written(), "x");
 }
 
 TEST_F(VelmarCommand, AFailedReadEndsItWithoutAReply) {

@@ -106,11 +106,14 @@ TEST_F(VelmarDriver, AFailedSecondProbeCommandIsNoReceiver) {
 TEST_F(VelmarDriver, TheProbeWatchesTheEventWhileItWaits) {
   const Event event(false);
   HANDLE watched = nullptr;
-  before_command = [&](const std::string&) { watched = connection->abort_event; };
+  before_command = [&](const std::string& command) {
+    if (command != kUnlogAll) return;
+    connection->Give({S_OK, kOkPrompt, [&] { watched = connection->wait_rule.watched; }});
+  };
   short answer = 99;
   driver.CheckConnection(event.get(), &answer);
   EXPECT_EQ(watched, event.get());
-  EXPECT_EQ(connection->abort_event, nullptr);
+  EXPECT_EQ(connection->wait_rule.watched, nullptr);
 }
 
 TEST(VelmarProbe, WithoutAConnectionIsNo) {
