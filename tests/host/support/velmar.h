@@ -7,6 +7,7 @@
 
 #include <map>
 #include <string>
+#include <utility>
 #include <vector>
 
 #include "rcvlink.h"
@@ -35,6 +36,8 @@ class Velmar {
   }
 
   void* get() const { return handle_; }
+  // Gives the handle away.
+  void* Release() { return std::exchange(handle_, nullptr); }
 
   // What the host said since the greeting.
   Lines Sent() const {
@@ -69,7 +72,7 @@ class Velmar {
   }
   long Delete(std::wstring name) const { return devapi::DeleteFileW(handle_, name.data()); }
 
-  const bed::SimulatedPort port;
+  bed::SimulatedPort port;
 
  private:
   static constexpr size_t kQuestionsOfGreeting = 2;
