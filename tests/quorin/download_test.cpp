@@ -137,6 +137,30 @@ TEST_F(QuorinDownload, SlowsTheReceiverDownAgainWhenTheHostCannotFollow) {
   EXPECT_TRUE(report.Has("CQuorinProtocol::DownloadFile - host speed up is failed [0x80070006]"));
 }
 
+// A receiver that no longer answers is asked for its port once, not again and again.
+TEST_F(QuorinDownload, SlowsTheReceiverDownOnce) {
+  connection->set_speed_result = E_HANDLE;
+  int asked = 0;
+  receiver.On(kGetPort, [&](const std::string& tag) {
+    if (++asked == 1) connection->GiveRead(Message("RE", tag + "/dev/ser/b"));
+  });
+  Download();
+  EXPECT_EQ(asked, 2) << "to raise it, and to slow it down";
+}
+
+// But an abort cuts off only what it came for.
+TEST_F(QuorinDownload, SlowsTheReceiverDownThoughAnAbortCutsTheFirstTryOff) {
+  connection->set_speed_result = E_HANDLE;
+  int asked = 0;
+  receiver.On(kGetPort, [&](const std::string& tag) {
+    if (++asked == 2) driver.Abort();
+    connection->GiveRead(Message("RE", tag + "/dev/ser/b"));
+  });
+  EXPECT_EQ(Download(), S_FALSE);
+  const std::vector<std::string> question = {"%%print,/cur/term\r\n"};
+  ExpectSaid({kSpeedUp, question, question, {"set,/par/dev/ser/b/rate,9600\r\n"}});
+}
+
 TEST_F(QuorinDownload, TakesAHostThatHadNothingToChange) {
   connection->set_speed_result = S_FALSE;
   EXPECT_EQ(Download(), S_OK);
@@ -272,6 +296,21 @@ TEST_F(QuorinDownload, FailsWithTheWayBackRatherThanWithTheTransfer) {
   receiver.Reply(kGetSize, "0");
   receiver.FailWriteOf(kPutBack, E_HANDLE);
   EXPECT_EQ(Download(), E_HANDLE);
+}
+
+// Half a line would stand in front of the command that puts the speed back.
+TEST_F(QuorinDownload, SaysAllWholeAtTheRaisedSpeed) {
+  std::vector<std::string> cut;
+  const auto answer = connection->on_write;
+  bool raised = false;
+  connection->on_write = [&](std::string_view bytes) {
+    const bool is_control = bytes.size() == 1 && bytes != "\n";
+    if (raised && !is_control && !connection->wait_rule.shielded) cut.emplace_back(bytes);
+    raised = raised || bytes == kRaise;
+    return answer(bytes);
+  };
+  EXPECT_EQ(Download(), S_OK);
+  EXPECT_THAT(cut, testing::IsEmpty());
 }
 
 TEST_F(QuorinDownload, SaysTheOldSpeedWhole) {

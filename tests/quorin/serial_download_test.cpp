@@ -64,6 +64,16 @@ TEST_F(QuorinSerialDownload, MayConsistOfAnEmptyLastBlock) {
   Give(blocks.Last(""));
   EXPECT_EQ(Download(), S_OK);
   EXPECT_EQ(stream.bytes, "");
+  EXPECT_EQ(stream.writes, 1U) << "a write of nothing is a write";
+  EXPECT_EQ(Controls(), "#");
+}
+
+// As any other failure of the stream: the receiver is told, and the host knows already.
+TEST_F(QuorinSerialDownload, EndsWhenAnEmptyLastBlockCannotBeWritten) {
+  Give(blocks.Last(""));
+  stream.fail_at_write = 0;
+  EXPECT_EQ(Download(), S_OK);
+  EXPECT_TRUE(progress.percents.empty());
   EXPECT_EQ(Controls(), "#");
 }
 

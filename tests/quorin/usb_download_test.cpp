@@ -155,6 +155,14 @@ TEST_F(QuorinUsbDownload, MayConsistOfAnEmptyLastBlock) {
   Give(blocks.Last(""));
   EXPECT_EQ(Download(), S_OK);
   EXPECT_EQ(stream.bytes, "");
+  EXPECT_EQ(stream.writes, 1U) << "a write of nothing is a write";
+  EXPECT_EQ(Controls(), "#");
+}
+
+TEST_F(QuorinUsbDownload, FailsWhenAnEmptyLastBlockCannotBeWritten) {
+  Give(blocks.Last(""));
+  stream.fail_at_write = 0;
+  EXPECT_EQ(Download(), stream.failure);
   EXPECT_EQ(Controls(), "#");
 }
 

@@ -452,6 +452,153 @@ TEST_F(VelmarDownload, AnAbortAtRaisedSpeedPutsTheSpeedBack) {
   EXPECT_EQ(driver.DeleteFile(L"a"), S_FALSE);
 }
 
+// What may still be sending is told to stop, at any speed; what has not begun is not.
+class VelmarUnfinishedDownload : public VelmarDownload {
+ protected:
+  size_t TimesStopped() const {
+    return static_cast<size_t>(std::ranges::count(connection->Writes(), kStop));
+  }
+};
+
+TEST_F(VelmarUnfinishedDownload, IsStoppedAfterAnAbort) {
+  Serve(3);
+  before_command = [&](const std::string& command) {
+    if (command == kRead) driver.Abort();
+  };
+  EXPECT_EQ(Download(), S_FALSE);
+  EXPECT_EQ(TimesStopped(), 1u);
+}
+
+TEST_F(VelmarUnfinishedDownload, IsStoppedWhenTheStreamFails) {
+  Serve(3);
+  stream.fail_at_write = 1;
+  EXPECT_EQ(Download(), stream.failure);
+  EXPECT_EQ(TimesStopped(), 1u);
+}
+
+TEST_F(VelmarUnfinishedDownload, IsStoppedWhenTheFileBreaksOff) {
+  Serve(3);
+  answers[kRead].resize(answers[kRead].size() - 50);
+  EXPECT_EQ(Download(), S_OK);
+  EXPECT_EQ(TimesStopped(), 1u);
+}
+
+TEST_F(VelmarUnfinishedDownload, IsStoppedWhenTheAnswerCannotBeUnderstood) {
+  Serve(3);
+  answers[kRead] = "x" + answers[kRead];
+  EXPECT_EQ(Download(), S_OK);
+  EXPECT_EQ(TimesStopped(), 1u);
+}
+
+TEST_F(VelmarUnfinishedDownload, IsNotStoppedWhenItIsComplete) {
+  Serve(3);
+  EXPECT_EQ(Download(), S_OK);
+  EXPECT_EQ(TimesStopped(), 0u);
+}
+
+TEST_F(VelmarUnfinishedDownload, IsNotStoppedBeforeItBegan) {
+  const std::string refused = "\r\n<ERROR:No such file\r\n[COM1]";
+  for (const std::string& command : {kCurrent, kHeader, kRead}) {
+    for (const std::string& answer : {std::string(), kErrorPrompt, refused}) {
+      Serve(3);
+      answers[command] = answer;
+      EXPECT_EQ(Download(), S_OK);
+      EXPECT_EQ(TimesStopped(), 0u) << command << answer;
+      answers[command] = kOkPrompt;
+    }
+  }
+}
+
+// An abort while the link is put in order ends its waits, and the receiver is told its old speed all
+// the same: with the settings that it had before.
+class VelmarAbortedPutBack : public VelmarDownload {
+ protected:
+  VelmarAbortedPutBack() {
+    connection->speed = 9600;
+    answers[kConfig] = kOkPrompt + AsciiLog("COMCONFIGA", "1,COM1,9600,E,8,2,XON,ON,OFF,A,B,ON");
+    answers[kRaiseEven] = kOkPrompt;
+    answers[kStop] = kOkPrompt;
+    Serve(3);
+    stream.fail_at_write = 1;
+  }
+  // The abort comes as this command is sent at the raised speed, and nobody answers from then on.
+  std::vector<std::string> DownloadAndAbortAt(const std::string& fatal) {
+    before_command = [this, fatal](const std::string& command) {
+      if (connection->speed != 115200 || command != fatal) return;
+      answers.clear();
+      driver.Abort();
+    };
+    EXPECT_EQ(Download(), S_OK);
+    std::vector<std::string> writes = connection->Writes();
+    const auto stop = std::ranges::find(writes, kStop);
+    return {stop, writes.end()};
+  }
+  size_t TimesTimedOut() const {
+    return static_cast<size_t>(
+        std::ranges::count(report.Lines(), "CVelmarCommand::Execute - read failed [0x800705B4]"));
+  }
+
+  const std::string kRaiseEven = "COM 115200 E 8 2 XON\r";
+  const std::string kRestoreEven = "COM 9600 E 8 2 XON\r";
+};
+
+TEST_F(VelmarAbortedPutBack, WhileTheReceiverIsStopped) {
+  EXPECT_THAT(DownloadAndAbortAt(kStop), ElementsAre(kStop, kRestoreEven));
+  EXPECT_EQ(TimesTimedOut(), 0u);
+  EXPECT_EQ(connection->speed, 9600u);
+}
+
+TEST_F(VelmarAbortedPutBack, WhileItIsAskedForItsSettings) {
+  EXPECT_THAT(DownloadAndAbortAt(kConfig), ElementsAre(kStop, kConfig, kRestoreEven));
+  EXPECT_EQ(TimesTimedOut(), 0u);
+  EXPECT_EQ(connection->speed, 9600u);
+}
+
+TEST_F(VelmarAbortedPutBack, WhileItConfirmsItsSpeed) {
+  EXPECT_THAT(DownloadAndAbortAt(kRestoreEven), ElementsAre(kStop, kConfig, kRestoreEven));
+  EXPECT_EQ(TimesTimedOut(), 0u);
+  EXPECT_EQ(connection->speed, 9600u);
+}
+
+// The line has left before the host changes its own speed.
+TEST_F(VelmarAbortedPutBack, LetsTheLineLeave) {
+  DownloadAndAbortAt(kConfig);
+  const auto told = std::ranges::find(connection->calls, "write " + kRestoreEven);
+  ASSERT_NE(told, connection->calls.end());
+  EXPECT_THAT(std::vector<std::string>(told + 1, connection->calls.end()),
+              ElementsAre("flush", "speed 9600"));
+}
+
+TEST_F(VelmarDownload, AnAbortThatEndedItDisturbsNothingOfThePutBack) {
+  Serve(3);
+  connection->speed = 9600;
+  before_command = [&](const std::string& command) {
+    if (command == kRead) driver.Abort();
+    if (command == kStop || command == kRestore) answers[command] = kOkPrompt;
+  };
+  EXPECT_EQ(Download(), S_OK);
+  const std::vector<std::string> writes = connection->Writes();
+  EXPECT_THAT(std::vector<std::string>(writes.end() - 3, writes.end()),
+              ElementsAre(kStop, kConfig, kRestore));
+  EXPECT_FALSE(report.Has("CVelmarCommand::Execute - read failed [0x800705B4]"));
+}
+
+// The answer of what was cut off would be taken for that of the next command.
+TEST_F(VelmarDownload, WhatFollowsACutOffCommandWaitsForItsLateAnswer) {
+  Serve(3);
+  before_command = [&](const std::string& command) {
+    if (command == kCurrent) driver.Abort();
+  };
+  EXPECT_EQ(Download(), S_FALSE);
+  EXPECT_EQ(clock.paused, 0u);
+  before_command = nullptr;
+  answers["del file a\r"] = kOkPrompt;
+  driver.DeleteFile(L"a");
+  EXPECT_EQ(clock.paused, 500u + 500u) << "once before it, and after it as after every command";
+  driver.DeleteFile(L"a");
+  EXPECT_EQ(clock.paused, 500u + 500u + 500u);
+}
+
 // A file that turns out longer than its header said: the percent is kept in a byte, and told as 100
 // at the most.
 TEST_F(VelmarDownload, ThePercentOfAFileThatIsLongerThanSaid) {
