@@ -92,8 +92,8 @@ long CreateReceiverOnSerial(
     Trace(L"CreateReceiverOnSerial - opening serial port [%s]\r\n", port);
     ThrowIfFailed(connection->Open(port, settings));
     std::unique_ptr<CIProtocol> driver;
-    const HRESULT found = FindDriver(std::move(connection), port, protocol, abortEvent, driver);
-    if (found != S_OK) return found;
+    const HRESULT find_result = FindDriver(std::move(connection), port, protocol, abortEvent, driver);
+    if (find_result != S_OK) return find_result;
     return Register(L"CreateReceiverOnSerial", port, std::move(driver), receiver);
   });
 }
@@ -116,9 +116,9 @@ long CreateReceiverOnUSB(wchar_t* device, EProtocol, void* abortEvent, void** re
 
 long SearchReceiver(
     wchar_t* port, EInstanceType type, EProtocol protocol, void* abortEvent, void** receiver) {
-  const HRESULT registered = OpenReceiver(port, receiver);
-  if (FAILED(registered)) return registered;
-  if (registered == S_OK) {
+  const HRESULT open_result = OpenReceiver(port, receiver);
+  if (FAILED(open_result)) return open_result;
+  if (open_result == S_OK) {
     Trace(L"SearchReceiver - receiver already exists [%s]\r\n", port);
     return S_OK;
   }
@@ -133,17 +133,17 @@ long SearchReceiver(
       return E_UNEXPECTED;
   }
 
-  const HRESULT on_serial = SearchReceiverOnSerial(port, protocol, abortEvent, receiver);
-  if (*receiver) return on_serial;
-  if (FAILED(on_serial)) {
-    Trace(L"SearchReceiver - SearchReceiverOnSerial failed[%s] [0x%08X]\r\n", port, on_serial);
+  const HRESULT serial_result = SearchReceiverOnSerial(port, protocol, abortEvent, receiver);
+  if (*receiver) return serial_result;
+  if (FAILED(serial_result)) {
+    Trace(L"SearchReceiver - SearchReceiverOnSerial failed[%s] [0x%08X]\r\n", port, serial_result);
   }
-  const HRESULT on_usb = CreateReceiverOnUSB(port, protocol, abortEvent, receiver);
-  if (*receiver) return on_usb;
-  if (FAILED(on_usb)) {
-    Trace(L"SearchReceiver - CreateReceiverOnUSB failed[%s] [0x%08X]\r\n", port, on_usb);
+  const HRESULT usb_result = CreateReceiverOnUSB(port, protocol, abortEvent, receiver);
+  if (*receiver) return usb_result;
+  if (FAILED(usb_result)) {
+    Trace(L"SearchReceiver - CreateReceiverOnUSB failed[%s] [0x%08X]\r\n", port, usb_result);
   }
-  return on_usb;
+  return usb_result;
 }
 
 }  // namespace devapi

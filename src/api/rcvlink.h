@@ -223,9 +223,9 @@ RCVLINK_API long OpenReceiver(wchar_t* port, void** receiver);
 /// @retval E_INVALIDARG unknown handle
 RCVLINK_API long CloseReceiver(void* receiver);
 
-/// Lets go of a receiver by name, for a host that lost its handles. Each receiver of that name
-/// loses one user, until one of them has none left and is removed. Unlike `CloseReceiver` it does
-/// not abort what is still running.
+/// Closes a receiver by name, for a host that lost its handles. Each receiver of that name loses one
+/// user, until one of them has none left and is removed. What still runs on that one is ended as by
+/// `Abort`; as with `CloseReceiver`, nobody waits for it.
 /// @retval S_OK         a receiver was removed
 /// @retval S_FALSE      none was removed
 /// @retval E_INVALIDARG `port` is null
@@ -248,13 +248,14 @@ RCVLINK_API long DestroyReceiver(wchar_t* port);
 /// @retval 0x8007048F   a Quorin receiver refused (a Velmar receiver: S_FALSE)
 /// @return otherwise the failing code of the exchange
 /// @warning A failure of a Quorin receiver after the lock was taken leaves the calling thread
-///          holding the receiver's lock: call `UnlockConnection` after a result other than S_OK. A
-///          Velmar receiver is let go by the failure itself, once, whoever took it: a host that holds
-///          it with `LockConnection` must take it again.
+///          holding the receiver's lock: call `UnlockConnection` after a result other than S_OK. With
+///          a Velmar receiver the failure releases the lock that the call itself took, and no other: a
+///          host that holds the receiver with `LockConnection` still does.
 RCVLINK_API long GetReceiverInfo(void* receiver, void* abortEvent, CReceiverInfo* info);
 
 /// Asks whether the receiver still answers.
-/// @param abortEvent Win32 event that ends the check; null: it cannot be ended
+/// @param abortEvent Win32 event that ends the check, and the wait for a receiver that another thread
+///                   has locked. Null: `Abort` alone ends the check, and nothing ends that wait.
 /// @param[out] answer -1 (VARIANT_TRUE) when it answered, 0 when not
 /// @retval S_OK         checked; `answer` is set (an aborted check answers 0)
 /// @retval S_FALSE      aborted while another thread held the receiver; `answer` is not written
@@ -275,9 +276,15 @@ RCVLINK_API long LockConnection(void* receiver, void* abortEvent);
 /// @retval S_OK always, also when the calling thread did not hold it
 RCVLINK_API long UnlockConnection(void* receiver);
 
-/// Ends the operation that another thread runs on the receiver, at its next step; takes no lock and
-/// waits for nothing. When no running operation looks for it (none runs, or a `CheckConnection`), the
-/// next one that does ends instead.
+/// Ends the operation that another thread runs on the receiver: its wait ends at once, and the
+/// operation at its next step. It takes no lock of the receiver and waits for nothing.
+///
+/// When no operation runs, the next one ends. A Quorin receiver's gives S_FALSE before it sends
+/// anything, or, where it asks for the receiver's identity or port first, after that question; a Velmar
+/// receiver's sends its command and then gives S_FALSE. A `CheckConnection` answers 0 once.
+///
+/// `CheckConnection` and the download of a Velmar receiver end too, but do not clear the abort: the
+/// next operation other than these two ends with S_FALSE as well.
 /// @retval S_OK always
 RCVLINK_API long Abort(void* receiver);
 
@@ -397,12 +404,15 @@ namespace dump_hlp {
 /// Starts a report, replacing the one that is open. A report that cannot be created (or whose path
 /// would be too long) leaves reporting off; nothing is reported about that.
 /// @param name bare file name; the file is made in the folder of GetTempPath
-/// @warning Not while other threads are inside the library.
+/// @warning Not while other threads are inside the library. A narrow name that is null or cannot be
+///          converted raises a C++ exception, as `DumpReportString` does for its format.
 RCVLINK_API void CreateReportFile(const char* name);
 RCVLINK_API void CreateReportFile(const wchar_t* name);
 
 /// Writes one stamped entry; safe without a report. The entry ends where the text ends: end it in
 /// "\r\n".
+/// @warning A null format, one that cannot be measured, and a lack of memory raise a C++ exception of
+///          the library's own runtime, which a host of another compiler cannot catch.
 /// @param format    in the meaning of Microsoft's printf
 /// @param arguments the caller's own va_list
 RCVLINK_API void DumpReportString(const char* format, char* arguments);

@@ -195,11 +195,11 @@ HRESULT CVelmarCommand::ParseAsciiMessage(const char* text, bool* done) {
     *done = false;
     return S_FALSE;
   }
-  const HRESULT header = ParseAsciiHeader(text, static_cast<uint32_t>(separator - text));
-  if (FAILED(header)) return header;
+  const HRESULT header_result = ParseAsciiHeader(text, static_cast<uint32_t>(separator - text));
+  if (FAILED(header_result)) return header_result;
   const char* const body = separator + 1;
-  const HRESULT parsed = ParseMessageBody(body, static_cast<uint32_t>(std::strlen(body)), done);
-  return FAILED(parsed) ? parsed : S_OK;
+  const HRESULT parse_result = ParseMessageBody(body, static_cast<uint32_t>(std::strlen(body)), done);
+  return FAILED(parse_result) ? parse_result : S_OK;
 }
 
 HRESULT CVelmarCommand::ParseAsciiLog(const char* bytes,
