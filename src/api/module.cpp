@@ -34,17 +34,27 @@ void TraceModule(HMODULE module) {
         LOWORD(version->dwProductVersionLS));
 }
 
+void Start(HMODULE module) {
+  PrepareReport();
+  Receivers();
+  OpenLists();
+  TraceModule(module);
+}
+
+// What the host has not closed goes after the farewell, while the report still takes its lines.
+void End() {
+  Trace(L"Bye!\r\n");
+  OpenLists().Clear();
+  Receivers().Clear();
+}
+
 }  // namespace
 
 extern "C" BOOL WINAPI DllMain(HINSTANCE module, DWORD reason, void* /*reserved*/) {
   if (reason == DLL_PROCESS_ATTACH) {
-    // Made here, in this order, so that at unload the receivers go before the report.
-    PrepareReport();
-    Receivers();
-    OpenLists();
-    TraceModule(module);
+    Start(module);
   } else if (reason == DLL_PROCESS_DETACH) {
-    Trace(L"Bye!\r\n");
+    End();
   }
   return TRUE;
 }
