@@ -3,8 +3,10 @@
 #include <cstddef>
 #include <vector>
 
+#include "api/exception_state.h"
 #include "api/file_lists.h"
 #include "api/registry.h"
+#include "platform/hresult.h"
 #include "platform/win32.h"
 #include "report/report_file.h"
 
@@ -50,11 +52,18 @@ void End() {
 
 }  // namespace
 
-extern "C" BOOL WINAPI DllMain(HINSTANCE module, DWORD reason, void* /*reserved*/) {
+extern "C" BOOL WINAPI DllMain(HINSTANCE module, DWORD reason, void* process_ends) {
   if (reason == DLL_PROCESS_ATTACH) {
     Start(module);
   } else if (reason == DLL_PROCESS_DETACH) {
-    End();
+    // A line that cannot be written does not keep the rest from being freed.
+    CatchResult([] {
+      End();
+      return S_OK;
+    });
+    // The end of a process frees everything. It has stopped the other threads wherever they were,
+    // in the middle of an allocation too, so the less is done the better.
+    if (!process_ends) FreeExceptionState();
   }
   return TRUE;
 }
