@@ -5,7 +5,14 @@
 #include "api/registry.h"
 #include "platform/api_types.h"
 #include "platform/hresult.h"
+#include "platform/process_object.h"
 #include "report/report_file.h"
+
+namespace {
+
+constinit ProcessObject<FileLists> lists;
+
+}  // namespace
 
 void* FileLists::Insert(std::unique_ptr<CFileList> list) {
   void* const handle = list.get();
@@ -20,10 +27,7 @@ const CFileList* FileLists::Find(void* handle) const {
 
 bool FileLists::Remove(void* handle) { return lists_.erase(handle) != 0; }
 
-FileLists& OpenLists() {
-  static FileLists lists;
-  return lists;
-}
+FileLists& OpenLists() { return lists.get(); }
 
 namespace devapi {
 

@@ -16,12 +16,14 @@ class FileLists {
   const CFileList* Find(void* handle) const;
   // False when the handle is unknown.
   bool Remove(void* handle);
+  // Destroys every list, at unload.
+  void Clear() { lists_.clear(); }
 
  private:
   std::unordered_map<void*, std::unique_ptr<CFileList>> lists_;
 };
 
-// The process's own. It is emptied at unload.
+// The process's own.
 FileLists& OpenLists();
 
 #endif  // RCVLINK_API_FILE_LISTS_H_

@@ -3,8 +3,10 @@
 #include <cstddef>
 #include <vector>
 
+#include "api/exception_state.h"
 #include "api/file_lists.h"
 #include "api/registry.h"
+#include "platform/hresult.h"
 #include "platform/win32.h"
 #include "report/report_file.h"
 
@@ -34,17 +36,34 @@ void TraceModule(HMODULE module) {
         LOWORD(version->dwProductVersionLS));
 }
 
+void Start(HMODULE module) {
+  PrepareReport();
+  Receivers();
+  OpenLists();
+  TraceModule(module);
+}
+
+// What the host has not closed goes after the farewell, while the report still takes its lines.
+void End() {
+  Trace(L"Bye!\r\n");
+  OpenLists().Clear();
+  Receivers().Clear();
+}
+
 }  // namespace
 
-extern "C" BOOL WINAPI DllMain(HINSTANCE module, DWORD reason, void* /*reserved*/) {
+extern "C" BOOL WINAPI DllMain(HINSTANCE module, DWORD reason, void* process_ends) {
   if (reason == DLL_PROCESS_ATTACH) {
-    // Made here, in this order, so that at unload the receivers go before the report.
-    PrepareReport();
-    Receivers();
-    OpenLists();
-    TraceModule(module);
+    Start(module);
   } else if (reason == DLL_PROCESS_DETACH) {
-    Trace(L"Bye!\r\n");
+    // A line that cannot be written does not keep the rest from being freed.
+    CatchResult([] {
+      End();
+      return S_OK;
+    });
+    // The end of a process frees everything. It has stopped the other threads wherever they were,
+    // in the middle of an allocation too, so the less is done the better.
+    if (!process_ends) FreeExceptionState();
   }
   return TRUE;
 }

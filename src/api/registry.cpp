@@ -5,6 +5,7 @@
 
 #include "platform/api_types.h"
 #include "platform/hresult.h"
+#include "platform/process_object.h"
 #include "report/report_file.h"
 
 namespace {
@@ -14,6 +15,8 @@ bool IsSameName(wchar_t* left, wchar_t* right) {
   constexpr ULONG kNoFlags = 0;
   return VarBstrCmp(left, right, LOCALE_USER_DEFAULT, kNoFlags) == static_cast<HRESULT>(VARCMP_EQ);
 }
+
+constinit ProcessObject<ReceiverRegistry> registry;
 
 }  // namespace
 
@@ -88,7 +91,4 @@ HRESULT ReceiverRegistry::Destroy(const wchar_t* port) {
   return S_FALSE;
 }
 
-ReceiverRegistry& Receivers() {
-  static ReceiverRegistry registry;
-  return registry;
-}
+ReceiverRegistry& Receivers() { return registry.get(); }

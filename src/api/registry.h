@@ -25,6 +25,10 @@ class ReceiverRegistry {
   HRESULT Close(void* handle);
   HRESULT Destroy(const wchar_t* port);
 
+  // Lets go of every receiver, at unload. No other thread runs in the library then. Takes no lock: a
+  // thread that the end of the process has stopped may hold it.
+  void Clear() { entries_.clear(); }
+
  private:
   struct Entry {
     uint32_t use_count = 1;
@@ -36,7 +40,7 @@ class ReceiverRegistry {
   std::unordered_map<void*, Entry> entries_;
 };
 
-// The process's own. It is emptied at unload.
+// The process's own.
 ReceiverRegistry& Receivers();
 
 #endif  // RCVLINK_API_REGISTRY_H_

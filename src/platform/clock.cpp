@@ -10,19 +10,16 @@ class SystemClock : public Clock {
   void Pause(DWORD milliseconds) override { Sleep(milliseconds); }
 };
 
-std::atomic<Clock*>& Override() {
-  static std::atomic<Clock*> clock{nullptr};
-  return clock;
-}
+constinit SystemClock system_clock;
+constinit std::atomic<Clock*> clock_override = nullptr;
 
 }  // namespace
 
 Clock& CurrentClock() {
-  static SystemClock system_clock;
-  Clock* const clock = Override();
+  Clock* const clock = clock_override;
   return clock ? *clock : system_clock;
 }
 
-ClockOverride::ClockOverride(Clock& clock) : previous_(Override().exchange(&clock)) {}
+ClockOverride::ClockOverride(Clock& clock) : previous_(clock_override.exchange(&clock)) {}
 
-ClockOverride::~ClockOverride() { Override() = previous_; }
+ClockOverride::~ClockOverride() { clock_override = previous_; }

@@ -11,7 +11,7 @@ constexpr int kBitsOfByte = 8;
 
 using Table = std::array<uint16_t, 256>;
 
-Table MakeTable() {
+constexpr Table MakeTable() {
   Table table{};
   for (size_t i = 0; i < table.size(); ++i) {
     auto entry = static_cast<uint16_t>(i << kBitsOfByte);
@@ -25,13 +25,14 @@ Table MakeTable() {
   return table;
 }
 
+constexpr Table kTable = MakeTable();
+
 }  // namespace
 
 uint16_t BlockCrc(std::span<const uint8_t> bytes, uint16_t crc) {
-  static const Table table = MakeTable();
   for (const uint8_t byte : bytes) {
     const auto index = static_cast<uint8_t>((crc >> kBitsOfByte) ^ byte);
-    crc = static_cast<uint16_t>(table[index] ^ (crc << kBitsOfByte));
+    crc = static_cast<uint16_t>(kTable[index] ^ (crc << kBitsOfByte));
   }
   return crc;
 }

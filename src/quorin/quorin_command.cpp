@@ -15,11 +15,10 @@ namespace {
 
 constexpr uint32_t kBufferLength = 65536;
 
+constinit std::atomic<int32_t> last_tag = 0;
+
 // The next tag of the process: a number between two percent signs.
-std::string NextTag() {
-  static std::atomic<int32_t> counter = 0;
-  return FormatText("%%%i%%", ++counter);
-}
+std::string NextTag() { return FormatText("%%%i%%", ++last_tag); }
 
 }  // namespace
 

@@ -12,6 +12,7 @@
 #include "platform/critical_section.h"
 #include "platform/handle.h"
 #include "platform/hresult.h"
+#include "platform/process_object.h"
 #include "platform/text.h"
 #include "platform/win32.h"
 
@@ -33,10 +34,9 @@ class ReportFile {
   FileHandle file_;
 };
 
-ReportFile& TheReport() {
-  static ReportFile report;
-  return report;
-}
+constinit ProcessObject<ReportFile> report;
+
+ReportFile& TheReport() { return report.get(); }
 
 void ReportFile::Create(const wchar_t* name) {
   Close();

@@ -14,7 +14,7 @@
 void Trace(const wchar_t* format, ...);
 void Trace(const char* format, ...);
 
-// Makes the report's lock, which lives as long as the module.
+// Makes the report's lock, at load.
 void PrepareReport();
 
 #endif  // RCVLINK_REPORT_REPORT_FILE_H_

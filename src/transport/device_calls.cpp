@@ -6,10 +6,8 @@
 
 namespace {
 
-std::atomic<DeviceCalls*>& Override() {
-  static std::atomic<DeviceCalls*> calls{nullptr};
-  return calls;
-}
+constinit DeviceCalls system_calls;
+constinit std::atomic<DeviceCalls*> calls_override = nullptr;
 
 }  // namespace
 
@@ -78,12 +76,11 @@ BOOL DeviceCalls::ClearCommError(HANDLE device, DWORD* errors, COMSTAT* status) 
 BOOL DeviceCalls::PurgeComm(HANDLE device, DWORD flags) { return ::PurgeComm(device, flags); }
 
 DeviceCalls& SystemCalls() {
-  static DeviceCalls system_calls;
-  DeviceCalls* const calls = Override();
+  DeviceCalls* const calls = calls_override;
   return calls ? *calls : system_calls;
 }
 
 SystemCallsOverride::SystemCallsOverride(DeviceCalls& calls)
-    : previous_(Override().exchange(&calls)) {}
+    : previous_(calls_override.exchange(&calls)) {}
 
-SystemCallsOverride::~SystemCallsOverride() { Override() = previous_; }
+SystemCallsOverride::~SystemCallsOverride() { calls_override = previous_; }

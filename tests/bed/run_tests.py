@@ -51,6 +51,7 @@ PORT_SETS = 8
 PROGRAMS = [
     Program("check_layers", "tests/bed/check_layers.py", SCRIPT),
     Program("check_exports", "tests/bed/check_exports.py", SCRIPT),
+    Program("check_statics", "tests/bed/check_statics.py", SCRIPT),
     Program("check_readme", "tests/bed/check_readme.py", SCRIPT),
     Program("simulator_tests", "build/native/bin/simulator_tests", NATIVE),
     Program("unit_tests", "build/release/bin/unit_tests.exe", WINE),

@@ -5,9 +5,9 @@
 #include <string>
 
 #include "rcvlink.h"
-#include "tests/host/support/handle_count.h"
 #include "tests/host/support/receiver.h"
 #include "tests/host/support/report.h"
+#include "tests/host/support/resources.h"
 
 namespace {
 

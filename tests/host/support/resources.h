@@ -1,0 +1,31 @@
+// How much this process has of what it can run out of.
+#ifndef RCVLINK_TESTS_HOST_SUPPORT_RESOURCES_H_
+#define RCVLINK_TESTS_HOST_SUPPORT_RESOURCES_H_
+
+#include <cstddef>
+#include <iosfwd>
+
+namespace host {
+
+// The handles that are open. Asks for each handle value: Wine does not count
+// (GetProcessHandleCount gives 0 there).
+size_t HandleCount();
+
+struct Resources {
+  size_t handles = 0;
+  size_t free_tls_slots = 0;
+  size_t free_fls_slots = 0;
+  bool operator==(const Resources&) const = default;
+};
+
+std::ostream& operator<<(std::ostream& stream, const Resources& resources);
+
+// Takes all free slots and gives them back: nothing else may need one meanwhile.
+Resources CountResources();
+
+// The bytes in use on all heaps of the process.
+size_t HeapBytes();
+
+}  // namespace host
+
+#endif  // RCVLINK_TESTS_HOST_SUPPORT_RESOURCES_H_
