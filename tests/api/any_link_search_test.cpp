@@ -151,11 +151,16 @@ TEST_F(AnyLinkSearch, AnEventInTheSilenceOfATryEndsTheSweepThere) {
 
 TEST_F(AnyLinkSearch, AnEventInTheWaitForUsbEndsThatToo) {
   port_.path = L"none";
+  // A read over USB has no time-out of the device's.
+  COMMTIMEOUTS patient{};
+  patient.ReadTotalTimeoutConstant = 10 * kPingMs;
+  port_.SetCommTimeouts(nullptr, &patient);
   port_.on_wait = [&](DWORD timeout_ms) {
     if (timeout_ms == kPingMs) SetEvent(abort_event_.get());
   };
   EXPECT_EQ(Search(), S_FALSE);
   EXPECT_EQ(handle_, nullptr);
+  EXPECT_EQ(WaitForSingleObject(abort_event_.get(), 0), WAIT_OBJECT_0) << "no answer was awaited";
   EXPECT_LT(clock_.now, kPingMs) << "the silence was waited out";
   EXPECT_THAT(LinesWith("CreateReceiverOnUSB"), ElementsAre(kOpeningUsb, kAskingUsb));
 }
