@@ -206,4 +206,20 @@ TEST_F(AnyLinkSearch, AStaleHandleIsNothingToASearchOfUsb) {
   EXPECT_THAT(LinesWith("CreateReceiverOnUSB"), ElementsAre(kOpeningUsb, kAskingUsb));
 }
 
+// Both families are asked on one open port: an event in the first question keeps the second back.
+TEST_F(AnyLinkSearch, AnEventInTheFirstProbeKeepsTheSecondFromAsking) {
+  port_.on_wait = [this](DWORD timeout_ms) {
+    if (timeout_ms == kPingMs) SetEvent(abort_event_.get());
+  };
+  DCB settings{};
+  settings.BaudRate = CBR_9600;
+  EXPECT_EQ(devapi::CreateReceiverOnSerial(
+                name_.data(), eProtocolAny, &settings, abort_event_.get(), &handle_),
+            S_FALSE);
+  EXPECT_THAT(LinesWith("CreateReceiverOnSerial - looking for"),
+              ElementsAre("CreateReceiverOnSerial - looking for Quorin receiver [COM7]"));
+  EXPECT_EQ(port_.openings, 1u);
+  EXPECT_LT(clock_.now, kPingMs) << "the silence was waited out";
+}
+
 }  // namespace
