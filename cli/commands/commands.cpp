@@ -16,10 +16,19 @@ CommandPointer MakeRemove();
 CommandPointer MakeMove();
 CommandPointer MakeSet();
 CommandPointer MakeCheck();
+CommandPointer MakeExplain();
 
 Commands MakeCommands() {
-  constexpr std::array kTable = {
-      MakePorts, MakeFind, MakeInfo, MakeList, MakeGet, MakeRemove, MakeMove, MakeSet, MakeCheck};
+  constexpr std::array kTable = {MakePorts,
+                                 MakeFind,
+                                 MakeInfo,
+                                 MakeList,
+                                 MakeGet,
+                                 MakeRemove,
+                                 MakeMove,
+                                 MakeSet,
+                                 MakeCheck,
+                                 MakeExplain};
   Commands commands;
   for (const auto make : kTable) commands.push_back(make());
   return commands;

@@ -19,16 +19,16 @@ class Ports : public Command {
     if (ports.empty()) context.PrintDone("This computer has no COM ports.\n");
     std::size_t width = 0;
     for (const SerialPort& port : ports) width = std::max(width, port.port.size() + kGap);
-    Outcome outcome{.document = Json::array()};
+    Json list = Json::array();
     for (const SerialPort& port : ports) {
       const std::string name = ToUtf8(port.port);
       const bool named = !port.friendly_name.empty();
       const std::string gap(named ? width - port.port.size() : 0, ' ');
       context.PrintResult(name + gap + Printable(port.friendly_name) + "\n");
-      outcome.document.push_back(
+      list.push_back(
           {{"port", name}, {"name", named ? Json(ToUtf8(port.friendly_name)) : Json(nullptr)}});
     }
-    return outcome;
+    return {.document = {{"ports", list}}};
   }
 };
 
