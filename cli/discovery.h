@@ -3,6 +3,11 @@
 #ifndef RCVLINK_CLI_DISCOVERY_H_
 #define RCVLINK_CLI_DISCOVERY_H_
 
+#include <windows.h>
+
+#include <optional>
+#include <string>
+
 #include "context.h"
 #include "rcvlink.h"
 
@@ -16,6 +21,14 @@ struct FoundReceiver {
 /// Searches the port, or tries it once when the command line tells speed or RTS.
 /// @throws Failure when there is no receiver
 FoundReceiver FindReceiver(Context& context);
+
+/// One try on a serial port.
+/// @return as `devapi::CreateReceiverOnSerial`
+long TryPort(const Context& context, DCB settings, void** receiver);
+
+/// The settings that a serial port has: those with which it was used last. Nothing when it cannot be
+/// opened.
+std::optional<DCB> CurrentSettings(const std::wstring& port);
 
 }  // namespace cli
 

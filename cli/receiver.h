@@ -7,6 +7,7 @@
 
 #include <cstdint>
 #include <memory>
+#include <optional>
 #include <string>
 #include <vector>
 
@@ -35,6 +36,12 @@ struct RemoteFile {
   SYSTEMTIME time{};
 };
 
+/// The receiver's files.
+struct Directory {
+  std::vector<RemoteFile> files{};
+  std::string doubt{};  ///< why some may be missing; empty: all are there
+};
+
 /// Asks the library once a second to end what it is doing: a request may fall between two steps
 /// and be lost.
 class Aborter {
@@ -60,12 +67,13 @@ class Receiver {
   void* handle() const { return handle_.get(); }
   EInstanceType link() const { return link_; }  ///< on which it was found: serial or USB
 
+  /// Asked for once only.
   /// @throws Failure
-  Identity Identify();
+  const Identity& Identify();
 
   /// Reads the receiver's directory. Warns when some of it may be missing.
   /// @throws Failure
-  std::vector<RemoteFile> ListFiles();
+  Directory ListFiles();
 
   /// What a result other than S_OK makes: a cancellation after Ctrl-C, else a failure.
   Failure FailureOf(std::string tried, long code, std::string meaning = "") const;
@@ -74,6 +82,10 @@ class Receiver {
   void ThrowIfCancelled(const std::string& tried) const;
 
  private:
+  std::vector<RemoteFile> ReadDirectory();
+  std::string DoubtAbout(std::vector<RemoteFile>& files);
+  void AwaitAnswer(const std::string& tried);
+
   Receiver(Context& context, const FoundReceiver& found);
 
   struct Closer {
@@ -84,6 +96,7 @@ class Receiver {
   const Interrupt& interrupt_;
   std::unique_ptr<void, Closer> handle_;
   EInstanceType link_;
+  std::optional<Identity> identity_;
   Ticker cancel_watch_;  // ends before the handle does
 };
 

@@ -1,0 +1,250 @@
+#include "command_line.h"
+
+#include <CLI/CLI.hpp>
+#include <algorithm>
+#include <cstdlib>
+#include <sstream>
+
+#include "names.h"
+#include "options.h"
+#include "results.h"
+#include "text.h"
+
+namespace cli {
+namespace {
+
+constexpr unsigned kDefaultStallTimeoutS = 30;
+constexpr unsigned kLongestStallTimeoutS = 86'400;
+constexpr int kHelpColumn = 28;
+
+/// Shows NAME... where the parser's own help shows NAME(0x).
+class HelpFormatter : public CLI::Formatter {
+ public:
+  std::string make_option_usage(const CLI::Option* option) const override {
+    const bool many = option->get_items_expected_max() > 1;
+    const std::string name = option->get_name(true) + (many ? "..." : "");
+    return option->get_required() ? name : "[" + name + "]";
+  }
+
+  /// A command's help has the options of all commands too.
+  std::string make_footer(const CLI::App* app) const override {
+    const CLI::App* const all = app->get_parent();
+    if (all == nullptr) return Formatter::make_footer(app);
+    const auto is_common = [all](const CLI::Option* option) {
+      return option != all->get_help_ptr() && option != all->get_version_ptr();
+    };
+    // The group begins with a line end, and so does what stands before it.
+    return make_group("Options of all commands", false, all->get_options(is_common)).substr(1) +
+           "\n" + Formatter::make_footer(app);
+  }
+};
+
+/// The word of a command that looks most like another one; empty when none does.
+std::string MostLike(const std::string& word, const Commands& commands) {
+  constexpr std::size_t kMostChanges = 2;
+  std::string best;
+  std::size_t least = kMostChanges + 1;
+  for (const auto& command : commands) {
+    const std::string candidate = command->text().word;
+    const std::size_t changes = ChangesBetween(word, candidate);
+    if (changes >= least || changes >= candidate.size()) continue;
+    least = changes;
+    best = candidate;
+  }
+  return best;
+}
+
+/// `help`, `help get` and `/?` as the parser knows them.
+std::vector<std::string> WithHelp(std::vector<std::string> words) {
+  const auto end = std::find(words.begin(), words.end(), "--");
+  std::replace(words.begin(), end, std::string("/?"), std::string("--help"));
+  if (words.empty() || words.front() != "help") return words;
+  words.erase(words.begin());
+  words.insert(words.end(), "--help");
+  return words;
+}
+
+std::string Examples() {
+  return ExitCodeTable() +
+         "\nOptions are also read from the file of --config, by default\n"
+         "%APPDATA%\\rcvlink\\rcvlink-cli.ini, and from RCVLINK_PORT, RCVLINK_LINK,\n"
+         "RCVLINK_PROTOCOL and RCVLINK_SPEED. The command line comes first, then the file.\n"
+         "\nExamples:\n"
+         "  rcvlink-cli ports                          which ports does this computer have?\n"
+         "  rcvlink-cli find COM7                      is there a receiver, and which?\n"
+         "  rcvlink-cli ls COM7 --speed 115200         its files, without the search for the "
+         "speed\n"
+         "  rcvlink-cli get COM7 --all -o D:\\survey\\   all of them, into a folder\n"
+         "\n`rcvlink-cli COMMAND --help` explains a command. The options above may follow a "
+         "command.";
+}
+
+void AddLinkOptions(CLI::App& app, Arguments& arguments) {
+  AddWord<EInstanceType>(
+      app,
+      "--link",
+      "The cable: serial (default), usb or any",
+      "LINK",
+      {{"serial", eInstanceSerial}, {"usb", eInstanceUSB}, {"any", eInstanceAny}},
+      arguments.link);
+  AddWord<EProtocol>(
+      app,
+      "--protocol",
+      "The family: any (default), quorin or velmar",
+      "FAMILY",
+      {{"any", eProtocolAny}, {"quorin", eProtocolQuorin}, {"velmar", eProtocolVelmar}},
+      arguments.protocol);
+  app.get_option("--link")->envname("RCVLINK_LINK");
+  app.get_option("--protocol")->envname("RCVLINK_PROTOCOL");
+  app.add_option("--speed", arguments.speed, "Try this speed only, instead of searching for it")
+      ->check(CLI::Range(kSlowestSpeed, kFastestSpeed).description(""))
+      ->option_text("BITS/S")
+      ->envname("RCVLINK_SPEED");
+  AddWord<RtsMode>(app,
+                   "--rts",
+                   "Try this RTS only: handshake, on, off (with --speed: on)",
+                   "MODE",
+                   {{"handshake", RtsMode::kHandshake},
+                    {"on", RtsMode::kOn},
+                    {"enable", RtsMode::kOn},
+                    {"off", RtsMode::kOff},
+                    {"disable", RtsMode::kOff}},
+                   arguments.rts);
+}
+
+/// Where a user's own options are read from, when the file is there.
+std::string DefaultConfig() {
+  const char* const folder = std::getenv("APPDATA");
+  return folder == nullptr ? "" : std::string(folder) + "\\rcvlink\\rcvlink-cli.ini";
+}
+
+/// The options of all commands.
+void AddOptions(CLI::App& app, Arguments& arguments) {
+  AddLinkOptions(app, arguments);
+  arguments.stall_timeout_s = kDefaultStallTimeoutS;
+  app.add_option("--stall-timeout",
+                 arguments.stall_timeout_s,
+                 "End a download that brings nothing new (30; 0: never)")
+      ->check(CLI::Range(0U, kLongestStallTimeoutS).description(""))
+      ->option_text("SECONDS");
+  AddText(app,
+          "--report",
+          "Trace the library's doings into this file in %TEMP%",
+          "NAME",
+          arguments.report);
+  AddFlag(app, "--force", "Overwrite files of this computer that exist already", arguments.force);
+  AddWord<ProgressMode>(app,
+                        "--progress",
+                        "auto (a bar, or lines), bar, lines, json or none",
+                        "HOW",
+                        {{"auto", ProgressMode::kAuto},
+                         {"bar", ProgressMode::kBar},
+                         {"lines", ProgressMode::kLines},
+                         {"json", ProgressMode::kJson},
+                         {"none", ProgressMode::kNone}},
+                        arguments.progress);
+  app.set_config("--config", DefaultConfig(), "Read options from this file: json = true")
+      ->option_text("FILE");
+  AddFlag(app, "--json", "Print one JSON value, errors included", arguments.json);
+  AddFlag(app,
+          "--verbose",
+          "Tell more: SHA-256 of downloads, why --link any tried USB",
+          arguments.verbose);
+  AddFlag(app, "--quiet", "Print only errors and what was asked for", arguments.quiet);
+}
+
+void AddCommands(CLI::App& app, Arguments& arguments, const Commands& commands) {
+  for (const auto& command : commands) {
+    CLI::App* const sub = app.add_subcommand(command->text().word, command->text().summary);
+    command->AddOptions(*sub, arguments);
+    sub->footer(command->text().examples);
+  }
+}
+
+/// "ports, find or check"
+std::string Words(const Commands& commands) {
+  std::string words;
+  for (std::size_t i = 0; i < commands.size(); ++i) {
+    if (i > 0) words += i + 1 == commands.size() ? " or " : ", ";
+    words += commands[i]->text().word;
+  }
+  return words;
+}
+
+/// Why the parser did not take the words.
+Failure ParseFailure(const CLI::App& app, const CLI::ParseError& error, const Commands& commands) {
+  const std::vector<std::string> rest = app.remaining();
+  if (!app.get_subcommands().empty() || rest.empty() || rest.front().starts_with('-')) {
+    return UsageError(Printable(ToUtf16(error.what())));
+  }
+  const std::string word = Printable(ToUtf16(Unmarked(rest.front())));
+  const std::string similar = MostLike(Lowered(word), commands);
+  return UsageError(
+      "there is no command " + word +
+      (similar.empty() ? "; there is " + Words(commands) : "; did you mean " + similar + "?"));
+}
+
+std::unique_ptr<Command> TakeChosen(const CLI::App& app, Commands& commands) {
+  for (auto& command : commands) {
+    if (app.got_subcommand(command->text().word)) return std::move(command);
+  }
+  throw UsageError("a command is missing: " + Words(commands));
+}
+
+void CheckArguments(const Arguments& arguments, bool needs_port) {
+  const bool control = std::any_of(arguments.port.begin(), arguments.port.end(), IsControl);
+  if ((needs_port && arguments.port.empty()) || control) {
+    throw UsageError("the port's name is empty or garbled");
+  }
+  if (needs_port && arguments.link == eInstanceUSB && (arguments.speed || arguments.rts)) {
+    throw UsageError("--speed and --rts are about serial ports, not about --link usb");
+  }
+  if (!arguments.report.empty() && !IsPlainFileName(arguments.report)) {
+    throw UsageError("the report's name must be a bare file name: " + Printable(arguments.report));
+  }
+}
+
+/// Reads the words and checks them, as far as the parser's own checks do not do that.
+CommandLine Checked(CLI::App& app, Arguments& arguments, Commands commands) {
+  std::unique_ptr<Command> command = TakeChosen(app, commands);
+  arguments.port = PlainPortName(arguments.port);
+  const CLI::Option* const port =
+      app.get_subcommand(command->text().word)->get_option_no_throw("PORT");
+  try {
+    CheckArguments(arguments, port != nullptr && (port->count() > 0 || !arguments.port.empty()));
+    command->Check();
+  } catch (Failure& failure) {
+    failure.tried = std::string("start `") + command->text().word + "`";
+    failure.port = Printable(arguments.port);
+    throw;
+  }
+  return {std::move(arguments), std::move(command)};
+}
+
+}  // namespace
+
+std::variant<CommandLine, HelpText> ParseCommandLine(const std::vector<std::string>& args,
+                                                     Commands commands) {
+  CLI::App app("Reaches Quorin and Velmar GNSS receivers on this computer's ports.", "rcvlink-cli");
+  app.formatter(std::make_shared<HelpFormatter>());
+  app.get_formatter()->column_width(kHelpColumn);
+  app.allow_windows_style_options(false);  // a file's name may begin with a slash
+  app.fallthrough();
+  app.require_subcommand(0, 1);  // none: `TakeChosen` says it better
+  app.set_version_flag("--version", "rcvlink-cli " RCVLINK_VERSION);
+  Arguments arguments;
+  AddOptions(app, arguments);
+  AddCommands(app, arguments, commands);
+  app.footer(Examples());  // after the commands, which would inherit it
+  try {
+    app.parse(Hidden(WithHelp(args)));
+  } catch (const CLI::ParseError& error) {
+    if (error.get_exit_code() != 0) throw ParseFailure(app, error, commands);
+    std::ostringstream text;
+    app.exit(error, text, text);
+    return HelpText{text.str()};
+  }
+  return Checked(app, arguments, std::move(commands));
+}
+
+}  // namespace cli
