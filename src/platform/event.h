@@ -1,4 +1,4 @@
-// The questions that every layer asks of an event.
+// The question that every layer asks of an event.
 #ifndef RCVLINK_PLATFORM_EVENT_H_
 #define RCVLINK_PLATFORM_EVENT_H_
 
@@ -7,11 +7,6 @@
 // Whether the event is signalled, without waiting. A null event never is.
 inline bool IsSignalled(HANDLE event) {
   return event != nullptr && WaitForSingleObject(event, 0) == WAIT_OBJECT_0;
-}
-
-// Whether it can be waited for at all: a null event and a handle that is none cannot.
-inline bool IsWaitable(HANDLE event) {
-  return event != nullptr && WaitForSingleObject(event, 0) != WAIT_FAILED;
 }
 
 #endif  // RCVLINK_PLATFORM_EVENT_H_

@@ -86,23 +86,22 @@ void CQuorinProtocol::SetReceiverBack(DWORD speed) {
 
 void CQuorinProtocol::RestoreSpeed(DWORD saved_speed) {
   if (saved_speed == 0 || saved_speed >= kTransferSpeed) return;
+  // The abort that ended the transfer does not end this wait: the receiver changes its speed after its
+  // answer.
+  abort_.ClearCancel();
   CSetBoudRateCmd set_speed(saved_speed, kCommandFlags);
-  set_speed.SendWhole();
   ThrowIfFailed(ExecuteCommand(set_speed));
   ThrowIfFailed(connection()->SetSpeed(saved_speed));
 }
 
 HRESULT CQuorinProtocol::Transfer(const wchar_t* name, IStream* stream, EInstanceType link) {
   ThrowIfAborted();
-  // What is sent at the raised speed is sent whole: half a line in front of it would spoil the command
-  // that puts the speed back.
   CQuorinCommand line_end("\n", kCommandFlags);
-  line_end.SendWhole();
   ThrowIfFailed(ExecuteCommand(line_end));
+  ThrowIfAborted();
 
   const std::string narrow_name = ToNarrow(name);
   CGetFileSizeCmd get_size(narrow_name, kCommandFlags);
-  get_size.SendWhole();
   ThrowIfFailed(ExecuteCommand(get_size));
   ThrowIfAborted();
   const int size = get_size.Size();
@@ -113,7 +112,6 @@ HRESULT CQuorinProtocol::Transfer(const wchar_t* name, IStream* stream, EInstanc
   Trace(L"CQuorinProtocol::DownloadFile - file size [%s] is %i bytes\r\n", name, size);
 
   CGetFileCmd get_file(narrow_name, kBlockPayload, kCommandFlags);
-  get_file.SendWhole();
   ThrowIfFailed(ExecuteCommand(get_file));
   if (abort_.Take()) {
     EndTransfer();  // the receiver has heard the command and waits for a control byte

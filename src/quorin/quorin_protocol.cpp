@@ -49,6 +49,8 @@ CQuorinProtocol::CQuorinProtocol(std::unique_ptr<CIConnection> connection)
       download_read_timeout_ms_(ReadDownloadReadTimeout()) {}
 
 HRESULT CQuorinProtocol::ExecuteCommand(CQuorinCommand& command) {
+  // Half a line, or a tag alone, would stand in front of the next command.
+  command.SendWhole();
   const HRESULT result = ExecuteAsCurrent(command);
   if (connection()) DumpInvalidResponse(connection(), command);
   return FAILED(result) ? result : command.Result();
@@ -182,9 +184,7 @@ HRESULT CQuorinProtocol::ChangePort(MakeCommand make_command) {
   return port_index < 0 ? S_FALSE : SendPortSetting(make_command(port_index));
 }
 
-// Half a line would leave it open which setting the receiver has.
 HRESULT CQuorinProtocol::SendPortSetting(CQuorinCommand&& command) {
-  command.SendWhole();
   const HRESULT result = ExecuteCommand(command);
   return FAILED(result) ? result : S_OK;
 }

@@ -2,7 +2,9 @@
 #ifndef RCVLINK_TRANSPORT_WAIT_SCOPE_H_
 #define RCVLINK_TRANSPORT_WAIT_SCOPE_H_
 
-#include "platform/event.h"
+#include <utility>
+
+#include "platform/handle.h"
 #include "transport/connection.h"
 
 class WaitScope {
@@ -15,7 +17,11 @@ class WaitScope {
 
   // The host's event ends a Read too. A null event, or a handle that is none, ends nothing.
   static WaitScope Watching(CIConnection* connection, HANDLE event) {
-    return WaitScope(connection, {.watched = IsWaitable(event) ? event : nullptr});
+    // A handle of our own, as the host may close its own meanwhile.
+    HANDLE copy = nullptr;
+    const HANDLE process = GetCurrentProcess();
+    if (event) DuplicateHandle(process, event, process, &copy, SYNCHRONIZE, FALSE, 0);
+    return WaitScope(connection, {.watched = copy}, KernelHandle(copy));
   }
 
   WaitScope(const WaitScope&) = delete;
@@ -23,11 +29,14 @@ class WaitScope {
   ~WaitScope() { connection_->ExchangeWaitRule(previous_); }
 
  private:
-  WaitScope(CIConnection* connection, const WaitRule& rule)
-      : connection_(connection), previous_(connection->ExchangeWaitRule(rule)) {}
+  WaitScope(CIConnection* connection, const WaitRule& rule, KernelHandle watched = {})
+      : connection_(connection),
+        previous_(connection->ExchangeWaitRule(rule)),
+        watched_(std::move(watched)) {}
 
   CIConnection* connection_;
   WaitRule previous_;
+  KernelHandle watched_;
 };
 
 #endif  // RCVLINK_TRANSPORT_WAIT_SCOPE_H_

@@ -91,7 +91,7 @@ HRESULT CVelmarProtocol::DownloadLocked(const wchar_t* name, IStream* stream) {
   bool is_aborted = false;
   if (is_sending) {
     CUnlogAllCommand stop_sending;
-    is_aborted = ExecuteCommand(stop_sending) == S_FALSE;
+    is_aborted = ExecuteForCertain(stop_sending) == S_FALSE;
   }
   if (saved_speed == 0 || saved_speed >= kTransferSpeed) return result;
   // What the put-back gives replaces what the transfer gave.
@@ -109,7 +109,15 @@ HRESULT CVelmarProtocol::RaiseReceiver(DWORD speed) {
   PortConfigLog settings = raised_port_;
   settings.baud = static_cast<int>(speed);
   CSetPortParamsCmd set_port(settings);
-  const HRESULT result = ExecuteUnstopped(set_port);
+  const HRESULT result = ExecuteForCertain(set_port);
+  if (result == S_FALSE) {
+    // Nobody knows whether it has changed its speed: it is told the old one at the new one.
+    DWORD old_speed = 0;
+    ThrowIfFailed(connection()->GetSpeed(&old_speed));
+    ThrowIfFailed(connection()->SetSpeed(speed));
+    ThrowIfFailed(RestoreSpeed(old_speed, /*is_aborted=*/true));
+    throw HResultError(S_FALSE);
+  }
   return result == S_OK && IsRefusal(set_port) ? S_FALSE : result;
 }
 
@@ -138,7 +146,7 @@ HRESULT CVelmarProtocol::TellSpeed(DWORD speed, bool is_aborted) {
   settings.baud = static_cast<int>(speed);
   CSetPortParamsCmd set_port(settings);
   if (is_aborted) set_port.SetFlags(kSendOnly);
-  const HRESULT result = ExecuteCommand(set_port);
+  const HRESULT result = ExecuteForCertain(set_port);
   if (is_aborted || result == S_FALSE) {
     // The line must have left before the host changes its own speed; an answer would have shown that.
     connection()->Flush();

@@ -198,7 +198,8 @@ HRESULT CVelmarCommand::ParseAsciiMessage(const char* text, bool* done) {
   const HRESULT header_result = ParseAsciiHeader(text, static_cast<uint32_t>(separator - text));
   if (FAILED(header_result)) return header_result;
   const char* const body = separator + 1;
-  const HRESULT parse_result = ParseMessageBody(body, static_cast<uint32_t>(std::strlen(body)), done);
+  const HRESULT parse_result =
+      ParseMessageBody(body, static_cast<uint32_t>(std::strlen(body)), done);
   return FAILED(parse_result) ? parse_result : S_OK;
 }
 

@@ -38,15 +38,17 @@ CVelmarProtocol::CVelmarProtocol(std::unique_ptr<CIConnection> connection)
 
 HRESULT CVelmarProtocol::ExecuteCommand(CVelmarCommand& command) {
   AwaitLateAnswer();
-  const HRESULT result = ExecuteAsCurrent(command);
-  if (result == S_FALSE) cut_off_at_ = CurrentClock().Ticks();
-  DumpInvalidResponse(result, connection(), command);
-  return result;
+  return Conclude(ExecuteAsCurrent(command), command);
 }
 
-HRESULT CVelmarProtocol::ExecuteUnstopped(CVelmarCommand& command) {
-  const WaitScope shield = WaitScope::Shielded(connection());
-  const HRESULT result = command.Execute(connection(), nullptr);
+// An abort marks the current command, and a marked one is not sent. This one is not the current one.
+HRESULT CVelmarProtocol::ExecuteForCertain(CVelmarCommand& command) {
+  AwaitLateAnswer();
+  return Conclude(command.Execute(connection(), nullptr), command);
+}
+
+HRESULT CVelmarProtocol::Conclude(HRESULT result, const CVelmarCommand& command) {
+  if (result == S_FALSE) cut_off_at_ = CurrentClock().Ticks();
   DumpInvalidResponse(result, connection(), command);
   return result;
 }

@@ -38,9 +38,11 @@ class CVelmarProtocol : public CAbstractProtocol, public VelmarCommands::CReadFi
 
   bool IsAnswering(HANDLE abort_event) override;
 
-  // Runs a command that no abort stops, because the host must know what became of it. An abort that
-  // comes meanwhile ends the first wait after it.
-  HRESULT ExecuteUnstopped(VelmarCommands::CVelmarCommand& command);
+  // Runs a command whose line goes out whatever comes: an abort ends only the wait for its answer.
+  HRESULT ExecuteForCertain(VelmarCommands::CVelmarCommand& command);
+
+  // Notes whether the command was cut off, and writes a failure to the report.
+  HRESULT Conclude(HRESULT result, const VelmarCommands::CVelmarCommand& command);
 
   // Lets the answer come of a command that was cut off: answers do not tell to which command they
   // belong, and the next command would take it for its own.

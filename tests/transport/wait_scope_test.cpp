@@ -14,6 +14,14 @@ using testing::ElementsAre;
 
 namespace {
 
+// Another handle of the event.
+MATCHER_P(IsHandleOf, event, "") {
+  SetEvent(event);
+  const DWORD signalled = WaitForSingleObject(arg, 0);
+  ResetEvent(event);
+  return arg != event && signalled == WAIT_OBJECT_0 && WaitForSingleObject(arg, 0) == WAIT_TIMEOUT;
+}
+
 KernelHandle MakeEvent() { return KernelHandle(CreateEventW(nullptr, TRUE, FALSE, nullptr)); }
 
 class WaitScopeTest : public testing::Test {
@@ -59,7 +67,7 @@ TEST_F(WaitScopeTest, TheWatchedEventEndsReadsBesideTheCancel) {
   const HANDLE cancel = connection.GetAbortEvent();
   {
     const WaitScope watching = WaitScope::Watching(&connection, event.get());
-    EXPECT_THAT(WaitedForByRead(), ElementsAre(cancel, event.get()));
+    EXPECT_THAT(WaitedForByRead(), ElementsAre(cancel, IsHandleOf(event.get())));
     device.wait_answer = WAIT_OBJECT_0 + 1;
     BYTE byte = 0;
     DWORD count = 0;
@@ -81,14 +89,29 @@ TEST_F(WaitScopeTest, AShieldInsideKeepsWhatIsWatchedForAfterIt) {
     const WaitScope shield = WaitScope::Shielded(&connection);
     const WaitScope inner = WaitScope::Shielded(&connection);
   }
-  EXPECT_THAT(WaitedForByRead(), ElementsAre(connection.GetAbortEvent(), event.get()));
+  EXPECT_THAT(WaitedForByRead(), ElementsAre(connection.GetAbortEvent(), IsHandleOf(event.get())));
 }
 
 TEST_F(WaitScopeTest, AnOutsideAbortEventStillTakesThePlaceOfTheCancel) {
   const KernelHandle outside = MakeEvent();
   connection.SetAbortEvent(outside.get());
   const WaitScope watching = WaitScope::Watching(&connection, event.get());
-  EXPECT_THAT(WaitedForByRead(), ElementsAre(outside.get(), event.get()));
+  EXPECT_THAT(WaitedForByRead(), ElementsAre(outside.get(), IsHandleOf(event.get())));
+}
+
+// Looking at an event that resets itself would clear it.
+TEST_F(WaitScopeTest, ASignalledEventStaysSignalled) {
+  const KernelHandle own(CreateEventW(nullptr, FALSE, TRUE, nullptr));
+  const WaitScope watching = WaitScope::Watching(&connection, own.get());
+  EXPECT_EQ(WaitForSingleObject(own.get(), 0), WAIT_OBJECT_0);
+}
+
+TEST_F(WaitScopeTest, AnEventThatTheHostClosesIsStillWatched) {
+  KernelHandle own = MakeEvent();
+  const WaitScope watching = WaitScope::Watching(&connection, own.get());
+  own.Reset();
+  ASSERT_EQ(WaitedForByRead().size(), 2u);
+  EXPECT_EQ(WaitForSingleObject(WaitedForByRead()[1], 0), WAIT_TIMEOUT);
 }
 
 TEST_F(WaitScopeTest, AHandleThatIsNoneIsNotWatched) {

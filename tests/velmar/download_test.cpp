@@ -452,6 +452,25 @@ TEST_F(VelmarDownload, AnAbortAtRaisedSpeedPutsTheSpeedBack) {
   EXPECT_EQ(driver.DeleteFile(L"a"), S_FALSE);
 }
 
+// Nobody knows whether the receiver took the higher speed: it is told the old one at the higher one.
+TEST_F(VelmarDownload, AnAbortWhileTheReceiverConfirmsItsSpeedPutsItBackAtOnce) {
+  Serve(3);
+  connection->speed = 9600;
+  std::vector<DWORD> speeds;
+  before_command = [&](const std::string& command) {
+    if (command == kRaise) {
+      answers[kRaise].clear();
+      driver.Abort();
+    }
+    if (command == kRestore) speeds.push_back(connection->speed);
+  };
+  EXPECT_EQ(Download(), S_FALSE);
+  EXPECT_THAT(connection->Writes(), ElementsAre(kConfig, kRaise, kRestore));
+  EXPECT_THAT(speeds, ElementsAre(115200u));
+  EXPECT_EQ(connection->speed, 9600u);
+  EXPECT_FALSE(report.Has("CVelmarCommand::Execute - read failed [0x800705B4]"));
+}
+
 // What may still be sending is told to stop, at any speed; what has not begun is not.
 class VelmarUnfinishedDownload : public VelmarDownload {
  protected:
@@ -557,6 +576,22 @@ TEST_F(VelmarAbortedPutBack, WhileItIsAskedForItsSettings) {
 TEST_F(VelmarAbortedPutBack, WhileItConfirmsItsSpeed) {
   EXPECT_THAT(DownloadAndAbortAt(kRestoreEven), ElementsAre(kStop, kConfig, kRestoreEven));
   EXPECT_EQ(TimesTimedOut(), 0u);
+  EXPECT_EQ(connection->speed, 9600u);
+}
+
+// Just before the line is written, when a command would be ended without being sent.
+TEST_F(VelmarAbortedPutBack, AsTheLineIsAboutToBeSent) {
+  const auto discard = connection->on_flush;
+  bool asked = false;
+  connection->on_flush = [&] {
+    if (asked) driver.Abort();
+    return discard();
+  };
+  before_command = [&](const std::string& command) {
+    asked = connection->speed == 115200 && command == kConfig;
+  };
+  EXPECT_EQ(Download(), S_OK);
+  EXPECT_EQ(connection->Writes().back(), kRestoreEven);
   EXPECT_EQ(connection->speed, 9600u);
 }
 

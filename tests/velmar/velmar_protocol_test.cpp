@@ -117,14 +117,17 @@ TEST_F(VelmarDriver, AFailedSecondProbeCommandIsNoReceiver) {
 
 TEST_F(VelmarDriver, TheProbeWatchesTheEventWhileItWaits) {
   const Event event(false);
-  HANDLE watched = nullptr;
+  DWORD watched = WAIT_FAILED;
   before_command = [&](const std::string& command) {
     if (command != kUnlogAll) return;
-    connection->Give({S_OK, kOkPrompt, [&] { watched = connection->wait_rule.watched; }});
+    connection->Give({S_OK, kOkPrompt, [&] {
+                        SetEvent(event.get());
+                        watched = WaitForSingleObject(connection->wait_rule.watched, 0);
+                      }});
   };
   short answer = 99;
   driver.CheckConnection(event.get(), &answer);
-  EXPECT_EQ(watched, event.get());
+  EXPECT_EQ(watched, WAIT_OBJECT_0);
   EXPECT_EQ(connection->wait_rule.watched, nullptr);
 }
 
