@@ -1,4 +1,5 @@
-// A host that aborts, closes and destroys at awkward moments, from several threads at once.
+// A host that aborts, closes and destroys at awkward moments, from several
+// threads at once.
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <windows.h>
@@ -58,7 +59,8 @@ TEST(ApiAwkwardMoments, EventIsClosedDuringTheCheck) {
 
 class ApiAwkwardProgress : public testing::TestWithParam<int> {};
 
-// The download's own thread lets the receiver go, with locks of the receiver held.
+// The download's own thread lets the receiver go, with locks of the receiver
+// held.
 TEST_P(ApiAwkwardProgress, ReceiverIsClosed) {
   const bed::SimulatedPort port({"quorin"}, {{"A.log", host::Content(1500)}});
   void* const handle = host::Receiver(port).Release();
@@ -82,7 +84,8 @@ struct Silence {
 
 class ApiAwkwardVelmarDownload : public testing::TestWithParam<Silence> {};
 
-// An abort before the file is asked for is followed by no command that stops one.
+// An abort before the file is asked for is followed by no command that stops
+// one.
 TEST_P(ApiAwkwardVelmarDownload, IsAbortedBeforeTheFileComes) {
   host::Velmar receiver({"--mute", std::string(GetParam().command) + "@1"},
                         {{"A.log", host::Content(5000)}},
@@ -105,7 +108,8 @@ INSTANTIATE_TEST_SUITE_P(
     testing::Values(Silence{"currentfile", "CVelmarProtocol::DownloadFile - connection is locked"},
                     Silence{"log filehdra", "CGetFileHeaderCmd::CGetFileHeaderCmd"}));
 
-// Threads that work on one receiver without looking at each other, while two more abort.
+// Threads that work on one receiver without looking at each other, while two
+// more abort.
 void WorkAndAbort(void* handle) {
   constexpr auto kDuration = std::chrono::seconds(3);
   std::atomic<bool> is_over = false;
@@ -173,6 +177,148 @@ TEST(ApiAwkwardMoments, ManyThreadsOnUsb) {
   const host::UsbReceiver receiver(usb);
   WorkAndAbort(receiver.get());
   ExpectNothingIsLeft(receiver);
+}
+
+// What ends because of an abort, and not because somebody waited long enough.
+constexpr auto kSoon = std::chrono::seconds(6);
+
+template <typename Result>
+bool EndsSoon(const std::future<Result>& call) {
+  return call.wait_for(kSoon) == std::future_status::ready;
+}
+
+// An event that resets itself once somebody has looked at it.
+class SelfResettingEvent {
+ public:
+  SelfResettingEvent() : handle_(CreateEventW(nullptr, FALSE, TRUE, nullptr)) {}
+  SelfResettingEvent(const SelfResettingEvent&) = delete;
+  SelfResettingEvent& operator=(const SelfResettingEvent&) = delete;
+  ~SelfResettingEvent() { CloseHandle(handle_); }
+  HANDLE get() const { return handle_; }
+
+ private:
+  HANDLE handle_;
+};
+
+// The step that spends the signal is the step that ends the check.
+TEST(ApiAwkwardMoments, SelfResettingEventEndsTheCheckOnAPort) {
+  const bed::SimulatedPort port({"quorin"});
+  const host::Receiver receiver(port);
+  EXPECT_EQ(Check(receiver.get(), SelfResettingEvent().get()), 0);
+  EXPECT_EQ(receiver.Check(), -1);
+}
+
+TEST(ApiAwkwardMoments, SelfResettingEventEndsTheCheckOnUsb) {
+  const bed::SimulatedUsb usb({"quorin"});
+  const host::UsbReceiver receiver(usb);
+  EXPECT_EQ(Check(receiver.get(), SelfResettingEvent().get()), 0);
+  EXPECT_EQ(receiver.Check(), -1);
+}
+
+TEST(ApiAwkwardMoments, SelfResettingEventEndsTheCheckOfAVelmarReceiver) {
+  const host::Velmar receiver({});
+  EXPECT_EQ(Check(receiver.get(), SelfResettingEvent().get()), 0);
+  EXPECT_EQ(Check(receiver.get()), -1);
+}
+
+// The receiver takes a moment to change its speed. The abort came when the last
+// block was in: the download returns when both ends are at the old speed.
+TEST(ApiAwkwardMoments, QuorinDownloadIsAbortedWithItsLastBlock) {
+  const bed::SimulatedPort port({"quorin", "--reply-silence", "0.3:set,cur/term/rate"},
+                                {{"A.log", host::Content(1500)}});
+  const host::Receiver receiver(port);
+  host::MemoryStream stream;
+  host::Progress progress([&](int percent) {
+    if (percent == 100) devapi::Abort(receiver.get());
+  });
+  EXPECT_EQ(receiver.Download(L"A.log", stream, &progress), S_FALSE);
+  EXPECT_EQ(receiver.Check(), -1) << port.Transcript();
+}
+
+// The second abort ends a wait of the put-back. The next command is heard all
+// the same.
+TEST(ApiAwkwardMoments, VelmarDownloadIsAbortedTwice) {
+  host::Velmar receiver({"--pace", "--reply-silence", "0.3:COM"},
+                        {{"A.log", host::Content(600000)}});
+  host::MemoryStream stream;
+  auto download = host::OnThread([&] { return receiver.Download(L"A.log", stream); });
+  receiver.port.WaitForTranscript(" offset=2048 ");
+  devapi::Abort(receiver.get());
+  receiver.port.WaitForTranscript(R"(> unlogall thisport\r)"
+                                  "\n- transfer stopped");
+  devapi::Abort(receiver.get());
+  EXPECT_TRUE(EndsSoon(download));
+  EXPECT_EQ(download.get(), S_OK);
+  auto deletion = host::OnThread([&] { return receiver.Delete(L"X.log"); });
+  EXPECT_TRUE(EndsSoon(deletion));
+  EXPECT_EQ(deletion.get(), S_FALSE);
+  EXPECT_THAT(receiver.Sent(), Contains(R"(del file X.log\r)")) << receiver.port.Transcript();
+}
+
+// One works, the other waits for its turn. Nobody can reach either of them to
+// abort it.
+TEST(ApiAwkwardMoments, DestructionEndsAllThatRuns) {
+  bed::SimulatedPort port({"quorin"});
+  std::wstring name = port.name();
+  void* const handle = host::Receiver(port).Release();
+  const host::Report report;
+  port.Pause();
+  auto first = host::OnThread([&] { return Delete(handle); });
+  report.WaitFor(kQuorinReads);
+  const size_t before = report.Lines().size();
+  auto second = host::OnThread([&] { return Delete(handle); });
+  report.WaitFor("CAbstractReceiver::DeleteFile", before);
+  EXPECT_EQ(devapi::DestroyReceiver(name.data()), S_OK);
+  EXPECT_TRUE(EndsSoon(first));
+  EXPECT_TRUE(EndsSoon(second));
+  EXPECT_EQ(first.get(), S_FALSE);
+  EXPECT_EQ(second.get(), S_FALSE);
+  port.Resume();
+}
+
+// A receiver that never answers the command that raises its speed.
+TEST(ApiAwkwardMoments, AbortEndsTheRaisingOfTheSpeed) {
+  host::Velmar receiver({"--mute", "COM"}, {{"A.log", "content"}});
+  host::MemoryStream stream;
+  const host::Report report;
+  auto download = host::OnThread([&] { return receiver.Download(L"A.log", stream); });
+  report.WaitFor("CSetPortParamsCmd::CSetPortParamsCmd");
+  // The first abort ends this wait, a further one that of the put-back.
+  const auto start = std::chrono::steady_clock::now();
+  do {
+    devapi::Abort(receiver.get());
+  } while (download.wait_for(std::chrono::milliseconds(200)) != std::future_status::ready &&
+           std::chrono::steady_clock::now() - start < kSoon);
+  EXPECT_LT(std::chrono::steady_clock::now() - start, kSoon);
+  download.get();
+}
+
+// An aborted command leaves nothing on the line in front of the next.
+TEST(ApiAwkwardMoments, AbortedCommandIsNotLeftHalfSent) {
+  const bed::SimulatedUsb usb({"quorin"});
+  const host::UsbReceiver receiver(usb);
+  devapi::Abort(receiver.get());
+  EXPECT_EQ(receiver.Identify().result, S_FALSE);
+  EXPECT_EQ(receiver.Identify().result, S_OK);
+  for (const std::string& line : receiver.SentSince()) {
+    EXPECT_THAT(line,
+                testing::AnyOf(R"(%#%print,/par/rcvid\r\n)", R"(%#%print,/par/rcv/model\r\n)"));
+  }
+}
+
+// The operation ends at its next step, not one silence later.
+TEST(ApiAwkwardMoments, QuorinDownloadIsAbortedInItsFirstCommand) {
+  bed::SimulatedPort port({"quorin", "--speed", "115200"}, {{"A.log", "content"}});
+  const host::Receiver receiver(port, CBR_115200);
+  const host::Report report;
+  host::MemoryStream stream;
+  port.Pause();
+  auto download = host::OnThread([&] { return receiver.Download(L"A.log", stream); });
+  report.WaitFor(kQuorinReads);
+  devapi::Abort(receiver.get());
+  EXPECT_TRUE(EndsSoon(download));
+  EXPECT_EQ(download.get(), S_FALSE);
+  port.Resume();
 }
 
 }  // namespace
