@@ -21,28 +21,28 @@ struct Context {
   Output& out;
   Output& err;
 
-  /// Prints what was asked for, unless it is asked for as JSON.
-  void Say(const std::string& text) {
+  /// Standard output: what was asked for, unless it is asked for as JSON.
+  void PrintResult(const std::string& text) {
     if (!arguments.json) out.Write(text);
   }
 
-  /// Prints that something was done.
-  void Tell(const std::string& text) {
-    if (!arguments.quiet) Say(text);
+  /// Standard output: that something was done; not with --quiet.
+  void PrintDone(const std::string& text) {
+    if (!arguments.quiet) PrintResult(text);
   }
 
-  /// Tells what is going on besides.
-  void Note(const std::string& text) {
+  /// Standard error: what is going on; not with --quiet or --json.
+  void PrintStatus(const std::string& text) {
     if (!arguments.quiet && !arguments.json) err.Write(text);
   }
 
-  /// Tells what a reader of the result has to know, also one of JSON.
-  void Warn(const std::string& text) {
+  /// Standard error: what a reader of the result has to know, also one of JSON; not with --quiet.
+  void PrintWarning(const std::string& text) {
     if (!arguments.quiet) err.Write(text);
   }
 
-  /// Reports a failure after which the command goes on; JSON has it in its document.
-  void Complain(const Failure& failure) {
+  /// Standard error: a failure after which the command goes on; JSON has it in its document.
+  void PrintFailure(const Failure& failure) {
     if (!arguments.json) err.Write(Describe(failure));
   }
 };

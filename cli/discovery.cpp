@@ -22,7 +22,7 @@ class SearchNote {
     if (!context.err.is_terminal()) return;
     const Arguments& arguments = context.arguments;
     if (arguments.link != eInstanceUSB && !IsOneTry(arguments)) {
-      context.Note(
+      context.PrintStatus(
           "Up to 18 tries of speed and RTS, some minutes on a silent port. Known speed? Then say "
           "--speed N.\n");
     }
@@ -31,7 +31,7 @@ class SearchNote {
 
   ~SearchNote() {
     ticker_.reset();
-    if (!line_.empty()) context_.Note(Erased(line_.size()));
+    if (!line_.empty()) context_.PrintStatus(Erased(line_.size()));
   }
 
   SearchNote(const SearchNote&) = delete;
@@ -44,7 +44,7 @@ class SearchNote {
     constexpr std::uint64_t kMsPerSecond = 1000;
     line_ = "Searching " + Printable(context_.arguments.port) + " ... " +
             FormatDuration((GetTickCount64() - start_) / kMsPerSecond) + " (Ctrl-C ends it)";
-    context_.Note(Redrawn(line_, line_.size()));
+    context_.PrintStatus(Redrawn(line_, line_.size()));
   }
 
   Context& context_;

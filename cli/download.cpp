@@ -67,11 +67,12 @@ std::string MeaningOfDownload(const RemoteFile& file, const FileStream& stream, 
 std::uint64_t Download(Context& context,
                        Receiver& receiver,
                        const RemoteFile& file,
-                       const std::filesystem::path& target) {
+                       const std::filesystem::path& target,
+                       bool overwrite) {
   const std::string tried = "download " + Printable(file.name);
   receiver.ThrowIfCancelled(tried);
   const std::uint64_t start_ms = GetTickCount64();
-  PartFile part(target, context.arguments.force);
+  PartFile part(target, overwrite);
   const auto stream = FileStream::Make(part);
   std::wstring name = file.name;
   long code = S_OK;

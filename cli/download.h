@@ -12,12 +12,14 @@ namespace cli {
 
 /// Copies a file, watching for silence and for Ctrl-C. The target appears only when every byte that
 /// the receiver listed is in it.
+/// @param overwrite whether the target may be replaced
 /// @return milliseconds that it took
 /// @throws Failure when the file is not complete; nothing is left of it then
 std::uint64_t Download(Context& context,
                        Receiver& receiver,
                        const RemoteFile& file,
-                       const std::filesystem::path& target);
+                       const std::filesystem::path& target,
+                       bool overwrite);
 
 }  // namespace cli
 

@@ -10,7 +10,7 @@
 #include <variant>
 #include <vector>
 
-#include "arguments.h"
+#include "command_line.h"
 #include "commands/commands.h"
 #include "context.h"
 #include "interrupt.h"
@@ -37,30 +37,6 @@ std::vector<std::string> CommandLineWords() {
   return utf8;
 }
 
-Outcome RunCommand(Context& context) {
-  switch (context.arguments.command) {
-    case Command::kPorts:
-      return RunPorts(context);
-    case Command::kFind:
-      return RunFind(context);
-    case Command::kInfo:
-      return RunInfo(context);
-    case Command::kList:
-      return RunList(context);
-    case Command::kGet:
-      return RunGet(context);
-    case Command::kRemove:
-      return RunRemove(context);
-    case Command::kMove:
-      return RunMove(context);
-    case Command::kSet:
-      return RunSet(context);
-    case Command::kCheck:
-      break;
-  }
-  return RunCheck(context);
-}
-
 /// Tells a failure in the way that was asked for.
 ExitCode Report(const Failure& failure, bool json, Output& out, Output& err) {
   if (json) {
@@ -71,12 +47,13 @@ ExitCode Report(const Failure& failure, bool json, Output& out, Output& err) {
   return failure.exit;
 }
 
-ExitCode RunArguments(const Arguments& arguments, Output& out, Output& err) {
+ExitCode RunCommand(const CommandLine& line, Output& out, Output& err) {
+  const Arguments& arguments = line.arguments;
   const Interrupt interrupt;
   Context context{arguments, interrupt, out, err};
   const ReportFile report(context);
   try {
-    const Outcome outcome = RunCommand(context);
+    const Outcome outcome = line.command->Run(context);
     if (arguments.json) out.Write(outcome.document.dump(kJsonIndent) + "\n");
     return outcome.exit;
   } catch (Failure& failure) {
@@ -89,12 +66,12 @@ ExitCode Run(Output& out, Output& err) {
   const std::vector<std::string> words = CommandLineWords();
   const bool json = std::find(words.begin(), words.end(), "--json") != words.end();
   try {
-    const auto parsed = ParseCommandLine(words);
+    const auto parsed = ParseCommandLine(words, MakeCommands());
     if (const auto* const help = std::get_if<HelpText>(&parsed)) {
       out.Write(help->text);
       return ExitCode::kDone;
     }
-    return RunArguments(std::get<Arguments>(parsed), out, err);
+    return RunCommand(std::get<CommandLine>(parsed), out, err);
   } catch (const Failure& failure) {
     return Report(failure, json, out, err);
   } catch (const std::exception& error) {

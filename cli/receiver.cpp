@@ -102,7 +102,7 @@ std::vector<RemoteFile> Receiver::ListFiles() {
     if (read != S_OK) throw FailureOf(kTried, read);
   }
   if (MayBeCut(files) && Identify().family == eProtocolVelmar) {
-    context_.Warn(
+    context_.PrintWarning(
         "Note: this list may be cut. A Velmar receiver's directory is read up to 8192 bytes, some "
         "70 "
         "files; those behind them appear when others have been deleted.\n");

@@ -15,8 +15,8 @@ ReportFile::ReportFile(Context& context) : wanted_(!context.arguments.report.emp
   const std::wstring path = folder + context.arguments.report;
   dump_hlp::CreateReportFile(context.arguments.report.c_str());
   const std::string shown = Printable(path);
-  context.Note(Exists(path) ? "The report is in " + shown + " (a hidden file).\n"
-                            : "The report " + shown + " could not be made.\n");
+  context.PrintStatus(Exists(path) ? "The report is in " + shown + " (a hidden file).\n"
+                                   : "The report " + shown + " could not be made.\n");
 }
 
 ReportFile::~ReportFile() {

@@ -6,15 +6,16 @@
 
 #include "names.h"
 #include "paths.h"
+#include "results.h"
 #include "text.h"
 
 namespace cli {
 namespace {
 
-bool NamesFolder(const Arguments& arguments) {
-  const std::wstring& output = arguments.output;
-  return arguments.all || arguments.names.size() > 1 || output.empty() || output.ends_with(L'\\') ||
-         output.ends_with(L'/') || IsFolder(output);
+bool NamesFolder(const Place& place) {
+  const std::wstring& output = place.output;
+  return place.many || output.empty() || output.ends_with(L'\\') || output.ends_with(L'/') ||
+         IsFolder(output);
 }
 
 Failure Refusal(const std::wstring& name, DWORD error, std::string meaning, std::string hint) {
@@ -27,8 +28,8 @@ Failure Refusal(const std::wstring& name, DWORD error, std::string meaning, std:
 
 }  // namespace
 
-Targets::Targets(const Arguments& arguments) : force_(arguments.force) {
-  (NamesFolder(arguments) ? folder_ : file_) = arguments.output;
+Targets::Targets(const Place& place) : force_(place.force) {
+  (NamesFolder(place) ? folder_ : file_) = place.output;
 }
 
 std::filesystem::path Targets::Choose(const std::wstring& name) {

@@ -7,14 +7,19 @@
 #include <string>
 #include <vector>
 
-#include "arguments.h"
-
 namespace cli {
+
+/// What the user said about the place of the downloads.
+struct Place {
+  std::wstring output{};  ///< a folder or a file; may be empty
+  bool many = false;      ///< more than one download: `output` is a folder
+  bool force = false;     ///< files may be overwritten
+};
 
 /// Chooses the local file of each download, and refuses those that would do harm.
 class Targets {
  public:
-  explicit Targets(const Arguments& arguments);
+  explicit Targets(const Place& place);
 
   /// The file for a name of the receiver.
   /// @throws Failure when the name is impossible, the file exists already and may not be

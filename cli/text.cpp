@@ -71,6 +71,13 @@ std::string Hex(unsigned long value, std::size_t digits) {
   return std::string(digits - std::min(digits, text.size()), '0') + text;
 }
 
+std::string Lowered(std::string text) {
+  std::transform(text.begin(), text.end(), text.begin(), [](char letter) {
+    return static_cast<char>(std::tolower(static_cast<unsigned char>(letter)));
+  });
+  return text;
+}
+
 std::string PadLeft(std::string text, std::size_t width) {
   text.insert(0, width - std::min(width, text.size()), ' ');
   return text;

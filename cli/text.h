@@ -24,6 +24,9 @@ std::string HexCode(long code);
 /// Hexadecimal digits in capitals, at least `digits` of them.
 std::string Hex(unsigned long value, std::size_t digits);
 
+/// In small letters, as far as they are of ASCII.
+std::string Lowered(std::string text);
+
 std::string PadLeft(std::string text, std::size_t width);
 std::string PadRight(std::string text, std::size_t width);
 

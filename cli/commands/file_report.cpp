@@ -18,7 +18,7 @@ void FileReport::AddDone(const std::wstring& name, const Json& details) {
 
 void FileReport::AddFailed(const std::wstring& name, Failure failure) {
   failure.port = Printable(context_.arguments.port);
-  context_.Complain(failure);
+  context_.PrintFailure(failure);
   document_["files"].push_back({{"name", ToUtf8(name)}, {"error", ToJson(failure)}});
   if (!failure_ || failure.exit == ExitCode::kCancelled) failure_ = std::move(failure);
 }
@@ -26,7 +26,7 @@ void FileReport::AddFailed(const std::wstring& name, Failure failure) {
 void FileReport::AddUntried(std::size_t count) {
   if (count == 0) return;
   const std::string files = count == 1 ? " more file was" : " more files were";
-  context_.Note("  " + std::to_string(count) + files + " not tried.\n");
+  context_.PrintStatus("  " + std::to_string(count) + files + " not tried.\n");
   document_["untried"] = count;
 }
 

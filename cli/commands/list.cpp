@@ -1,7 +1,8 @@
 #include <algorithm>
 
-#include "commands.h"
+#include "command.h"
 #include "formats.h"
+#include "options.h"
 #include "receiver.h"
 #include "text.h"
 
@@ -25,28 +26,41 @@ Json ToJson(const RemoteFile& file) {
           {"time", time == "-" ? Json(nullptr) : Json(time)}};
 }
 
+class List : public Command {
+ public:
+  using Command::Command;
+
+  void AddOptions(CLI::App& app, Arguments& arguments) override { AddPort(app, arguments); }
+
+  Outcome Run(Context& context) override {
+    constexpr std::string_view kSizeTitle = "Size";
+    Receiver receiver(context);
+    const std::vector<RemoteFile> files = receiver.ListFiles();
+    std::size_t size_width = kSizeTitle.size();
+    std::uint64_t total = 0;
+    for (const RemoteFile& file : files) {
+      size_width = std::max(size_width, std::to_string(file.size).size());
+      total += file.size;
+    }
+    if (!files.empty()) context.PrintDone(Row(std::string(kSizeTitle), size_width, "Time", "Name"));
+    Outcome outcome{.document = Json::array()};
+    for (const RemoteFile& file : files) {
+      context.PrintResult(
+          Row(std::to_string(file.size), size_width, FormatTime(file.time), Printable(file.name)));
+      outcome.document.push_back(ToJson(file));
+    }
+    const std::string count =
+        std::to_string(files.size()) + (files.size() == 1 ? " file" : " files");
+    context.PrintDone(count + ", " + std::to_string(total) + " bytes\n");
+    return outcome;
+  }
+};
+
 }  // namespace
 
-Outcome RunList(Context& context) {
-  constexpr std::string_view kSizeTitle = "Size";
-  Receiver receiver(context);
-  const std::vector<RemoteFile> files = receiver.ListFiles();
-  std::size_t size_width = kSizeTitle.size();
-  std::uint64_t total = 0;
-  for (const RemoteFile& file : files) {
-    size_width = std::max(size_width, std::to_string(file.size).size());
-    total += file.size;
-  }
-  if (!files.empty()) context.Tell(Row(std::string(kSizeTitle), size_width, "Time", "Name"));
-  Outcome outcome{.document = Json::array()};
-  for (const RemoteFile& file : files) {
-    context.Say(
-        Row(std::to_string(file.size), size_width, FormatTime(file.time), Printable(file.name)));
-    outcome.document.push_back(ToJson(file));
-  }
-  const std::string count = std::to_string(files.size()) + (files.size() == 1 ? " file" : " files");
-  context.Tell(count + ", " + std::to_string(total) + " bytes\n");
-  return outcome;
+std::unique_ptr<Command> MakeList() {
+  return std::make_unique<List>(
+      Command::Text{"ls", "List the receiver's files", "Example: rcvlink-cli ls COM7"});
 }
 
 }  // namespace cli

@@ -1,4 +1,5 @@
-#include "commands.h"
+#include "command.h"
+#include "options.h"
 #include "receiver.h"
 #include "text.h"
 
@@ -22,33 +23,61 @@ void Rename(Receiver& receiver,
   }
 }
 
+class Move : public Command {
+ public:
+  using Command::Command;
+
+  void AddOptions(CLI::App& app, Arguments& arguments) override {
+    AddPort(app, arguments);
+    AddNames(app, "OLD", "The file's name", old_names_, 1, 1);
+    AddNames(app, "NEW", "Its new name", new_names_, 1, 1);
+  }
+
+  void Check() const override {
+    CheckNames(old_names_);
+    CheckNames(new_names_);
+    if (old_names_ == new_names_) throw UsageError("the old and the new name are the same");
+  }
+
+  Outcome Run(Context& context) override {
+    const Arguments& arguments = context.arguments;
+    const std::wstring& old_name = old_names_.front();
+    const std::wstring& new_name = new_names_.front();
+    const std::string tried = "rename " + Printable(old_name) + " to " + Printable(new_name);
+    Receiver receiver(context);
+    const Identity identity = receiver.Identify();
+    if (!identity.offers_renaming()) {
+      throw Failure{
+          .tried = tried,
+          .code = E_NOTIMPL,
+          .meaning = "a " + FamilyName(identity.family) + " receiver does not offer renaming"};
+    }
+    const std::vector<RemoteFile> files = receiver.ListFiles();
+    FindFile(files, old_name, tried);
+    if (HasFile(files, new_name)) {
+      throw Failure{.tried = tried,
+                    .code = ResultOfWin32(ERROR_FILE_EXISTS),
+                    .meaning = "the receiver has a file of the new name already"};
+    }
+    Rename(receiver, old_name, new_name, tried);
+    context.PrintDone(Printable(old_name) + " is now " + Printable(new_name) + "\n");
+    return {.document = {{"port", ToUtf8(arguments.port)},
+                         {"old", ToUtf8(old_name)},
+                         {"new", ToUtf8(new_name)}}};
+  }
+
+ private:
+  std::vector<std::wstring> old_names_;
+  std::vector<std::wstring> new_names_;
+};
+
 }  // namespace
 
-Outcome RunMove(Context& context) {
-  const Arguments& arguments = context.arguments;
-  const std::wstring& old_name = arguments.names.front();
-  const std::wstring& new_name = arguments.names.back();
-  const std::string tried = "rename " + Printable(old_name) + " to " + Printable(new_name);
-  Receiver receiver(context);
-  const Identity identity = receiver.Identify();
-  if (!identity.offers_renaming()) {
-    throw Failure{
-        .tried = tried,
-        .code = E_NOTIMPL,
-        .meaning = "a " + FamilyName(identity.family) + " receiver does not offer renaming"};
-  }
-  const std::vector<RemoteFile> files = receiver.ListFiles();
-  FindFile(files, old_name, tried);
-  if (HasFile(files, new_name)) {
-    throw Failure{.tried = tried,
-                  .code = ResultOfWin32(ERROR_FILE_EXISTS),
-                  .meaning = "the receiver has a file of the new name already"};
-  }
-  Rename(receiver, old_name, new_name, tried);
-  context.Tell(Printable(old_name) + " is now " + Printable(new_name) + "\n");
-  return {.document = {{"port", ToUtf8(arguments.port)},
-                       {"old", ToUtf8(old_name)},
-                       {"new", ToUtf8(new_name)}}};
+std::unique_ptr<Command> MakeMove() {
+  return std::make_unique<Move>(
+      Command::Text{"mv",
+                    "Rename a file (only the Velmar family can)",
+                    "Example: rcvlink-cli mv COM7 LOG0001.DAT MONDAY.DAT"});
 }
 
 }  // namespace cli

@@ -1,8 +1,9 @@
 #include <map>
 #include <optional>
 
-#include "commands.h"
+#include "command.h"
 #include "file_report.h"
+#include "options.h"
 #include "receiver.h"
 #include "text.h"
 
@@ -22,8 +23,10 @@ std::optional<Failure> WhyStillThere(const std::vector<RemoteFile>& files,
 
 /// Asks for each file; stops when cancelled.
 /// @return the names that were asked for with success
-std::vector<std::wstring> RemoveAll(Context& context, Receiver& receiver, FileReport& report) {
-  const std::vector<std::wstring>& names = context.arguments.names;
+std::vector<std::wstring> RemoveAll(Context& context,
+                                    Receiver& receiver,
+                                    const std::vector<std::wstring>& names,
+                                    FileReport& report) {
   std::vector<std::wstring> removed;
   for (std::size_t i = 0; i < names.size(); ++i) {
     std::wstring name = names[i];
@@ -60,22 +63,42 @@ void Verify(Context& context,
     if (const auto failure = unread ? unread : WhyStillThere(files, name)) {
       report.AddFailed(name, *failure);
     } else {
-      context.Tell(Printable(name) + ": deleted\n");
+      context.PrintDone(Printable(name) + ": deleted\n");
       report.AddDone(name, {{"deleted", true}});
     }
   }
 }
 
+class Remove : public Command {
+ public:
+  using Command::Command;
+
+  void AddOptions(CLI::App& app, Arguments& arguments) override {
+    AddPort(app, arguments);
+    AddNames(app, "NAME", "Files as `ls` shows them", names_, 1, kMostNames);
+  }
+
+  void Check() const override { CheckNames(names_); }
+
+  Outcome Run(Context& context) override {
+    Receiver receiver(context);
+    const std::vector<RemoteFile> files = receiver.ListFiles();
+    for (const std::wstring& name : names_) FindFile(files, name, Tried(name));
+    FileReport report(context);
+    const std::vector<std::wstring> removed = RemoveAll(context, receiver, names_, report);
+    Verify(context, receiver, removed, report);
+    return std::move(report).Finish();
+  }
+
+ private:
+  std::vector<std::wstring> names_;
+};
+
 }  // namespace
 
-Outcome RunRemove(Context& context) {
-  Receiver receiver(context);
-  const std::vector<RemoteFile> files = receiver.ListFiles();
-  for (const std::wstring& name : context.arguments.names) FindFile(files, name, Tried(name));
-  FileReport report(context);
-  const std::vector<std::wstring> removed = RemoveAll(context, receiver, report);
-  Verify(context, receiver, removed, report);
-  return std::move(report).Finish();
+std::unique_ptr<Command> MakeRemove() {
+  return std::make_unique<Remove>(Command::Text{
+      "rm", "Delete receiver's files", "Example: rcvlink-cli rm COM7 LOG0001.DAT LOG0002.DAT"});
 }
 
 }  // namespace cli

@@ -10,13 +10,9 @@ namespace {
 
 class TargetsTest : public testing::Test {
  protected:
-  /// Arguments of a download of those names into the test's folder.
-  Arguments Into(std::vector<std::wstring> names, const std::wstring& output = L"") const {
-    Arguments arguments;
-    arguments.command = Command::kGet;
-    arguments.names = std::move(names);
-    arguments.output = (folder_.path() / output).native();
-    return arguments;
+  /// The place for downloads in the test's folder.
+  Place Into(const std::wstring& output = L"") const {
+    return {.output = (folder_.path() / output).native()};
   }
 
   TemporaryFolder folder_;
@@ -33,36 +29,32 @@ void ExpectRefusal(Targets& targets, const std::wstring& name) {
 }
 
 TEST_F(TargetsTest, ASingleFileMayBeNamed) {
-  Targets targets(Into({L"a"}, L"monday.dat"));
+  Targets targets(Into(L"monday.dat"));
   EXPECT_EQ(targets.Choose(L"a"), folder_.path() / L"monday.dat");
   EXPECT_TRUE(targets.folder().empty());
 }
 
 TEST_F(TargetsTest, AnExistingFolderIsAFolder) {
-  Targets targets(Into({L"a"}));
+  Targets targets(Into());
   EXPECT_EQ(targets.Choose(L"a"), folder_.path() / L"a");
 }
 
-TEST_F(TargetsTest, AFolderIsMeantBySeparatorByManyAndByAll) {
-  Targets separator(Into({L"a"}, L"new/"));
+TEST_F(TargetsTest, AFolderIsMeantBySeparatorAndByMany) {
+  Targets separator(Into(L"new/"));
   EXPECT_EQ(separator.Choose(L"a"), folder_.path() / L"new" / L"a");
-  Targets many(Into({L"a", L"b"}, L"new"));
-  EXPECT_EQ(many.Choose(L"b"), folder_.path() / L"new" / L"b");
-  Arguments arguments = Into({}, L"new");
-  arguments.all = true;
-  Targets all(arguments);
-  EXPECT_EQ(all.Choose(L"c"), folder_.path() / L"new" / L"c");
+  Place place = Into(L"new");
+  place.many = true;
+  Targets many(place);
+  EXPECT_EQ(many.Choose(L"c"), folder_.path() / L"new" / L"c");
 }
 
 TEST_F(TargetsTest, WithoutOutputItIsTheCurrentFolder) {
-  Arguments arguments;
-  arguments.names = {L"no such file"};
-  Targets targets(arguments);
+  Targets targets(Place{});
   EXPECT_EQ(targets.Choose(L"no such file"), L"no such file");
 }
 
 TEST_F(TargetsTest, NoNameLeavesTheFolder) {
-  Targets targets(Into({}));
+  Targets targets(Into());
   for (const wchar_t* name :
        {L"..", L"..\\a", L"../../b", L"C:\\c", L"\\\\h\\s\\d", L"NUL", L"e:f"}) {
     EXPECT_EQ(targets.Choose(name).parent_path(), folder_.path()) << name;
@@ -72,26 +64,26 @@ TEST_F(TargetsTest, NoNameLeavesTheFolder) {
 
 TEST_F(TargetsTest, AnExistingFileIsKeptUnlessForced) {
   folder_.Write(L"a", "precious");
-  Targets targets(Into({L"a"}));
+  Targets targets(Into());
   ExpectRefusal(targets, L"a");
-  Arguments arguments = Into({L"a"});
-  arguments.force = true;
-  Targets forced(arguments);
+  Place place = Into();
+  place.force = true;
+  Targets forced(place);
   EXPECT_EQ(forced.Choose(L"a"), folder_.path() / L"a");
 }
 
 TEST_F(TargetsTest, AFolderIsNeverOverwritten) {
   MakeFolder(folder_.path() / L"a");
-  Arguments arguments = Into({L"a"});
-  arguments.force = true;
-  Targets targets(arguments);
+  Place place = Into();
+  place.force = true;
+  Targets targets(place);
   ExpectRefusal(targets, L"a");
 }
 
 TEST_F(TargetsTest, TwoNamesNeverShareAFile) {
-  Arguments arguments = Into({});
-  arguments.force = true;
-  Targets targets(arguments);
+  Place place = Into();
+  place.force = true;
+  Targets targets(place);
   targets.Choose(L"LOG");
   ExpectRefusal(targets, L"LOG");
   ExpectRefusal(targets, L"log");

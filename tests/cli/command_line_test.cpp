@@ -1,7 +1,11 @@
-#include "arguments.h"
+#include "command_line.h"
 
 #include <gtest/gtest.h>
 
+#include <sstream>
+
+#include "commands/commands.h"
+#include "options.h"
 #include "results.h"
 
 namespace cli {
@@ -9,14 +13,18 @@ namespace {
 
 using Words = std::vector<std::string>;
 
-Arguments Parse(const Words& words) { return std::get<Arguments>(ParseCommandLine(words)); }
+CommandLine Parse(const Words& words) {
+  return std::get<CommandLine>(ParseCommandLine(words, MakeCommands()));
+}
 
-std::string Help(const Words& words) { return std::get<HelpText>(ParseCommandLine(words)).text; }
+std::string Help(const Words& words) {
+  return std::get<HelpText>(ParseCommandLine(words, MakeCommands())).text;
+}
 
 /// The failure of a line that makes no sense.
 Failure Refusal(const Words& words) {
   try {
-    ParseCommandLine(words);
+    ParseCommandLine(words, MakeCommands());
   } catch (const Failure& failure) {
     return failure;
   }
@@ -24,9 +32,10 @@ Failure Refusal(const Words& words) {
   return {};
 }
 
-TEST(ArgumentsTest, Defaults) {
-  const Arguments arguments = Parse({"find", "COM7"});
-  EXPECT_EQ(arguments.command, Command::kFind);
+TEST(CommandLineTest, Defaults) {
+  const CommandLine line = Parse({"find", "COM7"});
+  EXPECT_STREQ(line.command->text().word, "find");
+  const Arguments& arguments = line.arguments;
   EXPECT_EQ(arguments.port, L"COM7");
   EXPECT_EQ(arguments.link, eInstanceSerial);
   EXPECT_EQ(arguments.protocol, eProtocolAny);
@@ -37,18 +46,33 @@ TEST(ArgumentsTest, Defaults) {
   EXPECT_EQ(arguments.stall_timeout_s, 30U);
 }
 
-TEST(ArgumentsTest, Commands) {
-  EXPECT_EQ(Parse({"ports"}).command, Command::kPorts);
-  EXPECT_EQ(Parse({"info", "COM7"}).command, Command::kInfo);
-  EXPECT_EQ(Parse({"ls", "COM7"}).command, Command::kList);
-  EXPECT_EQ(Parse({"get", "COM7", "a"}).command, Command::kGet);
-  EXPECT_EQ(Parse({"rm", "COM7", "a"}).command, Command::kRemove);
-  EXPECT_EQ(Parse({"mv", "COM7", "a", "b"}).command, Command::kMove);
-  EXPECT_EQ(Parse({"set", "COM7", "rts", "on"}).command, Command::kSet);
-  EXPECT_EQ(Parse({"check", "COM7"}).command, Command::kCheck);
+TEST(CommandLineTest, Commands) {
+  for (const Words& words : {Words{"ports"},
+                             Words{"info", "COM7"},
+                             Words{"ls", "COM7"},
+                             Words{"get", "COM7", "a"},
+                             Words{"get", "COM7", "--all", "-o", "out\\", "--force"},
+                             Words{"rm", "COM7", "a"},
+                             Words{"mv", "COM7", "a", "b"},
+                             Words{"set", "COM7", "rts", "on"},
+                             Words{"set", "COM7", "Parity", "EVEN"},
+                             Words{"check", "COM7"}}) {
+    EXPECT_EQ(Parse(words).command->text().word, words.front());
+  }
 }
 
-TEST(ArgumentsTest, OptionsStandBeforeOrAfterTheCommand) {
+TEST(CommandLineTest, EachCommandHasItsHelp) {
+  for (const auto& command : MakeCommands()) {
+    const std::string word = command->text().word;
+    const std::string help = Help({word, "--help"});
+    EXPECT_NE(help.find(command->text().summary), std::string::npos) << help;
+    EXPECT_NE(help.find("rcvlink-cli " + word), std::string::npos) << help;
+    EXPECT_NE(Help({"--help"}).find("  " + word + "  "), std::string::npos) << word;
+    EXPECT_NE(Refusal({}).meaning.find(word), std::string::npos) << word;
+  }
+}
+
+TEST(CommandLineTest, OptionsStandBeforeOrAfterTheCommand) {
   const Words options = {"--link",
                          "any",
                          "--protocol=VELMAR",
@@ -67,8 +91,9 @@ TEST(ArgumentsTest, OptionsStandBeforeOrAfterTheCommand) {
   Words after = {"ls", "COM7"};
   after.insert(after.end(), options.begin(), options.end());
   for (const Words& words : {before, after}) {
-    const Arguments arguments = Parse(words);
-    EXPECT_EQ(arguments.command, Command::kList);
+    const CommandLine line = Parse(words);
+    EXPECT_STREQ(line.command->text().word, "ls");
+    const Arguments& arguments = line.arguments;
     EXPECT_EQ(arguments.link, eInstanceAny);
     EXPECT_EQ(arguments.protocol, eProtocolVelmar);
     EXPECT_EQ(arguments.speed, 115200U);
@@ -80,26 +105,54 @@ TEST(ArgumentsTest, OptionsStandBeforeOrAfterTheCommand) {
   }
 }
 
-TEST(ArgumentsTest, NamesAreTakenAsTheyAreTyped) {
-  const Arguments arguments =
-      Parse({"get", "COM7", "[a,b]", "{}", "get", "/x", "gr\xC3\xBC\xC3\x9F", "--", "-y", "--"});
-  const std::vector<std::wstring> expected = {
-      L"[a,b]", L"{}", L"get", L"/x", L"gr\xFC\xDF", L"-y", L"--"};
-  EXPECT_EQ(arguments.names, expected);
+/// A command that shows what it was given.
+class Probe : public Command {
+ public:
+  explicit Probe(std::vector<std::wstring>& names)
+      : Command({"probe", "Take names", ""}), names_(names) {}
+  void AddOptions(CLI::App& app, Arguments& arguments) override {
+    AddPort(app, arguments);
+    AddNames(app, "NAME", "Names", names_, 0, kMostNames);
+  }
+  Outcome Run(Context& /*context*/) override { return {}; }
+
+ private:
+  std::vector<std::wstring>& names_;
+};
+
+std::vector<std::wstring> NamesOf(const Words& words) {
+  std::vector<std::wstring> names;
+  Commands commands;
+  commands.push_back(std::make_unique<Probe>(names));
+  ParseCommandLine(words, std::move(commands));
+  return names;
 }
 
-TEST(ArgumentsTest, GetTakesNamesOrAll) {
-  const Arguments arguments = Parse({"get", "COM7", "--all", "-o", "out\\", "--force"});
-  EXPECT_TRUE(arguments.all);
-  EXPECT_TRUE(arguments.force);
-  EXPECT_EQ(arguments.output, L"out\\");
+TEST(CommandLineTest, NamesAreTakenAsTheyAreTyped) {
+  const std::vector<std::wstring> expected = {
+      L"[a,b]", L"{}", L"%%", L"get", L"/x", L"gr\xFC\xDF", L"-y", L"--"};
+  EXPECT_EQ(NamesOf({"probe",
+                     "COM7",
+                     "[a,b]",
+                     "{}",
+                     "%%",
+                     "get",
+                     "/x",
+                     "gr\xC3\xBC\xC3\x9F",
+                     "--",
+                     "-y",
+                     "--"}),
+            expected);
+  EXPECT_EQ(NamesOf({"probe", "COM7", "{}"}), std::vector<std::wstring>{L"{}"});
+  EXPECT_EQ(NamesOf({"probe", "COM7", "a", "%%"}), (std::vector<std::wstring>{L"a", L"%%"}));
+}
+
+TEST(CommandLineTest, GetTakesNamesOrAll) {
   EXPECT_EQ(Refusal({"get", "COM7"}).exit, ExitCode::kUsage);
   EXPECT_EQ(Refusal({"get", "COM7", "a", "--all"}).exit, ExitCode::kUsage);
 }
 
-TEST(ArgumentsTest, MoveTakesOldAndNew) {
-  const std::vector<std::wstring> expected = {L"a", L"b"};
-  EXPECT_EQ(Parse({"mv", "COM7", "a", "b"}).names, expected);
+TEST(CommandLineTest, MoveTakesOldAndNew) {
   for (const Words& words : {Words{"mv", "COM7"},
                              Words{"mv", "COM7", "a"},
                              Words{"mv", "COM7", "a", "a"},
@@ -108,13 +161,7 @@ TEST(ArgumentsTest, MoveTakesOldAndNew) {
   }
 }
 
-TEST(ArgumentsTest, SetTakesWordsInAnyCase) {
-  const Arguments arguments = Parse({"set", "COM7", "Parity", "EVEN"});
-  EXPECT_EQ(arguments.change.setting, Setting::kParity);
-  EXPECT_EQ(ValueWord(arguments.change), "even");
-}
-
-TEST(ArgumentsTest, NamesThatMustNotBeSentAreRefused) {
+TEST(CommandLineTest, NamesThatMustNotBeSentAreRefused) {
   for (const char* name : {"a\"b", "a'b", "a\nb", "\x1b[m", "\x01[", "\x01-", ""}) {
     const Failure failure = Refusal({"rm", "COM7", name});
     EXPECT_EQ(failure.exit, ExitCode::kUsage);
@@ -123,7 +170,7 @@ TEST(ArgumentsTest, NamesThatMustNotBeSentAreRefused) {
   EXPECT_EQ(Refusal({"mv", "COM7", "a", "b\"c"}).exit, ExitCode::kUsage);
 }
 
-TEST(ArgumentsTest, SenselessLinesAreRefused) {
+TEST(CommandLineTest, SenselessLinesAreRefused) {
   for (const Words& words : {Words{},
                              Words{"bogus"},
                              Words{"find"},
@@ -143,7 +190,7 @@ TEST(ArgumentsTest, SenselessLinesAreRefused) {
   }
 }
 
-TEST(ArgumentsTest, HelpTellsCommandsExitCodesAndExamples) {
+TEST(CommandLineTest, HelpTellsCommandsExitCodesAndExamples) {
   const std::string help = Help({"--help"});
   for (const char* text : {"ports", "--stall-timeout", "Exit codes", "rcvlink-cli get COM7"}) {
     EXPECT_NE(help.find(text), std::string::npos) << text;
@@ -152,7 +199,7 @@ TEST(ArgumentsTest, HelpTellsCommandsExitCodesAndExamples) {
   EXPECT_NE(Help({"get", "--help"}).find("--force"), std::string::npos);
 }
 
-TEST(ArgumentsTest, HelpFitsATerminal) {
+TEST(CommandLineTest, HelpFitsATerminal) {
   constexpr std::size_t kWidth = 100;
   for (const Words& words : {Words{"--help"}, Words{"get", "--help"}, Words{"set", "--help"}}) {
     std::istringstream help(Help(words));
@@ -160,7 +207,7 @@ TEST(ArgumentsTest, HelpFitsATerminal) {
   }
 }
 
-TEST(ArgumentsTest, TellsItsVersion) { EXPECT_EQ(Help({"--version"}).find("rcvlink-cli "), 0U); }
+TEST(CommandLineTest, TellsItsVersion) { EXPECT_EQ(Help({"--version"}).find("rcvlink-cli "), 0U); }
 
 }  // namespace
 }  // namespace cli

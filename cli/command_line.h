@@ -1,0 +1,36 @@
+/// @file command_line.h
+/// From the words of the command line to a command and its arguments.
+#ifndef RCVLINK_CLI_COMMAND_LINE_H_
+#define RCVLINK_CLI_COMMAND_LINE_H_
+
+#include <memory>
+#include <string>
+#include <variant>
+#include <vector>
+
+#include "arguments.h"
+#include "command.h"
+
+namespace cli {
+
+/// What is to be done, checked as far as that goes without a receiver.
+struct CommandLine {
+  Arguments arguments;
+  std::unique_ptr<Command> command;
+};
+
+/// Text to print instead of doing anything: --help or --version.
+struct HelpText {
+  std::string text;
+};
+
+/// Reads the command line.
+/// @param args UTF-8, without the program's name
+/// @param commands those that there are
+/// @throws Failure with ExitCode::kUsage when the line makes no sense
+std::variant<CommandLine, HelpText> ParseCommandLine(const std::vector<std::string>& args,
+                                                     Commands commands);
+
+}  // namespace cli
+
+#endif  // RCVLINK_CLI_COMMAND_LINE_H_
