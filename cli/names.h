@@ -29,6 +29,9 @@ bool IsPlainFileName(std::wstring_view name);
 /// Whether the file system takes both for the same name.
 bool SameLocalName(std::wstring_view first, std::wstring_view second);
 
+/// In capitals, as the file system compares names.
+std::wstring Capitals(std::wstring_view text);
+
 /// Whether the name is COM and a number, in any letter case.
 bool IsComPort(std::wstring_view name);
 
