@@ -17,6 +17,7 @@ struct Arguments {
   EProtocol protocol = eProtocolAny;
   std::optional<unsigned long> speed;  ///< given: one try at this speed
   std::optional<RtsMode> rts;          ///< given: one try with this use of RTS
+  bool no_memory = false;              ///< what was found is neither looked up nor remembered
   bool json = false;
   bool quiet = false;
   bool verbose = false;

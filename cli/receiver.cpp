@@ -64,6 +64,7 @@ Receiver::Receiver(Context& context, const FoundReceiver& found)
       interrupt_(context.interrupt),
       handle_(found.handle),
       link_(found.link),
+      setting_(found.setting),
       cancel_watch_(Aborter::kInterval, [this, aborter = Aborter(handle())]() mutable {
         if (interrupt_.requested()) aborter.Tick();
       }) {}

@@ -7,6 +7,7 @@
 
 #include <cstdint>
 #include <memory>
+#include <optional>
 #include <string>
 #include <vector>
 
@@ -57,8 +58,14 @@ class Receiver {
   /// @throws Failure when there is none
   explicit Receiver(Context& context);
 
+  /// Takes over a receiver that was found.
+  Receiver(Context& context, const FoundReceiver& found);
+
   void* handle() const { return handle_.get(); }
   EInstanceType link() const { return link_; }  ///< on which it was found: serial or USB
+
+  /// Where it answered, on a serial port.
+  const std::optional<KnownSetting>& setting() const { return setting_; }
 
   /// @throws Failure
   Identity Identify();
@@ -74,8 +81,6 @@ class Receiver {
   void ThrowIfCancelled(const std::string& tried) const;
 
  private:
-  Receiver(Context& context, const FoundReceiver& found);
-
   struct Closer {
     void operator()(void* handle) const { devapi::CloseReceiver(handle); }
   };
@@ -84,6 +89,7 @@ class Receiver {
   const Interrupt& interrupt_;
   std::unique_ptr<void, Closer> handle_;
   EInstanceType link_;
+  std::optional<KnownSetting> setting_;
   Ticker cancel_watch_;  // ends before the handle does
 };
 
