@@ -1,6 +1,7 @@
 #include "receiver.h"
 
 #include <oleauto.h>
+#include <wtypes.h>
 
 #include <algorithm>
 #include <utility>
@@ -102,13 +103,27 @@ std::vector<RemoteFile> Receiver::ListFiles() {
     const long read = ReadEntry(list.get(), i, files[static_cast<std::size_t>(i)]);
     if (read != S_OK) throw FailureOf(kTried, read);
   }
-  if (MayBeCut(files) && Identify().family == eProtocolVelmar) {
-    context_.PrintWarning(
-        "Note: this list may be cut. A Velmar receiver's directory is read up to 8192 bytes, some "
-        "70 "
-        "files; those behind them appear when others have been deleted.\n");
-  }
+  const std::string doubt = DoubtAbout(files);
+  if (!doubt.empty()) context_.PrintWarning("Note: this list may be cut. " + doubt + "\n");
   return files;
+}
+
+// Velmar receivers are on serial ports only, so the family is known without asking for it.
+std::string Receiver::DoubtAbout(const std::vector<RemoteFile>& files) const {
+  if (!setting_ || setting_->family != eProtocolVelmar) return {};
+  if (files.empty()) {
+    return "It is empty: a Velmar receiver without files is not told from one that refused or did "
+           "not answer.";
+  }
+  if (!MayBeCut(files)) return {};
+  return "A Velmar receiver's directory is read up to 8192 bytes, some 70 files; those after them "
+         "appear when others have been deleted.";
+}
+
+bool Receiver::Answers() {
+  short answer = VARIANT_FALSE;
+  const long code = devapi::CheckConnection(handle(), interrupt_.event(), &answer);
+  return code == S_OK && answer != VARIANT_FALSE;
 }
 
 Failure Receiver::FailureOf(std::string tried, long code, std::string meaning) const {

@@ -74,6 +74,12 @@ class Receiver {
   /// @throws Failure
   std::vector<RemoteFile> ListFiles();
 
+  /// Why files may be missing from a list that was read; empty when all are there.
+  std::string DoubtAbout(const std::vector<RemoteFile>& files) const;
+
+  /// Asks the receiver whether it still answers.
+  bool Answers();
+
   /// What a result other than S_OK makes: a cancellation after Ctrl-C, else a failure.
   Failure FailureOf(std::string tried, long code, std::string meaning = "") const;
 

@@ -12,14 +12,23 @@ CommandPointer MakeFind();
 CommandPointer MakeInfo();
 CommandPointer MakeList();
 CommandPointer MakeGet();
+CommandPointer MakeMirror();
 CommandPointer MakeRemove();
 CommandPointer MakeMove();
 CommandPointer MakeSet();
 CommandPointer MakeCheck();
 
 Commands MakeCommands() {
-  constexpr std::array kTable = {
-      MakePorts, MakeFind, MakeInfo, MakeList, MakeGet, MakeRemove, MakeMove, MakeSet, MakeCheck};
+  constexpr std::array kTable = {MakePorts,
+                                 MakeFind,
+                                 MakeInfo,
+                                 MakeList,
+                                 MakeGet,
+                                 MakeMirror,
+                                 MakeRemove,
+                                 MakeMove,
+                                 MakeSet,
+                                 MakeCheck};
   Commands commands;
   for (const auto make : kTable) commands.push_back(make());
   return commands;
