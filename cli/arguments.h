@@ -11,6 +11,10 @@
 
 namespace cli {
 
+/// How progress is shown on standard error. Automatic: a bar on a terminal, lines elsewhere, nothing
+/// with --quiet or --json.
+enum class ProgressMode { kAuto, kBar, kLines, kJson, kNone };
+
 struct Arguments {
   std::wstring port;                     ///< empty for commands without one
   EInstanceType link = eInstanceSerial;  ///< any: serial, then USB, under the same name
@@ -19,8 +23,10 @@ struct Arguments {
   std::optional<RtsMode> rts;          ///< given: one try with this use of RTS
   bool no_memory = false;              ///< what was found is neither looked up nor remembered
   bool json = false;
+  ProgressMode progress = ProgressMode::kAuto;
   bool quiet = false;
   bool verbose = false;
+  bool force = false;            ///< files of this computer may be overwritten
   std::wstring report;           ///< name of the library's report file; empty: none
   unsigned stall_timeout_s = 0;  ///< 0: never
 };

@@ -2,6 +2,7 @@
 
 #include <CLI/CLI.hpp>
 #include <algorithm>
+#include <cstdlib>
 #include <sstream>
 
 #include "names.h"
@@ -24,10 +25,50 @@ class HelpFormatter : public CLI::Formatter {
     const std::string name = option->get_name(true) + (many ? "..." : "");
     return option->get_required() ? name : "[" + name + "]";
   }
+
+  /// A command's help has the options of all commands too.
+  std::string make_footer(const CLI::App* app) const override {
+    const CLI::App* const all = app->get_parent();
+    if (all == nullptr) return Formatter::make_footer(app);
+    const auto is_common = [all](const CLI::Option* option) {
+      return option != all->get_help_ptr() && option != all->get_version_ptr();
+    };
+    // The group begins with a line end, and so does what stands before it.
+    return make_group("Options of all commands", false, all->get_options(is_common)).substr(1) +
+           "\n" + Formatter::make_footer(app);
+  }
 };
+
+/// The word of a command that looks most like another one; empty when none does.
+std::string MostLike(const std::string& word, const Commands& commands) {
+  constexpr std::size_t kMostChanges = 2;
+  std::string best;
+  std::size_t least = kMostChanges + 1;
+  for (const auto& command : commands) {
+    const std::string candidate = command->text().word;
+    const std::size_t changes = ChangesBetween(word, candidate);
+    if (changes >= least || changes >= candidate.size()) continue;
+    least = changes;
+    best = candidate;
+  }
+  return best;
+}
+
+/// `help`, `help get` and `/?` as the parser knows them.
+std::vector<std::string> WithHelp(std::vector<std::string> words) {
+  const auto end = std::find(words.begin(), words.end(), "--");
+  std::replace(words.begin(), end, std::string("/?"), std::string("--help"));
+  if (words.empty() || words.front() != "help") return words;
+  words.erase(words.begin());
+  words.insert(words.end(), "--help");
+  return words;
+}
 
 std::string Examples() {
   return ExitCodeTable() +
+         "\nOptions are also read from the file of --config, by default\n"
+         "%APPDATA%\\rcvlink\\rcvlink-cli.ini, and from RCVLINK_PORT, RCVLINK_LINK,\n"
+         "RCVLINK_PROTOCOL and RCVLINK_SPEED. The command line comes first, then the file.\n"
          "\nExamples:\n"
          "  rcvlink-cli ports                          which ports does this computer have?\n"
          "  rcvlink-cli find COM7                      is there a receiver, and which?\n"
@@ -53,9 +94,12 @@ void AddLinkOptions(CLI::App& app, Arguments& arguments) {
       "FAMILY",
       {{"any", eProtocolAny}, {"quorin", eProtocolQuorin}, {"velmar", eProtocolVelmar}},
       arguments.protocol);
+  app.get_option("--link")->envname("RCVLINK_LINK");
+  app.get_option("--protocol")->envname("RCVLINK_PROTOCOL");
   app.add_option("--speed", arguments.speed, "Try this speed only, instead of searching for it")
       ->check(CLI::Range(kSlowestSpeed, kFastestSpeed).description(""))
-      ->option_text("BITS/S");
+      ->option_text("BITS/S")
+      ->envname("RCVLINK_SPEED");
   AddWord<RtsMode>(app,
                    "--rts",
                    "Try this RTS only: handshake, on, off (with --speed: on)",
@@ -72,6 +116,12 @@ void AddLinkOptions(CLI::App& app, Arguments& arguments) {
           arguments.no_memory);
 }
 
+/// Where a user's own options are read from, when the file is there.
+std::string DefaultConfig() {
+  const char* const folder = std::getenv("APPDATA");
+  return folder == nullptr ? "" : std::string(folder) + "\\rcvlink\\rcvlink-cli.ini";
+}
+
 /// The options of all commands.
 void AddOptions(CLI::App& app, Arguments& arguments) {
   AddLinkOptions(app, arguments);
@@ -86,8 +136,24 @@ void AddOptions(CLI::App& app, Arguments& arguments) {
           "Trace the library's doings into this file in %TEMP%",
           "NAME",
           arguments.report);
+  AddFlag(app, "--force", "Overwrite files of this computer that exist already", arguments.force);
+  AddWord<ProgressMode>(app,
+                        "--progress",
+                        "auto (a bar, or lines), bar, lines, json or none",
+                        "HOW",
+                        {{"auto", ProgressMode::kAuto},
+                         {"bar", ProgressMode::kBar},
+                         {"lines", ProgressMode::kLines},
+                         {"json", ProgressMode::kJson},
+                         {"none", ProgressMode::kNone}},
+                        arguments.progress);
+  app.set_config("--config", DefaultConfig(), "Read options from this file: json = true")
+      ->option_text("FILE");
   AddFlag(app, "--json", "Print one JSON value, errors included", arguments.json);
-  AddFlag(app, "--verbose", "Tell also why --link any went on to USB", arguments.verbose);
+  AddFlag(app,
+          "--verbose",
+          "Tell more: SHA-256 of downloads, why --link any tried USB",
+          arguments.verbose);
   AddFlag(app, "--quiet", "Print only errors and what was asked for", arguments.quiet);
 }
 
@@ -107,6 +173,19 @@ std::string Words(const Commands& commands) {
     words += commands[i]->text().word;
   }
   return words;
+}
+
+/// Why the parser did not take the words.
+Failure ParseFailure(const CLI::App& app, const CLI::ParseError& error, const Commands& commands) {
+  const std::vector<std::string> rest = app.remaining();
+  if (!app.get_subcommands().empty() || rest.empty() || rest.front().starts_with('-')) {
+    return UsageError(Printable(ToUtf16(error.what())));
+  }
+  const std::string word = Printable(ToUtf16(Unmarked(rest.front())));
+  const std::string similar = MostLike(Lowered(word), commands);
+  return UsageError(
+      "there is no command " + word +
+      (similar.empty() ? "; there is " + Words(commands) : "; did you mean " + similar + "?"));
 }
 
 std::unique_ptr<Command> TakeChosen(const CLI::App& app, Commands& commands) {
@@ -132,10 +211,11 @@ void CheckArguments(const Arguments& arguments, bool needs_port) {
 /// Reads the words and checks them, as far as the parser's own checks do not do that.
 CommandLine Checked(CLI::App& app, Arguments& arguments, Commands commands) {
   std::unique_ptr<Command> command = TakeChosen(app, commands);
+  arguments.port = PlainPortName(arguments.port);
   const CLI::Option* const port =
       app.get_subcommand(command->text().word)->get_option_no_throw("PORT");
   try {
-    CheckArguments(arguments, port != nullptr && port->count() > 0);
+    CheckArguments(arguments, port != nullptr && (port->count() > 0 || !arguments.port.empty()));
     command->Check();
   } catch (Failure& failure) {
     failure.tried = std::string("start `") + command->text().word + "`";
@@ -161,9 +241,9 @@ std::variant<CommandLine, HelpText> ParseCommandLine(const std::vector<std::stri
   AddCommands(app, arguments, commands);
   app.footer(Examples());  // after the commands, which would inherit it
   try {
-    app.parse(Hidden(args));
+    app.parse(Hidden(WithHelp(args)));
   } catch (const CLI::ParseError& error) {
-    if (error.get_exit_code() != 0) throw UsageError(Printable(ToUtf16(error.what())));
+    if (error.get_exit_code() != 0) throw ParseFailure(app, error, commands);
     std::ostringstream text;
     app.exit(error, text, text);
     return HelpText{text.str()};

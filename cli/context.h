@@ -36,16 +36,17 @@ struct Context {
     if (!arguments.quiet && !arguments.json) err.Write(text);
   }
 
-  /// Standard error: what a reader of the result has to know, also one of JSON; not with --quiet.
-  void PrintWarning(const std::string& text) {
-    if (!arguments.quiet) err.Write(text);
-  }
+  /// Standard error: what a reader of the result has to know, always.
+  void PrintWarning(const std::string& text) { err.Write(text); }
 
   /// Standard error: a failure after which the command goes on; JSON has it in its document.
   void PrintFailure(const Failure& failure) {
     if (!arguments.json) err.Write(Describe(failure));
   }
 };
+
+/// How progress is to be shown; never `kAuto`.
+ProgressMode ProgressModeOf(const Context& context);
 
 /// A command's end. A command that could do nothing throws its `Failure` instead.
 struct Outcome {

@@ -16,13 +16,13 @@
 namespace cli {
 namespace {
 
+constexpr DWORD kShareAll = FILE_SHARE_READ | FILE_SHARE_WRITE;
 // In front of the name of a port, as `CreateFileW` takes it.
 const std::wstring kDevices = L"\\\\.\\";
 
 /// Why a device cannot be opened, as far as asking for nothing of it tells; S_OK when it can. A
 /// search on USB that cannot open its device finds no receiver, no more.
 long WhyNotOpened(const std::wstring& device) {
-  constexpr DWORD kShareAll = FILE_SHARE_READ | FILE_SHARE_WRITE;
   const UniqueHandle handle(
       CreateFileW(device.c_str(), 0, kShareAll, nullptr, OPEN_EXISTING, 0, nullptr));
   return handle.get() == INVALID_HANDLE_VALUE ? ResultOfWin32(GetLastError()) : S_OK;
@@ -110,9 +110,41 @@ std::string SilenceHint(const Arguments& arguments, EInstanceType link) {
   return "Is it switched on, and is this the port of its cable? `rcvlink-cli ports` lists them.";
 }
 
+/// A port that is a file of this computer would have its beginning overwritten.
+/// @throws Failure
+void RefuseFile(const std::wstring& port) {
+  for (const std::wstring& path : {port, kDevices + port}) {
+    const UniqueHandle handle(
+        CreateFileW(path.c_str(), 0, kShareAll, nullptr, OPEN_EXISTING, 0, nullptr));
+    if (handle.get() == INVALID_HANDLE_VALUE || GetFileType(handle.get()) != FILE_TYPE_DISK) {
+      continue;
+    }
+    throw Failure{.exit = ExitCode::kUsage,
+                  .tried = "use it as a port",
+                  .code = ResultOfWin32(ERROR_BAD_DEVICE),
+                  .meaning = "it is a file of this computer, which would be overwritten",
+                  .hint = "The port comes first, then the receiver's files."};
+  }
+}
+
 bool IsMissing(long code) {
   return code == ResultOfWin32(ERROR_FILE_NOT_FOUND) ||
          code == ResultOfWin32(ERROR_PATH_NOT_FOUND) || code == ResultOfWin32(ERROR_INVALID_NAME);
+}
+
+/// The family that answers in place of the one that was asked for; empty when none does. Asked for at
+/// known settings only: a sweep takes minutes.
+std::string OtherFamily(const Context& context, std::wstring port) {
+  const Arguments& arguments = context.arguments;
+  if (arguments.protocol == eProtocolAny || !IsOneTry(arguments)) return {};
+  const EProtocol other = arguments.protocol == eProtocolQuorin ? eProtocolVelmar : eProtocolQuorin;
+  DCB settings = PortSettings(arguments.speed.value_or(0), arguments.rts.value_or(RtsMode::kOn));
+  void* receiver = nullptr;
+  devapi::CreateReceiverOnSerial(
+      port.data(), other, &settings, context.interrupt.event(), &receiver);
+  if (receiver == nullptr) return {};
+  devapi::CloseReceiver(receiver);
+  return FamilyName(other);
 }
 
 /// What a result of the search on a link means to the user.
@@ -135,6 +167,9 @@ Failure SearchFailure(const Arguments& arguments, const SearchPlace& place, long
   } else if (code == ResultOfWin32(ERROR_ACCESS_DENIED)) {
     failure.meaning = "another program is using " + port;
     failure.hint = "Close that program and try again.";
+  } else if (code == ResultOfWin32(ERROR_NOT_READY)) {
+    failure.meaning = port + " is there, but the device behind it does not answer";
+    failure.hint = "Is it switched on, and in reach? Plug it in again and try once more.";
   } else if (SUCCEEDED(code)) {
     failure.meaning = "no receiver answered";
     failure.hint = SilenceHint(arguments, place.link);
@@ -143,6 +178,12 @@ Failure SearchFailure(const Arguments& arguments, const SearchPlace& place, long
 }
 
 }  // namespace
+
+long TryPort(const Context& context, DCB settings, void** receiver) {
+  std::wstring port = context.arguments.port;
+  return devapi::CreateReceiverOnSerial(
+      port.data(), context.arguments.protocol, &settings, context.interrupt.event(), receiver);
+}
 
 std::optional<DCB> CurrentSettings(const std::wstring& port) {
   const std::wstring path = kDevices + port;
@@ -164,6 +205,7 @@ FoundReceiver FindReceiverAt(const Context& context,
                              const SearchPlace& place,
                              SearchDisplay& display) {
   const Arguments& arguments = context.arguments;
+  if (!IsComPort(place.port)) RefuseFile(place.port);
   const bool any = place.link == eInstanceAny;
   SearchPlace tried{place.port, any ? eInstanceSerial : place.link};
   SearchResult result = tried.link == eInstanceUSB ? SearchUsb(context, place.port)
@@ -183,6 +225,11 @@ FoundReceiver FindReceiverAt(const Context& context,
     failure.exit = ExitCode::kCancelled;
     failure.meaning = "ended by Ctrl-C";
     failure.hint.clear();
+  } else if (tried.link == eInstanceSerial && result.code == S_FALSE) {
+    if (const std::string family = OtherFamily(context, place.port); !family.empty()) {
+      failure.meaning = "a " + family + " receiver answered instead";
+      failure.hint = "Leave out --protocol, or say --protocol " + Lowered(family) + ".";
+    }
   } else if (any) {
     failure.tried =
         arguments.verbose ? "find a receiver on USB" : "find a receiver on a serial port or on USB";

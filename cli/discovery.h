@@ -36,6 +36,10 @@ FoundReceiver FindReceiverAt(const Context& context,
                              const SearchPlace& place,
                              SearchDisplay& display);
 
+/// One try on a serial port.
+/// @return as `devapi::CreateReceiverOnSerial`
+long TryPort(const Context& context, DCB settings, void** receiver);
+
 /// The settings that a serial port has: those with which it was used last. Nothing when it cannot be
 /// opened.
 std::optional<DCB> CurrentSettings(const std::wstring& port);

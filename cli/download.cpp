@@ -31,13 +31,13 @@ class TransferWatch {
 
  private:
   void Tick() {
-    state_.elapsed_ms = GetTickCount64() - start_ms_;
+    const std::uint64_t elapsed_ms = GetTickCount64() - start_ms_;
     if (state_.done != stream_.received()) {
       state_.done = stream_.received();
-      last_news_ms_ = state_.elapsed_ms;
+      last_news_ms_ = elapsed_ms;
     }
-    progress_.Show(state_);
-    if (stall_ms_ != 0 && state_.elapsed_ms - last_news_ms_ >= stall_ms_) stalled_ = true;
+    progress_.Show(state_, elapsed_ms);
+    if (stall_ms_ != 0 && elapsed_ms - last_news_ms_ >= stall_ms_) stalled_ = true;
     if (stalled_ || stream_.first_error() != ERROR_SUCCESS) aborter_.Tick();
   }
 
@@ -52,48 +52,128 @@ class TransferWatch {
   Ticker ticker_;  // ends before all that it uses
 };
 
-std::string MeaningOfDownload(const RemoteFile& file, const FileStream& stream, long code) {
-  if (code == S_OK) {
-    return "incomplete: the receiver listed " + std::to_string(file.size) + " bytes, but " +
-           std::to_string(stream.received()) + " arrived";
+/// What became of one transfer.
+struct Transfer {
+  long code = S_OK;
+  bool stalled = false;
+  std::uint64_t received = 0;
+  DWORD write_error = ERROR_SUCCESS;
+  std::string sha256{};
+
+  bool IsComplete(const RemoteFile& file) const {
+    return code == S_OK && write_error == ERROR_SUCCESS && received == file.size;
   }
-  if (code == S_FALSE) return "ended by the receiver before the file was complete";
-  if (code == E_FAIL) return "the receiver says that the file is empty, or does not tell its size";
+};
+
+Transfer RunTransfer(Context& context,
+                     const Receiver& receiver,
+                     const RemoteFile& file,
+                     Destination& destination) {
+  const auto stream = FileStream::Make(destination);
+  std::wstring name = file.name;
+  Transfer transfer;
+  {
+    const TransferWatch watch(context, receiver, file, *stream);
+    transfer.code = devapi::DownloadFile(receiver.handle(), name.data(), stream.get(), nullptr);
+    transfer.stalled = watch.stalled();
+  }
+  stream->Detach();
+  transfer.received = stream->received();
+  transfer.write_error = stream->first_error();
+  transfer.sha256 = stream->TakeHash();
+  return transfer;
+}
+
+/// Whether the receiver ended the transfer in order, but with another size than it had listed.
+bool HasOtherSize(const Transfer& transfer, const RemoteFile& file) {
+  return transfer.code == S_OK && !transfer.stalled && transfer.received > 0 &&
+         transfer.received != file.size;
+}
+
+std::string MeaningOf(const Context& context, const Transfer& transfer, const RemoteFile& file) {
+  if (transfer.stalled) {
+    return "the receiver sent nothing new for " +
+           FormatDuration(context.arguments.stall_timeout_s) + ", so it was ended";
+  }
+  if (transfer.code == S_OK) {
+    return std::string(transfer.received < file.size ? "incomplete" : "longer than listed") +
+           ": the receiver listed " + std::to_string(file.size) + " bytes, but " +
+           std::to_string(transfer.received) + " arrived";
+  }
+  if (transfer.code == S_FALSE) return "ended by the receiver before the file was complete";
+  if (transfer.code == E_FAIL) {
+    return "the receiver says that the file is empty, or does not tell its size";
+  }
   return "";
+}
+
+/// Why a transfer is not complete; what came of it is kept where that makes sense.
+Failure WhyIncomplete(const Context& context,
+                      const Receiver& receiver,
+                      const Transfer& transfer,
+                      const RemoteFile& file,
+                      Destination& destination,
+                      bool keep_partial) {
+  if (transfer.write_error != ERROR_SUCCESS) {
+    Failure failure = destination.FailureOf(transfer.write_error);
+    if (keep_partial) failure.kept = ToUtf8(destination.KeepIncomplete());
+    return failure;
+  }
+  Failure failure = receiver.FailureOf(
+      "download " + Printable(file.name), transfer.code, MeaningOf(context, transfer, file));
+  const bool other_size = HasOtherSize(transfer, file) && failure.exit != ExitCode::kCancelled;
+  if (other_size) {
+    failure.hint = "A file that is still being recorded grows: list it again when it is closed.";
+  }
+  if (keep_partial || other_size) failure.kept = ToUtf8(destination.KeepIncomplete());
+  return failure;
 }
 
 }  // namespace
 
-std::uint64_t Download(Context& context,
-                       Receiver& receiver,
-                       const RemoteFile& file,
-                       const std::filesystem::path& target,
-                       bool overwrite) {
+void CheckSize(Receiver& receiver, const RemoteFile& file) {
+  constexpr std::uint64_t kMostBlocks = 65'536;
+  constexpr std::uint64_t kBlockBytes = 512;
+  constexpr std::uint64_t kMostBytes = kMostBlocks * kBlockBytes;
+  if (file.size <= kMostBytes || receiver.link() == eInstanceUSB) return;
+  if (receiver.Identify().family != eProtocolQuorin) return;
+  throw Failure{.tried = "download " + Printable(file.name),
+                .code = ResultOfWin32(ERROR_FILE_TOO_LARGE),
+                .meaning = "it has " + std::to_string(file.size) +
+                           " bytes; over a serial line a Quorin receiver can send " +
+                           std::to_string(kMostBytes) + " of a file",
+                .hint = "Download it over USB."};
+}
+
+Downloaded Download(Context& context,
+                    Receiver& receiver,
+                    const RemoteFile& file,
+                    Destination& destination,
+                    const DownloadOptions& options) {
   const std::string tried = "download " + Printable(file.name);
   receiver.ThrowIfCancelled(tried);
   const std::uint64_t start_ms = GetTickCount64();
-  PartFile part(target, overwrite);
-  const auto stream = FileStream::Make(part);
-  std::wstring name = file.name;
-  long code = S_OK;
-  bool stalled = false;
-  {
-    const TransferWatch watch(context, receiver, file, *stream);
-    code = devapi::DownloadFile(receiver.handle(), name.data(), stream.get(), nullptr);
-    stalled = watch.stalled();
+  const Transfer transfer = RunTransfer(context, receiver, file, destination);
+  if (!transfer.IsComplete(file)) {
+    throw WhyIncomplete(context, receiver, transfer, file, destination, options.keep_partial);
   }
-  stream->Detach();
-  if (stream->first_error() != ERROR_SUCCESS) throw part.FailureOf(stream->first_error());
-  if (code != S_OK || stream->received() != file.size) {
-    throw receiver.FailureOf(tried,
-                             code,
-                             stalled ? "the receiver sent nothing new for " +
-                                           FormatDuration(context.arguments.stall_timeout_s) +
-                                           ", so it was ended"
-                                     : MeaningOfDownload(file, *stream, code));
+  if (options.verify) {
+    Nowhere nowhere;
+    const Transfer again = RunTransfer(context, receiver, file, nowhere);
+    if (!again.IsComplete(file) || again.sha256 != transfer.sha256) {
+      Failure failure =
+          again.IsComplete(file)
+              ? Failure{.tried = "verify " + Printable(file.name),
+                        .code = ResultOfWin32(ERROR_CRC),
+                        .meaning = "a second download brought other bytes than the first",
+                        .hint = "Check the cable, lower the speed, and download it again."}
+              : WhyIncomplete(context, receiver, again, file, nowhere, false);
+      if (options.keep_partial) failure.kept = ToUtf8(destination.KeepIncomplete());
+      throw failure;
+    }
   }
-  part.Keep();
-  return GetTickCount64() - start_ms;
+  destination.Complete();
+  return {.milliseconds = GetTickCount64() - start_ms, .sha256 = transfer.sha256};
 }
 
 }  // namespace cli

@@ -3,23 +3,38 @@
 #ifndef RCVLINK_CLI_DOWNLOAD_H_
 #define RCVLINK_CLI_DOWNLOAD_H_
 
-#include <filesystem>
+#include <cstdint>
+#include <string>
 
 #include "context.h"
+#include "destination.h"
 #include "receiver.h"
 
 namespace cli {
 
-/// Copies a file, watching for silence and for Ctrl-C. The target appears only when every byte that
-/// the receiver listed is in it.
-/// @param overwrite whether the target may be replaced
-/// @return milliseconds that it took
-/// @throws Failure when the file is not complete; nothing is left of it then
-std::uint64_t Download(Context& context,
-                       Receiver& receiver,
-                       const RemoteFile& file,
-                       const std::filesystem::path& target,
-                       bool overwrite);
+struct DownloadOptions {
+  bool verify = false;        ///< download twice and compare
+  bool keep_partial = false;  ///< keep what came of a failed download too
+};
+
+struct Downloaded {
+  std::uint64_t milliseconds = 0;
+  std::string sha256{};
+};
+
+/// Refuses what the protocol cannot bring to its end, before minutes are spent on it.
+/// @throws Failure
+void CheckSize(Receiver& receiver, const RemoteFile& file);
+
+/// Copies a file, watching for silence and for Ctrl-C. The destination is complete only when every
+/// byte that the receiver listed is in it. What came of a file that has another size than listed is
+/// kept: it may be a log that is still being recorded.
+/// @throws Failure when the file is not complete
+Downloaded Download(Context& context,
+                    Receiver& receiver,
+                    const RemoteFile& file,
+                    Destination& destination,
+                    const DownloadOptions& options);
 
 }  // namespace cli
 

@@ -2,8 +2,8 @@
 
 namespace cli {
 
-std::unique_ptr<FileStream, ComReleaser> FileStream::Make(PartFile& file) {
-  return std::unique_ptr<FileStream, ComReleaser>(new FileStream(file));
+std::unique_ptr<FileStream, ComReleaser> FileStream::Make(Destination& destination) {
+  return std::unique_ptr<FileStream, ComReleaser>(new FileStream(destination));
 }
 
 STDMETHODIMP FileStream::QueryInterface(REFIID id, void** object) {
@@ -27,11 +27,12 @@ STDMETHODIMP_(ULONG) FileStream::Release() {
 
 STDMETHODIMP FileStream::Write(const void* data, ULONG size, ULONG* written) {
   if (written != nullptr) *written = 0;
-  PartFile* const file = file_;
-  if (file == nullptr) return STG_E_REVERTED;
+  Destination* const destination = destination_;
+  if (destination == nullptr) return STG_E_REVERTED;
   // After a failure the file has a hole: what follows must not hide it.
-  if (first_error_ == ERROR_SUCCESS) first_error_ = file->Write(data, size);
+  if (first_error_ == ERROR_SUCCESS) first_error_ = destination->Write(data, size);
   if (first_error_ != ERROR_SUCCESS) return ResultOfWin32(first_error_);
+  hash_.Add(data, size);
   received_ += size;
   if (written != nullptr) *written = size;
   return S_OK;

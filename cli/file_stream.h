@@ -1,5 +1,5 @@
 /// @file file_stream.h
-/// A download's way from the library into its file.
+/// A download's way from the library to its destination.
 #ifndef RCVLINK_CLI_FILE_STREAM_H_
 #define RCVLINK_CLI_FILE_STREAM_H_
 
@@ -11,7 +11,8 @@
 #include <cstdint>
 #include <memory>
 
-#include "part_file.h"
+#include "destination.h"
+#include "sha256.h"
 
 namespace cli {
 
@@ -23,12 +24,12 @@ struct ComReleaser {
 #pragma GCC diagnostic push
 #pragma GCC diagnostic ignored "-Wnon-virtual-dtor"
 
-/// A COM stream that only takes bytes. It counts them, and remembers its own first failure, since
+/// A COM stream that only takes bytes. It counts them, adds them to a hash, and remembers its own first failure, since
 /// the library does not always tell of it. The counts may be read from any thread.
 class FileStream final : public IStream {
  public:
-  /// @param file outlives the stream, or is taken away with `Detach`
-  static std::unique_ptr<FileStream, ComReleaser> Make(PartFile& file);
+  /// @param destination outlives the stream, or is taken away with `Detach`
+  static std::unique_ptr<FileStream, ComReleaser> Make(Destination& destination);
 
   std::uint64_t received() const { return received_; }
 
@@ -36,7 +37,10 @@ class FileStream final : public IStream {
   DWORD first_error() const { return first_error_; }
 
   /// From now on the stream takes nothing, whoever still holds it.
-  void Detach() { file_ = nullptr; }
+  void Detach() { destination_ = nullptr; }
+
+  /// SHA-256 of what was received, once the transfer is over; to be called once.
+  std::string TakeHash() { return hash_.Finish(); }
 
   STDMETHODIMP QueryInterface(REFIID id, void** object) override;
   STDMETHODIMP_(ULONG) AddRef() override;
@@ -57,11 +61,12 @@ class FileStream final : public IStream {
   STDMETHODIMP Clone(IStream** stream) override;
 
  private:
-  explicit FileStream(PartFile& file) : file_(&file) {}
+  explicit FileStream(Destination& destination) : destination_(&destination) {}
   virtual ~FileStream() = default;
 
   std::atomic<ULONG> references_{1};
-  std::atomic<PartFile*> file_;
+  std::atomic<Destination*> destination_;
+  Sha256 hash_;
   std::atomic<std::uint64_t> received_{0};
   std::atomic<DWORD> first_error_{ERROR_SUCCESS};
 };

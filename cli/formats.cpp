@@ -2,13 +2,13 @@
 
 #include <algorithm>
 #include <array>
+#include <nlohmann/json.hpp>
 
 #include "text.h"
 
 namespace cli {
 namespace {
 
-constexpr std::uint64_t kMsPerSecond = 1000;
 constexpr std::uint64_t kSecondsPerMinute = 60;
 constexpr std::uint64_t kMinutesPerHour = 60;
 constexpr std::uint64_t kFullPercent = 100;
@@ -24,7 +24,7 @@ std::string TwoDigits(std::uint64_t value) {
 }
 
 std::string TimeLeft(const TransferState& state) {
-  const std::uint64_t rate = RateOf(state);
+  const std::uint64_t rate = state.rate;
   if (rate == 0) return "--";
   const std::uint64_t rest = state.total - std::min(state.done, state.total);
   return FormatDuration((rest + rate - 1) / rate);
@@ -37,7 +37,7 @@ std::string Figures(const TransferState& state) {
   constexpr std::size_t kLeftWidth = 11;
   return PadLeft(std::to_string(PercentOf(state)), kPercentWidth) + " %  " +
          PadLeft(FormatBytes(state.done), kSizeWidth) + " of " + FormatBytes(state.total) + "  " +
-         PadLeft(FormatBytes(RateOf(state)), kSizeWidth) + "/s  " +
+         PadLeft(FormatBytes(state.rate), kSizeWidth) + "/s  " +
          PadLeft(TimeLeft(state), kLeftWidth) + " left";
 }
 
@@ -88,10 +88,6 @@ unsigned PercentOf(const TransferState& state) {
   return static_cast<unsigned>(state.done * kFullPercent / state.total);
 }
 
-std::uint64_t RateOf(const TransferState& state) {
-  return state.elapsed_ms == 0 ? 0 : state.done * kMsPerSecond / state.elapsed_ms;
-}
-
 std::string ProgressBar(const TransferState& state, std::size_t width) {
   const std::string figures = Figures(state);
   std::string line = "[";
@@ -103,10 +99,19 @@ std::string ProgressBar(const TransferState& state, std::size_t width) {
   return line.append(kGap) + Printable(std::wstring_view(state.name).substr(0, room));
 }
 
+std::string ProgressJson(const TransferState& state) {
+  const nlohmann::ordered_json json = {{"file", ToUtf8(state.name)},
+                                       {"done", state.done},
+                                       {"total", state.total},
+                                       {"percent", PercentOf(state)},
+                                       {"rate", state.rate}};
+  return json.dump();
+}
+
 std::string ProgressLine(const TransferState& state) {
   return Printable(state.name) + ": " + std::to_string(PercentOf(state)) + " %, " +
          FormatBytes(state.done) + " of " + FormatBytes(state.total) + ", " +
-         FormatBytes(RateOf(state)) + "/s, " + TimeLeft(state) + " left";
+         FormatBytes(state.rate) + "/s, " + TimeLeft(state) + " left";
 }
 
 }  // namespace cli

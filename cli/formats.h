@@ -24,20 +24,20 @@ struct TransferState {
   std::wstring name{};
   std::uint64_t done = 0;   ///< bytes
   std::uint64_t total = 0;  ///< bytes that the receiver listed
-  std::uint64_t elapsed_ms = 0;
+  std::uint64_t rate = 0;   ///< bytes a second right now; 0 while that cannot be told
 };
 
 /// 0 to 100; 100 only when all has arrived.
 unsigned PercentOf(const TransferState& state);
-
-/// Bytes a second since the beginning; 0 while that cannot be told.
-std::uint64_t RateOf(const TransferState& state);
 
 /// One line without line end: bar, percent, bytes, rate, time left, name; not wider than `width`.
 std::string ProgressBar(const TransferState& state, std::size_t width);
 
 /// The same for a reader that is no terminal: no bar.
 std::string ProgressLine(const TransferState& state);
+
+/// The same for a program: {"file", "done", "total", "percent", "rate"}
+std::string ProgressJson(const TransferState& state);
 
 }  // namespace cli
 

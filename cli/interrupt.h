@@ -3,6 +3,8 @@
 #ifndef RCVLINK_CLI_INTERRUPT_H_
 #define RCVLINK_CLI_INTERRUPT_H_
 
+#include <string>
+
 #include "handle.h"
 
 namespace cli {
@@ -11,7 +13,8 @@ namespace cli {
 /// of ending the process. There is one in a program.
 class Interrupt {
  public:
-  Interrupt();
+  /// @param message printed on standard error at the moment of the first Ctrl-C; may be empty
+  explicit Interrupt(std::string message);
   ~Interrupt();
   Interrupt(const Interrupt&) = delete;
   Interrupt& operator=(const Interrupt&) = delete;
@@ -21,6 +24,7 @@ class Interrupt {
   bool requested() const;
 
  private:
+  std::string message_;
   UniqueHandle event_;
 };
 

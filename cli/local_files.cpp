@@ -5,10 +5,13 @@
 
 #include "handle.h"
 #include "paths.h"
+#include "sha256.h"
 #include "text.h"
 
 namespace cli {
 namespace {
+
+constexpr std::size_t kPiece = 65'536;
 
 /// @throws Failure
 UniqueHandle Open(const std::filesystem::path& file,
@@ -56,7 +59,6 @@ std::optional<std::uint64_t> SizeOf(const std::filesystem::path& file) {
 }
 
 bool BeginsWith(const std::filesystem::path& file, const std::filesystem::path& beginning) {
-  constexpr std::size_t kPiece = 65'536;
   Reader whole(file);
   Reader start(beginning);
   std::array<char, kPiece> expected;
@@ -71,8 +73,12 @@ bool BeginsWith(const std::filesystem::path& file, const std::filesystem::path& 
   }
 }
 
-bool HaveSameBytes(const std::filesystem::path& first, const std::filesystem::path& second) {
-  return SizeOf(first) == SizeOf(second) && BeginsWith(first, second);
+std::string Sha256Of(const std::filesystem::path& file) {
+  Reader reader(file);
+  Sha256 hash;
+  std::array<char, kPiece> bytes;
+  while (const DWORD count = reader.Read(bytes)) hash.Add(bytes.data(), count);
+  return hash.Finish();
 }
 
 void MakeEmpty(const std::filesystem::path& file) {

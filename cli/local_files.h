@@ -19,9 +19,9 @@ std::optional<std::uint64_t> SizeOf(const std::filesystem::path& file);
 /// @throws Failure when one of them cannot be read
 bool BeginsWith(const std::filesystem::path& file, const std::filesystem::path& beginning);
 
-/// Whether two files have the same bytes.
-/// @throws Failure when one of them cannot be read
-bool HaveSameBytes(const std::filesystem::path& first, const std::filesystem::path& second);
+/// 64 hexadecimal digits in small letters; empty when Windows could not compute it.
+/// @throws Failure when the file cannot be read
+std::string Sha256Of(const std::filesystem::path& file);
 
 /// Makes an empty file in the place of whatever is there.
 /// @throws Failure

@@ -37,10 +37,17 @@ std::vector<std::string> CommandLineWords() {
   return utf8;
 }
 
+/// Prints a document, with the report that was written besides.
+void PrintJson(Json document, const std::wstring& report, Output& out) {
+  if (!report.empty()) document["report"] = ToUtf8(report);
+  out.Write(document.dump(kJsonIndent) + "\n");
+}
+
 /// Tells a failure in the way that was asked for.
-ExitCode Report(const Failure& failure, bool json, Output& out, Output& err) {
+ExitCode Tell(
+    const Failure& failure, bool json, const std::wstring& report, Output& out, Output& err) {
   if (json) {
-    out.Write(Json({{"error", ToJson(failure)}}).dump(kJsonIndent) + "\n");
+    PrintJson({{"error", ToJson(failure)}}, report, out);
   } else {
     err.Write(Describe(failure));
   }
@@ -49,16 +56,19 @@ ExitCode Report(const Failure& failure, bool json, Output& out, Output& err) {
 
 ExitCode RunCommand(const CommandLine& line, Output& out, Output& err) {
   const Arguments& arguments = line.arguments;
-  const Interrupt interrupt;
+  const bool silent = arguments.quiet || arguments.json;
+  const Interrupt interrupt(silent ? "" : "\nStopping, this may take a moment ...\n");
   Context context{arguments, interrupt, out, err};
-  const ReportFile report(context);
+  std::wstring report_path;
   try {
-    const Outcome outcome = line.command->Run(context);
-    if (arguments.json) out.Write(outcome.document.dump(kJsonIndent) + "\n");
+    const ReportFile report(context);
+    report_path = report.path();
+    Outcome outcome = line.command->Run(context);
+    if (arguments.json) PrintJson(std::move(outcome.document), report_path, out);
     return outcome.exit;
   } catch (Failure& failure) {
     if (failure.port.empty()) failure.port = Printable(arguments.port);
-    return Report(failure, arguments.json, out, err);
+    return Tell(failure, arguments.json, report_path, out, err);
   }
 }
 
@@ -73,9 +83,9 @@ ExitCode Run(Output& out, Output& err) {
     }
     return RunCommand(std::get<CommandLine>(parsed), out, err);
   } catch (const Failure& failure) {
-    return Report(failure, json, out, err);
+    return Tell(failure, json, L"", out, err);
   } catch (const std::exception& error) {
-    return Report({.tried = "go on", .code = E_FAIL, .meaning = error.what()}, json, out, err);
+    return Tell({.tried = "go on", .code = E_FAIL, .meaning = error.what()}, json, L"", out, err);
   }
 }
 
@@ -83,7 +93,7 @@ int Main() {
   Output out(STD_OUTPUT_HANDLE);
   Output err(STD_ERROR_HANDLE);
   const ExitCode exit = Run(out, err);
-  if (exit == ExitCode::kDone && out.first_error() != ERROR_SUCCESS) {
+  if (exit == ExitCode::kDone && out.first_error() != ERROR_SUCCESS && !out.IsClosed()) {
     const Failure failure{.exit = ExitCode::kLocalFile,
                           .tried = "write to the standard output",
                           .code = ResultOfWin32(out.first_error())};

@@ -2,38 +2,15 @@
 
 #include <utility>
 
+#include "destination.h"
 #include "download.h"
 #include "local_files.h"
+#include "part_file.h"
 #include "paths.h"
 #include "text.h"
 
 namespace cli {
 namespace {
-
-/// A further copy of a file, beside it, which vanishes.
-class Copy {
- public:
-  /// @throws Failure when there is a file of that name
-  Copy(const std::filesystem::path& target, const wchar_t* suffix)
-      : path_(target.native() + suffix) {
-    if (!Exists(path_)) return;
-    Failure failure =
-        LocalFailure("make " + Printable(path_.native()), static_cast<DWORD>(ERROR_FILE_EXISTS));
-    failure.hint = "A mirror that was cut off left it, or another one is at work here; delete it.";
-    throw failure;
-  }
-  ~Copy() { DeleteFileW(path_.c_str()); }
-  Copy(const Copy&) = delete;
-  Copy& operator=(const Copy&) = delete;
-
-  const std::filesystem::path& path() const { return path_; }
-
- private:
-  std::filesystem::path path_;
-};
-
-constexpr const wchar_t* kFirst = L".new";
-constexpr const wchar_t* kSecond = L".check";
 
 Failure Difference(const MirrorJob& job, std::string meaning, std::string hint) {
   return {.tried = "mirror " + Printable(job.file.name),
@@ -42,58 +19,67 @@ Failure Difference(const MirrorJob& job, std::string meaning, std::string hint) 
           .hint = std::move(hint)};
 }
 
-/// Downloads the file once more, and compares.
-void Verify(Context& context,
-            Receiver& receiver,
-            const MirrorJob& job,
-            const std::filesystem::path& first,
-            const std::string& meaning,
-            const std::string& hint) {
-  const Copy second(job.target, kSecond);
-  Download(context, receiver, job.file, second.path(), false);
-  if (!HaveSameBytes(first, second.path())) throw Difference(job, meaning, hint);
-}
-
-void DownloadNew(
-    Context& context, Receiver& receiver, const MirrorJob& job, bool verify, bool force) {
-  const bool replaces = Exists(job.target);
-  const Copy first(job.target, kFirst);
-  Download(context, receiver, job.file, first.path(), false);
-  if (verify) {
-    Verify(context,
-           receiver,
-           job,
-           first.path(),
-           "a second download brought other bytes than the first",
-           "Check the cable or lower the speed, and mirror it again.");
+/// The place of a download until it may take its name; it vanishes unless it does.
+class NewFile {
+ public:
+  /// @throws Failure when there is a file of that name
+  explicit NewFile(const std::filesystem::path& target) : path_(target.native() + L".new") {
+    if (!Exists(path_)) return;
+    Failure failure = LocalFailure("make " + Printable(path_.native()), ERROR_FILE_EXISTS);
+    failure.hint = "A mirror that was cut off left it, or another one is at work here; delete it.";
+    throw failure;
   }
-  if (replaces && !force && !BeginsWith(first.path(), job.target)) {
+  ~NewFile() { DeleteFileW(path_.c_str()); }
+  NewFile(const NewFile&) = delete;
+  NewFile& operator=(const NewFile&) = delete;
+
+  const std::filesystem::path& path() const { return path_; }
+
+ private:
+  std::filesystem::path path_;
+};
+
+std::string DownloadNew(Context& context, Receiver& receiver, const MirrorJob& job, bool verify) {
+  const NewFile file(job.target);
+  std::string sha256;
+  {
+    // What an earlier mirror kept of the file is out of date.
+    PartFile part(file.path(), /*overwrite=*/true);
+    sha256 = Download(context, receiver, job.file, part, {.verify = verify}).sha256;
+  }
+  const bool replaces = Exists(job.target);
+  if (replaces && !context.arguments.force && !BeginsWith(file.path(), job.target)) {
     throw Difference(job,
                      "the file of that name on this computer is another one, not its beginning",
                      "Move that file away, or say --force to replace it.");
   }
-  MoveOver(first.path(), job.target);
+  MoveOver(file.path(), job.target);
+  return sha256;
+}
+
+std::string Compare(Context& context, Receiver& receiver, const MirrorJob& job) {
+  Nowhere nowhere;
+  const std::string sha256 = Download(context, receiver, job.file, nowhere, {}).sha256;
+  if (sha256.empty() || sha256 != Sha256Of(job.target)) {
+    throw Difference(job,
+                     "the file on this computer has the same size, but other bytes",
+                     "Move that file away, and mirror it again.");
+  }
+  return sha256;
 }
 
 }  // namespace
 
-void Mirror(Context& context, Receiver& receiver, const MirrorJob& job, bool verify, bool force) {
+std::string Mirror(Context& context, Receiver& receiver, const MirrorJob& job, bool verify) {
   switch (job.step) {
     case MirrorStep::kNothing:
       break;
     case MirrorStep::kDownload:
-      DownloadNew(context, receiver, job, verify, force);
-      break;
+      return DownloadNew(context, receiver, job, verify);
     case MirrorStep::kCompare:
-      Verify(context,
-             receiver,
-             job,
-             job.target,
-             "the file on this computer has the same size, but other bytes",
-             "Move that file away, and mirror it again.");
-      break;
+      return Compare(context, receiver, job);
     case MirrorStep::kMakeEmpty:
-      if (Exists(job.target) && !force) {
+      if (Exists(job.target) && !context.arguments.force) {
         throw Difference(job,
                          "it has no bytes, but the file of that name on this computer has",
                          "Move that file away, or say --force to replace it.");
@@ -101,6 +87,7 @@ void Mirror(Context& context, Receiver& receiver, const MirrorJob& job, bool ver
       MakeEmpty(job.target);
       break;
   }
+  return {};
 }
 
 std::uint64_t BytesOf(const MirrorJob& job, bool verify) {

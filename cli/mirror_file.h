@@ -4,6 +4,7 @@
 #define RCVLINK_CLI_MIRROR_FILE_H_
 
 #include <filesystem>
+#include <string>
 
 #include "context.h"
 #include "mirror_plan.h"
@@ -18,11 +19,12 @@ struct MirrorJob {
 };
 
 /// Brings a file to this computer as its job says. What was there stays whatever fails, and is
-/// replaced only by a file of which it is the beginning, such as a log that has grown since.
+/// replaced only by a file of which it is the beginning, such as a log that has grown since, or with
+/// --force.
 /// @param verify download twice, and keep nothing when the bytes differ
-/// @param force replace also what is no such beginning
+/// @return the SHA-256 of the file; empty for one without bytes
 /// @throws Failure
-void Mirror(Context& context, Receiver& receiver, const MirrorJob& job, bool verify, bool force);
+std::string Mirror(Context& context, Receiver& receiver, const MirrorJob& job, bool verify);
 
 /// The bytes that a job moves.
 std::uint64_t BytesOf(const MirrorJob& job, bool verify);

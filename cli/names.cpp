@@ -89,6 +89,14 @@ bool SameLocalName(std::wstring_view first, std::wstring_view second) {
   return Capitals(first) == Capitals(second);
 }
 
+std::wstring PlainPortName(std::wstring_view name) {
+  constexpr std::wstring_view kDevices = L"\\\\.\\";
+  std::wstring_view plain = name;
+  if (plain.starts_with(kDevices)) plain.remove_prefix(kDevices.size());
+  if (plain.ends_with(L':')) plain.remove_suffix(1);
+  return IsComPort(plain) ? Capitals(plain) : std::wstring(name);
+}
+
 bool IsComPort(std::wstring_view name) {
   constexpr std::wstring_view kPrefix = L"COM";
   return name.size() > kPrefix.size() && SameLocalName(name.substr(0, kPrefix.size()), kPrefix) &&

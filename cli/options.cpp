@@ -4,6 +4,7 @@
 
 #include <CLI/CLI.hpp>
 #include <algorithm>
+#include <cstdlib>
 #include <string_view>
 
 #include "names.h"
@@ -19,10 +20,6 @@ constexpr std::string_view kMarked = "[{%\x01";
 
 // The parser puts its own words where an option's placeholder is empty.
 const std::string kNoPlaceholder = " ";
-
-std::string Unmarked(const std::string& word) {
-  return word.starts_with(kLiteralMark) ? word.substr(1) : word;
-}
 
 std::wstring AsTyped(const std::string& word) { return ToUtf16(Unmarked(word)); }
 
@@ -51,7 +48,16 @@ std::vector<std::string> Hidden(const std::vector<std::string>& words) {
   return hidden;
 }
 
+std::string Unmarked(const std::string& word) {
+  return word.starts_with(kLiteralMark) ? word.substr(1) : word;
+}
+
 void AddPort(CLI::App& app, Arguments& arguments, Need need) {
+  // The parser's own means would let the environment win over a positional.
+  if (const char* const port = std::getenv("RCVLINK_PORT"); port != nullptr) {
+    arguments.port = ToUtf16(port);
+    need = Need::kOptional;
+  }
   AddText(app,
           "PORT",
           "The port's name, as in COM7; with --link usb the device's path",

@@ -24,6 +24,9 @@ Failure UsageError(const std::string& meaning);
 /// that it would change marked.
 std::vector<std::string> Hidden(const std::vector<std::string>& words);
 
+/// A word that the parser gives back, as it was typed.
+std::string Unmarked(const std::string& word);
+
 enum class Need { kRequired, kOptional };
 
 /// PORT, the port of the receiver.

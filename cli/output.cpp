@@ -34,6 +34,11 @@ void Output::Write(std::string_view utf8) {
   WriteConsoleW(handle_, text.data(), static_cast<DWORD>(text.size()), &written, nullptr);
 }
 
+DWORD Output::WriteRaw(std::string_view bytes) {
+  WriteBytes(bytes);
+  return first_error_;
+}
+
 void Output::WriteBytes(std::string_view bytes) {
   while (!bytes.empty() && first_error_ == ERROR_SUCCESS) {
     DWORD written = 0;

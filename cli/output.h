@@ -22,8 +22,17 @@ class Output {
 
   void Write(std::string_view utf8);
 
+  /// Bytes as they are, also on a terminal.
+  /// @return ERROR_SUCCESS, or the Win32 error
+  DWORD WriteRaw(std::string_view bytes);
+
   /// Win32 error of the first write that failed; 0 for none.
   DWORD first_error() const { return first_error_; }
+
+  /// Whether that was because the reader had enough, as `more` and `head` do.
+  bool IsClosed() const {
+    return first_error_ == ERROR_BROKEN_PIPE || first_error_ == ERROR_NO_DATA;
+  }
 
  private:
   void WriteBytes(std::string_view bytes);

@@ -51,16 +51,31 @@ DWORD PartFile::Write(const void* data, DWORD size) {
   return written == size ? ERROR_SUCCESS : ERROR_DISK_FULL;
 }
 
-void PartFile::Keep() {
-  if (FlushFileBuffers(file_.get()) == FALSE) throw FailureOf(GetLastError());
-  SetVanishing(false);
-  file_.reset();
+void PartFile::Complete() {
+  const BOOL flushed = FlushFileBuffers(file_.get());
+  const DWORD flush_error = GetLastError();
+  KeepIncomplete();
+  if (flushed == FALSE) throw KeptFailure(FailureOf(flush_error));
   const DWORD replace = overwrite_ ? MOVEFILE_REPLACE_EXISTING : 0;
   if (MoveFileExW(part_.c_str(), target_.c_str(), replace | MOVEFILE_WRITE_THROUGH) == FALSE) {
     const DWORD error = GetLastError();
-    throw LocalFailure("rename " + Printable(part_.native()), error);
+    Failure failure = LocalFailure("rename it to " + Printable(target_.filename().native()), error);
+    failure.hint = "The download is complete. Rename the file yourself when " +
+                   Printable(target_.filename().native()) + " is free.";
+    throw KeptFailure(std::move(failure));
   }
+}
+
+std::wstring PartFile::KeepIncomplete() {
+  SetVanishing(false);
+  file_.reset();
   kept_ = true;
+  return part_.native();
+}
+
+Failure PartFile::KeptFailure(Failure failure) const {
+  failure.kept = ToUtf8(part_.native());
+  return failure;
 }
 
 Failure PartFile::FailureOf(DWORD error) const {

@@ -5,34 +5,32 @@
 
 #include <filesystem>
 
+#include "destination.h"
 #include "handle.h"
-#include "results.h"
 
 namespace cli {
 
-/// A file that grows under the name of its target with ".part" behind it, and vanishes unless it is
+/// A file that grows under the name of its target with ".part" after it, and vanishes unless it is
 /// kept, also when the process is killed.
-class PartFile {
+class PartFile : public Destination {
  public:
   /// @param overwrite whether files of either name may be replaced
   /// @throws Failure when it cannot be made
   PartFile(std::filesystem::path target, bool overwrite);
-  ~PartFile();
-  PartFile(const PartFile&) = delete;
-  PartFile& operator=(const PartFile&) = delete;
+  ~PartFile() override;
 
-  /// @return ERROR_SUCCESS, or the Win32 error
-  DWORD Write(const void* data, DWORD size);
+  DWORD Write(const void* data, DWORD size) override;
 
-  /// Completes the file and gives it its name.
-  /// @throws Failure when that does not work; the file is gone then
-  void Keep();
+  /// Gives the file its name.
+  /// @throws Failure when that does not work; all bytes are then in the file with ".part"
+  void Complete() override;
 
-  /// A failure with this file.
-  Failure FailureOf(DWORD error) const;
+  std::wstring KeepIncomplete() override;
+  Failure FailureOf(DWORD error) const override;
 
  private:
   bool SetVanishing(bool vanishing);
+  Failure KeptFailure(Failure failure) const;
 
   std::filesystem::path target_;
   std::filesystem::path part_;

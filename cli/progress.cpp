@@ -4,30 +4,40 @@
 
 namespace cli {
 
-Progress::Progress(Context& context, const TransferState& start) : context_(context) {
-  if (context_.err.is_terminal()) {
-    Show(start);
-  } else {
-    context_.PrintStatus("Downloading " + Printable(start.name) + ", " + FormatBytes(start.total) +
-                         "\n");
-  }
+Progress::Progress(Context& context, const TransferState& start)
+    : context_(context), mode_(ProgressModeOf(context)) {
+  // Until the first byte arrives the two sides agree on the speed of the line.
+  const std::string line = "Downloading " + Printable(start.name) + ", " + FormatBytes(start.total);
+  if (mode_ == ProgressMode::kBar) Draw(line + ": getting ready ...");
+  if (mode_ == ProgressMode::kLines) context_.err.Write(line + "\n");
+  if (mode_ == ProgressMode::kJson) context_.err.Write(ProgressJson(start) + "\n");
 }
 
-void Progress::Show(const TransferState& state) {
+void Progress::Show(TransferState state, std::uint64_t elapsed_ms) {
   constexpr std::uint64_t kLineIntervalMs = 5000;
-  if (context_.err.is_terminal()) {
+  constexpr std::uint64_t kJsonIntervalMs = 1000;
+  if (mode_ == ProgressMode::kNone || state.done == 0) return;
+  rate_.Add(elapsed_ms, state.done);
+  state.rate = rate_.BytesPerSecond();
+  if (mode_ == ProgressMode::kBar) {
     // The last column stays free: a full line would wrap.
-    const std::size_t width = context_.err.Width() - 1;
-    context_.PrintStatus(Redrawn(ProgressBar(state, width), drawn_width_));
-    drawn_width_ = width;
-  } else if (state.elapsed_ms - last_line_ms_ >= kLineIntervalMs) {
-    context_.PrintStatus(ProgressLine(state) + "\n");
-    last_line_ms_ = state.elapsed_ms;
+    Draw(ProgressBar(state, context_.err.Width() - 1));
+    return;
   }
+  const bool json = mode_ == ProgressMode::kJson;
+  if (elapsed_ms - last_line_ms_ < (json ? kJsonIntervalMs : kLineIntervalMs)) return;
+  context_.err.Write((json ? ProgressJson(state) : ProgressLine(state)) + "\n");
+  last_line_ms_ = elapsed_ms;
+}
+
+void Progress::Draw(const std::string& line) {
+  const std::size_t width = context_.err.Width() - 1;
+  context_.err.Write(Redrawn(line.substr(0, width), width));
+  drawn_width_ = width;
 }
 
 Progress::~Progress() {
-  if (drawn_width_ > 0) context_.PrintStatus(Erased(drawn_width_));
+  if (drawn_width_ > 0) context_.err.Write(Erased(drawn_width_));
 }
 
 }  // namespace cli

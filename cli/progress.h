@@ -5,10 +5,11 @@
 
 #include "context.h"
 #include "formats.h"
+#include "rate_meter.h"
 
 namespace cli {
 
-/// A bar on a terminal, a plain line now and then elsewhere.
+/// A bar, a line now and then, JSON lines, or nothing.
 class Progress {
  public:
   Progress(Context& context, const TransferState& start);
@@ -19,10 +20,15 @@ class Progress {
   Progress& operator=(const Progress&) = delete;
 
   /// To be called several times a second.
-  void Show(const TransferState& state);
+  /// @param elapsed_ms since the beginning
+  void Show(TransferState state, std::uint64_t elapsed_ms);
 
  private:
+  void Draw(const std::string& line);
+
   Context& context_;
+  ProgressMode mode_;
+  RateMeter rate_;
   std::size_t drawn_width_ = 0;
   std::uint64_t last_line_ms_ = 0;
 };

@@ -6,6 +6,7 @@
 #include <algorithm>
 #include <utility>
 
+#include "busy.h"
 #include "discovery.h"
 #include "names.h"
 #include "text.h"
@@ -14,6 +15,7 @@ namespace cli {
 namespace {
 
 constexpr unsigned kRenameFeature = 4;
+constexpr const char* kList = "list the receiver's files";
 
 struct ListCloser {
   void operator()(void* list) const { devapi::CloseFileList(list); }
@@ -70,9 +72,11 @@ Receiver::Receiver(Context& context, const FoundReceiver& found)
         if (interrupt_.requested()) aborter.Tick();
       }) {}
 
-Identity Receiver::Identify() {
+const Identity& Receiver::Identify() {
   constexpr const char* kTried = "read the receiver's identity";
+  if (identity_) return *identity_;
   ThrowIfCancelled(kTried);
+  const Busy busy(context_, "Asking the receiver who it is");
   CReceiverInfo info{};
   const long result = devapi::GetReceiverInfo(handle(), interrupt_.event(), &info);
   if (result != S_OK) {
@@ -80,39 +84,50 @@ Identity Receiver::Identify() {
     throw FailureOf(
         kTried, result, result == S_FALSE ? "the receiver did not answer with its identity" : "");
   }
-  return {.id = Take(info.bstrReceiverId),
-          .model = Take(info.bstrModel),
-          .family = info.dwProtocol,
-          .variant = info.dwVariant,
-          .features = info.dwFeatures};
+  identity_ = {.id = Take(info.bstrReceiverId),
+               .model = Take(info.bstrModel),
+               .family = info.dwProtocol,
+               .variant = info.dwVariant,
+               .features = info.dwFeatures};
+  return *identity_;
 }
 
-std::vector<RemoteFile> Receiver::ListFiles() {
-  constexpr const char* kTried = "list the receiver's files";
-  ThrowIfCancelled(kTried);
+Directory Receiver::ListFiles() {
+  Directory directory{.files = ReadDirectory()};
+  directory.doubt = DoubtAbout(directory.files);
+  if (!directory.doubt.empty()) {
+    context_.PrintWarning("Warning: files may be missing. " + directory.doubt + "\n");
+  }
+  return directory;
+}
+
+std::vector<RemoteFile> Receiver::ReadDirectory() {
+  ThrowIfCancelled(kList);
+  const Busy busy(context_, "Reading the list of files");
   void* opened = nullptr;
   const long result = devapi::OpenFileList(handle(), &opened);
   const UniqueList list(opened);
-  if (result != S_OK) throw FailureOf(kTried, result);
+  if (result != S_OK) throw FailureOf(kList, result);
   long count = 0;
   if (const long counted = devapi::GetFilesCount(list.get(), &count); counted != S_OK) {
-    throw FailureOf(kTried, counted);
+    throw FailureOf(kList, counted);
   }
   std::vector<RemoteFile> files(static_cast<std::size_t>(count));
   for (long i = 0; i < count; ++i) {
     const long read = ReadEntry(list.get(), i, files[static_cast<std::size_t>(i)]);
-    if (read != S_OK) throw FailureOf(kTried, read);
+    if (read != S_OK) throw FailureOf(kList, read);
   }
-  const std::string doubt = DoubtAbout(files);
-  if (!doubt.empty()) context_.PrintWarning("Note: this list may be cut. " + doubt + "\n");
   return files;
 }
 
-// Velmar receivers are on serial ports only, so the family is known without asking for it.
-std::string Receiver::DoubtAbout(const std::vector<RemoteFile>& files) const {
+/// Of Velmar receivers only, which are on serial ports: an empty list is read once more, as the
+/// library does not tell a refused or lost question from an empty directory.
+std::string Receiver::DoubtAbout(std::vector<RemoteFile>& files) {
   if (!setting_ || setting_->family != eProtocolVelmar) return {};
+  if (MayBeCut(files)) AwaitAnswer(kList);
+  if (files.empty()) files = ReadDirectory();
   if (files.empty()) {
-    return "It is empty: a Velmar receiver without files is not told from one that refused or did "
+    return "The list is empty: a Velmar receiver that has no files is not told from one that did "
            "not answer.";
   }
   if (!MayBeCut(files)) return {};
@@ -124,6 +139,18 @@ bool Receiver::Answers() {
   short answer = VARIANT_FALSE;
   const long code = devapi::CheckConnection(handle(), interrupt_.event(), &answer);
   return code == S_OK && answer != VARIANT_FALSE;
+}
+
+/// The rest of a list that did not fit is still on its way: it would spoil the next exchange.
+void Receiver::AwaitAnswer(const std::string& tried) {
+  constexpr std::uint64_t kLongestRestMs = 120'000;
+  const Busy busy(context_, "Waiting for the end of the list");
+  const std::uint64_t start_ms = GetTickCount64();
+  while (GetTickCount64() - start_ms < kLongestRestMs) {
+    ThrowIfCancelled(tried);
+    if (Answers()) return;
+  }
+  throw FailureOf(tried, ResultOfWin32(ERROR_TIMEOUT), "the receiver does not answer any more");
 }
 
 Failure Receiver::FailureOf(std::string tried, long code, std::string meaning) const {

@@ -36,6 +36,12 @@ struct RemoteFile {
   SYSTEMTIME time{};
 };
 
+/// The receiver's files.
+struct Directory {
+  std::vector<RemoteFile> files{};
+  std::string doubt{};  ///< why some may be missing; empty: all are there
+};
+
 /// Asks the library once a second to end what it is doing: a request may fall between two steps
 /// and be lost.
 class Aborter {
@@ -67,15 +73,13 @@ class Receiver {
   /// Where it answered, on a serial port.
   const std::optional<KnownSetting>& setting() const { return setting_; }
 
+  /// Asked for once only.
   /// @throws Failure
-  Identity Identify();
+  const Identity& Identify();
 
   /// Reads the receiver's directory. Warns when some of it may be missing.
   /// @throws Failure
-  std::vector<RemoteFile> ListFiles();
-
-  /// Why files may be missing from a list that was read; empty when all are there.
-  std::string DoubtAbout(const std::vector<RemoteFile>& files) const;
+  Directory ListFiles();
 
   /// Asks the receiver whether it still answers.
   bool Answers();
@@ -87,6 +91,10 @@ class Receiver {
   void ThrowIfCancelled(const std::string& tried) const;
 
  private:
+  std::vector<RemoteFile> ReadDirectory();
+  std::string DoubtAbout(std::vector<RemoteFile>& files);
+  void AwaitAnswer(const std::string& tried);
+
   struct Closer {
     void operator()(void* handle) const { devapi::CloseReceiver(handle); }
   };
@@ -96,6 +104,7 @@ class Receiver {
   std::unique_ptr<void, Closer> handle_;
   EInstanceType link_;
   std::optional<KnownSetting> setting_;
+  std::optional<Identity> identity_;
   Ticker cancel_watch_;  // ends before the handle does
 };
 

@@ -2,25 +2,74 @@
 
 #include <windows.h>
 
+#include <cstdarg>
+#include <vector>
+
 #include "paths.h"
 #include "rcvlink.h"
 #include "text.h"
 
 namespace cli {
+namespace {
 
-ReportFile::ReportFile(Context& context) : wanted_(!context.arguments.report.empty()) {
-  if (!wanted_) return;
+/// Writes one line into the report.
+void WriteLine(const wchar_t* format, ...) {
+  va_list arguments;
+  va_start(arguments, format);
+  dump_hlp::DumpReportString(format, arguments);
+  va_end(arguments);
+}
+
+/// "1.0.0.0", from the version resource of a module; "unknown" without one.
+std::wstring VersionOf(const wchar_t* module) {
+  const DWORD size = GetFileVersionInfoSizeW(module, nullptr);
+  std::vector<BYTE> block(size);
+  void* value = nullptr;
+  UINT length = 0;
+  if (size == 0 || GetFileVersionInfoW(module, 0, size, block.data()) == FALSE ||
+      VerQueryValueW(block.data(), L"\\", &value, &length) == FALSE) {
+    return L"unknown";
+  }
+  const auto& version = *static_cast<const VS_FIXEDFILEINFO*>(value);
+  return std::to_wstring(HIWORD(version.dwFileVersionMS)) + L"." +
+         std::to_wstring(LOWORD(version.dwFileVersionMS)) + L"." +
+         std::to_wstring(HIWORD(version.dwFileVersionLS)) + L"." +
+         std::to_wstring(LOWORD(version.dwFileVersionLS));
+}
+
+void WriteHeading() {
+  const std::wstring command_line = ToUtf16(Printable(GetCommandLineW()));
+  WriteLine(L"rcvlink-cli %s, rcvlink.dll %s, kernel32.dll %s\r\n",
+            L"" RCVLINK_VERSION,
+            VersionOf(L"rcvlink.dll").c_str(),
+            VersionOf(L"kernel32.dll").c_str());
+  WriteLine(L"command line: %s\r\n", command_line.c_str());
+}
+
+}  // namespace
+
+ReportFile::ReportFile(Context& context) {
+  const std::wstring& name = context.arguments.report;
+  if (name.empty()) return;
   wchar_t folder[MAX_PATH + 1] = L"";
   GetTempPathW(MAX_PATH + 1, folder);
-  const std::wstring path = folder + context.arguments.report;
-  dump_hlp::CreateReportFile(context.arguments.report.c_str());
+  const std::wstring path = folder + name;
   const std::string shown = Printable(path);
-  context.PrintStatus(Exists(path) ? "The report is in " + shown + " (a hidden file).\n"
-                                   : "The report " + shown + " could not be made.\n");
+  if (Exists(path) && !context.arguments.force) {
+    Failure failure = LocalFailure("make the report " + shown, ERROR_FILE_EXISTS);
+    failure.meaning = "it exists already";
+    failure.hint = "--force replaces it, --report with another name keeps it.";
+    throw failure;
+  }
+  dump_hlp::CreateReportFile(name.c_str());
+  if (!Exists(path)) throw LocalFailure("make the report " + shown, ERROR_CANNOT_MAKE);
+  path_ = path;
+  WriteHeading();
+  context.PrintStatus("The report is in " + shown + " (a hidden file).\n");
 }
 
 ReportFile::~ReportFile() {
-  if (wanted_) dump_hlp::CloseReportFile();
+  if (!path_.empty()) dump_hlp::CloseReportFile();
 }
 
 }  // namespace cli

@@ -3,20 +3,27 @@
 #ifndef RCVLINK_CLI_REPORT_FILE_H_
 #define RCVLINK_CLI_REPORT_FILE_H_
 
+#include <string>
+
 #include "context.h"
 
 namespace cli {
 
-/// While it lives, the library writes down what it does, when the command line asks for that.
+/// While it lives, the library writes down what it does, when the command line asks for that. The
+/// report begins with the versions and the command line.
 class ReportFile {
  public:
+  /// @throws Failure when the file exists already and may not be overwritten, or cannot be made
   explicit ReportFile(Context& context);
   ~ReportFile();
   ReportFile(const ReportFile&) = delete;
   ReportFile& operator=(const ReportFile&) = delete;
 
+  /// Where it is; empty when none was asked for.
+  const std::wstring& path() const { return path_; }
+
  private:
-  bool wanted_;
+  std::wstring path_;
 };
 
 }  // namespace cli

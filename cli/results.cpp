@@ -6,6 +6,7 @@
 #include <array>
 
 #include "text.h"
+#include "troubleshooting.h"
 
 namespace cli {
 namespace {
@@ -30,6 +31,8 @@ const std::array kKnownCodes = {
               "no connection, no complete reply, or the receiver refused the command"},
     KnownCode{HRESULT_FROM_WIN32(ERROR_TIMEOUT), "the receiver stayed silent"},
     KnownCode{HRESULT_FROM_WIN32(ERROR_FILE_NOT_FOUND), "it does not exist"},
+    KnownCode{HRESULT_FROM_WIN32(ERROR_NOT_READY),
+              "the device behind it does not answer: switched off, or out of reach"},
     KnownCode{HRESULT_FROM_WIN32(ERROR_ACCESS_DENIED), "access denied: in use, or not allowed"},
 };
 
@@ -78,14 +81,27 @@ std::string MeaningOf(const Failure& failure) {
   return failure.meaning.empty() ? MeaningOf(failure.code) : failure.meaning;
 }
 
+std::string HintOf(const Failure& failure) {
+  if (!failure.hint.empty() || failure.exit == ExitCode::kCancelled) return failure.hint;
+  if (!FindTroubleshooting(failure.code)) return "";
+  return "`rcvlink-cli explain " + HexCode(failure.code) + "` tells what to try.";
+}
+
 std::string Describe(const Failure& failure) {
   const bool cancelled = failure.exit == ExitCode::kCancelled;
+  // A code that reads as a success is no help to a person; the meaning says what is the matter.
+  const bool has_code = failure.code < 0;
   std::string text = "rcvlink-cli: ";
   if (!failure.port.empty()) text += failure.port + ": ";
   text += cancelled ? "cancelled: did not " : "could not ";
   text += failure.tried;
-  text += ": " + HexCode(failure.code) + ", " + MeaningOf(failure) + "\n";
-  if (!failure.hint.empty()) text += "  " + failure.hint + "\n";
+  text += ": ";
+  if (has_code) text += HexCode(failure.code) + ", ";
+  text += MeaningOf(failure) + "\n";
+  if (!failure.kept.empty()) {
+    text += "  What came is kept in " + Printable(ToUtf16(failure.kept)) + "\n";
+  }
+  if (const std::string hint = HintOf(failure); !hint.empty()) text += "  " + hint + "\n";
   return text;
 }
 

@@ -34,10 +34,14 @@ struct Failure {
   long code = 0;          ///< the result code
   std::string meaning{};  ///< empty: `MeaningOf` says it
   std::string hint{};     ///< what the user can do about it; may be empty
+  std::string kept{};     ///< path of what came of a download nevertheless; may be empty
 };
 
 /// The meaning of a failure: its own, or that of its code.
 std::string MeaningOf(const Failure& failure);
+
+/// What the user can try: the failure's own hint, or the way to the entry of its code.
+std::string HintOf(const Failure& failure);
 
 /// The failure as lines for a person, each with its line end.
 std::string Describe(const Failure& failure);

@@ -6,9 +6,12 @@
 namespace cli {
 
 SearchDisplay::SearchDisplay(Context& context, std::size_t ports)
-    : context_(context), ports_(ports), start_ms_(GetTickCount64()) {
+    : context_(context),
+      mode_(ProgressModeOf(context)),
+      ports_(ports),
+      start_ms_(GetTickCount64()) {
   doing_ = ports_ == 1 ? "Searching" : "Asking " + std::to_string(ports_) + " ports";
-  if (!context_.err.is_terminal()) return;
+  if (mode_ != ProgressMode::kBar) return;
   ticker_.emplace(kInterval, [this] {
     const std::scoped_lock lock(mutex_);
     Draw();
@@ -30,10 +33,15 @@ void SearchDisplay::Begin(const std::wstring& port,
       one_try ? "" : "try " + std::to_string(number) + " of " + std::to_string(count) + ": ";
   const std::string text = Printable(port) + ": " + numbers + InWords(line);
   if (ports_ == 1) doing_ = text;
-  if (context_.err.is_terminal()) {
-    Draw();
-  } else if (!one_try) {
-    context_.PrintStatus(text + "\n");
+  if (mode_ == ProgressMode::kBar) Draw();
+  if (mode_ == ProgressMode::kLines && !one_try) context_.err.Write(text + "\n");
+  if (mode_ == ProgressMode::kJson) {
+    const Json json = {{"port", ToUtf8(port)},
+                       {"try", number},
+                       {"tries", count},
+                       {"speed", line.speed},
+                       {"rts", RtsWord(line.rts)}};
+    context_.err.Write(json.dump() + "\n");
   }
 }
 
@@ -61,12 +69,12 @@ void SearchDisplay::Draw() {
   // The last column stays free: a full line would wrap.
   const std::size_t width = context_.err.Width() - 1;
   const std::string line = (doing_ + ", " + seconds + " (Ctrl-C ends it)").substr(0, width);
-  context_.PrintStatus(Redrawn(line, drawn_width_));
+  context_.err.Write(Redrawn(line, drawn_width_));
   drawn_width_ = line.size();
 }
 
 void SearchDisplay::Erase() {
-  if (drawn_width_ > 0) context_.PrintStatus(Erased(drawn_width_));
+  if (drawn_width_ > 0) context_.err.Write(Erased(drawn_width_));
   drawn_width_ = 0;
 }
 

@@ -14,7 +14,8 @@
 
 namespace cli {
 
-/// The present try in the last line of a terminal, with the time; elsewhere a line for each try.
+/// The present try where a bar would be shown, with the time; else a line for each try, as --progress
+/// says.
 /// While it lives, all that the program prints goes through it. For any number of threads.
 class SearchDisplay {
  public:
@@ -44,6 +45,7 @@ class SearchDisplay {
   void Erase();
 
   Context& context_;
+  const ProgressMode mode_;
   const std::size_t ports_;
   const std::uint64_t start_ms_;
   std::mutex mutex_;

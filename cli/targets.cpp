@@ -4,6 +4,8 @@
 
 #include <algorithm>
 
+#include "formats.h"
+#include "handle.h"
 #include "names.h"
 #include "paths.h"
 #include "results.h"
@@ -26,10 +28,71 @@ Failure Refusal(const std::wstring& name, DWORD error, std::string meaning, std:
           .hint = std::move(hint)};
 }
 
+/// @throws Failure when no file can be made in the folder
+void CheckWritable(const std::filesystem::path& folder) {
+  const std::string tried = "make files in " + Printable(folder.native());
+  if (!IsFolder(folder)) throw LocalFailure(tried, ERROR_DIRECTORY);
+  const std::wstring name = L"rcvlink-cli-" + std::to_wstring(GetCurrentProcessId()) + L".tmp";
+  const std::filesystem::path probe = folder / name;
+  const UniqueHandle file(CreateFileW(probe.c_str(),
+                                      GENERIC_WRITE | DELETE,
+                                      0,
+                                      nullptr,
+                                      CREATE_NEW,
+                                      FILE_FLAG_DELETE_ON_CLOSE,
+                                      nullptr));
+  const DWORD error = GetLastError();
+  if (file.get() == INVALID_HANDLE_VALUE) throw LocalFailure(tried, error);
+}
+
 }  // namespace
 
 Targets::Targets(const Place& place) : force_(place.force) {
   (NamesFolder(place) ? folder_ : file_) = place.output;
+}
+
+void Targets::CheckFolder() const {
+  if (!file_.empty() && !IsPlainFileName(file_.filename().native())) {
+    throw Refusal(
+        file_.native(), ERROR_INVALID_NAME, "no file of this computer can have that name", "");
+  }
+  const std::filesystem::path existing = ExistingFolder();
+  const std::filesystem::path parent = file_.parent_path();
+  if (!file_.empty() && !parent.empty() && !IsFolder(parent)) {
+    throw Refusal(file_.native(),
+                  ERROR_PATH_NOT_FOUND,
+                  "there is no folder " + Printable(parent.native()),
+                  "Make it first, or choose another one with -o.");
+  }
+  CheckWritable(existing);
+}
+
+void Targets::CheckRoom(std::uint64_t bytes) const {
+  ULARGE_INTEGER available{};
+  const std::filesystem::path folder = ExistingFolder();
+  if (GetDiskFreeSpaceExW(folder.c_str(), &available, nullptr, nullptr) == FALSE) return;
+  if (available.QuadPart >= bytes) return;
+  throw Failure{.exit = ExitCode::kLocalFile,
+                .tried = "download into " + Printable(folder.native()),
+                .code = ResultOfWin32(ERROR_DISK_FULL),
+                .meaning = "there is room for " + FormatBytes(available.QuadPart) +
+                           ", but the files have " + FormatBytes(bytes),
+                .hint = "Make room, choose another disk with -o, or name fewer files."};
+}
+
+/// The folder of the targets, or the nearest one above that is there already.
+std::filesystem::path Targets::ExistingFolder() const {
+  std::filesystem::path folder = file_.empty() ? folder_ : file_.parent_path();
+  folder = std::filesystem::absolute(folder.empty() ? L"." : folder);
+  if (!folder.has_filename()) folder = folder.parent_path();
+  while (!Exists(folder) && folder.parent_path() != folder) {
+    const std::wstring name = folder.filename().native();
+    if (!name.empty() && !IsPlainFileName(name)) {
+      throw Refusal(name, ERROR_INVALID_NAME, "no folder of this computer can have that name", "");
+    }
+    folder = folder.parent_path();
+  }
+  return folder;
 }
 
 std::filesystem::path Targets::Choose(const std::wstring& name) {
@@ -46,6 +109,14 @@ std::filesystem::path Targets::Choose(const std::wstring& name) {
                   ERROR_FILE_EXISTS,
                   shown + (IsFolder(target) ? " is a folder" : " exists already"),
                   IsFolder(target) ? "" : "--force overwrites it, -o chooses another place.");
+  }
+  const std::filesystem::path part = target.native() + std::wstring(kPartSuffix);
+  if (Exists(part) && (!force_ || IsFolder(part))) {
+    throw Refusal(name,
+                  ERROR_FILE_EXISTS,
+                  Printable(part.native()) + " exists already",
+                  "A download that was cut off left it, or another one is writing it; --force "
+                  "replaces it.");
   }
   chosen_.push_back(target);
   return target;

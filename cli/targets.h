@@ -3,6 +3,7 @@
 #ifndef RCVLINK_CLI_TARGETS_H_
 #define RCVLINK_CLI_TARGETS_H_
 
+#include <cstdint>
 #include <filesystem>
 #include <string>
 #include <vector>
@@ -21,9 +22,17 @@ class Targets {
  public:
   explicit Targets(const Place& place);
 
+  /// Looks whether files can be made where they are to go. Makes nothing that stays.
+  /// @throws Failure
+  void CheckFolder() const;
+
+  /// Looks whether the disk has room for so many bytes.
+  /// @throws Failure
+  void CheckRoom(std::uint64_t bytes) const;
+
   /// The file for a name of the receiver.
-  /// @throws Failure when the name is impossible, the file exists already and may not be
-  ///         overwritten, or an earlier name has taken it
+  /// @throws Failure when the name is impossible, the file or its ".part" exists already and may not
+  ///         be overwritten, or an earlier name has taken it
   std::filesystem::path Choose(const std::wstring& name);
 
   /// The folder of all targets; empty for that of a single target named by the user.
@@ -31,6 +40,7 @@ class Targets {
 
  private:
   std::filesystem::path PathOf(const std::wstring& name) const;
+  std::filesystem::path ExistingFolder() const;
   bool IsTaken(const std::filesystem::path& target) const;
 
   bool force_;

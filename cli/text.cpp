@@ -5,6 +5,8 @@
 #include <algorithm>
 #include <cctype>
 #include <charconv>
+#include <numeric>
+#include <vector>
 
 namespace cli {
 namespace {
@@ -76,6 +78,21 @@ std::string Lowered(std::string text) {
     return static_cast<char>(std::tolower(static_cast<unsigned char>(letter)));
   });
   return text;
+}
+
+std::size_t ChangesBetween(std::string_view first, std::string_view second) {
+  std::vector<std::size_t> row(second.size() + 1);
+  std::iota(row.begin(), row.end(), std::size_t{0});
+  for (std::size_t i = 0; i < first.size(); ++i) {
+    std::size_t diagonal = row[0];
+    row[0] = i + 1;
+    for (std::size_t j = 0; j < second.size(); ++j) {
+      const std::size_t changed = diagonal + (first[i] == second[j] ? 0 : 1);
+      diagonal = row[j + 1];
+      row[j + 1] = std::min({changed, row[j] + 1, row[j + 1] + 1});
+    }
+  }
+  return row.back();
 }
 
 std::string PadLeft(std::string text, std::size_t width) {

@@ -27,6 +27,9 @@ std::string Hex(unsigned long value, std::size_t digits);
 /// In small letters, as far as they are of ASCII.
 std::string Lowered(std::string text);
 
+/// How many letters have to be added, taken away or changed to make one word the other.
+std::size_t ChangesBetween(std::string_view first, std::string_view second);
+
 std::string PadLeft(std::string text, std::size_t width);
 std::string PadRight(std::string text, std::size_t width);
 

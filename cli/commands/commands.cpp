@@ -17,6 +17,7 @@ CommandPointer MakeRemove();
 CommandPointer MakeMove();
 CommandPointer MakeSet();
 CommandPointer MakeCheck();
+CommandPointer MakeExplain();
 
 Commands MakeCommands() {
   constexpr std::array kTable = {MakePorts,
@@ -28,7 +29,8 @@ Commands MakeCommands() {
                                  MakeRemove,
                                  MakeMove,
                                  MakeSet,
-                                 MakeCheck};
+                                 MakeCheck,
+                                 MakeExplain};
   Commands commands;
   for (const auto make : kTable) commands.push_back(make());
   return commands;

@@ -30,6 +30,17 @@ void FileReport::AddUntried(std::size_t count) {
   document_["untried"] = count;
 }
 
+void FileReport::SetComplete(const std::string& doubt) {
+  document_["complete"] = doubt.empty();
+  if (doubt.empty()) return;
+  document_["warning"] = doubt;
+  if (failure_) return;
+  failure_ = Failure{.tried = "download all files",
+                     .port = Printable(context_.arguments.port),
+                     .code = ResultOfWin32(ERROR_MORE_DATA),
+                     .meaning = "files may be missing. " + doubt};
+}
+
 Outcome FileReport::Finish() && {
   if (failure_) document_["error"] = ToJson(*failure_);
   return {.exit = failure_ ? failure_->exit : ExitCode::kDone, .document = std::move(document_)};

@@ -24,6 +24,10 @@ class FileReport {
   /// Records that the command ended early.
   void AddUntried(std::size_t count);
 
+  /// Records whether the receiver's list of files had all of them.
+  /// @param doubt why not; empty when it had
+  void SetComplete(const std::string& doubt);
+
   /// The command's end: that of the first failure, or of the cancellation.
   Outcome Finish() &&;
 

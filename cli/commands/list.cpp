@@ -33,26 +33,36 @@ class List : public Command {
   void AddOptions(CLI::App& app, Arguments& arguments) override { AddPort(app, arguments); }
 
   Outcome Run(Context& context) override {
-    constexpr std::string_view kSizeTitle = "Size";
     Receiver receiver(context);
-    const std::vector<RemoteFile> files = receiver.ListFiles();
-    std::size_t size_width = kSizeTitle.size();
+    const Directory directory = receiver.ListFiles();
+    const std::vector<RemoteFile>& files = directory.files;
     std::uint64_t total = 0;
+    for (const RemoteFile& file : files) total += file.size;
+    PrintTable(context, files);
+    context.PrintDone(std::to_string(files.size()) + (files.size() == 1 ? " file" : " files") +
+                      ", " + std::to_string(total) + " bytes\n");
+    Json list = Json::array();
+    for (const RemoteFile& file : files) list.push_back(ToJson(file));
+    Outcome outcome{.document = {{"port", ToUtf8(context.arguments.port)},
+                                 {"files", list},
+                                 {"bytes", total},
+                                 {"complete", directory.doubt.empty()}}};
+    if (!directory.doubt.empty()) outcome.document["warning"] = directory.doubt;
+    return outcome;
+  }
+
+ private:
+  static void PrintTable(Context& context, const std::vector<RemoteFile>& files) {
+    constexpr std::string_view kSizeTitle = "Size";
+    std::size_t size_width = kSizeTitle.size();
     for (const RemoteFile& file : files) {
       size_width = std::max(size_width, std::to_string(file.size).size());
-      total += file.size;
     }
     if (!files.empty()) context.PrintDone(Row(std::string(kSizeTitle), size_width, "Time", "Name"));
-    Outcome outcome{.document = Json::array()};
     for (const RemoteFile& file : files) {
       context.PrintResult(
           Row(std::to_string(file.size), size_width, FormatTime(file.time), Printable(file.name)));
-      outcome.document.push_back(ToJson(file));
     }
-    const std::string count =
-        std::to_string(files.size()) + (files.size() == 1 ? " file" : " files");
-    context.PrintDone(count + ", " + std::to_string(total) + " bytes\n");
-    return outcome;
   }
 };
 

@@ -3,6 +3,7 @@
 #include <optional>
 
 #include "command.h"
+#include "download.h"
 #include "file_report.h"
 #include "formats.h"
 #include "local_files.h"
@@ -24,20 +25,33 @@ struct MirrorOptions {
   std::optional<TimeZone> times{};  ///< nothing: files have the time of their download
   bool verify = false;
   bool deletes = false;
-  bool force = false;
 };
+
+/// The places of a mirror's files. What is there already may be replaced, by the rules of `Mirror`.
+/// @throws Failure when there can be none, before a search that may take minutes
+Targets TargetsIn(const std::wstring& folder) {
+  Targets targets({.output = folder, .many = true, .force = true});
+  targets.CheckFolder();
+  return targets;
+}
 
 /// The mirror of a receiver: goes on after a file that failed, and ends by the worst of all.
 class MirrorRun {
  public:
   MirrorRun(Context& context, const MirrorOptions& options)
-      : context_(context), options_(options), receiver_(context), report_(context) {}
+      : context_(context),
+        options_(options),
+        targets_(TargetsIn(options.folder)),
+        receiver_(context),
+        report_(context) {}
 
   Outcome Run() {
-    const std::vector<RemoteFile> files = receiver_.ListFiles();
-    doubt_ = receiver_.DoubtAbout(files);
+    const Directory directory = receiver_.ListFiles();
+    const std::vector<RemoteFile>& files = directory.files;
+    doubt_ = directory.doubt;
     const std::vector<MirrorJob> jobs = Plan(files);
     PrintPlan(jobs);
+    targets_.CheckRoom(new_bytes_);
     if (!jobs.empty()) MakeFolder(options_.folder);
     MirrorAll(jobs);
     if (!asked_to_delete_.empty()) CheckDeleted(files.size());
@@ -62,8 +76,6 @@ class MirrorRun {
   }
 
   std::vector<MirrorJob> Plan(const std::vector<RemoteFile>& files) {
-    // What is here already may be replaced, by the rules of `Mirror`.
-    Targets targets({.output = options_.folder, .many = true, .force = true});
     std::vector<MirrorJob> jobs;
     for (const RemoteFile& file : files) {
       if (!IsWanted(file.name)) continue;
@@ -72,8 +84,8 @@ class MirrorRun {
           throw Failure{
               .tried = "mirror " + Printable(file.name), .code = E_INVALIDARG, .meaning = *reason};
         }
-        CheckSize(file);
-        const std::filesystem::path target = targets.Choose(file.name);
+        CheckSize(receiver_, file);
+        const std::filesystem::path target = targets_.Choose(file.name);
         jobs.push_back({file, target, StepFor(file.size, SizeOf(target), options_.deletes)});
       } catch (const Failure& failure) {
         AddFailed(file.name, failure);
@@ -82,23 +94,10 @@ class MirrorRun {
     return jobs;
   }
 
-  /// Refuses what the protocol cannot bring to its end, before minutes are spent on it.
-  void CheckSize(const RemoteFile& file) const {
-    constexpr std::uint64_t kMostQuorinBytes = 33'554'432;  // 65536 blocks of 512
-    const auto& setting = receiver_.setting();
-    const bool limited = setting && setting->family == eProtocolQuorin;
-    if (!limited || file.size <= kMostQuorinBytes) return;
-    throw Failure{.tried = "mirror " + Printable(file.name),
-                  .code = ResultOfWin32(ERROR_FILE_TOO_LARGE),
-                  .meaning = "it has " + std::to_string(file.size) +
-                             " bytes; over a serial line a Quorin receiver can send " +
-                             std::to_string(kMostQuorinBytes) + " of a file",
-                  .hint = "Download it over USB."};
-  }
-
   void PrintPlan(const std::vector<MirrorJob>& jobs) {
     for (const MirrorJob& job : jobs) {
       total_.total += BytesOf(job, options_.verify);
+      if (job.step == MirrorStep::kDownload) new_bytes_ += job.file.size;
       total_.files += job.step != MirrorStep::kNothing;
     }
     context_.PrintStatus(std::to_string(jobs.size()) + " files on the receiver, " +
@@ -141,13 +140,14 @@ class MirrorRun {
     ++total_.file;
     receiver_.ThrowIfCancelled("mirror " + Printable(name));
     context_.PrintStatus(InWords(total_, name, job.file.size) + "\n");
-    Mirror(context_, receiver_, job, options_.verify, options_.force);
+    const std::string sha256 = Mirror(context_, receiver_, job, options_.verify);
     const bool came = job.step != MirrorStep::kCompare;
     ++(came ? summary_.downloaded : summary_.present);
     if (came) SetTimeOf(job);
     const bool verified = job.file.size > 0 && (options_.verify || !came);
     details["done"] = came ? "downloaded" : "compared";
     details["verified"] = verified;
+    details["sha256"] = sha256.empty() ? Json(nullptr) : Json(sha256);
     if (came) context_.PrintDone(Printable(name) + " -> " + Printable(job.target.native()) + "\n");
     if (verified && options_.deletes) Delete(name);
     done_.emplace_back(name, details);
@@ -171,7 +171,7 @@ class MirrorRun {
     std::vector<RemoteFile> files;
     std::optional<Failure> unread;
     try {
-      files = receiver_.ListFiles();
+      files = receiver_.ListFiles().files;
       if (files.empty() && listed_before > asked_to_delete_.size()) {
         unread = Failure{.code = ResultOfWin32(ERROR_TIMEOUT),
                          .meaning = "the receiver did not list its files again"};
@@ -224,6 +224,7 @@ class MirrorRun {
   }
 
   Outcome Finish() {
+    report_.SetComplete(doubt_);
     Outcome outcome = std::move(report_).Finish();
     outcome.document["folder"] = ToUtf8(options_.folder);
     outcome.document["summary"] = {{"downloaded", summary_.downloaded},
@@ -231,26 +232,18 @@ class MirrorRun {
                                    {"failed", summary_.failed},
                                    {"untried", summary_.untried},
                                    {"deleted", summary_.deleted}};
-    outcome.document["complete"] = doubt_.empty() && worst_ == ExitCode::kDone;
-    outcome.exit = worst_;
-    if (doubt_.empty()) return outcome;
-    outcome.document["warning"] = doubt_;
-    const Failure failure{.tried = "mirror all files",
-                          .port = Printable(context_.arguments.port),
-                          .code = ResultOfWin32(ERROR_MORE_DATA),
-                          .meaning = "files may be missing. " + doubt_};
-    context_.PrintFailure(failure);
-    if (!outcome.document.contains("error")) outcome.document["error"] = ToJson(failure);
-    outcome.exit = Worse(worst_, failure.exit);
+    outcome.exit = doubt_.empty() ? worst_ : Worse(worst_, ExitCode::kFailed);
     return outcome;
   }
 
   Context& context_;
   const MirrorOptions& options_;
+  Targets targets_;
   Receiver receiver_;
   FileReport report_;
   std::string doubt_;
   MirrorState total_;
+  std::uint64_t new_bytes_ = 0;  // that the disk needs room for
   Summary summary_;
   ExitCode worst_ = ExitCode::kDone;
   std::vector<std::pair<std::wstring, Json>> done_;
@@ -281,10 +274,6 @@ class MirrorCommand : public Command {
             "--then-delete",
             "Delete files on the receiver that a second download verified",
             options_.deletes);
-    AddFlag(app,
-            "--force",
-            "Replace also files that are no beginning of the receiver's",
-            options_.force);
   }
 
   void Check() const override {
@@ -293,12 +282,6 @@ class MirrorCommand : public Command {
   }
 
   Outcome Run(Context& context) override {
-    if (Exists(options_.folder) && !IsFolder(options_.folder)) {
-      throw Failure{.exit = ExitCode::kLocalFile,
-                    .tried = "mirror into " + Printable(options_.folder),
-                    .code = ResultOfWin32(ERROR_DIRECTORY),
-                    .meaning = "it is no folder"};
-    }
     MirrorOptions options = options_;
     options.verify = options.verify || options.deletes;
     return MirrorRun(context, options).Run();

@@ -16,7 +16,7 @@ void Rename(Receiver& receiver,
   const long code = devapi::RenameFile(receiver.handle(), from.data(), to.data());
   if (code != S_OK) throw receiver.FailureOf(tried, code);
   // The receiver may refuse and the library not know it: its directory tells.
-  const std::vector<RemoteFile> files = receiver.ListFiles();
+  const std::vector<RemoteFile> files = receiver.ListFiles().files;
   if (!HasFile(files, new_name) || HasFile(files, old_name)) {
     throw receiver.FailureOf(
         tried, code, "the receiver was asked to, but its directory does not show it");
@@ -52,7 +52,7 @@ class Move : public Command {
           .code = E_NOTIMPL,
           .meaning = "a " + FamilyName(identity.family) + " receiver does not offer renaming"};
     }
-    const std::vector<RemoteFile> files = receiver.ListFiles();
+    const std::vector<RemoteFile> files = receiver.ListFiles().files;
     FindFile(files, old_name, tried);
     if (HasFile(files, new_name)) {
       throw Failure{.tried = tried,

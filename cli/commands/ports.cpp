@@ -50,7 +50,7 @@ class Ports : public Command {
       context.PrintResult((details.empty() ? name : PadRight(name, width) + details) + "\n");
       list.push_back(ToJson(port));
     }
-    return {.document = list};
+    return {.document = {{"ports", list}}};
   }
 };
 

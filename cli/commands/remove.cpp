@@ -48,13 +48,19 @@ std::vector<std::wstring> RemoveAll(Context& context,
 
 void Verify(Context& context,
             Receiver& receiver,
+            std::size_t listed_before,
             const std::vector<std::wstring>& removed,
             FileReport& report) {
   if (removed.empty()) return;
   std::vector<RemoteFile> files;
   std::optional<Failure> unread;
   try {
-    files = receiver.ListFiles();
+    files = receiver.ListFiles().files;
+    if (files.empty() && listed_before > removed.size()) {
+      // It was not answered: without the files that were not removed it tells nothing.
+      unread = Failure{.code = ResultOfWin32(ERROR_TIMEOUT),
+                       .meaning = "the receiver did not list its files again"};
+    }
   } catch (const Failure& failure) {
     unread = failure;
   }
@@ -82,11 +88,11 @@ class Remove : public Command {
 
   Outcome Run(Context& context) override {
     Receiver receiver(context);
-    const std::vector<RemoteFile> files = receiver.ListFiles();
+    const std::vector<RemoteFile> files = receiver.ListFiles().files;
     for (const std::wstring& name : names_) FindFile(files, name, Tried(name));
     FileReport report(context);
     const std::vector<std::wstring> removed = RemoveAll(context, receiver, names_, report);
-    Verify(context, receiver, removed, report);
+    Verify(context, receiver, files.size(), removed, report);
     return std::move(report).Finish();
   }
 

@@ -1,6 +1,7 @@
 #include <algorithm>
 
 #include "command.h"
+#include "discovery.h"
 #include "options.h"
 #include "receiver.h"
 #include "text.h"
@@ -40,12 +41,48 @@ long Send(void* receiver, Setting setting, unsigned long number) {
   return E_UNEXPECTED;
 }
 
+/// The port's settings with which a receiver answers after the change.
+DCB Changed(DCB settings, const SettingChange& change) {
+  switch (change.setting) {
+    case Setting::kBaud:
+      settings.BaudRate = change.value;
+      break;
+    case Setting::kParity:
+      settings.Parity = NOPARITY;
+      if (change.value == static_cast<unsigned long>(Parity::kOdd)) settings.Parity = ODDPARITY;
+      if (change.value == static_cast<unsigned long>(Parity::kEven)) settings.Parity = EVENPARITY;
+      settings.fParity = settings.Parity != NOPARITY;
+      break;
+    case Setting::kStopBits:
+      settings.StopBits = change.value == 1 ? ONESTOPBIT : TWOSTOPBITS;
+      break;
+    case Setting::kRts:
+      break;
+  }
+  return settings;
+}
+
+bool AnswersAt(const Context& context, const DCB& settings) {
+  void* receiver = nullptr;
+  TryPort(context, settings, &receiver);
+  if (receiver == nullptr) return false;
+  devapi::CloseReceiver(receiver);
+  return true;
+}
+
+/// Whether this program looks for receivers with that setting.
+bool IsFoundAgain(const SettingChange& change) {
+  if (change.setting == Setting::kParity)
+    return change.value == static_cast<unsigned long>(Parity::kNone);
+  return change.setting != Setting::kStopBits || change.value == 1;
+}
+
 std::string Advice(const SettingChange& change) {
   if (change.setting == Setting::kBaud) {
     return "  Open it with --speed " + std::to_string(change.value) + " from now on.\n";
   }
-  return "  Open its port with this setting from now on. (--speed and --rts mean no parity and one "
-         "stop bit.)\n";
+  if (IsFoundAgain(change)) return "";
+  return "  This program does not find it again: it uses no parity and one stop bit.\n";
 }
 
 /// What the words ask for.
@@ -73,39 +110,85 @@ class Set : public Command {
             "",
             value_,
             Need::kRequired);
+    AddFlag(app, "--yes", "Also set what this program cannot use itself", yes_);
   }
 
-  void Check() const override { CheckedChange(setting_, value_); }
+  void Check() const override {
+    const SettingChange change = CheckedChange(setting_, value_);
+    if (yes_ || IsFoundAgain(change)) return;
+    throw UsageError("with that " + SettingName(change.setting) +
+                     " the receiver would not be found again by this program, which uses no parity "
+                     "and one stop bit; --yes sets it all the same");
+  }
 
   Outcome Run(Context& context) override {
     const Arguments& arguments = context.arguments;
     const SettingChange change = CheckedChange(setting_, value_);
     const std::string name = SettingName(change.setting);
     const std::string tried = "set the receiver's " + name + " to " + ValueWord(change);
+    const EInstanceType link = Change(context, change, tried);
+    // What the RTS line does cannot be seen from here, nor what a receiver's port does over USB.
+    const bool confirmed = link == eInstanceSerial && change.setting != Setting::kRts;
+    if (confirmed) Confirm(context, change, tried);
+    context.PrintDone(Printable(arguments.port) + ": the receiver's " + name + " was set to " +
+                      ValueWord(change) +
+                      (confirmed ? ", and it answers there.\n" : "; it does not confirm that.\n") +
+                      Advice(change));
+    return {.document = {{"port", ToUtf8(arguments.port)},
+                         {"setting", SettingWord(change.setting)},
+                         {"value", ValueWord(change)},
+                         {"confirmed", confirmed}}};
+  }
+
+ private:
+  /// Sends the change, and lets go of the receiver.
+  /// @return the link on which it was found
+  /// @throws Failure
+  static EInstanceType Change(Context& context,
+                              const SettingChange& change,
+                              const std::string& tried) {
     Receiver receiver(context);
-    const Identity identity = receiver.Identify();
-    const auto family = static_cast<EProtocol>(identity.family);
-    const auto number = FamilyNumber(change, family);
+    const unsigned family = receiver.Identify().family;
+    const auto number = FamilyNumber(change, static_cast<EProtocol>(family));
     if (!number) {
       throw Failure{.tried = tried,
                     .code = E_NOTIMPL,
-                    .meaning = "a " + FamilyName(identity.family) +
-                               " receiver does not offer to control its " + name};
+                    .meaning = "a " + FamilyName(family) +
+                               " receiver does not offer to control its " +
+                               SettingName(change.setting)};
     }
     const ReceiverLock lock(context, receiver, tried);
     receiver.ThrowIfCancelled(tried);
     const long code = Send(receiver.handle(), change.setting, *number);
     if (code != S_OK) throw receiver.FailureOf(tried, code);
-    context.PrintDone(Printable(arguments.port) + ": the receiver's " + name + " was set to " +
-                      ValueWord(change) + "; it does not confirm that.\n" + Advice(change));
-    return {.document = {{"port", ToUtf8(arguments.port)},
-                         {"setting", SettingWord(change.setting)},
-                         {"value", ValueWord(change)}}};
+    return receiver.link();
   }
 
- private:
+  /// Asks the receiver at its new setting, and when it does not answer there, at the old one.
+  /// @throws Failure when it was not changed, or is lost
+  static void Confirm(const Context& context,
+                      const SettingChange& change,
+                      const std::string& tried) {
+    const auto before = CurrentSettings(context.arguments.port);
+    if (before && AnswersAt(context, Changed(*before, change))) return;
+    Failure failure{.tried = tried, .code = ResultOfWin32(ERROR_DEVICE_NOT_CONNECTED)};
+    if (context.interrupt.requested()) {
+      failure.exit = ExitCode::kCancelled;
+      failure.meaning = "ended by Ctrl-C while it was asked whether it had changed";
+    } else if (before && AnswersAt(context, *before)) {
+      failure.meaning = "refused: the receiver still answers as before";
+      failure.hint = "Receivers know certain values only, such as 115200, 57600 or 9600.";
+    } else {
+      failure.exit = ExitCode::kNoReceiver;
+      failure.meaning = "after the change the receiver answers neither as asked nor as before";
+      failure.hint = "`rcvlink-cli find` tries all the usual speeds.";
+    }
+    throw failure;
+  }
+
   std::wstring setting_;
   std::wstring value_;
+  bool yes_ = false;
 };
 
 }  // namespace
@@ -115,6 +198,7 @@ std::unique_ptr<Command> MakeSet() {
       "set",
       "Change the receiver's own port settings",
       "The change is the receiver's: from then on its port is reached with the new setting only.\n"
+      "The program then asks it whether it answers there.\n"
       "Examples:\n"
       "  rcvlink-cli set COM7 baud 115200\n"
       "  rcvlink-cli set COM7 parity none"});

@@ -25,8 +25,9 @@ struct ChunkFaultOption {
   const char* help;
 };
 
-constexpr std::array<ChunkFaultOption, 6> kChunkFaults = {{
+constexpr std::array<ChunkFaultOption, 7> kChunkFaults = {{
     {"--bad-crc", VelmarChunkFaultKind::kDamagedCrc, "CHUNK[@TIMES]", "a damaged CRC"},
+    {"--flipped-bit", VelmarChunkFaultKind::kFlippedBit, "CHUNK[@TIMES]", "a wrong bit of data"},
     {"--bad-sync", VelmarChunkFaultKind::kWrongSync, "CHUNK[@TIMES]", "wrong sync bytes 2 and 3"},
     {"--message-length",
      VelmarChunkFaultKind::kMessageLength,

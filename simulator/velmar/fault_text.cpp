@@ -56,7 +56,8 @@ uint32_t ParseAmount(VelmarChunkFaultKind kind, std::string_view text) {
 }  // namespace
 
 bool HasAmount(VelmarChunkFaultKind kind) {
-  return kind != VelmarChunkFaultKind::kDamagedCrc && kind != VelmarChunkFaultKind::kWrongSync;
+  return kind != VelmarChunkFaultKind::kDamagedCrc && kind != VelmarChunkFaultKind::kFlippedBit &&
+         kind != VelmarChunkFaultKind::kWrongSync;
 }
 
 bool HasAmount(VelmarReplyFaultKind kind) {

@@ -41,6 +41,8 @@ std::string_view FaultName(VelmarChunkFaultKind kind) {
   switch (kind) {
     case VelmarChunkFaultKind::kDamagedCrc:
       return "crc";
+    case VelmarChunkFaultKind::kFlippedBit:
+      return "bit";
     case VelmarChunkFaultKind::kWrongSync:
       return "sync";
     case VelmarChunkFaultKind::kMessageLength:

@@ -8,6 +8,7 @@ namespace sim {
 namespace {
 
 constexpr uint16_t kFileTransferId = 588;
+constexpr size_t kCrcLength = 4;
 constexpr uint8_t kOtherPort = 0xA0;
 
 uint8_t PortAddress(const std::string& port_name) {
@@ -78,6 +79,9 @@ std::optional<VelmarChunk> VelmarTransfer::CurrentChunk(VelmarFaults& faults) co
 
   VelmarChunk chunk;
   chunk.wire = FrameBinaryLog(log);
+  if (take(VelmarChunkFaultKind::kFlippedBit)) {
+    chunk.wire[chunk.wire.size() - kCrcLength - 1] ^= 1;
+  }
   chunk.description = "log FILETRANSFERB seq=" + std::to_string(log.sequence) +
                       " offset=" + std::to_string(offset_) +
                       " len=" + std::to_string(log.message_length) +

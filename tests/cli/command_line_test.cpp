@@ -2,11 +2,13 @@
 
 #include <gtest/gtest.h>
 
+#include <cstdlib>
 #include <sstream>
 
 #include "commands/commands.h"
 #include "options.h"
 #include "results.h"
+#include "temporary_folder.h"
 
 namespace cli {
 namespace {
@@ -55,7 +57,7 @@ TEST(CommandLineTest, Commands) {
                              Words{"rm", "COM7", "a"},
                              Words{"mv", "COM7", "a", "b"},
                              Words{"set", "COM7", "rts", "on"},
-                             Words{"set", "COM7", "Parity", "EVEN"},
+                             Words{"set", "COM7", "Parity", "EVEN", "--yes"},
                              Words{"check", "COM7"}}) {
     EXPECT_EQ(Parse(words).command->text().word, words.front());
   }
@@ -205,6 +207,81 @@ TEST(CommandLineTest, HelpFitsATerminal) {
     std::istringstream help(Help(words));
     for (std::string line; std::getline(help, line);) EXPECT_LE(line.size(), kWidth) << line;
   }
+}
+
+TEST(CommandLineTest, HelpIsHadInSeveralWays) {
+  EXPECT_EQ(Help({"help"}), Help({"--help"}));
+  EXPECT_EQ(Help({"/?"}), Help({"--help"}));
+  EXPECT_EQ(Help({"help", "get"}), Help({"get", "--help"}));
+  EXPECT_EQ(Help({"get", "/?"}), Help({"get", "--help"}));
+  EXPECT_EQ(NamesOf({"probe", "COM7", "--", "/?"}), std::vector<std::wstring>{L"/?"});
+}
+
+TEST(CommandLineTest, TheHelpOfACommandHasTheOptionsOfAll) {
+  for (const auto& command : MakeCommands()) {
+    const std::string help = Help({command->text().word, "--help"});
+    EXPECT_NE(help.find("--speed BITS/S"), std::string::npos) << help;
+    EXPECT_EQ(help.find("--version"), std::string::npos);
+    EXPECT_NE(help.find("Example"), std::string::npos) << help;
+  }
+}
+
+TEST(CommandLineTest, AMistypedCommandGetsASuggestion) {
+  EXPECT_NE(Refusal({"fnid", "COM7"}).meaning.find("did you mean find?"), std::string::npos);
+  EXPECT_NE(Refusal({"PORTS"}).meaning.find("did you mean ports?"), std::string::npos);
+  EXPECT_NE(Refusal({"dance", "COM7"}).meaning.find("there is ports, "), std::string::npos);
+  EXPECT_EQ(Refusal({"find", "COM7", "fnid"}).meaning.find("did you mean"), std::string::npos);
+}
+
+TEST(CommandLineTest, PortsAreTakenHoweverTheyAreWritten) {
+  EXPECT_EQ(Parse({"find", "com7:"}).arguments.port, L"COM7");
+  EXPECT_EQ(Parse({"find", "\\\\.\\COM7"}).arguments.port, L"COM7");
+}
+
+/// A variable of the environment for the time of a test.
+class Variable {
+ public:
+  Variable(std::string name, const std::string& value) : name_(std::move(name)) {
+    _putenv_s(name_.c_str(), value.c_str());
+  }
+  ~Variable() { _putenv_s(name_.c_str(), ""); }
+  Variable(const Variable&) = delete;
+  Variable& operator=(const Variable&) = delete;
+
+ private:
+  std::string name_;
+};
+
+TEST(CommandLineTest, TheEnvironmentIsAsked) {
+  const Variable port("RCVLINK_PORT", "com7:");
+  const Variable link("RCVLINK_LINK", "any");
+  const Variable protocol("RCVLINK_PROTOCOL", "velmar");
+  const Variable speed("RCVLINK_SPEED", "57600");
+  const Arguments arguments = Parse({"find"}).arguments;
+  EXPECT_EQ(arguments.port, L"COM7");
+  EXPECT_EQ(arguments.link, eInstanceAny);
+  EXPECT_EQ(arguments.protocol, eProtocolVelmar);
+  EXPECT_EQ(arguments.speed, 57600U);
+  EXPECT_EQ(Parse({"find", "COM8", "--speed", "9600"}).arguments.port, L"COM8");
+  EXPECT_EQ(Parse({"find", "COM8", "--speed", "9600"}).arguments.speed, 9600U);
+}
+
+TEST(CommandLineTest, AFileHasOptionsToo) {
+  const TemporaryFolder folder;
+  folder.Write(L"my.ini", "speed = 57600\njson = true\nprogress = none\n");
+  const std::string path = (folder.path() / L"my.ini").string();
+  const Arguments arguments = Parse({"find", "COM7", "--config", path}).arguments;
+  EXPECT_EQ(arguments.speed, 57600U);
+  EXPECT_TRUE(arguments.json);
+  EXPECT_EQ(arguments.progress, ProgressMode::kNone);
+  EXPECT_EQ(Parse({"find", "COM7", "--config", path, "--speed", "9600"}).arguments.speed, 9600U);
+  EXPECT_EQ(Refusal({"find", "COM7", "--config", path + "none"}).exit, ExitCode::kUsage);
+}
+
+TEST(CommandLineTest, CodesToExplainAreNumbers) {
+  EXPECT_STREQ(Parse({"explain", "0x8007048F"}).command->text().word, "explain");
+  EXPECT_STREQ(Parse({"explain"}).command->text().word, "explain");
+  EXPECT_EQ(Refusal({"explain", "all"}).exit, ExitCode::kUsage);
 }
 
 TEST(CommandLineTest, TellsItsVersion) { EXPECT_EQ(Help({"--version"}).find("rcvlink-cli "), 0U); }

@@ -2,6 +2,7 @@
 
 #include <gtest/gtest.h>
 
+#include "part_file.h"
 #include "temporary_folder.h"
 
 namespace cli {
@@ -21,17 +22,26 @@ TEST_F(FileStreamTest, WritesAndCounts) {
   EXPECT_EQ(stream_->Write(" world", 6, nullptr), S_OK);
   EXPECT_EQ(stream_->received(), 11U);
   EXPECT_EQ(stream_->first_error(), DWORD{ERROR_SUCCESS});
-  part_.Keep();
+  part_.Complete();
   EXPECT_EQ(folder_.Read(L"a"), "hello world");
 }
 
 TEST_F(FileStreamTest, RemembersItsFirstFailure) {
-  part_.Keep();  // the file is closed behind the stream's back
+  part_.KeepIncomplete();  // closes the file
   ULONG written = 99;
   EXPECT_EQ(stream_->Write("hello", 5, &written), ResultOfWin32(ERROR_INVALID_HANDLE));
   EXPECT_EQ(written, 0U);
   EXPECT_EQ(stream_->received(), 0U);
   EXPECT_EQ(stream_->first_error(), DWORD{ERROR_INVALID_HANDLE});
+}
+
+TEST_F(FileStreamTest, HashesWhatItReceived) {
+  stream_->Write("a", 1, nullptr);
+  stream_->Write("bc", 2, nullptr);
+  stream_->Detach();
+  stream_->Write("d", 1, nullptr);
+  EXPECT_EQ(stream_->TakeHash(),
+            "ba7816bf8f01cfea414140de5dae2223b00361a396177a9cb410ff61f20015ad");
 }
 
 TEST_F(FileStreamTest, TakesNothingOnceDetached) {

@@ -5,8 +5,8 @@
 namespace cli {
 namespace {
 
-TransferState State(std::uint64_t done, std::uint64_t total, std::uint64_t elapsed_ms) {
-  return {.name = L"LOG.DAT", .done = done, .total = total, .elapsed_ms = elapsed_ms};
+TransferState State(std::uint64_t done, std::uint64_t total, std::uint64_t rate) {
+  return {.name = L"LOG.DAT", .done = done, .total = total, .rate = rate};
 }
 
 TEST(FormatsTest, Bytes) {
@@ -49,25 +49,25 @@ TEST(FormatsTest, PercentOfTheLargestFile) {
   EXPECT_EQ(PercentOf(State(kLargest - 1, kLargest, 0)), 99U);
 }
 
-TEST(FormatsTest, RateIsUnknownAtFirst) {
-  EXPECT_EQ(RateOf(State(0, 1000, 0)), 0U);
-  EXPECT_EQ(RateOf(State(500, 1000, 250)), 2000U);
-}
-
 TEST(FormatsTest, Line) {
-  EXPECT_EQ(ProgressLine(State(500'000, 1'000'000, 50'000)),
+  EXPECT_EQ(ProgressLine(State(500'000, 1'000'000, 10'000)),
             "LOG.DAT: 50 %, 500.0 kB of 1.0 MB, 10.0 kB/s, 50 s left");
   EXPECT_EQ(ProgressLine(State(0, 1'000'000, 0)), "LOG.DAT: 0 %, 0 B of 1.0 MB, 0 B/s, -- left");
 }
 
+TEST(FormatsTest, Json) {
+  EXPECT_EQ(ProgressJson(State(500, 1000, 250)),
+            R"({"file":"LOG.DAT","done":500,"total":1000,"percent":50,"rate":250})");
+}
+
 TEST(FormatsTest, Bar) {
-  EXPECT_EQ(ProgressBar(State(500'000, 1'000'000, 50'000), 100),
+  EXPECT_EQ(ProgressBar(State(500'000, 1'000'000, 10'000), 100),
             "[##########          ]  50 %  500.0 kB of 1.0 MB   10.0 kB/s         50 s left  "
             "LOG.DAT");
 }
 
 TEST(FormatsTest, BarIsNeverWiderThanItsLine) {
-  TransferState state = State(500'000, 1'000'000, 50'000);
+  TransferState state = State(500'000, 1'000'000, 10'000);
   state.name = std::wstring(200, L'x');
   for (std::size_t width = 0; width < 120; ++width) {
     EXPECT_LE(ProgressBar(state, width).size(), width);

@@ -34,12 +34,11 @@ TEST_F(LocalFilesTest, KnowsAFileThatHasGrown) {
   EXPECT_TRUE(BeginsWith(old, Write(L"empty", "")));
 }
 
-TEST_F(LocalFilesTest, ComparesBytes) {
-  const auto one = Write(L"one", "abc");
-  EXPECT_TRUE(HaveSameBytes(one, Write(L"two", "abc")));
-  EXPECT_FALSE(HaveSameBytes(one, Write(L"two", "abd")));
-  EXPECT_FALSE(HaveSameBytes(one, Write(L"two", "ab")));
-  EXPECT_FALSE(HaveSameBytes(one, Write(L"two", "abcd")));
+TEST_F(LocalFilesTest, HashesAFile) {
+  EXPECT_EQ(Sha256Of(Write(L"abc", "abc")),
+            "ba7816bf8f01cfea414140de5dae2223b00361a396177a9cb410ff61f20015ad");
+  EXPECT_EQ(Sha256Of(Write(L"million", std::string(1'000'000, 'a'))),
+            "cdc76e5c9914fb9281a1c7e284d73e67f1809a48a497200e046d39ccc7112cd0");
 }
 
 TEST_F(LocalFilesTest, AFileThatCannotBeReadIsAFailureOfThisComputer) {

@@ -109,5 +109,16 @@ TEST(NamesTest, KnowsComPorts) {
   }
 }
 
+TEST(NamesTest, PortsAreKnownHoweverTheyAreWritten) {
+  for (const wchar_t* name :
+       {L"COM7", L"com7", L"COM7:", L"com7:", L"\\\\.\\COM7", L"\\\\.\\com7:"}) {
+    EXPECT_EQ(PlainPortName(name), L"COM7") << name;
+  }
+  for (const wchar_t* name :
+       {L"", L":", L"COM", L"com7::", L"\\\\?\\usb#x", L"C:", L"\\\\.\\other"}) {
+    EXPECT_EQ(PlainPortName(name), name);
+  }
+}
+
 }  // namespace
 }  // namespace cli

@@ -15,13 +15,13 @@ class PartFileTest : public testing::Test {
   TemporaryFolder folder_;
 };
 
-TEST_F(PartFileTest, GetsItsNameWhenItIsKept) {
+TEST_F(PartFileTest, GetsItsNameWhenItIsComplete) {
   {
     PartFile part(Target(), false);
     EXPECT_TRUE(folder_.Has(L"a.part"));
     EXPECT_EQ(part.Write("hello", 5), DWORD{ERROR_SUCCESS});
     EXPECT_FALSE(folder_.Has(L"a"));
-    part.Keep();
+    part.Complete();
   }
   EXPECT_EQ(folder_.Read(L"a"), "hello");
   EXPECT_FALSE(folder_.Has(L"a.part"));
@@ -36,18 +36,42 @@ TEST_F(PartFileTest, VanishesUnlessItIsKept) {
   EXPECT_FALSE(folder_.Has(L"a.part"));
 }
 
-TEST_F(PartFileTest, OverwritesOnlyWhenItMay) {
+TEST_F(PartFileTest, WhatCameCanBeKept) {
+  std::wstring path;
+  {
+    PartFile part(Target(), false);
+    part.Write("hel", 3);
+    path = part.KeepIncomplete();
+  }
+  EXPECT_EQ(path, Target().native() + L".part");
+  EXPECT_EQ(folder_.Read(L"a.part"), "hel");
+  EXPECT_FALSE(folder_.Has(L"a"));
+}
+
+// What took an hour to download is not thrown away because its name is taken.
+TEST_F(PartFileTest, ACompleteFileSurvivesARenameThatFails) {
   folder_.Write(L"a", "precious");
   {
     PartFile part(Target(), false);
-    EXPECT_THROW(part.Keep(), Failure);
+    part.Write("hello", 5);
+    try {
+      part.Complete();
+      ADD_FAILURE() << "replaced a file";
+    } catch (const Failure& failure) {
+      EXPECT_EQ(failure.exit, ExitCode::kLocalFile);
+      EXPECT_TRUE(failure.kept.ends_with("a.part")) << failure.kept;
+    }
   }
   EXPECT_EQ(folder_.Read(L"a"), "precious");
-  EXPECT_FALSE(folder_.Has(L"a.part"));
+  EXPECT_EQ(folder_.Read(L"a.part"), "hello");
+}
+
+TEST_F(PartFileTest, OverwritesWhenItMay) {
+  folder_.Write(L"a", "old");
   {
     PartFile part(Target(), true);
     part.Write("new", 3);
-    part.Keep();
+    part.Complete();
   }
   EXPECT_EQ(folder_.Read(L"a"), "new");
 }

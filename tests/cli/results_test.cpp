@@ -53,6 +53,27 @@ TEST(ResultsTest, AFailureTellsWhatWhereCodeAndMeaning) {
             "  Try again.\n");
 }
 
+TEST(ResultsTest, EachCodeThatIsExplainedSaysSo) {
+  const Failure failure{.tried = "delete A.DAT", .code = ResultOfWin32(ERROR_DEVICE_NOT_CONNECTED)};
+  EXPECT_NE(Describe(failure).find("`rcvlink-cli explain 0x8007048F`"), std::string::npos);
+  EXPECT_EQ(HintOf(Failure{.code = ResultOfWin32(ERROR_ARENA_TRASHED)}), "");
+}
+
+TEST(ResultsTest, ACodeThatReadsAsASuccessIsNotShown) {
+  for (const long code : {long{S_OK}, long{S_FALSE}}) {
+    const Failure failure{.tried = "delete A.DAT", .code = code, .meaning = "it is still there"};
+    EXPECT_EQ(Describe(failure).find("rcvlink-cli: could not delete A.DAT: it is still there\n"),
+              0U)
+        << Describe(failure);
+  }
+}
+
+TEST(ResultsTest, WhatIsKeptIsTold) {
+  const Failure failure{.tried = "download A.DAT", .code = S_OK, .hint = "x", .kept = "A.DAT.part"};
+  EXPECT_NE(Describe(failure).find("kept in A.DAT.part\n"), std::string::npos);
+  EXPECT_EQ(ToJson(failure).at("kept"), "A.DAT.part");
+}
+
 TEST(ResultsTest, ACancellationIsNoFailure) {
   const Failure failure{.exit = ExitCode::kCancelled,
                         .tried = "download A.DAT",
@@ -60,7 +81,7 @@ TEST(ResultsTest, ACancellationIsNoFailure) {
                         .code = S_FALSE,
                         .meaning = "ended by Ctrl-C"};
   EXPECT_EQ(Describe(failure),
-            "rcvlink-cli: COM7: cancelled: did not download A.DAT: 0x00000001, ended by Ctrl-C\n");
+            "rcvlink-cli: COM7: cancelled: did not download A.DAT: ended by Ctrl-C\n");
 }
 
 TEST(ResultsTest, AFailureIsAlsoJson) {
@@ -73,6 +94,7 @@ TEST(ResultsTest, AFailureIsAlsoJson) {
                          {"port", "COM7"},
                          {"code", "0x00000001"},
                          {"meaning", "no receiver answered"},
+                         {"hint", "`rcvlink-cli explain 0x00000001` tells what to try."},
                          {"exit", 3}};
   EXPECT_EQ(ToJson(failure), expected);
   EXPECT_TRUE(ToJson(Failure{})["port"].is_null());

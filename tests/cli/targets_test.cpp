@@ -72,6 +72,39 @@ TEST_F(TargetsTest, AnExistingFileIsKeptUnlessForced) {
   EXPECT_EQ(forced.Choose(L"a"), folder_.path() / L"a");
 }
 
+TEST_F(TargetsTest, WhatAnEarlierDownloadLeftIsKeptUnlessForced) {
+  folder_.Write(L"a.part", "what came");
+  Targets targets(Into());
+  ExpectRefusal(targets, L"a");
+  Place place = Into();
+  place.force = true;
+  Targets forced(place);
+  EXPECT_EQ(forced.Choose(L"a"), folder_.path() / L"a");
+}
+
+TEST_F(TargetsTest, FoldersThatCanBeMadeWillDo) {
+  EXPECT_NO_THROW(Targets(Into()).CheckFolder());
+  EXPECT_NO_THROW(Targets(Into(L"new\\deep\\")).CheckFolder());
+  EXPECT_NO_THROW(Targets(Into(L"a.dat")).CheckFolder());
+  EXPECT_NO_THROW(Targets(Place{}).CheckFolder());
+  EXPECT_TRUE(std::filesystem::is_empty(folder_.path()));
+}
+
+TEST_F(TargetsTest, FoldersThatCannotBeMadeAreRefused) {
+  folder_.Write(L"file", "");
+  for (const wchar_t* output :
+       {L"file\\deep\\", L"file\\a.dat", L"none\\a.dat", L"a?b", L"a?b\\"}) {
+    EXPECT_THROW(Targets(Into(output)).CheckFolder(), Failure) << output;
+  }
+}
+
+TEST_F(TargetsTest, TheDiskMustHaveRoom) {
+  constexpr std::uint64_t kTooMuch = std::uint64_t{1} << 62;
+  EXPECT_NO_THROW(Targets(Into(L"new\\")).CheckRoom(1));
+  EXPECT_THROW(Targets(Into(L"new\\")).CheckRoom(kTooMuch), Failure);
+  EXPECT_THROW(Targets(Into(L"a.dat")).CheckRoom(kTooMuch), Failure);
+}
+
 TEST_F(TargetsTest, AFolderIsNeverOverwritten) {
   MakeFolder(folder_.path() / L"a");
   Place place = Into();

@@ -51,5 +51,16 @@ TEST(TextTest, RedrawsALineOverALongerOne) {
   EXPECT_EQ(Erased(3), "\r   \r");
 }
 
+TEST(TextTest, SmallLetters) { EXPECT_EQ(Lowered("Com7 \xC3\x84"), "com7 \xC3\x84"); }
+
+TEST(TextTest, ChangesBetweenWords) {
+  EXPECT_EQ(ChangesBetween("", ""), 0U);
+  EXPECT_EQ(ChangesBetween("find", "find"), 0U);
+  EXPECT_EQ(ChangesBetween("", "ls"), 2U);
+  EXPECT_EQ(ChangesBetween("ports", "port"), 1U);
+  EXPECT_EQ(ChangesBetween("fnid", "find"), 2U);
+  EXPECT_EQ(ChangesBetween("chek", "check"), 1U);
+}
+
 }  // namespace
 }  // namespace cli

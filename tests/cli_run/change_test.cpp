@@ -12,7 +12,7 @@ TEST_F(Cli, RemoveDeletesEachFile) {
   const bed::SimulatedPort receiver({"quorin"}, {{"a.jps", "a"}, {"b.jps", "b"}, {"c.jps", "c"}});
   const auto result = RunOn(receiver, {"rm", "a.jps", "c.jps"});
   EXPECT_EQ(result.status, kDone) << result.errors;
-  const auto files = nlohmann::json::parse(RunOn(receiver, {"ls", "--json"}).output);
+  const auto files = nlohmann::json::parse(RunOn(receiver, {"ls", "--json"}).output).at("files");
   ASSERT_EQ(files.size(), 1u);
   EXPECT_EQ(files[0].at("name"), "b.jps");
 }
@@ -34,10 +34,10 @@ TEST_F(Cli, MoveIsRefusedWithASentence) {
 
 TEST_F(Cli, SettingsReachTheReceiverInItsOwnWords) {
   bed::SimulatedPort receiver({"quorin", "--port-letter", "c"});
-  EXPECT_EQ(RunOn(receiver, {"set", "parity", "odd"}).status, kDone);
-  EXPECT_EQ(RunOn(receiver, {"set", "stopbits", "2"}).status, kDone);
+  EXPECT_EQ(RunOn(receiver, {"set", "parity", "odd", "--yes"}).status, kDone);
+  EXPECT_EQ(RunOn(receiver, {"set", "stopbits", "2", "--yes"}).status, kDone);
   EXPECT_EQ(RunOn(receiver, {"set", "rts", "off"}).status, kDone);
-  EXPECT_EQ(RunOn(receiver, {"set", "parity", "even"}).status, kDone);
+  EXPECT_EQ(RunOn(receiver, {"set", "parity", "even", "--yes"}).status, kDone);
   EXPECT_EQ(RunOn(receiver, {"set", "parity", "none"}).status, kDone);
   EXPECT_EQ(RunOn(receiver, {"set", "baud", "57600"}).status, kDone);
   const std::string transcript = receiver.Transcript();
@@ -53,12 +53,47 @@ TEST_F(Cli, SettingsReachTheReceiverInItsOwnWords) {
   }
 }
 
-// The receiver answers no such command, whatever becomes of it.
-TEST_F(Cli, ASettingIsNotConfirmedAndSaidToBeSo) {
+// What the RTS line does is not seen from here.
+TEST_F(Cli, AnRtsLineIsNotConfirmedAndSaidToBeSo) {
   const bed::SimulatedPort receiver({"quorin"});
-  const auto result = RunOn(receiver, {"set", "parity", "odd"});
+  const auto result = RunOn(receiver, {"set", "rts", "off", "--json"});
   EXPECT_EQ(result.status, kDone);
-  EXPECT_THAT(result.output, HasSubstr("does not confirm"));
+  EXPECT_EQ(nlohmann::json::parse(result.output).at("confirmed"), false);
+  EXPECT_THAT(RunOn(receiver, {"set", "rts", "on"}).output, HasSubstr("does not confirm"));
+}
+
+TEST_F(Cli, ANewSpeedIsTried) {
+  const bed::SimulatedPort receiver({"quorin"}, {{"a.jps", "a"}});
+  const auto result = RunOn(receiver, {"set", "baud", "57600"});
+  EXPECT_EQ(result.status, kDone) << result.errors;
+  EXPECT_THAT(result.output, HasSubstr("it answers there"));
+  EXPECT_THAT(result.output, HasSubstr("--speed 57600"));
+  // Asked there: the ping came after the change.
+  const std::string transcript = receiver.Transcript();
+  EXPECT_NE(transcript.find("> dm", transcript.find("= speed 57600")), std::string::npos);
+}
+
+TEST_F(Cli, ARefusedSpeedIsSaidToBeRefused) {
+  for (const std::vector<std::string>& simulator :
+       std::vector<std::vector<std::string>>{{"quorin"}, {"velmar"}}) {
+    const bed::SimulatedPort receiver(simulator, {{"a.jps", "a"}});
+    const auto result = RunOn(receiver, {"set", "baud", "12345"});
+    EXPECT_EQ(result.status, kFailed) << result.output;
+    EXPECT_THAT(result.errors, HasSubstr("refused"));
+    EXPECT_EQ(RunOn(receiver, {"ls"}).status, kDone);
+  }
+}
+
+TEST_F(Cli, ASettingThatLosesTheReceiverNeedsAYes) {
+  const bed::SimulatedPort receiver({"quorin"});
+  for (const std::vector<std::string>& change :
+       std::vector<std::vector<std::string>>{{"set", "parity", "odd"}, {"set", "stopbits", "2"}}) {
+    const auto result = RunOn(receiver, change);
+    EXPECT_EQ(result.status, kUsage);
+    EXPECT_THAT(result.errors, HasSubstr("--yes"));
+  }
+  EXPECT_THAT(receiver.Transcript(), testing::Not(HasSubstr("set,")));
+  EXPECT_EQ(RunOn(receiver, {"set", "parity", "none"}).status, kDone);
 }
 
 }  // namespace

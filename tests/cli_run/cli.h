@@ -40,10 +40,13 @@ class Cli : public testing::Test {
                            std::vector<std::string> arguments) const {
     return Run(On(receiver, std::move(arguments)));
   }
+  static std::string Port(const bed::SimulatedPort& receiver) {
+    const std::wstring name = receiver.name();
+    return {name.begin(), name.end()};
+  }
   static std::vector<std::string> On(const bed::SimulatedPort& receiver,
                                      std::vector<std::string> arguments) {
-    const std::wstring name = receiver.name();
-    arguments.insert(arguments.begin() + 1, std::string(name.begin(), name.end()));
+    arguments.insert(arguments.begin() + 1, Port(receiver));
     arguments.insert(arguments.end(), {"--speed", "9600"});
     return arguments;
   }

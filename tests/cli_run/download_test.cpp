@@ -1,4 +1,7 @@
 // rcvlink-cli get: what lands on the disk, and what never does.
+#include <windows.h>
+
+#include <filesystem>
 #include <nlohmann/json.hpp>
 
 #include "tests/cli_run/cli.h"
@@ -57,14 +60,115 @@ TEST_F(Cli, GetOfAnUnknownFileTransfersNothing) {
   EXPECT_THAT(LocalFiles(), IsEmpty());
 }
 
-// The library calls it a success; the program knows better.
-TEST_F(Cli, AFileOfAnotherSizeThanListedIsAFailure) {
+// The library calls it a success; the program knows better, and throws nothing away.
+TEST_F(Cli, AFileOfAnotherSizeThanListedIsKeptAsAPart) {
+  for (const char* listed : {"4000", "2000"}) {
+    const bed::SimulatedPort receiver({"velmar", "--lie-size", std::string("a.jps=") + listed},
+                                      {{"a.jps", Content(3000)}});
+    const auto result = RunOn(receiver, {"get", "a.jps", "--force", "--protocol", "velmar"});
+    EXPECT_EQ(result.status, kFailed);
+    EXPECT_THAT(result.errors, HasSubstr(std::string("listed ") + listed + " bytes, but 3000"));
+    EXPECT_THAT(result.errors, HasSubstr("kept in a.jps.part"));
+    EXPECT_THAT(LocalFiles(), ElementsAre("a.jps.part"));
+    EXPECT_EQ(folder.Read("a.jps.part"), Content(3000));
+  }
+}
+
+TEST_F(Cli, AShorterFileOfAQuorinReceiverIsKeptToo) {
   const bed::SimulatedPort receiver({"quorin", "--lie-size", "a.jps=4000"},
                                     {{"a.jps", Content(3000)}});
-  const auto result = RunOn(receiver, {"get", "a.jps"});
+  const auto result = RunOn(receiver, {"get", "a.jps", "--json"});
   EXPECT_EQ(result.status, kFailed);
-  EXPECT_THAT(result.errors, HasSubstr("4000"));
+  const auto error = nlohmann::json::parse(result.output).at("files").at(0).at("error");
+  EXPECT_EQ(error.at("kept"), "a.jps.part");
+  EXPECT_EQ(folder.Read("a.jps.part"), Content(3000));
+}
+
+TEST_F(Cli, ACompleteDownloadSurvivesARenameThatFails) {
+  folder.Write("a.jps", "mine");
+  const bed::SimulatedPort receiver({"quorin"}, {{"a.jps", Content(3000)}});
+  const HANDLE open = CreateFileW((folder / "a.jps").c_str(),
+                                  GENERIC_READ,
+                                  FILE_SHARE_READ,
+                                  nullptr,
+                                  OPEN_EXISTING,
+                                  0,
+                                  nullptr);
+  ASSERT_NE(open, INVALID_HANDLE_VALUE);
+  const auto result = RunOn(receiver, {"get", "a.jps", "--force"});
+  CloseHandle(open);
+  EXPECT_EQ(result.status, kLocalFile);
+  EXPECT_THAT(result.errors, HasSubstr("kept in a.jps.part"));
+  EXPECT_EQ(folder.Read("a.jps.part"), Content(3000));
+  EXPECT_EQ(folder.Read("a.jps"), "mine");
+}
+
+TEST_F(Cli, WhatCameOfAFailedDownloadIsKeptWhenAskedFor) {
+  const bed::SimulatedPort receiver({"quorin", "--end-block", "2"}, {{"a.jps", Content(3000)}});
+  const auto result = RunOn(receiver, {"get", "a.jps", "--keep-partial"});
+  EXPECT_EQ(result.status, kFailed);
+  EXPECT_THAT(LocalFiles(), ElementsAre("a.jps.part"));
+  EXPECT_EQ(folder.Read("a.jps.part"), Content(3000).substr(0, 1024));
+}
+
+// Each of them is told although no receiver is there: the search comes after.
+TEST_F(Cli, WhatIsWrongOnThisComputerIsToldBeforeTheSearch) {
+  folder.Write("taken", "a file");
+  folder.Write("b.jps.part", "what came of an earlier download");
+  for (const std::vector<std::string>& line :
+       std::vector<std::vector<std::string>>{{"get", "COM99", "a.jps", "-o", "none\\a.jps"},
+                                             {"get", "COM99", "a.jps", "-o", "taken\\a.jps"},
+                                             {"get", "COM99", "--all", "-o", "taken\\"},
+                                             {"get", "COM99", "--all", "-o", "taken"},
+                                             {"get", "COM99", "a.jps", "-o", "a?b"},
+                                             {"get", "COM99", "b.jps"}}) {
+    EXPECT_EQ(Run(line).status, kLocalFile) << testing::PrintToString(line);
+  }
+  EXPECT_THAT(LocalFiles(), ElementsAre("b.jps.part", "taken"));
+}
+
+TEST_F(Cli, AFileThatTheProtocolCannotNumberIsRefusedAtOnce) {
+  const bed::SimulatedPort receiver({"quorin", "--lie-size", "a.jps=33554433"},
+                                    {{"a.jps", Content(3000)}, {"b.jps", Content(30)}});
+  const auto one = RunOn(receiver, {"get", "a.jps"});
+  EXPECT_EQ(one.status, kFailed);
+  EXPECT_THAT(one.errors, HasSubstr("33554432"));
+  EXPECT_THAT(receiver.Transcript(), testing::Not(HasSubstr("%get,")));
+  const auto all = RunOn(receiver, {"get", "--all"});
+  EXPECT_EQ(all.status, kFailed);
+  EXPECT_THAT(LocalFiles(), ElementsAre("b.jps"));
+}
+
+TEST_F(Cli, FilesThatTheDiskHasNoRoomForAreRefusedAtOnce) {
+  constexpr std::uint64_t kListed = 2'147'483'647;
+  constexpr std::uint64_t kMostFiles = 60;  // a longer list is cut
+  const std::uint64_t needed = std::filesystem::space(folder.path()).available / kListed + 1;
+  if (needed > kMostFiles) GTEST_SKIP() << "this disk has room for all that can be listed";
+  std::vector<std::string> simulator = {"velmar"};
+  Files files;
+  for (std::uint64_t i = 0; i < needed; ++i) {
+    const std::string name = "f" + std::to_string(i);
+    files.emplace(name, "x");
+    simulator.insert(simulator.end(), {"--lie-size", name + "=" + std::to_string(kListed)});
+  }
+  const bed::SimulatedPort receiver(simulator, files);
+  const auto result = RunOn(receiver, {"get", "--all", "--protocol", "velmar"});
+  EXPECT_EQ(result.status, kLocalFile);
+  EXPECT_THAT(result.errors, HasSubstr("there is room for"));
+  EXPECT_THAT(receiver.Transcript(), testing::Not(HasSubstr("filetransfer")));
   EXPECT_THAT(LocalFiles(), IsEmpty());
+}
+
+TEST_F(Cli, AHashOfTheFileIsTold) {
+  constexpr char kHashOfAbc[] = "ba7816bf8f01cfea414140de5dae2223b00361a396177a9cb410ff61f20015ad";
+  const bed::SimulatedPort receiver({"quorin"}, {{"a.jps", "abc"}});
+  const auto document =
+      nlohmann::json::parse(RunOn(receiver, {"get", "a.jps", "--json"}).output).at("files").at(0);
+  EXPECT_EQ(document.at("sha256"), kHashOfAbc);
+  EXPECT_EQ(document.at("verified"), false);
+  const auto verbose = RunOn(receiver, {"get", "a.jps", "--verbose", "--force", "--verify"});
+  EXPECT_EQ(verbose.status, kDone);
+  EXPECT_THAT(verbose.output, HasSubstr(kHashOfAbc));
 }
 
 TEST_F(Cli, ATransferEndedByTheReceiverLeavesNothing) {
@@ -117,6 +221,7 @@ TEST_F(Cli, CtrlCEndsADownloadAndLeavesNothing) {
   const auto result = program.Finish();
   EXPECT_EQ(result.status, kCancelled) << result.output;
   EXPECT_THAT(result.output, HasSubstr("cancelled"));
+  EXPECT_THAT(result.output, HasSubstr("Stopping"));
   EXPECT_THAT(LocalFiles(), IsEmpty());
   receiver.WaitForTranscript("= speed 9600");
 }
@@ -128,6 +233,51 @@ TEST_F(Cli, CtrlCEndsASearch) {
   receiver.WaitForTranscript("> dm");
   program.Interrupt();
   EXPECT_EQ(program.Finish().status, kCancelled);
+}
+
+TEST_F(Cli, AFileGoesToTheStandardOutput) {
+  const std::string text = "line one\nline two\n";
+  const bed::SimulatedPort receiver({"quorin"}, {{"a.jps", text}});
+  const auto result = RunOn(receiver, {"get", "a.jps", "-o", "-"});
+  EXPECT_EQ(result.status, kDone) << result.errors;
+  EXPECT_EQ(result.output, text);
+  EXPECT_THAT(result.errors, HasSubstr("18 bytes"));
+  EXPECT_EQ(RunOn(receiver, {"get", "a.jps", "-o", "-", "--json"}).status, kUsage);
+  EXPECT_EQ(RunOn(receiver, {"get", "--all", "-o", "-"}).status, kUsage);
+  EXPECT_THAT(LocalFiles(), IsEmpty());
+}
+
+TEST_F(Cli, AFileGoesNowhere) {
+  const bed::SimulatedPort receiver({"quorin"}, {{"a.jps", Content(3000)}});
+  const auto result = RunOn(receiver, {"get", "a.jps", "-o", "NUL"});
+  EXPECT_EQ(result.status, kDone) << result.errors;
+  EXPECT_THAT(result.output, HasSubstr("3000 bytes"));
+  EXPECT_THAT(LocalFiles(), IsEmpty());
+}
+
+TEST_F(Cli, ProgressIsShownAsAskedFor) {
+  const bed::SimulatedPort receiver({"quorin"}, {{"a.jps", Content(3000)}});
+  const auto get = [&](const char* how) {
+    return RunOn(receiver, {"get", "a.jps", "--force", "--json", "--progress", how}).errors;
+  };
+  EXPECT_EQ(get("none"), "");
+  EXPECT_EQ(get("auto"), "");
+  EXPECT_THAT(get("lines"), HasSubstr("Downloading a.jps, 3.0 kB\n"));
+  const std::string lines = get("json");
+  const auto first = nlohmann::json::parse(lines.substr(0, lines.find('\n')));
+  EXPECT_EQ(first.at("file"), "a.jps");
+  EXPECT_EQ(first.at("total"), 3000);
+}
+
+// The set-up of a download and the reading of a list are shown as well.
+TEST_F(Cli, ATerminalShowsWhatIsWaitedFor) {
+  const bed::SimulatedPort receiver({"quorin", "--reply-silence", "3:print,/log/@1"},
+                                    {{"a.jps", Content(3000)}});
+  bed::Program program(
+      kProgram, On(receiver, {"get", "a.jps"}), bed::Output::kTerminal, folder.unix_path());
+  program.Expect("Reading the list of files ... ");
+  program.Expect("getting ready");
+  EXPECT_EQ(program.Finish().status, kDone);
 }
 
 TEST_F(Cli, ATerminalGetsAProgressBar) {

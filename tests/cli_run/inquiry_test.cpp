@@ -1,4 +1,7 @@
 // The commands that ask: find, info, ls, check, ports; and what is said when nobody answers.
+#include <filesystem>
+#include <fstream>
+#include <iterator>
 #include <nlohmann/json.hpp>
 
 #include "tests/cli_run/cli.h"
@@ -46,17 +49,20 @@ TEST_F(Cli, ListShowsNamesSizesAndTotal) {
   EXPECT_THAT(result.output, HasSubstr("2 files, 730 bytes"));
 }
 
-TEST_F(Cli, ListAsJsonIsAnArrayAlsoWhenEmpty) {
+TEST_F(Cli, ListAsJsonTellsFilesAndTotal) {
   const bed::SimulatedPort receiver({"quorin"}, {{"a.jps", Content(700)}});
   const auto result = RunOn(receiver, {"ls", "--json"});
   ASSERT_EQ(result.status, kDone) << result.errors;
-  const json files = json::parse(result.output);
+  const json list = json::parse(result.output);
+  EXPECT_EQ(list.at("bytes"), 700);
+  EXPECT_EQ(list.at("complete"), true);
+  const json& files = list.at("files");
   ASSERT_EQ(files.size(), 1u);
   EXPECT_EQ(files[0].at("name"), "a.jps");
   EXPECT_EQ(files[0].at("size"), 700);
 
   const bed::SimulatedPort empty({"quorin"});
-  EXPECT_EQ(json::parse(RunOn(empty, {"ls", "--json"}).output), json::array());
+  EXPECT_EQ(json::parse(RunOn(empty, {"ls", "--json"}).output).at("files"), json::array());
 }
 
 TEST_F(Cli, CheckTellsThatTheReceiverAnswers) {
@@ -69,7 +75,8 @@ TEST_F(Cli, SilenceIsNoReceiver) {
   const auto result = RunOn(receiver, {"find"});
   EXPECT_EQ(result.status, kNoReceiver);
   EXPECT_EQ(result.output, "");
-  EXPECT_THAT(result.errors, HasSubstr("0x00000001"));
+  EXPECT_THAT(result.errors, HasSubstr("no receiver answered"));
+  EXPECT_THAT(result.errors, testing::Not(HasSubstr("0x0000")));
 }
 
 TEST_F(Cli, AMissingPortIsNoReceiver) {
@@ -97,10 +104,10 @@ TEST_F(Cli, UsbIsRefusedWithASentence) {
   EXPECT_THAT(result.errors, HasSubstr("USB"));
 }
 
-TEST_F(Cli, PortsAreAnArrayInJson) {
+TEST_F(Cli, PortsAreAlsoJson) {
   const auto result = Run({"ports", "--json"});
   EXPECT_EQ(result.status, kDone);
-  EXPECT_TRUE(json::parse(result.output).is_array());
+  EXPECT_TRUE(json::parse(result.output).at("ports").is_array());
 }
 
 TEST_F(Cli, WrongCommandLinesAreUsageErrors) {
@@ -129,16 +136,75 @@ TEST_F(Cli, HelpTellsTheExitCodes) {
   EXPECT_THAT(result.output, HasSubstr("Exit codes"));
 }
 
-TEST_F(Cli, TheReportIsWritten) {
+TEST_F(Cli, TheOtherFamilyIsNamedWhenItAnswers) {
+  const bed::SimulatedPort velmar({"velmar"});
+  const auto result = RunOn(velmar, {"find", "--protocol", "quorin"});
+  EXPECT_EQ(result.status, kNoReceiver);
+  EXPECT_THAT(result.errors, HasSubstr("a Velmar receiver answered instead"));
+  EXPECT_THAT(result.errors, HasSubstr("--protocol velmar"));
+}
+
+TEST_F(Cli, APortIsUnderstoodHoweverItIsWritten) {
   const bed::SimulatedPort receiver({"quorin"});
+  for (const std::string& port : {Port(receiver) + ":", "\\\\.\\" + Port(receiver)}) {
+    const auto result = Run({"find", port, "--speed", "9600", "--json"});
+    EXPECT_EQ(result.status, kDone) << result.errors;
+    EXPECT_EQ(json::parse(result.output).at("port"), Port(receiver));
+  }
+}
+
+TEST_F(Cli, ACodeIsExplained) {
+  const auto result = Run({"explain", "0x8007048F"});
+  EXPECT_EQ(result.status, kDone);
+  EXPECT_THAT(result.output, HasSubstr("0x8007048F"));
+  EXPECT_THAT(result.output, HasSubstr("check the cable"));
+  EXPECT_THAT(Run({"explain"}).output, HasSubstr("0x800705B4  silence"));
+  EXPECT_THAT(Run({"explain", "0x800700C1"}).output, HasSubstr("no entry"));
+}
+
+class ReportCli : public Cli {
+ protected:
+  ~ReportCli() override { std::filesystem::remove(path); }
+
+  // The folder's own name is unique, and so is this.
   const std::string name =
-      "cli-run-" + folder.unix_path().substr(folder.unix_path().rfind('/') + 1);
-  const auto result = RunOn(receiver, {"find", "--report", name + ".txt"});
+      "cli-run-" + std::filesystem::path(folder.unix_path()).filename().string();
+  const std::filesystem::path path = std::filesystem::temp_directory_path() / name;
+
+  std::string Report() const {
+    std::ifstream file(path, std::ios::binary);
+    return {std::istreambuf_iterator<char>(file), std::istreambuf_iterator<char>()};
+  }
+};
+
+TEST_F(ReportCli, BeginsWithVersionsAndCommandLine) {
+  const bed::SimulatedPort receiver({"quorin"});
+  const auto result = RunOn(receiver, {"find", "--report", name, "--json"});
   EXPECT_EQ(result.status, kDone) << result.errors;
-  const auto report = std::filesystem::temp_directory_path() / (name + ".txt");
-  EXPECT_TRUE(std::filesystem::exists(report));
-  EXPECT_GT(std::filesystem::file_size(report), 100u);
-  std::filesystem::remove(report);
+  EXPECT_TRUE(json::parse(result.output).at("report").get<std::string>().ends_with(name));
+  const std::string report = Report();
+  const std::string first_lines = report.substr(0, report.find("CreateReceiverOnSerial"));
+  EXPECT_THAT(first_lines, HasSubstr("rcvlink-cli 1."));
+  EXPECT_THAT(first_lines, HasSubstr(", rcvlink.dll 1."));
+  EXPECT_THAT(first_lines, HasSubstr("command line: "));
+  EXPECT_THAT(first_lines, HasSubstr("--report " + name));
+  EXPECT_GT(report.size(), first_lines.size());
+}
+
+TEST_F(ReportCli, IsNeverReplacedUnlessForced) {
+  std::ofstream(path) << "an earlier report";
+  const auto refused = Run({"find", "COM99", "--report", name});
+  EXPECT_EQ(refused.status, kLocalFile);
+  EXPECT_THAT(refused.errors, HasSubstr("exists already"));
+  EXPECT_EQ(Report(), "an earlier report");
+  EXPECT_EQ(Run({"find", "COM99", "--report", name, "--force"}).status, kNoReceiver);
+  EXPECT_THAT(Report(), HasSubstr("command line: "));
+}
+
+TEST_F(ReportCli, IsNamedAlsoWhenTheCommandFails) {
+  const auto result = Run({"find", "COM99", "--report", name, "--json"});
+  EXPECT_EQ(result.status, kNoReceiver);
+  EXPECT_TRUE(json::parse(result.output).at("report").get<std::string>().ends_with(name));
 }
 
 }  // namespace

@@ -30,7 +30,8 @@ class Mirror : public Cli {
   }
   std::vector<std::string> NamesOn(const bed::SimulatedPort& receiver) const {
     std::vector<std::string> names;
-    for (const json& file : json::parse(RunOn(receiver, {"ls", "--json"}).output)) {
+    const json list = json::parse(RunOn(receiver, {"ls", "--json"}).output);
+    for (const json& file : list.at("files")) {
       names.push_back(file.at("name"));
     }
     return names;
@@ -101,13 +102,13 @@ TEST_F(Mirror, GoesOnAfterAFileThatFailed) {
   const auto result = RunMirror(receiver, {"--json"});
   EXPECT_EQ(result.status, kFailed);
   EXPECT_EQ(folder.Read("out/b.jps"), Content(30));
-  EXPECT_EQ(Mirrored(), Names{"b.jps"});
+  // What came of it is kept: it may be a log that is still being recorded.
+  EXPECT_EQ(Mirrored(), (Names{"a.jps.new.part", "b.jps"}));
   const json document = json::parse(result.output);
   EXPECT_TRUE(FileOf(document, "a.jps").contains("error"));
   EXPECT_EQ(FileOf(document, "b.jps").at("done"), "downloaded");
   EXPECT_EQ(document.at("summary").at("downloaded"), 1);
   EXPECT_EQ(document.at("summary").at("failed"), 1);
-  EXPECT_EQ(document.at("complete"), false);
 }
 
 TEST_F(Mirror, AFileThatIsLeftFromAnEarlierRunStopsOnlyItsOwn) {
@@ -197,6 +198,19 @@ class VelmarMirror : public Mirror {
     return Mirror::RunMirror(receiver, std::move(arguments));
   }
 };
+
+// The first of all downloads has a wrong bit, which the protocol does not notice.
+TEST_F(VelmarMirror, WhatASecondDownloadDoesNotVerifyIsNeitherKeptNorDeleted) {
+  const bed::SimulatedPort receiver({"velmar", "--flipped-bit", "0@1"}, {{"a.log", Content(30)}});
+  const auto result = RunMirror(receiver, {"--then-delete"});
+  EXPECT_EQ(result.status, kFailed);
+  EXPECT_THAT(result.errors, HasSubstr("other bytes"));
+  EXPECT_EQ(Mirrored(), Names{});
+  EXPECT_EQ(NamesOn(receiver), Names{"a.log"});
+
+  EXPECT_EQ(RunMirror(receiver, {"--verify"}).status, kDone);
+  EXPECT_EQ(folder.Read("out/a.log"), Content(30));
+}
 
 TEST_F(VelmarMirror, ARefusedDeletionIsNoticed) {
   const bed::SimulatedPort receiver({"velmar", "--refuse", "del"}, {{"a.log", Content(30)}});

@@ -108,6 +108,21 @@ TEST_F(UsbCli, ADeviceOfAnotherLayoutHasNoReceiver) {
   EXPECT_THAT(result.errors, HasSubstr("no receiver answered"));
 }
 
+TEST_F(UsbCli, AFileOfThisComputerIsNoPort) {
+  folder.Write("survey.jps", Content(3000));
+  for (const char* link : {"usb", "any"}) {
+    for (const std::vector<std::string>& words : std::vector<std::vector<std::string>>{
+             {"find", "survey.jps"}, {"get", "survey.jps", "COM99"}}) {
+      std::vector<std::string> line = words;
+      line.insert(line.end(), {"--link", link});
+      const auto result = Run(line);
+      EXPECT_EQ(result.status, kUsage) << result.errors;
+      EXPECT_THAT(result.errors, HasSubstr("file of this computer"));
+      EXPECT_EQ(folder.Read("survey.jps"), Content(3000));
+    }
+  }
+}
+
 TEST_F(UsbCli, ASpeedIsNotForUsb) {
   const auto result = Run({"find", R"(\\?\x)", "--link", "usb", "--speed", "9600"});
   EXPECT_EQ(result.status, kUsage);

@@ -9,7 +9,6 @@ namespace {
 using nlohmann::json;
 using testing::ElementsAre;
 using testing::HasSubstr;
-using testing::IsEmpty;
 
 class VelmarCli : public Cli {
  protected:
@@ -20,7 +19,8 @@ class VelmarCli : public Cli {
   }
   std::vector<std::string> NamesOn(const bed::SimulatedPort& receiver) const {
     std::vector<std::string> names;
-    for (const json& file : json::parse(RunOn(receiver, {"ls", "--json"}).output)) {
+    const json list = json::parse(RunOn(receiver, {"ls", "--json"}).output);
+    for (const json& file : list.at("files")) {
       names.push_back(file.at("name"));
     }
     return names;
@@ -61,20 +61,20 @@ TEST_F(VelmarCli, AListThatMayBeCutIsSaidToBe) {
   };
   add_until(30);
   const bed::SimulatedPort few({"velmar"}, files);
-  EXPECT_THAT(RunOn(few, {"ls"}).errors, testing::Not(HasSubstr("may be cut")));
+  EXPECT_THAT(RunOn(few, {"ls"}).errors, testing::Not(HasSubstr("may be missing")));
   add_until(120);
   const bed::SimulatedPort many({"velmar"}, files);
   const auto result = RunOn(many, {"ls", "--json"});
   EXPECT_EQ(result.status, kDone);
-  EXPECT_THAT(result.errors, HasSubstr("this list may be cut"));
-  const size_t listed = json::parse(result.output).size();
+  EXPECT_THAT(result.errors, HasSubstr("may be missing"));
+  const size_t listed = json::parse(result.output).at("files").size();
   EXPECT_GT(listed, 50U);
   EXPECT_LT(listed, files.size());
 
   const bed::SimulatedPort quorin({"quorin"}, files);
   const auto whole = Cli::RunOn(quorin, {"ls", "--json", "--protocol", "quorin"});
-  EXPECT_EQ(json::parse(whole.output).size(), files.size());
-  EXPECT_THAT(whole.errors, testing::Not(HasSubstr("may be cut")));
+  EXPECT_EQ(json::parse(whole.output).at("files").size(), files.size());
+  EXPECT_THAT(whole.errors, testing::Not(HasSubstr("may be missing")));
 }
 
 TEST_F(VelmarCli, GetBringsTheFile) {
@@ -91,7 +91,65 @@ TEST_F(VelmarCli, AFileOfAnotherSizeThanListedIsAFailure) {
   const auto result = RunOn(receiver, {"get", "a.log"});
   EXPECT_EQ(result.status, kFailed);
   EXPECT_THAT(result.errors, HasSubstr("listed 4000 bytes, but 3000 arrived"));
-  EXPECT_THAT(LocalFiles(), IsEmpty());
+  EXPECT_THAT(LocalFiles(), ElementsAre("a.log.part"));
+  EXPECT_EQ(folder.Read("a.log.part"), Content(3000));
+}
+
+// Its driver does not check what arrives.
+TEST_F(VelmarCli, VerifyFindsADamagedByte) {
+  const bed::SimulatedPort receiver({"velmar", "--flipped-bit", "1@2"}, {{"a.log", Content(3000)}});
+  EXPECT_EQ(RunOn(receiver, {"get", "a.log"}).status, kDone);
+  EXPECT_NE(folder.Read("a.log"), Content(3000));
+  const auto verified = RunOn(receiver, {"get", "a.log", "-o", "b.log", "--verify"});
+  EXPECT_EQ(verified.status, kFailed);
+  EXPECT_THAT(verified.errors, HasSubstr("other bytes"));
+  EXPECT_THAT(LocalFiles(), ElementsAre("a.log"));
+  const auto sound = RunOn(receiver, {"get", "a.log", "-o", "c.log", "--verify", "--json"});
+  EXPECT_EQ(sound.status, kDone);
+  EXPECT_EQ(json::parse(sound.output).at("files").at(0).at("verified"), true);
+  EXPECT_EQ(folder.Read("c.log"), Content(3000));
+}
+
+// That each file is here already keeps the test short.
+TEST_F(VelmarCli, AllSaysWhenTheListMayBeCut) {
+  Files files;
+  while (files.size() < 80) files.emplace("file" + std::to_string(100 + files.size()), "x");
+  for (const auto& [name, content] : files) folder.Write(name, content);
+  const bed::SimulatedPort receiver({"velmar"}, files);
+  const auto result = RunOn(receiver, {"get", "--all", "--quiet", "--json"});
+  EXPECT_NE(result.status, kDone);
+  const json document = json::parse(result.output);
+  EXPECT_EQ(document.at("complete"), false);
+  EXPECT_GT(document.at("files").size(), 50U);
+  EXPECT_THAT(result.errors, HasSubstr("may be missing"));
+}
+
+TEST_F(VelmarCli, AllIsNeverDoneWhenTheListIsRefused) {
+  const bed::SimulatedPort receiver({"velmar", "--refuse", "log direnta"}, {{"a.log", "a"}});
+  const auto result = RunOn(receiver, {"get", "--all", "--quiet"});
+  EXPECT_EQ(result.status, kFailed) << result.output;
+  EXPECT_THAT(result.errors, HasSubstr("may be missing"));
+}
+
+TEST_F(VelmarCli, AListThatWasRefusedIsReadAgain) {
+  const bed::SimulatedPort receiver({"velmar", "--refuse", "log direnta@1"},
+                                    {{"a.log", Content(30)}});
+  const auto result = RunOn(receiver, {"get", "--all"});
+  EXPECT_EQ(result.status, kDone) << result.errors;
+  EXPECT_EQ(folder.Read("a.log"), Content(30));
+}
+
+// The rest of a list that did not fit is still on its way when the next command goes out.
+TEST_F(VelmarCli, AListThatDoesNotFitSpoilsNothing) {
+  constexpr size_t kFiles = 110;
+  Files files;
+  while (files.size() < kFiles) {
+    files.emplace("file" + std::to_string(100 + files.size()), Content(30));
+  }
+  const bed::SimulatedPort receiver({"velmar", "--pace"}, files);
+  const auto result = RunOn(receiver, {"get", "file103"});
+  EXPECT_EQ(result.status, kDone) << result.errors << receiver.Transcript();
+  EXPECT_EQ(folder.Read("file103"), Content(30));
 }
 
 TEST_F(VelmarCli, MoveRenamesTheFile) {
@@ -126,9 +184,9 @@ TEST_F(VelmarCli, ARefusedRemoveIsNoticed) {
 // The families number parities the other way round.
 TEST_F(VelmarCli, ParitiesReachTheReceiverInItsOwnWords) {
   const bed::SimulatedPort receiver({"velmar"});
-  EXPECT_EQ(RunOn(receiver, {"set", "parity", "even"}).status, kDone);
+  EXPECT_EQ(RunOn(receiver, {"set", "parity", "even", "--yes"}).status, kDone);
   EXPECT_THAT(receiver.Transcript(), HasSubstr(R"(> COM 9600 E 8 1 N\r)"));
-  EXPECT_EQ(RunOn(receiver, {"set", "parity", "odd"}).status, kDone);
+  EXPECT_EQ(RunOn(receiver, {"set", "parity", "odd", "--yes"}).status, kDone);
   EXPECT_THAT(receiver.Transcript(), HasSubstr(R"(> COM 9600 O 8 1 N\r)"));
 }
 

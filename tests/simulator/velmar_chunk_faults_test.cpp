@@ -28,6 +28,15 @@ TEST(VelmarChunkFaultsTest, ADamagedCrcIsTheOnlyDamage) {
   EXPECT_TRUE(ReadChunks(session.FetchFile()).at(1).good_crc);
 }
 
+TEST(VelmarChunkFaultsTest, AFlippedBitLeavesTheCrcBehind) {
+  const auto chunks = ReadChunks(FetchWith({Kind::kFlippedBit, 1}));
+  ASSERT_EQ(chunks.size(), 3U);
+  EXPECT_FALSE(chunks[1].good_crc);
+  Bytes expected = TestPayload(2100);
+  expected.at(2 * 1024 - 1) ^= 1;
+  EXPECT_EQ(Contents(chunks), expected);
+}
+
 TEST(VelmarChunkFaultsTest, AFaultMayHappenEveryTime) {
   VelmarSession session(WithChunkFault({Kind::kDamagedCrc, 1, kAlways}));
   EXPECT_FALSE(ReadChunks(session.FetchFile()).at(1).good_crc);

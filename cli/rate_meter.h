@@ -1,0 +1,31 @@
+/// @file rate_meter.h
+/// How fast a download is right now.
+#ifndef RCVLINK_CLI_RATE_METER_H_
+#define RCVLINK_CLI_RATE_METER_H_
+
+#include <cstdint>
+#include <deque>
+
+namespace cli {
+
+/// The rate of the last seconds: a slow beginning does not count for ever.
+class RateMeter {
+ public:
+  /// @param elapsed_ms time since the beginning; never less than before
+  /// @param done bytes that have arrived until then
+  void Add(std::uint64_t elapsed_ms, std::uint64_t done);
+
+  /// Bytes a second; 0 while that cannot be told, or nothing arrives.
+  std::uint64_t BytesPerSecond() const;
+
+ private:
+  struct Sample {
+    std::uint64_t elapsed_ms;
+    std::uint64_t done;
+  };
+  std::deque<Sample> samples_;  // the first is the beginning of the window
+};
+
+}  // namespace cli
+
+#endif  // RCVLINK_CLI_RATE_METER_H_
