@@ -304,6 +304,8 @@ RCVLINK_API long Abort(void* receiver);
 /// @retval 0x800705B4   a Quorin receiver stayed silent
 /// @retval 0x8007048F   a Quorin receiver refused a command, or sent a block that makes no sense
 /// @return otherwise the failing code of the connection, or over USB of the stream's Write
+/// @note What a Velmar receiver sends is not checked: a bit that was flipped on the line is in the file, and
+///       the result is S_OK. Where it matters, download twice and compare. Quorin blocks carry a CRC that is.
 /// @note A Quorin receiver that falls silent between two blocks is asked without end on a serial port
 ///       whose reads end empty, as those of Windows do: a host that has no patience calls `Abort`.
 /// @note Quorin blocks are numbered with 16 bits: a file of more than 65536 blocks of 512 bytes

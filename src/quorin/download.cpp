@@ -130,7 +130,9 @@ HRESULT CQuorinProtocol::Transfer(const wchar_t* name, IStream* stream, EInstanc
   return result;
 }
 
+// No abort cuts it off: the host would not know whether the receiver has heard it.
 HRESULT CQuorinProtocol::WriteControl(uint8_t control) {
+  const WaitScope shield = WaitScope::Shielded(connection());
   return connection()->Write(&control, sizeof(control), kWriteTimeoutMs);
 }
 
@@ -146,11 +148,7 @@ std::optional<HRESULT> CQuorinProtocol::AskAgain(const wchar_t* trace_line) {
   return AskAgain();
 }
 
-// The receiver must hear that it is over, whatever cancels are on their way.
-HRESULT CQuorinProtocol::EndTransfer() {
-  const WaitScope shield = WaitScope::Shielded(connection());
-  return WriteControl(kEndOfTransfer);
-}
+HRESULT CQuorinProtocol::EndTransfer() { return WriteControl(kEndOfTransfer); }
 
 HRESULT CQuorinProtocol::EndCancelledDownload(const wchar_t* trace_line) {
   Trace(trace_line);
@@ -232,8 +230,7 @@ std::optional<HRESULT> CQuorinProtocol::TakeSerialBlock(Download& download,
   if (abort_.Take()) return EndCancelledDownload(kCancelled);
   const HRESULT write_result = WriteControl(kAck);
   if (FAILED(write_result)) return write_result;
-  // Cut off by an abort: the receiver still waits for its answer, and must hear that it is over.
-  if (write_result != S_OK) return abort_.Take() ? EndCancelledDownload(kCancelled) : S_OK;
+  if (write_result != S_OK) return S_OK;
   ++download.expected_sequence;
   download.timeouts = 0;
   return std::nullopt;
@@ -282,6 +279,8 @@ std::optional<HRESULT> CQuorinProtocol::TakeUsbBlock(Download& download,
   }
   const std::optional<size_t> payload_length = block.PayloadLength();
   if (!payload_length) return kNotConnected;
+  // Another call on this receiver took the abort; the receiver must hear of it all the same.
+  if (read_result == S_FALSE) EndTransfer();
   if (read_result != S_OK) return read_result;
   if (!block.HasEndByte()) {
     return AskAgain(L"CQuorinProtocol::DownloadOverUSB - eob character is missed\r\n");
@@ -307,7 +306,7 @@ std::optional<HRESULT> CQuorinProtocol::TakeUsbBlock(Download& download,
   if (abort_.Take()) return EndCancelledDownload(kCancelled);
   const HRESULT write_result = WriteControl(kAck);
   if (FAILED(write_result)) return write_result;
-  if (write_result != S_OK) return abort_.Take() ? EndCancelledDownload(kCancelled) : write_result;
+  if (write_result != S_OK) return write_result;
   ++download.expected_sequence;
   return std::nullopt;
 }

@@ -6,6 +6,7 @@
 #include <span>
 #include <string_view>
 
+#include "platform/clock.h"
 #include "platform/hresult.h"
 #include "platform/text.h"
 #include "report/report_file.h"
@@ -138,8 +139,11 @@ HRESULT CVelmarProtocol::TellSpeed(DWORD speed, bool is_aborted) {
   CSetPortParamsCmd set_port(settings);
   if (is_aborted) set_port.SetFlags(kSendOnly);
   const HRESULT result = ExecuteCommand(set_port);
-  // The line must have left before the host changes its own speed; an answer would have shown that.
-  if (is_aborted || result == S_FALSE) connection()->Flush();
+  if (is_aborted || result == S_FALSE) {
+    // The line must have left before the host changes its own speed; an answer would have shown that.
+    connection()->Flush();
+    cut_off_at_ = CurrentClock().Ticks();
+  }
   return result;
 }
 

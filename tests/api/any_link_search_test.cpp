@@ -151,11 +151,16 @@ TEST_F(AnyLinkSearch, AnEventInTheSilenceOfATryEndsTheSweepThere) {
 
 TEST_F(AnyLinkSearch, AnEventInTheWaitForUsbEndsThatToo) {
   port_.path = L"none";
+  // A read over USB has no time-out of the device's.
+  COMMTIMEOUTS patient{};
+  patient.ReadTotalTimeoutConstant = 10 * kPingMs;
+  port_.SetCommTimeouts(nullptr, &patient);
   port_.on_wait = [&](DWORD timeout_ms) {
     if (timeout_ms == kPingMs) SetEvent(abort_event_.get());
   };
   EXPECT_EQ(Search(), S_FALSE);
   EXPECT_EQ(handle_, nullptr);
+  EXPECT_EQ(WaitForSingleObject(abort_event_.get(), 0), WAIT_OBJECT_0) << "no answer was awaited";
   EXPECT_LT(clock_.now, kPingMs) << "the silence was waited out";
   EXPECT_THAT(LinesWith("CreateReceiverOnUSB"), ElementsAre(kOpeningUsb, kAskingUsb));
 }
@@ -199,6 +204,22 @@ TEST_F(AnyLinkSearch, AStaleHandleIsNothingToASearchOfUsb) {
   EXPECT_EQ(Search(eInstanceUSB), S_FALSE);
   EXPECT_EQ(handle_, Stale());
   EXPECT_THAT(LinesWith("CreateReceiverOnUSB"), ElementsAre(kOpeningUsb, kAskingUsb));
+}
+
+// Both families are asked on one open port: an event in the first question keeps the second back.
+TEST_F(AnyLinkSearch, AnEventInTheFirstProbeKeepsTheSecondFromAsking) {
+  port_.on_wait = [this](DWORD timeout_ms) {
+    if (timeout_ms == kPingMs) SetEvent(abort_event_.get());
+  };
+  DCB settings{};
+  settings.BaudRate = CBR_9600;
+  EXPECT_EQ(devapi::CreateReceiverOnSerial(
+                name_.data(), eProtocolAny, &settings, abort_event_.get(), &handle_),
+            S_FALSE);
+  EXPECT_THAT(LinesWith("CreateReceiverOnSerial - looking for"),
+              ElementsAre("CreateReceiverOnSerial - looking for Quorin receiver [COM7]"));
+  EXPECT_EQ(port_.openings, 1u);
+  EXPECT_LT(clock_.now, kPingMs) << "the silence was waited out";
 }
 
 }  // namespace

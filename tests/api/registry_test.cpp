@@ -137,10 +137,11 @@ TEST(Registry, DestroyDropsOneUserEachAndSaysSoOnlyOfTheRemoved) {
   EXPECT_EQ(devapi::DestroyReceiver(Name(L"COM7")), S_FALSE);
 }
 
-TEST(Registry, DestroyDoesNotAbort) {
+TEST(Registry, DestroyDoesNotAbortWhereNothingRuns) {
   const Registered one(L"COM7");
   bool called = false;
   one.receiver->during = [&] { called = true; };
+  one.receiver->stopped = &called;
   EXPECT_EQ(devapi::DestroyReceiver(Name(L"COM7")), S_OK);
   EXPECT_FALSE(called);
 }
@@ -259,6 +260,8 @@ TEST(Registry, ACallInFlightKeepsTheReceiverAlive) {
     EXPECT_EQ(destroy ? devapi::DestroyReceiver(Name(L"COM7")) : devapi::CloseReceiver(one.handle),
               S_OK);
     EXPECT_FALSE(one.destroyed);
+    // Nobody else can end the call any more.
+    EXPECT_THAT(one.receiver->calls, ElementsAre("DownloadFile", destroy ? "Stop" : "Abort"));
     EXPECT_EQ(devapi::Abort(one.handle), kInvalid);
     SetEvent(go_on.get());
     caller.join();

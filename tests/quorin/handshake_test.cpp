@@ -220,4 +220,25 @@ TEST_F(QuorinHandshake, LooksAtTheEventAfterThePortQuery) {
   EXPECT_THAT(Said(), ElementsAreArray(First(5)));
 }
 
+// The abort itself is not looked for: what it cuts off tells of it.
+TEST_F(QuorinHandshake, EndsWithAWriteThatAnAbortCutOff) {
+  connection->on_write = [](std::string_view) { return S_FALSE; };
+  short answer = 99;
+  EXPECT_EQ(driver.CheckConnection(nullptr, &answer), S_OK);
+  EXPECT_EQ(answer, VARIANT_FALSE);
+  EXPECT_EQ(connection->Written(), "\n");
+}
+
+TEST_F(QuorinHandshake, LeavesNoCancelToTheNextWait) {
+  receiver.on_hear = [this](const std::string& command) {
+    if (command.find("echo") != std::string::npos) driver.Abort();
+  };
+  short answer = 99;
+  EXPECT_EQ(driver.CheckConnection(nullptr, &answer), S_OK);
+  EXPECT_EQ(answer, VARIANT_TRUE) << "the abort came when all was said";
+  EXPECT_FALSE(connection->is_cancelled);
+  CFileList files;
+  EXPECT_EQ(driver.GetFiles(&files), S_FALSE) << "its flag stays";
+}
+
 }  // namespace

@@ -49,6 +49,19 @@ TEST_F(QuorinSerialDownloadEnd, EndsWithAFailedAck) {
   EXPECT_EQ(Controls(), "\x06");
 }
 
+TEST_F(QuorinSerialDownloadEnd, SaysEachControlByteWhole) {
+  std::string cut;
+  connection->on_write = [&](std::string_view bytes) {
+    if (!connection->wait_rule.shielded) cut += bytes;
+    return S_OK;
+  };
+  connection->GiveResult(kTimedOut);
+  GiveFile();
+  EXPECT_EQ(Download(), S_OK);
+  EXPECT_EQ(Controls(), "\x15\x06\x06#");
+  EXPECT_EQ(cut, "");
+}
+
 TEST_F(QuorinSerialDownloadEnd, EndsWithoutAFailureWhenTheAckWasInterrupted) {
   GiveFile();
   connection->on_write = [](std::string_view) { return S_FALSE; };

@@ -48,8 +48,14 @@ BOOL SimulatedComPort::WriteFile(
 
 // A read ends when it has all it asked for, when the line was quiet for the interval, or at its
 // limit.
-DWORD SimulatedComPort::WaitForMultipleObjects(DWORD, const HANDLE* handles, DWORD timeout_ms) {
-  if (WaitForSingleObject(handles[0], 0) == WAIT_OBJECT_0) return WAIT_OBJECT_0;
+DWORD SimulatedComPort::WaitForMultipleObjects(DWORD count,
+                                               const HANDLE* handles,
+                                               DWORD timeout_ms) {
+  // The last is the transfer's own; the others end the wait early.
+  const DWORD own = count - 1;
+  for (DWORD i = 0; i < own; ++i) {
+    if (WaitForSingleObject(handles[i], 0) == WAIT_OBJECT_0) return WAIT_OBJECT_0 + i;
+  }
   Follow();
   const uint64_t patience_ms = port_.Now() + timeout_ms;
   uint64_t end_ms = pending_.end_ms;
@@ -64,7 +70,7 @@ DWORD SimulatedComPort::WaitForMultipleObjects(DWORD, const HANDLE* handles, DWO
   }
   clock_.now = static_cast<DWORD>(port_.Now());
   const bool over = pending_.received == pending_.size || port_.Now() >= end_ms;
-  return over ? WAIT_OBJECT_0 + 1 : WAIT_TIMEOUT;
+  return over ? WAIT_OBJECT_0 + own : WAIT_TIMEOUT;
 }
 
 BOOL SimulatedComPort::GetOverlappedResult(HANDLE, OVERLAPPED*, DWORD* bytes, BOOL wait) {

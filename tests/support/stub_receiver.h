@@ -15,6 +15,7 @@ class StubReceiver : public CIReceiver {
   std::function<void()> during;  // runs inside each operation; may be empty
   std::function<void(CFileList&)> fill;
   bool* destroyed = nullptr;
+  bool* stopped = nullptr;
 
   ~StubReceiver() override {
     if (destroyed) *destroyed = true;
@@ -45,7 +46,10 @@ class StubReceiver : public CIReceiver {
   HRESULT SetProgressCallback(ProgressFunction, void*) override {
     return Called("SetProgressCallback");
   }
-  void Stop() override { calls.push_back("Stop"); }
+  void Stop() override {
+    calls.push_back("Stop");
+    if (stopped) *stopped = true;
+  }
 
  private:
   HRESULT Called(const char* name) {

@@ -94,6 +94,18 @@ TEST_F(VelmarDriver, ALogIsNoAnswerToTheProbe) {
   EXPECT_EQ(answer, 0);
 }
 
+// An answer that comes after the check has given up is discarded by what follows.
+TEST_F(VelmarDriver, WhatFollowsACheckInVainWaitsForALateAnswer) {
+  short answer = 99;
+  EXPECT_EQ(driver.CheckConnection(nullptr, &answer), S_OK);
+  EXPECT_EQ(answer, 0);
+  const DWORD paused = clock.paused;
+  answers = {{kUnlogAll, kOkPrompt}};
+  EXPECT_EQ(driver.CheckConnection(nullptr, &answer), S_OK);
+  EXPECT_EQ(answer, -1);
+  EXPECT_EQ(clock.paused - paused, 500u + 500u) << "before it, and after its question";
+}
+
 TEST_F(VelmarDriver, AFailedSecondProbeCommandIsNoReceiver) {
   answers = {{kUnlogAll, kOkPrompt + "<STATUS"}};
   short answer = 99;
