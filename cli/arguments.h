@@ -21,6 +21,7 @@ struct Arguments {
   EProtocol protocol = eProtocolAny;
   std::optional<unsigned long> speed;  ///< given: one try at this speed
   std::optional<RtsMode> rts;          ///< given: one try with this use of RTS
+  bool no_memory = false;              ///< what was found is neither looked up nor remembered
   bool json = false;
   ProgressMode progress = ProgressMode::kAuto;
   bool quiet = false;

@@ -110,6 +110,10 @@ void AddLinkOptions(CLI::App& app, Arguments& arguments) {
                     {"off", RtsMode::kOff},
                     {"disable", RtsMode::kOff}},
                    arguments.rts);
+  AddFlag(app,
+          "--no-memory",
+          "Neither begin with what was found last time nor remember it",
+          arguments.no_memory);
 }
 
 /// Where a user's own options are read from, when the file is there.

@@ -2,11 +2,14 @@
 
 #include <windows.h>
 
-#include <optional>
+#include <filesystem>
+#include <utility>
+#include <vector>
 
-#include "busy.h"
 #include "handle.h"
 #include "names.h"
+#include "port_list.h"
+#include "port_memory.h"
 #include "rcvlink.h"
 #include "text.h"
 
@@ -14,30 +17,89 @@ namespace cli {
 namespace {
 
 constexpr DWORD kShareAll = FILE_SHARE_READ | FILE_SHARE_WRITE;
+// In front of the name of a port, as `CreateFileW` takes it.
 const std::wstring kDevices = L"\\\\.\\";
+
+/// Why a device cannot be opened, as far as asking for nothing of it tells; S_OK when it can. A
+/// search on USB that cannot open its device finds no receiver, no more.
+long WhyNotOpened(const std::wstring& device) {
+  const UniqueHandle handle(
+      CreateFileW(device.c_str(), 0, kShareAll, nullptr, OPEN_EXISTING, 0, nullptr));
+  return handle.get() == INVALID_HANDLE_VALUE ? ResultOfWin32(GetLastError()) : S_OK;
+}
 
 bool IsOneTry(const Arguments& arguments) { return arguments.speed || arguments.rts; }
 
-/// Tells a person at a terminal how to have a search shorter.
-void PrintAdvice(Context& context) {
-  const Arguments& arguments = context.arguments;
-  if (ProgressModeOf(context) != ProgressMode::kBar) return;
-  if (arguments.link == eInstanceUSB || IsOneTry(arguments)) return;
-  context.err.Write(
-      "Up to 18 tries of speed and RTS, some minutes on a silent port. Known speed? Then say "
-      "--speed N.\n");
+/// The port of a search on a serial port.
+class SearchedPort : public SweepPort {
+ public:
+  SearchedPort(const Context& context, std::wstring port, SearchDisplay& display)
+      : context_(context),
+        port_(std::move(port)),
+        display_(display),
+        there_(SUCCEEDED(WhyNotOpened(kDevices + port_))) {}
+
+  long Ask(const LineSetting& line, EProtocol family, void** receiver) override {
+    DCB settings = PortSettings(line.speed, line.rts);
+    const HANDLE cancel = context_.interrupt.event();
+    return devapi::CreateReceiverOnSerial(port_.data(), family, &settings, cancel, receiver);
+  }
+
+  void Begin(std::size_t number, std::size_t count, const LineSetting& line) override {
+    // Of a port that is not there no try is worth a line: its first one ends the search.
+    if (there_) display_.Begin(port_, number, count, line);
+  }
+
+  bool IsCancelled() const override { return context_.interrupt.requested(); }
+
+ private:
+  const Context& context_;
+  std::wstring port_;
+  SearchDisplay& display_;
+  bool there_;
+};
+
+std::vector<Try> TriesOn(const std::wstring& port,
+                         const Arguments& arguments,
+                         const PortMemory& memory) {
+  const auto current = arguments.speed ? std::nullopt : CurrentSettings(port);
+  const unsigned long port_speed = current ? current->BaudRate : 0;
+  if (!IsOneTry(arguments)) {
+    return PlanSweep(arguments.protocol, port_speed, memory.Recall(port));
+  }
+  const LineSetting line{arguments.speed.value_or(port_speed),
+                         arguments.rts.value_or(RtsMode::kOn)};
+  return {{line, FamiliesOf(arguments.protocol)}};
 }
 
-long SearchOn(EInstanceType link, const Context& context, void** receiver) {
+/// What came of a search on one kind of link.
+struct SearchResult {
+  long code = S_FALSE;
+  FoundReceiver found{};
+};
+
+SearchResult SearchSerial(const Context& context,
+                          const std::wstring& port,
+                          SearchDisplay& display) {
   const Arguments& arguments = context.arguments;
-  std::wstring port = arguments.port;
-  const HANDLE cancel = context.interrupt.event();
-  if (link == eInstanceUSB || !IsOneTry(arguments)) {
-    return devapi::SearchReceiver(port.data(), link, arguments.protocol, cancel, receiver);
+  const PortMemory memory(arguments.no_memory ? std::filesystem::path() : PortMemory::UsualFile());
+  SearchedPort searched(context, port, display);
+  const SweepResult result = RunSweep(TriesOn(port, arguments, memory), searched);
+  if (result.receiver == nullptr) return {.code = result.code};
+  // A speed of 0 would say nothing the next time.
+  if (result.setting.line.speed != 0 && !memory.Remember(port, result.setting) &&
+      arguments.verbose) {
+    display.PrintStatus(Printable(port) + ": its setting could not be remembered in " +
+                        Printable(PortMemory::UsualFile().native()) + "\n");
   }
-  return TryPort(context,
-                 PortSettings(arguments.speed.value_or(0), arguments.rts.value_or(RtsMode::kOn)),
-                 receiver);
+  return {S_OK, {result.receiver, eInstanceSerial, result.setting}};
+}
+
+SearchResult SearchUsb(const Context& context, std::wstring device) {
+  SearchResult result{.found = {nullptr, eInstanceUSB}};
+  result.code = devapi::CreateReceiverOnUSB(
+      device.data(), context.arguments.protocol, context.interrupt.event(), &result.found.handle);
+  return result;
 }
 
 std::string SilenceHint(const Arguments& arguments, EInstanceType link) {
@@ -46,14 +108,6 @@ std::string SilenceHint(const Arguments& arguments, EInstanceType link) {
     return "Is it switched on, and is this its speed? Without --speed and --rts all are tried.";
   }
   return "Is it switched on, and is this the port of its cable? `rcvlink-cli ports` lists them.";
-}
-
-/// Why a device cannot be opened, as far as asking for nothing of it tells; S_OK when it can. A
-/// search on USB that cannot open its device finds no receiver, no more.
-long WhyNotOpened(const std::wstring& device) {
-  const UniqueHandle handle(
-      CreateFileW(device.c_str(), 0, kShareAll, nullptr, OPEN_EXISTING, 0, nullptr));
-  return handle.get() == INVALID_HANDLE_VALUE ? ResultOfWin32(GetLastError()) : S_OK;
 }
 
 /// A port that is a file of this computer would have its beginning overwritten.
@@ -80,11 +134,10 @@ bool IsMissing(long code) {
 
 /// The family that answers in place of the one that was asked for; empty when none does. Asked for at
 /// known settings only: a sweep takes minutes.
-std::string OtherFamily(const Context& context) {
+std::string OtherFamily(const Context& context, std::wstring port) {
   const Arguments& arguments = context.arguments;
   if (arguments.protocol == eProtocolAny || !IsOneTry(arguments)) return {};
   const EProtocol other = arguments.protocol == eProtocolQuorin ? eProtocolVelmar : eProtocolQuorin;
-  std::wstring port = arguments.port;
   DCB settings = PortSettings(arguments.speed.value_or(0), arguments.rts.value_or(RtsMode::kOn));
   void* receiver = nullptr;
   devapi::CreateReceiverOnSerial(
@@ -95,22 +148,22 @@ std::string OtherFamily(const Context& context) {
 }
 
 /// What a result of the search on a link means to the user.
-Failure SearchFailure(const Arguments& arguments, EInstanceType link, long code) {
-  const bool on_usb = link == eInstanceUSB;
-  const std::string port = Printable(arguments.port);
+Failure SearchFailure(const Arguments& arguments, const SearchPlace& place, long code) {
+  const bool on_usb = place.link == eInstanceUSB;
+  const std::string port = Printable(place.port);
   if (on_usb && SUCCEEDED(code)) {
-    const long opening = WhyNotOpened(arguments.port);
+    const long opening = WhyNotOpened(place.port);
     if (FAILED(opening)) code = opening;
   }
-  Failure failure{.exit = ExitCode::kNoReceiver, .tried = "find a receiver", .code = code};
+  Failure failure{
+      .exit = ExitCode::kNoReceiver, .tried = "find a receiver", .port = port, .code = code};
   if (!on_usb && code == ResultOfWin32(ERROR_INVALID_NAME)) {
     failure.meaning = port + " is no name of a COM port";
-    failure.hint = "`rcvlink-cli ports` lists the ports of this computer.";
+    failure.hint = PortsInWords(ListPorts(), place.link);
   } else if (IsMissing(code)) {
     failure.meaning = port + " does not exist: nothing is plugged in there";
-    failure.hint = on_usb ? "A device on USB is named by its whole path, such as "
-                            "\\\\?\\usb#vid_1234&pid_5678#...; --link serial is for COM ports."
-                          : "`rcvlink-cli ports` lists the ports of this computer.";
+    failure.hint = PortsInWords(ListPorts(), place.link);
+    if (on_usb && IsComPort(place.port)) failure.hint += " COM ports are for --link serial.";
   } else if (code == ResultOfWin32(ERROR_ACCESS_DENIED)) {
     failure.meaning = "another program is using " + port;
     failure.hint = "Close that program and try again.";
@@ -119,7 +172,7 @@ Failure SearchFailure(const Arguments& arguments, EInstanceType link, long code)
     failure.hint = "Is it switched on, and in reach? Plug it in again and try once more.";
   } else if (SUCCEEDED(code)) {
     failure.meaning = "no receiver answered";
-    failure.hint = SilenceHint(arguments, link);
+    failure.hint = SilenceHint(arguments, place.link);
   }
   return failure;
 }
@@ -144,35 +197,36 @@ std::optional<DCB> CurrentSettings(const std::wstring& port) {
 }
 
 FoundReceiver FindReceiver(Context& context) {
+  SearchDisplay display(context, 1);
+  return FindReceiverAt(context, {context.arguments.port, context.arguments.link}, display);
+}
+
+FoundReceiver FindReceiverAt(const Context& context,
+                             const SearchPlace& place,
+                             SearchDisplay& display) {
   const Arguments& arguments = context.arguments;
-  if (!IsComPort(arguments.port)) RefuseFile(arguments.port);
-  const bool any = arguments.link == eInstanceAny;
-  EInstanceType link = any ? eInstanceSerial : arguments.link;
-  void* receiver = nullptr;
-  long code = S_OK;
-  {
-    PrintAdvice(context);
-    const Busy busy(context, "Searching " + Printable(arguments.port));
-    code = SearchOn(link, context, &receiver);
-  }
-  if (any && receiver == nullptr && !context.interrupt.requested()) {
+  if (!IsComPort(place.port)) RefuseFile(place.port);
+  const bool any = place.link == eInstanceAny;
+  SearchPlace tried{place.port, any ? eInstanceSerial : place.link};
+  SearchResult result = tried.link == eInstanceUSB ? SearchUsb(context, place.port)
+                                                   : SearchSerial(context, place.port, display);
+  if (any && result.found.handle == nullptr && !context.interrupt.requested()) {
     if (arguments.verbose) {
-      Failure failure = SearchFailure(arguments, link, code);
+      Failure failure = SearchFailure(arguments, tried, result.code);
       failure.tried = "find a receiver on a serial port";
-      failure.port = Printable(arguments.port);
-      context.err.Write(Describe(failure));
+      display.PrintFailure(failure);
     }
-    link = eInstanceUSB;
-    code = SearchOn(link, context, &receiver);
+    tried.link = eInstanceUSB;
+    result = SearchUsb(context, place.port);
   }
-  if (receiver != nullptr) return {receiver, link};
-  Failure failure = SearchFailure(arguments, link, code);
+  if (result.found.handle != nullptr) return result.found;
+  Failure failure = SearchFailure(arguments, tried, result.code);
   if (context.interrupt.requested()) {
     failure.exit = ExitCode::kCancelled;
     failure.meaning = "ended by Ctrl-C";
     failure.hint.clear();
-  } else if (link == eInstanceSerial && code == S_FALSE) {
-    if (const std::string family = OtherFamily(context); !family.empty()) {
+  } else if (tried.link == eInstanceSerial && result.code == S_FALSE) {
+    if (const std::string family = OtherFamily(context, place.port); !family.empty()) {
       failure.meaning = "a " + family + " receiver answered instead";
       failure.hint = "Leave out --protocol, or say --protocol " + Lowered(family) + ".";
     }

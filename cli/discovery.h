@@ -10,17 +10,31 @@
 
 #include "context.h"
 #include "rcvlink.h"
+#include "search_display.h"
+#include "sweep.h"
 
 namespace cli {
 
 struct FoundReceiver {
   void* handle;  ///< the library's, to be given back with `devapi::CloseReceiver`
   EInstanceType link;
+  std::optional<KnownSetting> setting{};  ///< of a serial port
 };
 
-/// Searches the port, or tries it once when the command line tells speed or RTS.
+/// Where to look for a receiver.
+struct SearchPlace {
+  std::wstring port;
+  EInstanceType link;
+};
+
+/// Searches the port of the command line, or tries it once when that tells speed or RTS.
 /// @throws Failure when there is no receiver
 FoundReceiver FindReceiver(Context& context);
+
+/// The same for another place than that of the command line. May run on any thread.
+FoundReceiver FindReceiverAt(const Context& context,
+                             const SearchPlace& place,
+                             SearchDisplay& display);
 
 /// One try on a serial port.
 /// @return as `devapi::CreateReceiverOnSerial`

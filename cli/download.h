@@ -22,6 +22,10 @@ struct Downloaded {
   std::string sha256{};
 };
 
+/// Refuses what the protocol cannot bring to its end, before minutes are spent on it.
+/// @throws Failure
+void CheckSize(Receiver& receiver, const RemoteFile& file);
+
 /// Copies a file, watching for silence and for Ctrl-C. The destination is complete only when every
 /// byte that the receiver listed is in it. What came of a file that has another size than listed is
 /// kept: it may be a log that is still being recorded.

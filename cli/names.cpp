@@ -23,12 +23,6 @@ std::wstring Escaped(wchar_t character) {
   return L"%" + ToUtf16(Hex(character, kDigits));
 }
 
-std::wstring Capitals(std::wstring_view text) {
-  std::wstring capitals(text);
-  CharUpperBuffW(capitals.data(), static_cast<DWORD>(capitals.size()));
-  return capitals;
-}
-
 bool IsPortNumber(std::wstring_view text) {
   // Windows takes the superscript digits 1 to 3 for digits here.
   constexpr std::wstring_view kDigits = L"0123456789\xB9\xB2\xB3";
@@ -59,6 +53,12 @@ bool SurvivesAnsi(std::wstring_view name) {
 }
 
 }  // namespace
+
+std::wstring Capitals(std::wstring_view text) {
+  std::wstring capitals(text);
+  CharUpperBuffW(capitals.data(), static_cast<DWORD>(capitals.size()));
+  return capitals;
+}
 
 std::optional<std::string> WhyNotSendable(std::wstring_view name) {
   if (name.empty()) return "a file name is empty";

@@ -29,6 +29,9 @@ bool IsPlainFileName(std::wstring_view name);
 /// Whether the file system takes both for the same name.
 bool SameLocalName(std::wstring_view first, std::wstring_view second);
 
+/// In capitals, as the file system compares names.
+std::wstring Capitals(std::wstring_view text);
+
 /// A COM port as it is listed, from the ways in which people write one: `com7`, `COM7:`,
 /// `\\.\COM7`. Any other name stays as it is.
 std::wstring PlainPortName(std::wstring_view name);

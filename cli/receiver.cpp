@@ -1,6 +1,7 @@
 #include "receiver.h"
 
 #include <oleauto.h>
+#include <wtypes.h>
 
 #include <algorithm>
 #include <utility>
@@ -66,6 +67,7 @@ Receiver::Receiver(Context& context, const FoundReceiver& found)
       interrupt_(context.interrupt),
       handle_(found.handle),
       link_(found.link),
+      setting_(found.setting),
       cancel_watch_(Aborter::kInterval, [this, aborter = Aborter(handle())]() mutable {
         if (interrupt_.requested()) aborter.Tick();
       }) {}
@@ -118,12 +120,11 @@ std::vector<RemoteFile> Receiver::ReadDirectory() {
   return files;
 }
 
-/// Of Velmar receivers only: an empty list is read once more, as the library does not tell a refused
-/// or lost question from an empty directory.
+/// Of Velmar receivers only, which are on serial ports: an empty list is read once more, as the
+/// library does not tell a refused or lost question from an empty directory.
 std::string Receiver::DoubtAbout(std::vector<RemoteFile>& files) {
-  if (!files.empty() && !MayBeCut(files)) return {};
-  if (!files.empty()) AwaitAnswer(kList);
-  if (Identify().family != eProtocolVelmar) return {};
+  if (!setting_ || setting_->family != eProtocolVelmar) return {};
+  if (MayBeCut(files)) AwaitAnswer(kList);
   if (files.empty()) files = ReadDirectory();
   if (files.empty()) {
     return "The list is empty: a Velmar receiver that has no files is not told from one that did "
@@ -134,6 +135,12 @@ std::string Receiver::DoubtAbout(std::vector<RemoteFile>& files) {
          "appear when others have been deleted.";
 }
 
+bool Receiver::Answers() {
+  short answer = VARIANT_FALSE;
+  const long code = devapi::CheckConnection(handle(), interrupt_.event(), &answer);
+  return code == S_OK && answer != VARIANT_FALSE;
+}
+
 /// The rest of a list that did not fit is still on its way: it would spoil the next exchange.
 void Receiver::AwaitAnswer(const std::string& tried) {
   constexpr std::uint64_t kLongestRestMs = 120'000;
@@ -141,9 +148,7 @@ void Receiver::AwaitAnswer(const std::string& tried) {
   const std::uint64_t start_ms = GetTickCount64();
   while (GetTickCount64() - start_ms < kLongestRestMs) {
     ThrowIfCancelled(tried);
-    short answer = VARIANT_FALSE;
-    const long code = devapi::CheckConnection(handle(), interrupt_.event(), &answer);
-    if (code == S_OK && answer != VARIANT_FALSE) return;
+    if (Answers()) return;
   }
   throw FailureOf(tried, ResultOfWin32(ERROR_TIMEOUT), "the receiver does not answer any more");
 }

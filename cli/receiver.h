@@ -64,8 +64,14 @@ class Receiver {
   /// @throws Failure when there is none
   explicit Receiver(Context& context);
 
+  /// Takes over a receiver that was found.
+  Receiver(Context& context, const FoundReceiver& found);
+
   void* handle() const { return handle_.get(); }
   EInstanceType link() const { return link_; }  ///< on which it was found: serial or USB
+
+  /// Where it answered, on a serial port.
+  const std::optional<KnownSetting>& setting() const { return setting_; }
 
   /// Asked for once only.
   /// @throws Failure
@@ -74,6 +80,9 @@ class Receiver {
   /// Reads the receiver's directory. Warns when some of it may be missing.
   /// @throws Failure
   Directory ListFiles();
+
+  /// Asks the receiver whether it still answers.
+  bool Answers();
 
   /// What a result other than S_OK makes: a cancellation after Ctrl-C, else a failure.
   Failure FailureOf(std::string tried, long code, std::string meaning = "") const;
@@ -86,8 +95,6 @@ class Receiver {
   std::string DoubtAbout(std::vector<RemoteFile>& files);
   void AwaitAnswer(const std::string& tried);
 
-  Receiver(Context& context, const FoundReceiver& found);
-
   struct Closer {
     void operator()(void* handle) const { devapi::CloseReceiver(handle); }
   };
@@ -96,6 +103,7 @@ class Receiver {
   const Interrupt& interrupt_;
   std::unique_ptr<void, Closer> handle_;
   EInstanceType link_;
+  std::optional<KnownSetting> setting_;
   std::optional<Identity> identity_;
   Ticker cancel_watch_;  // ends before the handle does
 };

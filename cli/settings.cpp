@@ -88,6 +88,32 @@ std::string FamilyWord(unsigned family) {
   return word;
 }
 
+std::string RtsWord(RtsMode rts) {
+  switch (rts) {
+    case RtsMode::kHandshake:
+      return "handshake";
+    case RtsMode::kOn:
+      return "on";
+    case RtsMode::kOff:
+      break;
+  }
+  return "off";
+}
+
+std::optional<RtsMode> ParseRts(std::string_view word) {
+  for (const RtsMode rts : {RtsMode::kHandshake, RtsMode::kOn, RtsMode::kOff}) {
+    if (word == RtsWord(rts)) return rts;
+  }
+  return std::nullopt;
+}
+
+std::optional<EProtocol> ParseFamily(std::string_view word) {
+  for (const EProtocol family : {eProtocolQuorin, eProtocolVelmar}) {
+    if (word == FamilyWord(family)) return family;
+  }
+  return std::nullopt;
+}
+
 std::optional<SettingChange> ParseSetting(std::string_view setting, std::string_view value) {
   const auto* const known =
       std::find_if(kSettings.begin(), kSettings.end(), [&](const SettingText& candidate) {

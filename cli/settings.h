@@ -36,6 +36,15 @@ std::string FamilyName(unsigned family);
 /// The same as a word of --protocol.
 std::string FamilyWord(unsigned family);
 
+/// "handshake", "on" or "off", a word of --rts.
+std::string RtsWord(RtsMode rts);
+
+/// The mode that such a word stands for; nothing for any other word.
+std::optional<RtsMode> ParseRts(std::string_view word);
+
+/// The family that a word of `FamilyWord` stands for; nothing for any other word.
+std::optional<EProtocol> ParseFamily(std::string_view word);
+
 /// Reads `SETTING VALUE` of the command line; nothing when the words make no sense.
 std::optional<SettingChange> ParseSetting(std::string_view setting, std::string_view value);
 

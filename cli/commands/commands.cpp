@@ -12,6 +12,7 @@ CommandPointer MakeFind();
 CommandPointer MakeInfo();
 CommandPointer MakeList();
 CommandPointer MakeGet();
+CommandPointer MakeMirror();
 CommandPointer MakeRemove();
 CommandPointer MakeMove();
 CommandPointer MakeSet();
@@ -24,6 +25,7 @@ Commands MakeCommands() {
                                  MakeInfo,
                                  MakeList,
                                  MakeGet,
+                                 MakeMirror,
                                  MakeRemove,
                                  MakeMove,
                                  MakeSet,

@@ -32,22 +32,6 @@ bool MayGoOn(const Failure& failure) {
   return failure.exit == ExitCode::kFailed && refused;
 }
 
-/// Refuses what the protocol cannot bring to its end, before minutes are spent on it.
-/// @throws Failure
-void CheckSize(Receiver& receiver, const RemoteFile& file) {
-  constexpr std::uint64_t kMostBlocks = 65'536;
-  constexpr std::uint64_t kBlockBytes = 512;
-  constexpr std::uint64_t kMostBytes = kMostBlocks * kBlockBytes;
-  if (file.size <= kMostBytes || receiver.link() == eInstanceUSB) return;
-  if (receiver.Identify().family != eProtocolQuorin) return;
-  throw Failure{.tried = "download " + Printable(file.name),
-                .code = ResultOfWin32(ERROR_FILE_TOO_LARGE),
-                .meaning = "it has " + std::to_string(file.size) +
-                           " bytes; over a serial line a Quorin receiver can send " +
-                           std::to_string(kMostBytes) + " of a file",
-                .hint = "Download it over USB."};
-}
-
 class Get : public Command {
  public:
   using Command::Command;

@@ -11,10 +11,13 @@
 namespace cli {
 
 /// The link as a word of --link.
-std::string LinkWord(const Receiver& receiver);
+std::string LinkWord(EInstanceType link);
 
-/// {"port", "link", "protocol", "id", "model"}
-Json ToJson(const Arguments& arguments, const Receiver& receiver, const Identity& identity);
+/// "usb", or "serial, 57600 bit/s, RTS on"
+std::string LinkInWords(const Receiver& receiver);
+
+/// {"port", "link", "speed", "rts", "protocol", "id", "model"}; speed and rts are null on USB
+Json ToJson(const std::wstring& port, const Receiver& receiver, const Identity& identity);
 
 }  // namespace cli
 

@@ -23,14 +23,14 @@ class Info : public Command {
     Receiver receiver(context);
     const Identity identity = receiver.Identify();
     const bool renaming = identity.offers_renaming();
-    context.PrintResult(Row("Port", Printable(arguments.port) + " (" + LinkWord(receiver) + ")") +
-                        Row("Id", Printable(identity.id)) +
-                        Row("Model", Printable(identity.model)) +
-                        Row("Family", FamilyName(identity.family)) +
-                        Row("Variant", std::to_string(identity.variant)) +
-                        Row("Renaming", renaming ? "offered" : "not offered") +
-                        Row("Features", std::to_string(identity.features)));
-    Json document = ToJson(arguments, receiver, identity);
+    context.PrintResult(
+        Row("Port", Printable(arguments.port) + " (" + LinkInWords(receiver) + ")") +
+        Row("Id", Printable(identity.id)) + Row("Model", Printable(identity.model)) +
+        Row("Family", FamilyName(identity.family)) +
+        Row("Variant", std::to_string(identity.variant)) +
+        Row("Renaming", renaming ? "offered" : "not offered") +
+        Row("Features", std::to_string(identity.features)));
+    Json document = ToJson(arguments.port, receiver, identity);
     document["variant"] = identity.variant;
     document["features"] = identity.features;
     document["renaming"] = renaming;

@@ -1,11 +1,33 @@
 #include <algorithm>
 
 #include "command.h"
-#include "serial_ports.h"
+#include "identity.h"
+#include "port_list.h"
 #include "text.h"
 
 namespace cli {
 namespace {
+
+/// What is known of a port besides its name.
+std::string Details(const Port& port) {
+  std::string details = Printable(port.friendly_name);
+  if (port.vendor.empty()) return details;
+  return details + (details.empty() ? "" : " ") + "(vendor " + port.vendor + ", product " +
+         port.product + ")";
+}
+
+Json OrNull(const std::string& text) { return text.empty() ? Json(nullptr) : Json(text); }
+
+Json ToJson(const Port& port) {
+  Json json = {{"port", ToUtf8(port.name)},
+               {"link", LinkWord(port.link)},
+               {"name", OrNull(ToUtf8(port.friendly_name))}};
+  if (port.link == eInstanceUSB) {
+    json["vendor"] = OrNull(port.vendor);
+    json["product"] = OrNull(port.product);
+  }
+  return json;
+}
 
 class Ports : public Command {
  public:
@@ -15,18 +37,18 @@ class Ports : public Command {
 
   Outcome Run(Context& context) override {
     constexpr std::size_t kGap = 2;
-    const std::vector<SerialPort> ports = ListSerialPorts();
-    if (ports.empty()) context.PrintDone("This computer has no COM ports.\n");
+    const std::vector<Port> ports = ListPorts();
+    if (ports.empty()) {
+      context.PrintDone("This computer has no COM ports, and no device of the USBIO driver.\n");
+    }
     std::size_t width = 0;
-    for (const SerialPort& port : ports) width = std::max(width, port.port.size() + kGap);
+    for (const Port& port : ports) width = std::max(width, Printable(port.name).size() + kGap);
     Json list = Json::array();
-    for (const SerialPort& port : ports) {
-      const std::string name = ToUtf8(port.port);
-      const bool named = !port.friendly_name.empty();
-      const std::string gap(named ? width - port.port.size() : 0, ' ');
-      context.PrintResult(name + gap + Printable(port.friendly_name) + "\n");
-      list.push_back(
-          {{"port", name}, {"name", named ? Json(ToUtf8(port.friendly_name)) : Json(nullptr)}});
+    for (const Port& port : ports) {
+      const std::string details = Details(port);
+      const std::string name = Printable(port.name);
+      context.PrintResult((details.empty() ? name : PadRight(name, width) + details) + "\n");
+      list.push_back(ToJson(port));
     }
     return {.document = {{"ports", list}}};
   }
@@ -36,7 +58,10 @@ class Ports : public Command {
 
 std::unique_ptr<Command> MakePorts() {
   return std::make_unique<Ports>(
-      Command::Text{"ports", "List this computer's COM ports", "Example: rcvlink-cli ports"});
+      Command::Text{"ports",
+                    "List this computer's COM ports and USB receivers",
+                    "A device on USB is listed when it has the USBIO driver.\n"
+                    "Example: rcvlink-cli ports"});
 }
 
 }  // namespace cli

@@ -177,7 +177,7 @@ TEST(CommandLineTest, SenselessLinesAreRefused) {
                              Words{"bogus"},
                              Words{"find"},
                              Words{"find", ""},
-                             Words{"find", "COM7", "COM8"},
+                             Words{"find", "COM7", "--all"},
                              Words{"find", "COM7", "--bogus"},
                              Words{"find", "COM7", "--speed", "fast"},
                              Words{"find", "COM7", "--speed", "1"},

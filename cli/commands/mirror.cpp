@@ -1,0 +1,309 @@
+#include <algorithm>
+#include <map>
+#include <optional>
+
+#include "command.h"
+#include "download.h"
+#include "file_report.h"
+#include "formats.h"
+#include "local_files.h"
+#include "mirror_file.h"
+#include "mirror_plan.h"
+#include "names.h"
+#include "options.h"
+#include "paths.h"
+#include "targets.h"
+#include "text.h"
+#include "wildcard.h"
+
+namespace cli {
+namespace {
+
+struct MirrorOptions {
+  std::vector<std::wstring> patterns{};  ///< empty: all files
+  std::wstring folder{};
+  std::optional<TimeZone> times{};  ///< nothing: files have the time of their download
+  bool verify = false;
+  bool deletes = false;
+};
+
+/// The places of a mirror's files. What is there already may be replaced, by the rules of `Mirror`.
+/// @throws Failure when there can be none, before a search that may take minutes
+Targets TargetsIn(const std::wstring& folder) {
+  Targets targets({.output = folder, .many = true, .force = true});
+  targets.CheckFolder();
+  return targets;
+}
+
+/// The mirror of a receiver: goes on after a file that failed, and ends by the worst of all.
+class MirrorRun {
+ public:
+  MirrorRun(Context& context, const MirrorOptions& options)
+      : context_(context),
+        options_(options),
+        targets_(TargetsIn(options.folder)),
+        receiver_(context),
+        report_(context) {}
+
+  Outcome Run() {
+    const Directory directory = receiver_.ListFiles();
+    const std::vector<RemoteFile>& files = directory.files;
+    doubt_ = directory.doubt;
+    const std::vector<MirrorJob> jobs = Plan(files);
+    PrintPlan(jobs);
+    targets_.CheckRoom(new_bytes_);
+    if (!jobs.empty()) MakeFolder(options_.folder);
+    MirrorAll(jobs);
+    if (!asked_to_delete_.empty()) CheckDeleted(files.size());
+    for (auto& [name, details] : done_) report_.AddDone(name, details);
+    PrintSummary();
+    return Finish();
+  }
+
+ private:
+  struct Summary {
+    std::size_t downloaded = 0;
+    std::size_t present = 0;
+    std::size_t failed = 0;
+    std::size_t deleted = 0;
+    std::size_t untried = 0;
+  };
+
+  bool IsWanted(const std::wstring& name) const {
+    const auto fits = [&name](const std::wstring& pattern) { return FitsPattern(name, pattern); };
+    return options_.patterns.empty() ||
+           std::any_of(options_.patterns.begin(), options_.patterns.end(), fits);
+  }
+
+  std::vector<MirrorJob> Plan(const std::vector<RemoteFile>& files) {
+    std::vector<MirrorJob> jobs;
+    for (const RemoteFile& file : files) {
+      if (!IsWanted(file.name)) continue;
+      try {
+        if (const auto reason = WhyNotSendable(file.name)) {
+          throw Failure{
+              .tried = "mirror " + Printable(file.name), .code = E_INVALIDARG, .meaning = *reason};
+        }
+        CheckSize(receiver_, file);
+        const std::filesystem::path target = targets_.Choose(file.name);
+        jobs.push_back({file, target, StepFor(file.size, SizeOf(target), options_.deletes)});
+      } catch (const Failure& failure) {
+        AddFailed(file.name, failure);
+      }
+    }
+    return jobs;
+  }
+
+  void PrintPlan(const std::vector<MirrorJob>& jobs) {
+    for (const MirrorJob& job : jobs) {
+      total_.total += BytesOf(job, options_.verify);
+      if (job.step == MirrorStep::kDownload) new_bytes_ += job.file.size;
+      total_.files += job.step != MirrorStep::kNothing;
+    }
+    context_.PrintStatus(std::to_string(jobs.size()) + " files on the receiver, " +
+                         std::to_string(jobs.size() - total_.files) + " here already; " +
+                         FormatBytes(total_.total) + " to come.\n");
+    if (options_.times) {
+      context_.PrintStatus("File times are taken as " + InWords(*options_.times) + ".\n");
+    }
+  }
+
+  void MirrorAll(const std::vector<MirrorJob>& jobs) {
+    const std::uint64_t start_ms = GetTickCount64();
+    for (std::size_t i = 0; i < jobs.size(); ++i) {
+      const MirrorJob& job = jobs[i];
+      total_.elapsed_ms = GetTickCount64() - start_ms;
+      try {
+        MirrorOne(job);
+      } catch (const Failure& failure) {
+        AddFailed(job.file.name, failure);
+        if (!MayGoOn(failure)) {
+          summary_.untried = jobs.size() - i - 1;
+          report_.AddUntried(summary_.untried);
+          break;
+        }
+      }
+      total_.done += BytesOf(job, options_.verify);
+    }
+    total_.elapsed_ms = GetTickCount64() - start_ms;
+  }
+
+  void MirrorOne(const MirrorJob& job) {
+    const std::wstring& name = job.file.name;
+    Json details = {{"path", ToUtf8(job.target.native())}, {"bytes", job.file.size}};
+    if (job.step == MirrorStep::kNothing) {
+      ++summary_.present;
+      details["done"] = "nothing";
+      done_.emplace_back(name, details);
+      return;
+    }
+    ++total_.file;
+    receiver_.ThrowIfCancelled("mirror " + Printable(name));
+    context_.PrintStatus(InWords(total_, name, job.file.size) + "\n");
+    const std::string sha256 = Mirror(context_, receiver_, job, options_.verify);
+    const bool came = job.step != MirrorStep::kCompare;
+    ++(came ? summary_.downloaded : summary_.present);
+    if (came) SetTimeOf(job);
+    const bool verified = job.file.size > 0 && (options_.verify || !came);
+    details["done"] = came ? "downloaded" : "compared";
+    details["verified"] = verified;
+    details["sha256"] = sha256.empty() ? Json(nullptr) : Json(sha256);
+    if (came) context_.PrintDone(Printable(name) + " -> " + Printable(job.target.native()) + "\n");
+    if (verified && options_.deletes) Delete(name);
+    done_.emplace_back(name, details);
+  }
+
+  void SetTimeOf(const MirrorJob& job) {
+    if (!options_.times) return;
+    if (const auto time = ToFileTime(job.file.time, *options_.times)) SetTime(job.target, *time);
+  }
+
+  void Delete(std::wstring name) {
+    const std::string tried = "delete " + Printable(name);
+    receiver_.ThrowIfCancelled(tried);
+    const long code = devapi::DeleteFileW(receiver_.handle(), name.data());
+    if (code != S_OK) throw receiver_.FailureOf(tried, code);
+    asked_to_delete_.push_back(name);
+  }
+
+  /// A receiver may refuse and the library not know it: the directory tells.
+  void CheckDeleted(std::size_t listed_before) {
+    std::vector<RemoteFile> files;
+    std::optional<Failure> unread;
+    try {
+      files = receiver_.ListFiles().files;
+      if (files.empty() && listed_before > asked_to_delete_.size()) {
+        unread = Failure{.code = ResultOfWin32(ERROR_TIMEOUT),
+                         .meaning = "the receiver did not list its files again"};
+      }
+    } catch (const Failure& failure) {
+      unread = failure;
+    }
+    for (const std::wstring& name : asked_to_delete_) {
+      const std::string tried = "delete " + Printable(name);
+      if (unread) {
+        unread->tried = tried;
+        AddFailed(name, *unread);
+      } else if (HasFile(files, name)) {
+        AddFailed(name,
+                  {.tried = tried,
+                   .code = S_OK,
+                   .meaning = "the receiver was asked to, but still has the file"});
+      } else {
+        ++summary_.deleted;
+        const auto entry = std::find_if(
+            done_.begin(), done_.end(), [&](const auto& done) { return done.first == name; });
+        entry->second["deleted"] = true;
+      }
+    }
+  }
+
+  void AddFailed(const std::wstring& name, const Failure& failure) {
+    ++summary_.failed;
+    worst_ = Worse(worst_, failure.exit);
+    report_.AddFailed(name, failure);
+  }
+
+  /// Whether a failure leaves hope for the next file.
+  bool MayGoOn(const Failure& failure) {
+    if (failure.exit == ExitCode::kCancelled) return false;
+    if (failure.exit == ExitCode::kLocalFile) {
+      return failure.code != ResultOfWin32(ERROR_DISK_FULL);
+    }
+    return receiver_.Answers();
+  }
+
+  void PrintSummary() {
+    constexpr std::uint64_t kMsPerSecond = 1000;
+    std::string text = std::to_string(summary_.downloaded) + " downloaded, " +
+                       std::to_string(summary_.present) + " here already, " +
+                       std::to_string(summary_.failed) + " failed";
+    if (summary_.untried > 0) text += ", " + std::to_string(summary_.untried) + " not tried";
+    if (options_.deletes) text += ", " + std::to_string(summary_.deleted) + " deleted";
+    context_.PrintDone(text + "; " + FormatDuration(total_.elapsed_ms / kMsPerSecond) + "\n");
+  }
+
+  Outcome Finish() {
+    report_.SetComplete(doubt_);
+    Outcome outcome = std::move(report_).Finish();
+    outcome.document["folder"] = ToUtf8(options_.folder);
+    outcome.document["summary"] = {{"downloaded", summary_.downloaded},
+                                   {"present", summary_.present},
+                                   {"failed", summary_.failed},
+                                   {"untried", summary_.untried},
+                                   {"deleted", summary_.deleted}};
+    outcome.exit = doubt_.empty() ? worst_ : Worse(worst_, ExitCode::kFailed);
+    return outcome;
+  }
+
+  Context& context_;
+  const MirrorOptions& options_;
+  Targets targets_;
+  Receiver receiver_;
+  FileReport report_;
+  std::string doubt_;
+  MirrorState total_;
+  std::uint64_t new_bytes_ = 0;  // that the disk needs room for
+  Summary summary_;
+  ExitCode worst_ = ExitCode::kDone;
+  std::vector<std::pair<std::wstring, Json>> done_;
+  std::vector<std::wstring> asked_to_delete_;
+};
+
+class MirrorCommand : public Command {
+ public:
+  using Command::Command;
+
+  void AddOptions(CLI::App& app, Arguments& arguments) override {
+    AddPort(app, arguments);
+    AddText(app, "FOLDER", "Where the files are kept", "", options_.folder, Need::kRequired);
+    AddNames(app,
+             "PATTERN",
+             "Only files of such names, as in *.JPS; without any, all",
+             options_.patterns,
+             0,
+             kMostNames);
+    AddWord<TimeZone>(app,
+                      "--times",
+                      "Keep the receiver's file times, which are utc or local",
+                      "ZONE",
+                      {{"utc", TimeZone::kUtc}, {"local", TimeZone::kLocal}},
+                      options_.times);
+    AddFlag(app, "--verify", "Download each file twice and compare", options_.verify);
+    AddFlag(app,
+            "--then-delete",
+            "Delete files on the receiver that a second download verified",
+            options_.deletes);
+  }
+
+  void Check() const override {
+    CheckNames(options_.patterns);
+    if (options_.folder.empty()) throw UsageError("the folder's name is empty");
+  }
+
+  Outcome Run(Context& context) override {
+    MirrorOptions options = options_;
+    options.verify = options.verify || options.deletes;
+    return MirrorRun(context, options).Run();
+  }
+
+ private:
+  MirrorOptions options_;
+};
+
+}  // namespace
+
+std::unique_ptr<Command> MakeMirror() {
+  return std::make_unique<MirrorCommand>(Command::Text{
+      "mirror",
+      "Bring a folder up to date with the receiver's files",
+      "Files that are missing, or differ in size, are downloaded. One that failed stops no other;\n"
+      "the exit code is that of the worst. A file of this computer is replaced only when it is "
+      "the\n"
+      "beginning of the receiver's, as of a log that has grown.\n"
+      "Examples:\n"
+      "  rcvlink-cli mirror COM7 D:\\survey\n"
+      "  rcvlink-cli mirror COM7 D:\\survey *.JPS --times utc --then-delete"});
+}
+
+}  // namespace cli

@@ -1,0 +1,100 @@
+#include "mirror_file.h"
+
+#include <utility>
+
+#include "destination.h"
+#include "download.h"
+#include "local_files.h"
+#include "part_file.h"
+#include "paths.h"
+#include "text.h"
+
+namespace cli {
+namespace {
+
+Failure Difference(const MirrorJob& job, std::string meaning, std::string hint) {
+  return {.tried = "mirror " + Printable(job.file.name),
+          .code = ResultOfWin32(ERROR_CRC),
+          .meaning = std::move(meaning),
+          .hint = std::move(hint)};
+}
+
+/// The place of a download until it may take its name; it vanishes unless it does.
+class NewFile {
+ public:
+  /// @throws Failure when there is a file of that name
+  explicit NewFile(const std::filesystem::path& target) : path_(target.native() + L".new") {
+    if (!Exists(path_)) return;
+    Failure failure = LocalFailure("make " + Printable(path_.native()), ERROR_FILE_EXISTS);
+    failure.hint = "A mirror that was cut off left it, or another one is at work here; delete it.";
+    throw failure;
+  }
+  ~NewFile() { DeleteFileW(path_.c_str()); }
+  NewFile(const NewFile&) = delete;
+  NewFile& operator=(const NewFile&) = delete;
+
+  const std::filesystem::path& path() const { return path_; }
+
+ private:
+  std::filesystem::path path_;
+};
+
+std::string DownloadNew(Context& context, Receiver& receiver, const MirrorJob& job, bool verify) {
+  const NewFile file(job.target);
+  std::string sha256;
+  {
+    // What an earlier mirror kept of the file is out of date.
+    PartFile part(file.path(), /*overwrite=*/true);
+    sha256 = Download(context, receiver, job.file, part, {.verify = verify}).sha256;
+  }
+  const bool replaces = Exists(job.target);
+  if (replaces && !context.arguments.force && !BeginsWith(file.path(), job.target)) {
+    throw Difference(job,
+                     "the file of that name on this computer is another one, not its beginning",
+                     "Move that file away, or say --force to replace it.");
+  }
+  MoveOver(file.path(), job.target);
+  return sha256;
+}
+
+std::string Compare(Context& context, Receiver& receiver, const MirrorJob& job) {
+  Nowhere nowhere;
+  const std::string sha256 = Download(context, receiver, job.file, nowhere, {}).sha256;
+  if (sha256.empty() || sha256 != Sha256Of(job.target)) {
+    throw Difference(job,
+                     "the file on this computer has the same size, but other bytes",
+                     "Move that file away, and mirror it again.");
+  }
+  return sha256;
+}
+
+}  // namespace
+
+std::string Mirror(Context& context, Receiver& receiver, const MirrorJob& job, bool verify) {
+  switch (job.step) {
+    case MirrorStep::kNothing:
+      break;
+    case MirrorStep::kDownload:
+      return DownloadNew(context, receiver, job, verify);
+    case MirrorStep::kCompare:
+      return Compare(context, receiver, job);
+    case MirrorStep::kMakeEmpty:
+      if (Exists(job.target) && !context.arguments.force) {
+        throw Difference(job,
+                         "it has no bytes, but the file of that name on this computer has",
+                         "Move that file away, or say --force to replace it.");
+      }
+      MakeEmpty(job.target);
+      break;
+  }
+  return {};
+}
+
+std::uint64_t BytesOf(const MirrorJob& job, bool verify) {
+  constexpr std::uint64_t kTwice = 2;
+  if (job.step == MirrorStep::kNothing) return 0;
+  const bool twice = verify && job.step == MirrorStep::kDownload;
+  return twice ? kTwice * job.file.size : job.file.size;
+}
+
+}  // namespace cli

@@ -1,0 +1,34 @@
+/// @file mirror_file.h
+/// One file of a mirror.
+#ifndef RCVLINK_CLI_MIRROR_FILE_H_
+#define RCVLINK_CLI_MIRROR_FILE_H_
+
+#include <filesystem>
+#include <string>
+
+#include "context.h"
+#include "mirror_plan.h"
+#include "receiver.h"
+
+namespace cli {
+
+struct MirrorJob {
+  RemoteFile file{};
+  std::filesystem::path target{};
+  MirrorStep step = MirrorStep::kNothing;
+};
+
+/// Brings a file to this computer as its job says. What was there stays whatever fails, and is
+/// replaced only by a file of which it is the beginning, such as a log that has grown since, or with
+/// --force.
+/// @param verify download twice, and keep nothing when the bytes differ
+/// @return the SHA-256 of the file; empty for one without bytes
+/// @throws Failure
+std::string Mirror(Context& context, Receiver& receiver, const MirrorJob& job, bool verify);
+
+/// The bytes that a job moves.
+std::uint64_t BytesOf(const MirrorJob& job, bool verify);
+
+}  // namespace cli
+
+#endif  // RCVLINK_CLI_MIRROR_FILE_H_

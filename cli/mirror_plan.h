@@ -1,0 +1,43 @@
+/// @file mirror_plan.h
+/// What a mirror has to do, from sizes alone.
+#ifndef RCVLINK_CLI_MIRROR_PLAN_H_
+#define RCVLINK_CLI_MIRROR_PLAN_H_
+
+#include <cstdint>
+#include <optional>
+#include <string>
+
+#include "results.h"
+
+namespace cli {
+
+enum class MirrorStep {
+  kNothing,    ///< the file is here already
+  kDownload,   ///< it is missing, or differs in size
+  kCompare,    ///< it is here, but is to be deleted on the receiver: only after a second download
+  kMakeEmpty,  ///< it has no bytes, which no protocol transfers
+};
+
+/// @param size bytes that the receiver listed
+/// @param local_size of the file on this computer; nothing when there is none
+/// @param deletes whether files are to be deleted on the receiver
+MirrorStep StepFor(std::uint64_t size, std::optional<std::uint64_t> local_size, bool deletes);
+
+/// The worse of two exit codes: a cancellation says most, a file of this computer least.
+ExitCode Worse(ExitCode first, ExitCode second);
+
+/// How far the files of a mirror are.
+struct MirrorState {
+  std::size_t file = 0;  ///< the present one, from 1
+  std::size_t files = 0;
+  std::uint64_t done = 0;   ///< bytes of the files before it
+  std::uint64_t total = 0;  ///< bytes of all of them
+  std::uint64_t elapsed_ms = 0;
+};
+
+/// "File 3 of 300: A.JPS, 1.2 MB, 5 min 10 s left over all"
+std::string InWords(const MirrorState& state, const std::wstring& name, std::uint64_t size);
+
+}  // namespace cli
+
+#endif  // RCVLINK_CLI_MIRROR_PLAN_H_

@@ -1,0 +1,59 @@
+/// @file search_display.h
+/// What a search for receivers shows while it goes on.
+#ifndef RCVLINK_CLI_SEARCH_DISPLAY_H_
+#define RCVLINK_CLI_SEARCH_DISPLAY_H_
+
+#include <cstdint>
+#include <mutex>
+#include <optional>
+#include <string>
+
+#include "context.h"
+#include "sweep.h"
+#include "ticker.h"
+
+namespace cli {
+
+/// The present try where a bar would be shown, with the time; else a line for each try, as --progress
+/// says.
+/// While it lives, all that the program prints goes through it. For any number of threads.
+class SearchDisplay {
+ public:
+  /// @param ports how many are searched side by side
+  SearchDisplay(Context& context, std::size_t ports);
+
+  /// Takes the line away.
+  ~SearchDisplay();
+  SearchDisplay(const SearchDisplay&) = delete;
+  SearchDisplay& operator=(const SearchDisplay&) = delete;
+
+  /// A try begins.
+  void Begin(const std::wstring& port,
+             std::size_t number,
+             std::size_t count,
+             const LineSetting& line);
+
+  /// As the functions of `Context`.
+  void PrintResult(const std::string& text);
+  void PrintStatus(const std::string& text);
+  void PrintFailure(const Failure& failure);
+
+ private:
+  static constexpr std::chrono::milliseconds kInterval{1000};
+
+  void Draw();
+  void Erase();
+
+  Context& context_;
+  const ProgressMode mode_;
+  const std::size_t ports_;
+  const std::uint64_t start_ms_;
+  std::mutex mutex_;
+  std::string doing_;
+  std::size_t drawn_width_ = 0;
+  std::optional<Ticker> ticker_;  // ends before all that it uses
+};
+
+}  // namespace cli
+
+#endif  // RCVLINK_CLI_SEARCH_DISPLAY_H_
