@@ -224,8 +224,8 @@ RCVLINK_API long OpenReceiver(wchar_t* port, void** receiver);
 RCVLINK_API long CloseReceiver(void* receiver);
 
 /// Closes a receiver by name, for a host that lost its handles. Each receiver of that name loses one
-/// user, until one of them has none left and is removed. What still runs on that one is ended as by
-/// `Abort`; as with `CloseReceiver`, nobody waits for it.
+/// user, until one of them has none left and is removed. The operation that runs on that one is ended
+/// as by `Abort`; as with `CloseReceiver`, nobody waits for it.
 /// @retval S_OK         a receiver was removed
 /// @retval S_FALSE      none was removed
 /// @retval E_INVALIDARG `port` is null

@@ -255,27 +255,6 @@ TEST(ApiAwkwardMoments, VelmarDownloadIsAbortedTwice) {
   EXPECT_THAT(receiver.Sent(), Contains(R"(del file X.log\r)")) << receiver.port.Transcript();
 }
 
-// One works, the other waits for its turn. Nobody can reach either of them to
-// abort it.
-TEST(ApiAwkwardMoments, DestructionEndsAllThatRuns) {
-  bed::SimulatedPort port({"quorin"});
-  std::wstring name = port.name();
-  void* const handle = host::Receiver(port).Release();
-  const host::Report report;
-  port.Pause();
-  auto first = host::OnThread([&] { return Delete(handle); });
-  report.WaitFor(kQuorinReads);
-  const size_t before = report.Lines().size();
-  auto second = host::OnThread([&] { return Delete(handle); });
-  report.WaitFor("CAbstractReceiver::DeleteFile", before);
-  EXPECT_EQ(devapi::DestroyReceiver(name.data()), S_OK);
-  EXPECT_TRUE(EndsSoon(first));
-  EXPECT_TRUE(EndsSoon(second));
-  EXPECT_EQ(first.get(), S_FALSE);
-  EXPECT_EQ(second.get(), S_FALSE);
-  port.Resume();
-}
-
 // A receiver that never answers the command that raises its speed.
 TEST(ApiAwkwardMoments, AbortEndsTheRaisingOfTheSpeed) {
   host::Velmar receiver({"--mute", "COM"}, {{"A.log", "content"}});
