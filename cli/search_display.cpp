@@ -35,7 +35,7 @@ void SearchDisplay::Begin(const std::wstring& port,
   if (ports_ == 1) doing_ = text;
   if (mode_ == ProgressMode::kBar) Draw();
   if (mode_ == ProgressMode::kLines && !one_try) context_.err.Write(text + "\n");
-  if (mode_ == ProgressMode::kJson) {
+  if (mode_ == ProgressMode::kJson && !one_try) {
     const Json json = {{"port", ToUtf8(port)},
                        {"try", number},
                        {"tries", count},

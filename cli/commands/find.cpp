@@ -122,7 +122,7 @@ class Find : public Command {
   /// A COM port is on a serial line whatever --link says, so that both links can be named together.
   std::vector<SearchPlace> NamedPlaces(const Arguments& arguments) const {
     std::vector<std::wstring> names = {arguments.port};
-    std::copy(more_.begin(), more_.end(), std::back_inserter(names));
+    std::transform(more_.begin(), more_.end(), std::back_inserter(names), PlainPortName);
     std::vector<SearchPlace> places;
     for (const std::wstring& name : names) {
       const bool twice = std::any_of(places.begin(), places.end(), [&](const SearchPlace& place) {
