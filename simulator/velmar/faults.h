@@ -13,8 +13,8 @@ namespace sim {
 
 enum class VelmarChunkFaultKind {
   kDamagedCrc,
-  kFlippedBit,     // The last bit of the data is wrong on the wire; the CRC is that of the right one.
-  kWrongSync,      // The first of the three sync bytes is right, the others are not; the CRC fits.
+  kFlippedBit,  // The last bit of the data is wrong on the wire; the CRC is that of the right one.
+  kWrongSync,   // The first of the three sync bytes is right, the others are not; the CRC fits.
   kMessageLength,  // The header says `amount`, the body is as ever; the CRC fits.
   kBodyLength,     // The body has `amount` bytes, cut off or filled up with 0; header and CRC fit.
   kHeaderLength,   // The header says that it has `amount` bytes; the CRC fits.

@@ -92,7 +92,8 @@ long CreateReceiverOnSerial(
     Trace(L"CreateReceiverOnSerial - opening serial port [%s]\r\n", port);
     ThrowIfFailed(connection->Open(port, settings));
     std::unique_ptr<CIProtocol> driver;
-    const HRESULT find_result = FindDriver(std::move(connection), port, protocol, abortEvent, driver);
+    const HRESULT find_result =
+        FindDriver(std::move(connection), port, protocol, abortEvent, driver);
     if (find_result != S_OK) return find_result;
     return Register(L"CreateReceiverOnSerial", port, std::move(driver), receiver);
   });
