@@ -17,6 +17,7 @@ CommandPointer MakeMove();
 CommandPointer MakeSet();
 CommandPointer MakeCheck();
 CommandPointer MakeExplain();
+CommandPointer MakeReport();
 
 Commands MakeCommands() {
   constexpr std::array kTable = {MakePorts,
@@ -28,7 +29,8 @@ Commands MakeCommands() {
                                  MakeMove,
                                  MakeSet,
                                  MakeCheck,
-                                 MakeExplain};
+                                 MakeExplain,
+                                 MakeReport};
   Commands commands;
   for (const auto make : kTable) commands.push_back(make());
   return commands;
