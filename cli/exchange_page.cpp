@@ -36,6 +36,7 @@ svg { width: 100%; height: auto; display: block; }
 svg text { fill: var(--weak); font: 12px system-ui, "Segoe UI", sans-serif; }
 svg rect { stroke: var(--back); stroke-width: .6; }
 svg .grid { stroke: var(--line); }
+svg, table { min-width: 46rem; }
 table { border-collapse: collapse; width: 100%; table-layout: fixed; }
 th { text-align: left; color: var(--weak); font-weight: 600; position: sticky; top: 0;
   background: var(--back); }
@@ -225,7 +226,6 @@ std::string_view SignOf(TraceKind kind) {
     case TraceKind::kCancel:
     case TraceKind::kCommand:
     case TraceKind::kSend:
-    case TraceKind::kBlocks:
       return "&rarr;";
     case TraceKind::kDone:
     case TraceKind::kReply:

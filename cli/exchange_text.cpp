@@ -65,7 +65,6 @@ std::string PartiesOf(TraceKind kind) {
       return "host <- library";
     case TraceKind::kCommand:
     case TraceKind::kSend:
-    case TraceKind::kBlocks:
     case TraceKind::kRetry:
       return "library -> receiver";
     case TraceKind::kReply:

@@ -151,7 +151,7 @@ constexpr std::array kPatterns = {
             TraceKind::kFailure,
             "the receiver says that %2 is empty, or does not tell its size"},
     Pattern{"*::DownloadFile - file size [*] is * bytes", TraceKind::kReply, "%2 has %3 bytes"},
-    Pattern{"*::DownloadOver* - read timeout*", TraceKind::kRead, "so the block is missing"},
+    Pattern{"*::DownloadOver* - read timeout*", TraceKind::kBlocks, "a block is missing"},
     Pattern{
         "*::DownloadOver* - download is cancelled", TraceKind::kCancel, "the transfer was aborted"},
     Pattern{"*::DownloadOver* - recognisable byte is 0x23",

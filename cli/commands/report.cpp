@@ -64,7 +64,14 @@ void WritePage(const std::filesystem::path& path, const std::string& page, bool 
                                     force ? CREATE_ALWAYS : CREATE_NEW,
                                     FILE_ATTRIBUTE_NORMAL,
                                     nullptr);
-  if (opened == INVALID_HANDLE_VALUE) throw LocalFailure(tried, GetLastError());
+  if (opened == INVALID_HANDLE_VALUE) {
+    Failure failure = LocalFailure(tried, GetLastError());
+    if (failure.code == ResultOfWin32(ERROR_FILE_EXISTS)) {
+      failure.meaning = "it exists already";
+      failure.hint = "--force replaces it, --html with another name keeps it.";
+    }
+    throw failure;
+  }
   const UniqueHandle file(opened);
   DWORD written = 0;
   if (WriteFile(file.get(), page.data(), static_cast<DWORD>(page.size()), &written, nullptr) ==

@@ -39,6 +39,7 @@ TEST(ExchangeTest, ADownloadOfAQuorinReceiverShowsItsRetries) {
   EXPECT_EQ(exchange.Count(TraceKind::kCommand), 13U);
   EXPECT_EQ(exchange.Count(TraceKind::kRetry), 3U);
   EXPECT_EQ(exchange.Count(TraceKind::kTimeout), 1U);
+  EXPECT_EQ(exchange.Count(TraceKind::kReply), 10U);  // eight, the size, the end of the blocks
   EXPECT_EQ(exchange.Count(TraceKind::kFailure), 0U);
   EXPECT_EQ(exchange.DurationMs(), 10'334U);
   EXPECT_EQ(exchange.Codes(), std::vector{ResultOfWin32(ERROR_TIMEOUT)});

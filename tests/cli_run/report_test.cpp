@@ -28,7 +28,7 @@ TEST_F(Cli, AReportBecomesAnExchangeAndAPage) {
   folder.Write("page.html", "another's");
   const auto refused = Run({"report", name, "--html", "page.html"});
   EXPECT_EQ(refused.status, kLocalFile);
-  EXPECT_THAT(refused.errors, HasSubstr("the file exists already"));
+  EXPECT_THAT(refused.errors, HasSubstr("it exists already"));
   EXPECT_EQ(folder.Read("page.html"), "another's");
   EXPECT_EQ(Run({"report", name, "--html", "page.html", "--force"}).status, kDone);
   EXPECT_THAT(folder.Read("page.html"), HasSubstr("what model are you?"));
