@@ -18,6 +18,7 @@ CommandPointer MakeMove();
 CommandPointer MakeSet();
 CommandPointer MakeCheck();
 CommandPointer MakeExplain();
+CommandPointer MakeReport();
 
 Commands MakeCommands() {
   constexpr std::array kTable = {MakePorts,
@@ -30,7 +31,8 @@ Commands MakeCommands() {
                                  MakeMove,
                                  MakeSet,
                                  MakeCheck,
-                                 MakeExplain};
+                                 MakeExplain,
+                                 MakeReport};
   Commands commands;
   for (const auto make : kTable) commands.push_back(make());
   return commands;

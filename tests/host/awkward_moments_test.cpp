@@ -238,7 +238,8 @@ TEST(ApiAwkwardMoments, QuorinDownloadIsAbortedWithItsLastBlock) {
 // The second abort ends a wait of the put-back. The next command is heard all
 // the same.
 TEST(ApiAwkwardMoments, VelmarDownloadIsAbortedTwice) {
-  host::Velmar receiver({"--pace", "--reply-silence", "0.3:COM"},
+  // In pieces with pauses between them, for time to abort; answers come whole.
+  host::Velmar receiver({"--pieces", "1000", "--piece-gap", "50", "--reply-silence", "0.3:COM"},
                         {{"A.log", host::Content(600000)}});
   host::MemoryStream stream;
   auto download = host::OnThread([&] { return receiver.Download(L"A.log", stream); });

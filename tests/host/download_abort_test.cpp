@@ -204,6 +204,7 @@ TEST_F(ApiDownloadAbort, ManyTimesIsLikeOnce) {
   port_.WaitForTranscript(" seq=3 ");
   for (int i = 0; i < 100; ++i) Abort();
   EXPECT_EQ(download.get(), S_FALSE);
+  port_.WaitForTranscript("= speed 9600\n");  // nobody waited for the receiver to hear it
   ExpectEnded();
 }
 

@@ -1,0 +1,62 @@
+/// @file exchange.h
+/// A report as an exchange between the host, the library and a receiver.
+#ifndef RCVLINK_CLI_EXCHANGE_H_
+#define RCVLINK_CLI_EXCHANGE_H_
+
+#include <cstddef>
+#include <cstdint>
+#include <optional>
+#include <string>
+#include <string_view>
+#include <vector>
+
+#include "trace_words.h"
+
+namespace cli {
+
+/// How a command or the blocks of a file ended.
+enum class ExchangeEnd {
+  kUntold,  ///< no reply is waited for, or the report ends before
+  kReply,   ///< something came that the library was content with
+  kTimeout,
+  kFailure,
+  kCancelled,
+};
+
+struct ExchangeEntry {
+  std::uint32_t ms_of_day = 0;
+  std::uint64_t elapsed_ms = 0;  ///< since the report's first line
+  std::uint64_t since_ms =
+      0;  ///< since the entry before that is no kSend, which is not always shown
+  std::uint32_t thread = 0;
+  TraceKind kind = TraceKind::kNote;
+  std::string text{};     ///< the line, printable UTF-8; empty for a reply, which has no line
+  std::string meaning{};  ///< printable UTF-8
+  std::optional<long> code{};
+  std::optional<std::uint64_t> until_ms{};  ///< commands and blocks: when they ended, as elapsed_ms
+  ExchangeEnd end = ExchangeEnd::kUntold;
+};
+
+struct Exchange {
+  std::vector<ExchangeEntry> entries{};
+  std::vector<std::string> remarks{};  ///< what is wrong with the report, as sentences
+
+  std::size_t Count(TraceKind kind) const;
+  std::uint64_t DurationMs() const;
+  /// The result codes that it tells, each once.
+  std::vector<long> Codes() const;
+};
+
+/// "12:30:01.250"
+std::string TimeOfDay(std::uint32_t ms_of_day);
+
+/// What a code means, as docs/troubleshooting.md says it, or Windows.
+std::string TitleOf(long code);
+
+/// Reads a report; as much of it as can be read. Without any stamp in it there are no entries.
+/// @param code_page of text that is not UTF-8
+Exchange ReadExchange(std::string_view report, unsigned code_page);
+
+}  // namespace cli
+
+#endif  // RCVLINK_CLI_EXCHANGE_H_

@@ -1,0 +1,31 @@
+/// @file exchange_text.h
+/// An exchange as lines for a person.
+#ifndef RCVLINK_CLI_EXCHANGE_TEXT_H_
+#define RCVLINK_CLI_EXCHANGE_TEXT_H_
+
+#include <cstdint>
+#include <string>
+
+#include "exchange.h"
+
+namespace cli {
+
+/// "host -> library": who says it to whom; empty for what nobody says.
+std::string PartiesOf(TraceKind kind);
+
+/// Whether a reader looks for it: retries, silences and failures.
+bool IsTrouble(TraceKind kind);
+
+/// "+15 ms", "+2.5 s"; empty for no time.
+std::string Gap(std::uint64_t ms);
+
+/// "5 s, 14 commands, 2 retries, 1 silence, no failures"
+std::string Summary(const Exchange& exchange);
+
+/// Every entry, the summary, and the result codes with their meaning.
+/// @param verbose also the lines of the report themselves
+std::string ToText(const Exchange& exchange, bool verbose);
+
+}  // namespace cli
+
+#endif  // RCVLINK_CLI_EXCHANGE_TEXT_H_

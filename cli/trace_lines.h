@@ -1,0 +1,33 @@
+/// @file trace_lines.h
+/// The lines of a report, as the library wrote them.
+#ifndef RCVLINK_CLI_TRACE_LINES_H_
+#define RCVLINK_CLI_TRACE_LINES_H_
+
+#include <cstddef>
+#include <cstdint>
+#include <string>
+#include <string_view>
+#include <vector>
+
+namespace cli {
+
+struct TraceLine {
+  std::uint32_t ms_of_day = 0;
+  std::uint32_t thread = 0;
+  std::string bytes{};   ///< behind the stamp, without the line end; in the writer's code page
+  bool has_end = false;  ///< whether there was a line end
+};
+
+struct TraceLines {
+  std::vector<TraceLine> lines{};
+  std::size_t bytes_before = 0;  ///< how many bytes stand in front of the first stamp
+};
+
+/// Takes a report apart at its stamps, "hh:mm:ss.mmmm thread ". Lines without a stamp belong to the
+/// one before: receivers' replies have line ends in them. A line with bytes beyond ASCII may have
+/// lost its end, so that the next stamp stands in it.
+TraceLines SplitTrace(std::string_view report);
+
+}  // namespace cli
+
+#endif  // RCVLINK_CLI_TRACE_LINES_H_

@@ -1,0 +1,54 @@
+/// @file trace_words.h
+/// What the lines of a report mean, each by itself.
+#ifndef RCVLINK_CLI_TRACE_WORDS_H_
+#define RCVLINK_CLI_TRACE_WORDS_H_
+
+#include <optional>
+#include <string>
+#include <string_view>
+
+namespace cli {
+
+enum class TraceKind {
+  kNote,     ///< nothing that is known, or about the report itself
+  kHost,     ///< the program calls the library
+  kLink,     ///< a port is opened, set or closed
+  kLock,     ///< a receiver is locked or unlocked
+  kCommand,  ///< a command for the receiver
+  kSend,     ///< the line is emptied and the command sent
+  kRead,     ///< the reply is waited for
+  kReply,    ///< it came
+  kBlocks,   ///< the blocks of a file
+  kRetry,    ///< a block is asked for again
+  kTimeout,  ///< silence
+  kFailure,
+  kCancel,
+  kDone,
+};
+
+/// "command": what programs are given.
+std::string_view NameOf(TraceKind kind);
+
+struct TraceWords {
+  TraceKind kind = TraceKind::kNote;
+  std::string meaning{};
+  std::optional<long> code{};  ///< the result code that the line tells
+};
+
+/// @param line a line without its stamp, printable
+TraceWords WordsOf(std::string_view line);
+
+enum class TraceFamily { kUnknown, kQuorin, kVelmar };
+
+/// The family of receivers that a line is about.
+TraceFamily FamilyOf(std::string_view line);
+
+/// What a command asks for, and its text on the wire, by the name of its class.
+std::string CommandMeaning(std::string_view class_name, TraceFamily family);
+
+/// The class of a line that tells that a command was made; empty for another line.
+std::string_view CommandClass(std::string_view line);
+
+}  // namespace cli
+
+#endif  // RCVLINK_CLI_TRACE_WORDS_H_
