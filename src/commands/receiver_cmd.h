@@ -56,7 +56,7 @@ class CReceiverCmd {
   virtual void Cancel();
 
   // Makes Execute send the command whole once it begins: an abort then ends only the wait for the
-  // reply. For commands after which the receiver must be in a known state.
+  // reply. Half a line would stand in front of the next command.
   void SendWhole() { sends_whole_ = true; }
 
  protected:

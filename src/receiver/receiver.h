@@ -38,7 +38,7 @@ class CIReceiver {
   virtual HRESULT DCSetRcvStopbits(BYTE stop_bits) = 0;
   virtual HRESULT SetProgressCallback(ProgressFunction function, void* context) = 0;
   // Ends the operations that are running, as Abort does but without its report line: for a receiver
-  // that goes while they run. The library's own, behind the operations of hosts.
+  // that goes while they run. The library's own, after the operations of hosts.
   virtual void Stop() = 0;
 };
 
