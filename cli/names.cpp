@@ -103,4 +103,8 @@ bool IsComPort(std::wstring_view name) {
          name.find_first_not_of(L"0123456789", kPrefix.size()) == std::wstring_view::npos;
 }
 
+bool LooksLikePort(std::wstring_view name) {
+  return name.starts_with(L"\\\\") || IsComPort(PlainPortName(name));
+}
+
 }  // namespace cli

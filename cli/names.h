@@ -39,6 +39,10 @@ std::wstring PlainPortName(std::wstring_view name);
 /// Whether the name is COM and a number, in any letter case.
 bool IsComPort(std::wstring_view name);
 
+/// Whether the name is a COM port's in one of the ways in which people write it, or the path of a
+/// device.
+bool LooksLikePort(std::wstring_view name);
+
 }  // namespace cli
 
 #endif  // RCVLINK_CLI_NAMES_H_

@@ -54,8 +54,9 @@ std::string Unmarked(const std::string& word) {
 
 void AddPort(CLI::App& app, Arguments& arguments, Need need) {
   // The parser's own means would let the environment win over a positional.
-  if (const char* const port = std::getenv("RCVLINK_PORT"); port != nullptr) {
-    arguments.port = ToUtf16(port);
+  const char* const usual = std::getenv("RCVLINK_PORT");
+  if (usual != nullptr) {
+    arguments.port = ToUtf16(usual);
     need = Need::kOptional;
   }
   AddText(app,
@@ -64,6 +65,14 @@ void AddPort(CLI::App& app, Arguments& arguments, Need need) {
           "",
           arguments.port,
           need);
+  if (usual == nullptr) return;
+  // In `get LOG1.DAT` the first word is then no port: the parser takes it for the next argument.
+  app.validate_positionals();
+  app.get_option("PORT")->check(
+      [](const std::string& word) {
+        return LooksLikePort(AsTyped(word)) ? "" : Printable(AsTyped(word)) + " names no port";
+      },
+      "");
 }
 
 void AddNames(CLI::App& app,

@@ -266,6 +266,24 @@ TEST(CommandLineTest, TheEnvironmentIsAsked) {
   EXPECT_EQ(Parse({"find", "COM8", "--speed", "9600"}).arguments.speed, 9600U);
 }
 
+// The first word of a command is its port when it can be one.
+TEST(CommandLineTest, ThePortOfTheEnvironmentLeavesNamesAlone) {
+  const Variable port("RCVLINK_PORT", "COM7");
+  EXPECT_EQ(Parse({"get", "a.jps"}).arguments.port, L"COM7");
+  EXPECT_EQ(Parse({"get", "b.jps", "a.jps"}).arguments.port, L"COM7");
+  EXPECT_EQ(Parse({"get", "com8:", "a.jps"}).arguments.port, L"COM8");
+  EXPECT_EQ(Parse({"get", R"(\\?\usb#1)", "a.jps"}).arguments.port, LR"(\\?\usb#1)");
+  EXPECT_EQ(Parse({"mv", "a", "b"}).arguments.port, L"COM7");
+  EXPECT_EQ(Parse({"mirror", "D:\\survey", "*.JPS"}).arguments.port, L"COM7");
+  EXPECT_EQ(Parse({"ls"}).arguments.port, L"COM7");
+  EXPECT_EQ(Refusal({"ls", "a.jps"}).exit, ExitCode::kUsage);
+}
+
+TEST(CommandLineTest, SkippingNeedsFilesThatCanBeHere) {
+  EXPECT_EQ(Refusal({"get", "COM7", "a", "-o", "NUL", "--skip-existing"}).exit, ExitCode::kUsage);
+  EXPECT_EQ(Refusal({"get", "COM7", "*.jps", "-o", "-"}).exit, ExitCode::kUsage);
+}
+
 TEST(CommandLineTest, AFileHasOptionsToo) {
   const TemporaryFolder folder;
   folder.Write(L"my.ini", "speed = 57600\njson = true\nprogress = none\n");
