@@ -117,8 +117,9 @@ class MirrorRun {
         MirrorOne(job);
       } catch (const Failure& failure) {
         AddFailed(job.file.name, failure);
-        if (!MayGoOn(failure)) {
-          summary_.untried = jobs.size() - i - 1;
+        const std::size_t untried = jobs.size() - i - 1;
+        if (untried > 0 && !MayGoOn(receiver_, failure)) {
+          summary_.untried = untried;
           report_.AddUntried(summary_.untried);
           break;
         }
@@ -202,15 +203,6 @@ class MirrorRun {
     ++summary_.failed;
     worst_ = Worse(worst_, failure.exit);
     report_.AddFailed(name, failure);
-  }
-
-  /// Whether a failure leaves hope for the next file.
-  bool MayGoOn(const Failure& failure) {
-    if (failure.exit == ExitCode::kCancelled) return false;
-    if (failure.exit == ExitCode::kLocalFile) {
-      return failure.code != ResultOfWin32(ERROR_DISK_FULL);
-    }
-    return receiver_.Answers();
   }
 
   void PrintSummary() {

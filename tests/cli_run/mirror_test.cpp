@@ -173,6 +173,15 @@ TEST_F(Mirror, DeletesOnlyWhatASecondDownloadVerified) {
   EXPECT_EQ(downloads, 4U) << transcript;
 }
 
+TEST_F(Mirror, SaysAtWhichFileItIsAndHowLongAllTake) {
+  const bed::SimulatedPort receiver({"quorin"},
+                                    {{"a.jps", Content(30000)}, {"b.jps", Content(40)}});
+  const auto result = RunMirror(receiver, {});
+  EXPECT_EQ(result.status, kDone) << result.errors;
+  EXPECT_THAT(result.errors, HasSubstr("File 1 of 2: a.jps, 30.0 kB\n"));
+  EXPECT_THAT(result.errors, HasSubstr("File 2 of 2: b.jps, 40 B, 1 s left over all\n"));
+}
+
 TEST_F(Mirror, WithoutThenDeleteNothingIsDeleted) {
   const bed::SimulatedPort receiver({"quorin"}, {{"a.jps", Content(30)}});
   EXPECT_EQ(RunMirror(receiver, {"--verify"}).status, kDone);
