@@ -176,4 +176,10 @@ Downloaded Download(Context& context,
   return {.milliseconds = GetTickCount64() - start_ms, .sha256 = transfer.sha256};
 }
 
+bool MayGoOn(Receiver& receiver, const Failure& failure) {
+  if (failure.exit == ExitCode::kCancelled) return false;
+  if (failure.exit == ExitCode::kLocalFile) return failure.code != ResultOfWin32(ERROR_DISK_FULL);
+  return receiver.Answers();
+}
+
 }  // namespace cli

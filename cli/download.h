@@ -36,6 +36,9 @@ Downloaded Download(Context& context,
                     Destination& destination,
                     const DownloadOptions& options);
 
+/// Whether a failed download leaves hope for the next file: a receiver is asked whether it answers.
+bool MayGoOn(Receiver& receiver, const Failure& failure);
+
 }  // namespace cli
 
 #endif  // RCVLINK_CLI_DOWNLOAD_H_

@@ -96,14 +96,8 @@ std::filesystem::path Targets::ExistingFolder() const {
 }
 
 std::filesystem::path Targets::Choose(const std::wstring& name) {
-  const std::filesystem::path target = PathOf(name);
+  const std::filesystem::path target = FreePathOf(name);
   const std::string shown = Printable(target.native());
-  if (IsTaken(target)) {
-    throw Refusal(name,
-                  ERROR_FILE_EXISTS,
-                  shown + " is the place of another file of this download already",
-                  "Download it by itself, with -o and another name.");
-  }
   if (Exists(target) && (!force_ || IsFolder(target))) {
     throw Refusal(name,
                   ERROR_FILE_EXISTS,
@@ -120,6 +114,24 @@ std::filesystem::path Targets::Choose(const std::wstring& name) {
   }
   chosen_.push_back(target);
   return target;
+}
+
+std::optional<std::filesystem::path> Targets::TakeExisting(const std::wstring& name) {
+  const std::filesystem::path target = FreePathOf(name);
+  if (!Exists(target) || IsFolder(target)) return std::nullopt;
+  chosen_.push_back(target);
+  return target;
+}
+
+/// Names that differ only in case are one name on this computer.
+std::filesystem::path Targets::FreePathOf(const std::wstring& name) const {
+  const std::filesystem::path target = PathOf(name);
+  if (!IsTaken(target)) return target;
+  throw Refusal(
+      name,
+      ERROR_FILE_EXISTS,
+      Printable(target.native()) + " is the place of another file of this download already",
+      "Download it by itself, with -o and another name.");
 }
 
 std::filesystem::path Targets::PathOf(const std::wstring& name) const {

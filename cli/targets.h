@@ -5,6 +5,7 @@
 
 #include <cstdint>
 #include <filesystem>
+#include <optional>
 #include <string>
 #include <vector>
 
@@ -35,12 +36,18 @@ class Targets {
   ///         be overwritten, or an earlier name has taken it
   std::filesystem::path Choose(const std::wstring& name);
 
+  /// The file for a name of the receiver when it is there already, nothing otherwise. Later names
+  /// cannot have it.
+  /// @throws Failure when the name is impossible, or an earlier name has taken the file
+  std::optional<std::filesystem::path> TakeExisting(const std::wstring& name);
+
   /// The folder of all targets; empty for that of a single target named by the user.
   const std::filesystem::path& folder() const { return folder_; }
 
  private:
   std::filesystem::path PathOf(const std::wstring& name) const;
   std::filesystem::path ExistingFolder() const;
+  std::filesystem::path FreePathOf(const std::wstring& name) const;
   bool IsTaken(const std::filesystem::path& target) const;
 
   bool force_;

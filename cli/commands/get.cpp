@@ -1,10 +1,12 @@
 #include <algorithm>
+#include <map>
 #include <optional>
 
 #include "command.h"
 #include "download.h"
 #include "file_report.h"
 #include "formats.h"
+#include "local_files.h"
 #include "names.h"
 #include "options.h"
 #include "part_file.h"
@@ -12,6 +14,7 @@
 #include "receiver.h"
 #include "targets.h"
 #include "text.h"
+#include "wildcard.h"
 
 namespace cli {
 namespace {
@@ -19,103 +22,116 @@ namespace {
 constexpr std::wstring_view kStandardOutput = L"-";
 constexpr std::wstring_view kNullDevice = L"NUL";
 
+struct GetOptions {
+  std::vector<std::wstring> names{};  ///< of files, or patterns of names
+  std::wstring output{};
+  bool all = false;
+  bool skip_existing = false;
+  DownloadOptions download{};
+
+  bool ToStandardOutput() const { return output == kStandardOutput; }
+
+  /// Whether no file of this computer is made.
+  bool IsStream() const { return ToStandardOutput() || SameLocalName(output, kNullDevice); }
+
+  bool IsOneFile() const { return !all && names.size() == 1 && !IsPattern(names.front()); }
+};
+
+/// Where a file goes.
+struct Spot {
+  std::filesystem::path target{};
+  bool is_taken = false;  ///< by a file that stays, so that there is nothing to download
+};
+
 struct Job {
   RemoteFile file;
   std::filesystem::path target;
 };
 
-/// Whether a failed download leaves hope for the next file.
-bool MayGoOn(const Failure& failure) {
-  const bool refused = failure.code == S_OK || failure.code == E_FAIL ||
-                       failure.code == ResultOfWin32(ERROR_CRC) ||
-                       failure.code == ResultOfWin32(ERROR_DEVICE_NOT_CONNECTED);
-  return failure.exit == ExitCode::kFailed && refused;
-}
-
-class Get : public Command {
+/// One execution of `get`. A file that cannot be had or kept stops no other.
+class GetRun {
  public:
-  using Command::Command;
+  GetRun(Context& context, const GetOptions& options)
+      : context_(context),
+        options_(options),
+        targets_({.output = options.IsStream() ? L"" : options.output,
+                  .many = !options.IsOneFile(),
+                  .force = context.arguments.force}),
+        report_(context) {}
 
-  void AddOptions(CLI::App& app, Arguments& arguments) override {
-    AddPort(app, arguments);
-    AddNames(app, "NAME", "Files as `ls` shows them", names_, 0, kMostNames);
-    AddText(app,
-            "-o",
-            "The folder, or the name for a single file; - is the standard output",
-            "PATH",
-            output_);
-    AddFlag(app, "--all", "Every file of the receiver", all_);
-    AddFlag(app, "--verify", "Download twice and compare", download_.verify);
-    AddFlag(app,
-            "--keep-partial",
-            "Keep what came of a failed download, as NAME.part",
-            download_.keep_partial);
-  }
-
-  void Check() const override {
-    CheckNames(names_);
-    if (output_ == kStandardOutput && (all_ || names_.size() != 1)) {
-      throw UsageError("-o - takes a single file");
-    }
-    if (all_ == !names_.empty()) throw UsageError("get needs either the names of files or --all");
-  }
-
-  Outcome Run(Context& context) override {
-    const bool force = context.arguments.force;
-    if (output_ == kStandardOutput && context.arguments.json) {
-      throw UsageError("-o - and --json both need the standard output");
-    }
-    Targets targets(
-        {.output = IsStream() ? L"" : output_, .many = all_ || names_.size() > 1, .force = force});
-    std::vector<std::filesystem::path> named;
+  Outcome Run() {
     // What is wrong on this computer is told before a search that may take minutes.
-    if (!IsStream()) targets.CheckFolder();
-    for (const std::wstring& name : names_) {
-      named.push_back(IsStream() ? std::filesystem::path(output_) : targets.Choose(name));
-    }
-    Receiver receiver(context);
+    if (!options_.IsStream()) targets_.CheckFolder();
+    const std::vector<std::wstring> wishes = Wishes();
+    if (!options_.all && wishes.empty()) return std::move(report_).Finish();
+    Receiver receiver(context_);
     const Directory directory = receiver.ListFiles();
-    FileReport report(context);
-    const std::vector<Job> jobs = all_ ? AllJobs(receiver, targets, directory.files, report)
-                                       : NamedJobs(receiver, named, directory.files);
-    if (!IsStream()) CheckRoom(targets, jobs);
-    if (!IsStream() && !jobs.empty()) MakeFolder(targets.folder());
-    DownloadAll(context, receiver, jobs, report);
-    if (all_) report.SetComplete(directory.doubt);
-    if (all_ && directory.files.empty()) context.PrintDone("The receiver lists no files.\n");
-    return std::move(report).Finish();
+    const std::vector<RemoteFile> files =
+        options_.all ? directory.files : Wanted(wishes, directory.files);
+    const std::vector<Job> jobs = Plan(receiver, files);
+    if (!options_.IsStream()) CheckRoom(jobs);
+    if (!options_.IsStream() && !jobs.empty()) MakeFolder(targets_.folder());
+    DownloadAll(receiver, jobs);
+    if (options_.all) report_.SetComplete(directory.doubt);
+    if (options_.all && files.empty()) context_.PrintDone("The receiver lists no files.\n");
+    return std::move(report_).Finish();
   }
 
  private:
-  bool IsStream() const {
-    return output_ == kStandardOutput || SameLocalName(output_, kNullDevice);
-  }
-
-  std::unique_ptr<Destination> Open(Context& context, const Job& job) const {
-    if (output_ == kStandardOutput) return std::make_unique<ToOutput>(context.out);
-    if (IsStream()) return std::make_unique<Nowhere>();
-    return std::make_unique<PartFile>(job.target, context.arguments.force);
-  }
-
-  /// The files named by the user, checked before anything is transferred.
-  std::vector<Job> NamedJobs(Receiver& receiver,
-                             const std::vector<std::filesystem::path>& targets,
-                             const std::vector<RemoteFile>& files) const {
-    std::vector<Job> jobs;
-    for (std::size_t i = 0; i < targets.size(); ++i) {
-      const std::wstring& name = names_[i];
-      const RemoteFile& file = FindFile(files, name, "download " + Printable(name));
-      CheckSize(receiver, file);
-      jobs.push_back({file, targets[i]});
+  /// The names and patterns of the command line, without names that no file here can have.
+  std::vector<std::wstring> Wishes() {
+    std::vector<std::wstring> wishes;
+    for (const std::wstring& name : options_.names) {
+      if (std::find(wishes.begin(), wishes.end(), name) != wishes.end()) continue;
+      try {
+        if (!IsPattern(name)) spots_.emplace(name, Choose(name));
+        wishes.push_back(name);
+      } catch (const Failure& failure) {
+        report_.AddFailed(name, failure);
+      }
     }
-    return jobs;
+    return wishes;
   }
 
-  /// All files of the receiver; what cannot be had or kept is left out and reported.
-  std::vector<Job> AllJobs(Receiver& receiver,
-                           Targets& targets,
-                           const std::vector<RemoteFile>& files,
-                           FileReport& report) const {
+  Spot Choose(const std::wstring& name) {
+    if (options_.IsStream()) return {.target = options_.output};
+    if (options_.skip_existing) {
+      if (const auto existing = targets_.TakeExisting(name)) {
+        return {.target = *existing, .is_taken = true};
+      }
+    }
+    return {.target = targets_.Choose(name)};
+  }
+
+  /// The receiver's files that were named, each once.
+  /// @throws Failure when there is none for one of the names: nothing is transferred then
+  static std::vector<RemoteFile> Wanted(const std::vector<std::wstring>& wishes,
+                                        const std::vector<RemoteFile>& files) {
+    std::vector<RemoteFile> wanted;
+    const auto add = [&wanted](const RemoteFile& file) {
+      if (!HasFile(wanted, file.name)) wanted.push_back(file);
+    };
+    for (const std::wstring& wish : wishes) {
+      if (!IsPattern(wish)) {
+        add(FindFile(files, wish, "download " + Printable(wish)));
+        continue;
+      }
+      const auto fits = [&wish](const RemoteFile& file) { return FitsPattern(file.name, wish); };
+      if (std::none_of(files.begin(), files.end(), fits)) {
+        throw Failure{.tried = "download " + Printable(wish),
+                      .code = ResultOfWin32(ERROR_FILE_NOT_FOUND),
+                      .meaning = "the receiver has no file of such a name",
+                      .hint = "`rcvlink-cli ls` shows the files."};
+      }
+      for (const RemoteFile& file : files) {
+        if (fits(file)) add(file);
+      }
+    }
+    return wanted;
+  }
+
+  /// What is to be transferred. What cannot be had or kept is left out and reported.
+  std::vector<Job> Plan(Receiver& receiver, const std::vector<RemoteFile>& files) {
     std::vector<Job> jobs;
     for (const RemoteFile& file : files) {
       try {
@@ -124,70 +140,153 @@ class Get : public Command {
                         .code = E_INVALIDARG,
                         .meaning = *reason};
         }
+        const auto chosen = spots_.extract(file.name);
+        const Spot spot = chosen ? chosen.mapped() : Choose(file.name);
+        if (spot.is_taken) {
+          Skip(file, spot.target);
+          continue;
+        }
         CheckSize(receiver, file);
-        jobs.push_back(
-            {file, IsStream() ? std::filesystem::path(output_) : targets.Choose(file.name)});
+        jobs.push_back({file, spot.target});
       } catch (const Failure& failure) {
-        report.AddFailed(file.name, failure);
+        report_.AddFailed(file.name, failure);
       }
     }
     return jobs;
   }
 
-  static void CheckRoom(const Targets& targets, const std::vector<Job>& jobs) {
-    std::uint64_t total = 0;
-    for (const Job& job : jobs) total += job.file.size;
-    targets.CheckRoom(total);
+  /// A file that is here stays as it is; that it has another size is not kept quiet.
+  void Skip(const RemoteFile& file, const std::filesystem::path& target) {
+    const std::uint64_t here = SizeOf(target).value_or(0);
+    report_.AddDone(file.name,
+                    {{"path", ToUtf8(target.native())}, {"bytes", here}, {"skipped", true}});
+    const std::string start = Printable(file.name) + ": is here already";
+    if (here == file.size) {
+      context_.PrintDone(start + "\n");
+    } else {
+      context_.PrintWarning(start + ", with " + std::to_string(here) +
+                            " bytes; the receiver lists " + std::to_string(file.size) + "\n");
+    }
   }
 
-  void DownloadAll(Context& context,
-                   Receiver& receiver,
-                   const std::vector<Job>& jobs,
-                   FileReport& report) const {
+  void CheckRoom(const std::vector<Job>& jobs) const {
+    std::uint64_t total = 0;
+    for (const Job& job : jobs) total += job.file.size;
+    targets_.CheckRoom(total);
+  }
+
+  std::unique_ptr<Destination> Open(const Job& job) const {
+    if (options_.ToStandardOutput()) return std::make_unique<ToOutput>(context_.out);
+    if (options_.IsStream()) return std::make_unique<Nowhere>();
+    return std::make_unique<PartFile>(job.target, context_.arguments.force);
+  }
+
+  void DownloadAll(Receiver& receiver, const std::vector<Job>& jobs) {
     for (std::size_t i = 0; i < jobs.size(); ++i) {
-      const Job& job = jobs[i];
+      const std::size_t untried = jobs.size() - i - 1;
       try {
-        const auto destination = Open(context, job);
-        const Downloaded downloaded =
-            Download(context, receiver, job.file, *destination, download_);
-        PrintDownload(context, job, downloaded);
-        report.AddDone(job.file.name,
-                       {{"path", ToUtf8(job.target.native())},
-                        {"bytes", job.file.size},
-                        {"milliseconds", downloaded.milliseconds},
-                        {"sha256", downloaded.sha256},
-                        {"verified", download_.verify}});
+        DownloadOne(receiver, jobs[i]);
       } catch (const Failure& failure) {
-        report.AddFailed(job.file.name, failure);
-        if (MayGoOn(failure)) continue;
-        report.AddUntried(jobs.size() - i - 1);
+        report_.AddFailed(jobs[i].file.name, failure);
+        if (untried == 0 || MayGoOn(receiver, failure)) continue;
+        report_.AddUntried(untried);
         return;
       }
     }
   }
 
-  void PrintDownload(Context& context, const Job& job, const Downloaded& downloaded) const {
+  void DownloadOne(Receiver& receiver, const Job& job) {
+    const auto destination = Open(job);
+    const Downloaded downloaded =
+        Download(context_, receiver, job.file, *destination, options_.download);
+    PrintDownload(job, downloaded);
+    report_.AddDone(job.file.name,
+                    {{"path", ToUtf8(job.target.native())},
+                     {"bytes", job.file.size},
+                     {"milliseconds", downloaded.milliseconds},
+                     {"sha256", downloaded.sha256},
+                     {"verified", options_.download.verify}});
+  }
+
+  void PrintDownload(const Job& job, const Downloaded& downloaded) {
     constexpr std::uint64_t kMsPerSecond = 1000;
     std::string text = Printable(job.file.name) + ": " + std::to_string(job.file.size) +
                        " bytes in " + FormatDuration(downloaded.milliseconds / kMsPerSecond) +
                        " -> " + Printable(job.target.native()) + "\n";
-    if (context.arguments.verbose) text += "  SHA-256 " + downloaded.sha256 + "\n";
-    if (output_ == kStandardOutput) {
-      context.PrintStatus(text);
+    if (context_.arguments.verbose) text += "  SHA-256 " + downloaded.sha256 + "\n";
+    if (options_.ToStandardOutput()) {
+      context_.PrintStatus(text);
     } else {
-      context.PrintDone(text);
+      context_.PrintDone(text);
     }
     const std::wstring local = job.target.filename().native();
-    if (output_.empty() && local != job.file.name) {
-      context.PrintStatus("  Windows cannot have the receiver's name, so it is kept as " +
-                          Printable(local) + "\n");
+    if (options_.output.empty() && local != job.file.name) {
+      context_.PrintStatus("  Windows cannot have the receiver's name, so it is kept as " +
+                           Printable(local) + "\n");
     }
   }
 
-  std::vector<std::wstring> names_;
-  std::wstring output_;
-  bool all_ = false;
-  DownloadOptions download_;
+  Context& context_;
+  const GetOptions& options_;
+  Targets targets_;
+  FileReport report_;
+  std::map<std::wstring, Spot> spots_;  // of files named in full, until they are planned
+};
+
+class Get : public Command {
+ public:
+  using Command::Command;
+
+  void AddOptions(CLI::App& app, Arguments& arguments) override {
+    AddPort(app, arguments);
+    AddNames(app,
+             "NAME",
+             "Files as `ls` shows them, or patterns of names, as in *.JPS",
+             options_.names,
+             0,
+             kMostNames);
+    AddText(app,
+            "-o",
+            "The folder, or the name for a single file; - is the standard output",
+            "PATH",
+            options_.output);
+    AddFlag(app, "--all", "Every file of the receiver", options_.all);
+    AddFlag(app,
+            "--skip-existing",
+            "Leave out files whose names are here already",
+            options_.skip_existing);
+    AddFlag(app, "--verify", "Download twice and compare", options_.download.verify);
+    AddFlag(app,
+            "--keep-partial",
+            "Keep what came of a failed download, as NAME.part",
+            options_.download.keep_partial);
+  }
+
+  void Check() const override {
+    CheckNames(options_.names);
+    if (options_.ToStandardOutput() && !options_.IsOneFile()) {
+      throw UsageError("-o - takes a single file");
+    }
+    if (options_.all == !options_.names.empty()) {
+      throw UsageError("get needs either the names of files or --all");
+    }
+    if (options_.IsStream() && options_.skip_existing) {
+      throw UsageError("with -o " + Printable(options_.output) + " no file can be here already");
+    }
+  }
+
+  Outcome Run(Context& context) override {
+    if (options_.ToStandardOutput() && context.arguments.json) {
+      throw UsageError("-o - and --json both need the standard output");
+    }
+    if (options_.skip_existing && context.arguments.force) {
+      throw UsageError("--skip-existing and --force contradict each other");
+    }
+    return GetRun(context, options_).Run();
+  }
+
+ private:
+  GetOptions options_;
 };
 
 }  // namespace
@@ -201,6 +300,7 @@ std::unique_ptr<Command> MakeGet() {
       "Examples:\n"
       "  rcvlink-cli get COM7 LOG0001.DAT\n"
       "  rcvlink-cli get COM7 LOG0001.DAT -o monday.dat --force\n"
+      "  rcvlink-cli get COM7 *.JPS --skip-existing\n"
       "  rcvlink-cli get COM7 --all -o D:\\survey\\"});
 }
 

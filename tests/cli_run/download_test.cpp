@@ -111,6 +111,93 @@ TEST_F(Cli, WhatCameOfAFailedDownloadIsKeptWhenAskedFor) {
   EXPECT_EQ(folder.Read("a.jps.part"), Content(3000).substr(0, 1024));
 }
 
+TEST_F(Cli, GetTakesPatterns) {
+  const bed::SimulatedPort receiver(
+      {"quorin"}, {{"a.jps", Content(30)}, {"B.JPS", Content(40)}, {"c.log", Content(50)}});
+  const auto result = RunOn(receiver, {"get", "*.jps", "a.*", "a.jps", "--json"});
+  EXPECT_EQ(result.status, kDone) << result.errors;
+  EXPECT_THAT(LocalFiles(), ElementsAre("B.JPS", "a.jps"));
+  EXPECT_EQ(nlohmann::json::parse(result.output).at("files").size(), 2u);
+}
+
+TEST_F(Cli, APatternThatFitsNothingTransfersNothing) {
+  const bed::SimulatedPort receiver({"quorin"}, {{"a.jps", Content(30)}});
+  const auto result = RunOn(receiver, {"get", "a.jps", "*.log"});
+  EXPECT_EQ(result.status, kFailed);
+  EXPECT_THAT(result.errors, HasSubstr("could not download *.log"));
+  EXPECT_THAT(LocalFiles(), IsEmpty());
+}
+
+TEST_F(Cli, FilesThatAreHereCanBeSkipped) {
+  folder.Write("a.jps", Content(30));
+  folder.Write("b.jps", "mine");
+  const bed::SimulatedPort receiver(
+      {"quorin"}, {{"a.jps", Content(30)}, {"b.jps", Content(40)}, {"c.jps", Content(50)}});
+  const auto result = RunOn(receiver, {"get", "a.jps", "*.jps", "--skip-existing", "--json"});
+  EXPECT_EQ(result.status, kDone) << result.errors;
+  EXPECT_EQ(folder.Read("b.jps"), "mine");
+  EXPECT_EQ(folder.Read("c.jps"), Content(50));
+  const auto files = nlohmann::json::parse(result.output).at("files");
+  ASSERT_EQ(files.size(), 3u);
+  EXPECT_EQ(files[0].at("skipped"), true);
+  EXPECT_EQ(files[1].at("bytes"), 4);
+  EXPECT_FALSE(files[2].contains("skipped"));
+  // A quiet user hears of the file that is not the receiver's, and of that alone.
+  EXPECT_EQ(result.errors, "b.jps: is here already, with 4 bytes; the receiver lists 40\n");
+}
+
+// "A.JPS" and "a.jps" are two files on a receiver.
+TEST_F(Cli, AFileThatDiffersInCaseAloneIsNotSkippedInSilence) {
+  folder.Write("A.JPS", Content(30));
+  const bed::SimulatedPort receiver({"quorin"}, {{"A.JPS", Content(30)}, {"a.jps", Content(40)}});
+  const auto result = RunOn(receiver, {"get", "--all", "--skip-existing"});
+  EXPECT_EQ(result.status, kLocalFile);
+  EXPECT_THAT(result.errors, HasSubstr("place of another file"));
+}
+
+// A stale part, a file that is here, and two names that are one on this computer.
+TEST_F(Cli, WhatCannotBeKeptStopsNoOtherFile) {
+  folder.Write("a.jps.part", "what came of an earlier download");
+  folder.Write("b.jps", "mine");
+  const bed::SimulatedPort receiver({"quorin"},
+                                    {{"a.jps", Content(30)},
+                                     {"b.jps", Content(40)},
+                                     {"c.jps", Content(50)},
+                                     {"d.jps", Content(60)},
+                                     {"D.jps", Content(70)}});
+  for (const std::vector<std::string>& line : std::vector<std::vector<std::string>>{
+           {"get", "a.jps", "b.jps", "c.jps", "d.jps", "D.jps"}, {"get", "*.jps"}}) {
+    const auto result = RunOn(receiver, line);
+    EXPECT_EQ(result.status, kLocalFile);
+    EXPECT_THAT(result.errors, HasSubstr("a.jps.part exists already"));
+    EXPECT_THAT(result.errors, HasSubstr("b.jps exists already"));
+    EXPECT_THAT(result.errors, HasSubstr("place of another file"));
+    EXPECT_EQ(folder.Read("c.jps"), Content(50));
+    EXPECT_EQ(folder.Read("b.jps"), "mine");
+    std::filesystem::remove(folder / "c.jps");
+    std::filesystem::remove(folder / "d.jps");
+    std::filesystem::remove(folder / "D.jps");
+  }
+}
+
+TEST_F(Cli, AFileThatCannotGetItsNameStopsNoOther) {
+  folder.Write("a.jps", "mine");
+  const bed::SimulatedPort receiver({"quorin"}, {{"a.jps", Content(30)}, {"b.jps", Content(40)}});
+  const HANDLE open = CreateFileW((folder / "a.jps").c_str(),
+                                  GENERIC_READ,
+                                  FILE_SHARE_READ,
+                                  nullptr,
+                                  OPEN_EXISTING,
+                                  0,
+                                  nullptr);
+  ASSERT_NE(open, INVALID_HANDLE_VALUE);
+  const auto result = RunOn(receiver, {"get", "--all", "--force"});
+  CloseHandle(open);
+  EXPECT_EQ(result.status, kLocalFile);
+  EXPECT_EQ(folder.Read("a.jps.part"), Content(30));
+  EXPECT_EQ(folder.Read("b.jps"), Content(40));
+}
+
 // Each of them is told although no receiver is there: the search comes after.
 TEST_F(Cli, WhatIsWrongOnThisComputerIsToldBeforeTheSearch) {
   folder.Write("taken", "a file");
