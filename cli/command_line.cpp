@@ -225,7 +225,30 @@ CommandLine Checked(CLI::App& app, Arguments& arguments, Commands commands) {
   return {std::move(arguments), std::move(command)};
 }
 
+std::vector<CommandWords::Word> OptionsOf(const CLI::App& app) {
+  std::vector<CommandWords::Word> words;
+  for (const CLI::Option* const option : app.get_options()) {
+    if (option->get_positional()) continue;
+    const std::string& word = option->get_name();  // the long one where there are two
+    words.push_back({word, option->get_description()});
+  }
+  return words;
+}
+
 }  // namespace
+
+std::vector<CommandWords> WordsOf(const Commands& commands) {
+  CLI::App app;
+  Arguments arguments;
+  AddOptions(app, arguments);
+  AddCommands(app, arguments, commands);
+  std::vector<CommandWords> all = {{.command = {}, .options = OptionsOf(app)}};
+  for (const auto& command : commands) {
+    const auto [word, summary, examples] = command->text();
+    all.push_back({{word, summary}, OptionsOf(*app.get_subcommand(word))});
+  }
+  return all;
+}
 
 std::variant<CommandLine, HelpText> ParseCommandLine(const std::vector<std::string>& args,
                                                      Commands commands) {

@@ -31,6 +31,20 @@ struct HelpText {
 std::variant<CommandLine, HelpText> ParseCommandLine(const std::vector<std::string>& args,
                                                      Commands commands);
 
+/// What may stand on the command line.
+struct CommandWords {
+  struct Word {
+    std::string word;
+    std::string description;
+  };
+
+  Word command;               ///< empty for the options of all commands
+  std::vector<Word> options;  ///< "--json"
+};
+
+/// The options of all commands, and then each command.
+std::vector<CommandWords> WordsOf(const Commands& commands);
+
 }  // namespace cli
 
 #endif  // RCVLINK_CLI_COMMAND_LINE_H_

@@ -19,6 +19,7 @@ CommandPointer MakeSet();
 CommandPointer MakeCheck();
 CommandPointer MakeExplain();
 CommandPointer MakeReport();
+CommandPointer MakeCompletion();
 
 Commands MakeCommands() {
   constexpr std::array kTable = {MakePorts,
@@ -32,7 +33,8 @@ Commands MakeCommands() {
                                  MakeSet,
                                  MakeCheck,
                                  MakeExplain,
-                                 MakeReport};
+                                 MakeReport,
+                                 MakeCompletion};
   Commands commands;
   for (const auto make : kTable) commands.push_back(make());
   return commands;

@@ -2,6 +2,7 @@
 
 #include <gtest/gtest.h>
 
+#include <algorithm>
 #include <cstdlib>
 #include <sstream>
 
@@ -300,6 +301,26 @@ TEST(CommandLineTest, CodesToExplainAreNumbers) {
   EXPECT_STREQ(Parse({"explain", "0x8007048F"}).command->text().word, "explain");
   EXPECT_STREQ(Parse({"explain"}).command->text().word, "explain");
   EXPECT_EQ(Refusal({"explain", "all"}).exit, ExitCode::kUsage);
+}
+
+TEST(CommandLineTest, TellsItsWords) {
+  const std::vector<CommandWords> words = WordsOf(MakeCommands());
+  ASSERT_EQ(words.size(), MakeCommands().size() + 1);
+  const auto has = [](const CommandWords& command, const std::string& option) {
+    return std::any_of(command.options.begin(), command.options.end(), [&](const auto& word) {
+      return word.word == option && !word.description.empty();
+    });
+  };
+  EXPECT_EQ(words.front().command.word, "");
+  EXPECT_TRUE(has(words.front(), "--json"));
+  const auto get = std::find_if(
+      words.begin(), words.end(), [](const auto& entry) { return entry.command.word == "get"; });
+  ASSERT_NE(get, words.end());
+  EXPECT_EQ(get->command.description, "Download files, or all of them");
+  EXPECT_TRUE(has(*get, "--all"));
+  EXPECT_TRUE(has(*get, "-o"));
+  EXPECT_FALSE(has(*get, "PORT"));
+  EXPECT_FALSE(has(*get, "--json"));
 }
 
 TEST(CommandLineTest, TellsItsVersion) { EXPECT_EQ(Help({"--version"}).find("rcvlink-cli "), 0U); }
