@@ -32,8 +32,9 @@ void Progress::Show(TransferState state, std::uint64_t elapsed_ms) {
 
 void Progress::Draw(const std::string& line) {
   const std::size_t width = context_.err.Width() - 1;
-  context_.err.Write(Redrawn(line.substr(0, width), width));
-  drawn_width_ = width;
+  const std::string shown = line.substr(0, width);
+  context_.err.Write(Redrawn(shown, drawn_width_));
+  drawn_width_ = shown.size();
 }
 
 Progress::~Progress() {
