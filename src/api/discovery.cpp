@@ -1,18 +1,24 @@
 // Discovery: from the name of a port to a registered receiver.
+#include "api/discovery.h"
+
+#include <algorithm>
 #include <array>
+#include <iterator>
 #include <memory>
 #include <utility>
+#include <vector>
 
 #include "api/registry.h"
-#include "platform/api_types.h"
 #include "platform/event.h"
 #include "platform/hresult.h"
-#include "quorin/quorin_protocol.h"
 #include "receiver/abstract_receiver.h"
 #include "report/report_file.h"
 #include "transport/serial_connection.h"
 #include "transport/usb_connection.h"
-#include "velmar/velmar_protocol.h"
+
+using rcvlink::Family;
+using rcvlink::FindReceiver;
+using rcvlink::Inquiry;
 
 namespace {
 
@@ -44,43 +50,46 @@ DCB SettingsOfTry(DWORD speed, DWORD rts_control) {
   return settings;
 }
 
-// The driver of the family that answers, S_FALSE for none.
-HRESULT FindDriver(std::unique_ptr<CIConnection> connection,
-                   const wchar_t* port,
-                   EProtocol protocol,
-                   HANDLE abort_event,
-                   std::unique_ptr<CIProtocol>& driver) {
-  if (protocol != eProtocolVelmar) {
-    if (IsSignalled(abort_event)) return S_FALSE;
-    Trace(L"CreateReceiverOnSerial - looking for Quorin receiver [%s]\r\n", port);
-    if (CQuorinProtocol::Probe(connection.get(), abort_event)) {
-      driver = std::make_unique<CQuorinProtocol>(std::move(connection));
-      Trace(L"CreateReceiverOnSerial - Quorin receiver found [%s]\r\n", port);
-      return S_OK;
-    }
-  }
-  if (protocol == eProtocolQuorin || IsSignalled(abort_event)) return S_FALSE;
-  Trace(L"CreateReceiverOnSerial - looking for Velmar receiver [%s]\r\n", port);
-  if (!CVelmarProtocol::Probe(connection.get(), abort_event)) return S_FALSE;
-  driver = std::make_unique<CVelmarProtocol>(std::move(connection));
-  Trace(L"CreateReceiverOnSerial - Velmar receiver found [%s]\r\n", port);
-  return S_OK;
+// Only the family that is asked for. A number that is no family's stands for all of them.
+std::span<const Family> FamiliesOnSerial(EProtocol protocol) {
+  const std::span<const Family> all = rcvlink::kFamilies;
+  const auto asked = std::ranges::find(all, protocol, &Family::protocol);
+  return asked == all.end() ? all : std::span(asked, 1);
+}
+
+// Whatever family is asked for.
+std::vector<Family> FamiliesOnUsb() {
+  std::vector<Family> families;
+  std::ranges::copy_if(rcvlink::kFamilies, std::back_inserter(families), &Family::is_on_usb);
+  return families;
 }
 
 // Makes the receiver around the driver that was found, and registers it.
-HRESULT Register(const wchar_t* caller,
-                 const wchar_t* port,
-                 std::unique_ptr<CIProtocol> driver,
-                 void** receiver) {
+HRESULT Register(const Inquiry& inquiry, std::unique_ptr<CIProtocol> driver, void** receiver) {
   auto object = std::make_shared<CAbstractReceiver>(std::move(driver));
   void* handle = nullptr;
-  ThrowIfFailed(Receivers().Insert(port, std::move(object), &handle));
-  Trace(L"%s - OK [%s]\r\n", caller, port);
+  ThrowIfFailed(Receivers().Insert(inquiry.name, std::move(object), &handle));
+  Trace(L"%s - OK [%s]\r\n", inquiry.caller, inquiry.name);
   *receiver = handle;
   return S_OK;
 }
 
 }  // namespace
+
+HRESULT rcvlink::FindReceiver(std::span<const Family> families,
+                              const Inquiry& inquiry,
+                              std::unique_ptr<CIConnection> connection,
+                              void** receiver) {
+  for (const Family& family : families) {
+    if (IsSignalled(inquiry.abort_event)) return S_FALSE;
+    Trace(L"%s - looking for %s receiver [%s]\r\n", inquiry.caller, family.name, inquiry.name);
+    if (!family.probe(connection.get(), inquiry.abort_event)) continue;
+    std::unique_ptr<CIProtocol> driver = family.make(std::move(connection));
+    Trace(L"%s - %s receiver found [%s]\r\n", inquiry.caller, family.name, inquiry.name);
+    return Register(inquiry, std::move(driver), receiver);
+  }
+  return S_FALSE;
+}
 
 namespace devapi {
 
@@ -91,27 +100,23 @@ long CreateReceiverOnSerial(
     auto connection = std::make_unique<CSerialConnection>();
     Trace(L"CreateReceiverOnSerial - opening serial port [%s]\r\n", port);
     ThrowIfFailed(connection->Open(port, settings));
-    std::unique_ptr<CIProtocol> driver;
-    const HRESULT find_result =
-        FindDriver(std::move(connection), port, protocol, abortEvent, driver);
-    if (find_result != S_OK) return find_result;
-    return Register(L"CreateReceiverOnSerial", port, std::move(driver), receiver);
+    return FindReceiver(FamiliesOnSerial(protocol),
+                        {L"CreateReceiverOnSerial", port, abortEvent},
+                        std::move(connection),
+                        receiver);
   });
 }
 
-// Only Quorin receivers are on USB, whatever family is asked for.
 long CreateReceiverOnUSB(wchar_t* device, EProtocol, void* abortEvent, void** receiver) {
   if (!device || !receiver) return E_INVALIDARG;
   return CatchResult([&] {
     auto connection = std::make_unique<CUSBConnection>();
     Trace(L"CreateReceiverOnUSB - opening USB [%s]\r\n", device);
     ThrowIfFailed(connection->Open(device));
-    if (IsSignalled(abortEvent)) return S_FALSE;
-    Trace(L"CreateReceiverOnUSB - looking for Quorin receiver [%s]\r\n", device);
-    if (!CQuorinProtocol::Probe(connection.get(), abortEvent)) return S_FALSE;
-    auto driver = std::make_unique<CQuorinProtocol>(std::move(connection));
-    Trace(L"CreateReceiverOnUSB - Quorin receiver found [%s]\r\n", device);
-    return Register(L"CreateReceiverOnUSB", device, std::move(driver), receiver);
+    return FindReceiver(FamiliesOnUsb(),
+                        {L"CreateReceiverOnUSB", device, abortEvent},
+                        std::move(connection),
+                        receiver);
   });
 }
 
