@@ -5,8 +5,8 @@
 #include <cstring>
 #include <system_error>
 
+#include "simulator/ports/driver_service.h"
 #include "simulator/usb/driver/bus.h"
-#include "simulator/usb/driver_service.h"
 
 namespace sim {
 namespace {

@@ -53,6 +53,7 @@
 
 #include <stddef.h>
 
+/// Says that a function comes from the DLL. Not for hosts to set.
 #ifdef RCVLINK_STATIC
 #define RCVLINK_API
 #else
@@ -69,14 +70,14 @@ typedef SYSTEMTIME RCVLINK_SYSTEMTIME;
 #else
 /// The shape of Win32's SYSTEMTIME, for a host that does not include <windows.h>.
 struct RCVLINK_SYSTEMTIME {
-  unsigned short wYear;
-  unsigned short wMonth;      ///< 1 to 12
-  unsigned short wDayOfWeek;  ///< 0 is Sunday
-  unsigned short wDay;        ///< 1 to 31
-  unsigned short wHour;
-  unsigned short wMinute;
-  unsigned short wSecond;
-  unsigned short wMilliseconds;
+  unsigned short wYear;          ///< all four digits
+  unsigned short wMonth;         ///< 1 to 12
+  unsigned short wDayOfWeek;     ///< 0 is Sunday
+  unsigned short wDay;           ///< 1 to 31
+  unsigned short wHour;          ///< 0 to 23
+  unsigned short wMinute;        ///< 0 to 59
+  unsigned short wSecond;        ///< 0 to 59
+  unsigned short wMilliseconds;  ///< 0 to 999
 };
 #endif
 
@@ -409,6 +410,7 @@ namespace dump_hlp {
 /// @warning Not while other threads are inside the library. A narrow name that is null or cannot be
 ///          converted raises a C++ exception, as `DumpReportString` does for its format.
 RCVLINK_API void CreateReportFile(const char* name);
+/// The same with a wide name.
 RCVLINK_API void CreateReportFile(const wchar_t* name);
 
 /// Writes one stamped entry; safe without a report. The entry ends where the text ends: end it in
@@ -418,6 +420,7 @@ RCVLINK_API void CreateReportFile(const wchar_t* name);
 /// @param format    in the meaning of Microsoft's printf
 /// @param arguments the caller's own va_list
 RCVLINK_API void DumpReportString(const char* format, char* arguments);
+/// The same with a wide format.
 RCVLINK_API void DumpReportString(const wchar_t* format, char* arguments);
 
 /// Ends the report.

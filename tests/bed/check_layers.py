@@ -1,10 +1,12 @@
 #!/usr/bin/env python3
-"""Refuses an #include that points up the layers of src/, or across the borders of the project.
+"""Refuses an #include that points up the layers, or across the borders of the project.
 
-  src/        a layer includes itself and lower ones; quorin and velmar do not see each other;
-              the public header api/rcvlink.h is for all
+  src/        the public header api/rcvlink.h is for all
   cli/        of src/ only the public header
   simulator/  nothing of src/, and src/ nothing of simulator/
+
+In src/ and simulator/ a folder is a layer. It includes itself and lower ones, none of its own height:
+quorin and velmar do not see each other.
 """
 
 import os
@@ -13,17 +15,24 @@ import sys
 
 ROOT = os.path.realpath(os.path.join(os.path.dirname(os.path.abspath(__file__)), "..", ".."))
 
-# From low to high; layers of one height do not include each other.
 HEIGHTS = {
-    "platform": 0,
-    "report": 1,
-    "transport": 2,
-    "commands": 3,
-    "receiver": 4,
-    "quorin": 5,
-    "velmar": 5,
-    "api": 6,
+    "src/platform": 0,
+    "src/report": 1,
+    "src/transport": 2,
+    "src/commands": 3,
+    "src/receiver": 4,
+    "src/quorin": 5,
+    "src/velmar": 5,
+    "src/api": 6,
+    "simulator": 0,
+    "simulator/usb/driver": 0,
+    "simulator/quorin": 1,
+    "simulator/velmar": 1,
+    "simulator/usb": 1,
+    "simulator/ports": 2,
+    "simulator/program": 3,
 }
+LAYERED_AREAS = ("src", "simulator")
 PUBLIC_HEADER = "src/api/rcvlink.h"
 INCLUDE_FOLDERS = ["", "src", "src/api"]
 INCLUDE = re.compile(r'^\s*#\s*include\s*["<]([^">]+)[">]')
@@ -46,28 +55,32 @@ def resolve(source, name):
     return None
 
 
-def layer(path):
-    return path.split("/")[1]
+def area_of(path):
+    return path.split("/")[0]
 
 
 def refusal(source, target):
     """Why `source` may not include `target`, or None."""
-    area, target_area = source.split("/")[0], target.split("/")[0]
+    area, target_area = area_of(source), area_of(target)
     if target == PUBLIC_HEADER and area != "simulator":
         return None
     if area != target_area:
         return f"{area}/ does not see {target_area}/"
-    if area != "src" or layer(source) == layer(target):
+    layer, target_layer = os.path.dirname(source), os.path.dirname(target)
+    if area not in LAYERED_AREAS or layer == target_layer:
         return None
-    if HEIGHTS[layer(target)] >= HEIGHTS[layer(source)]:
-        return f"{layer(target)} is not below {layer(source)}"
+    if target_layer not in HEIGHTS:
+        return f"{target_layer}/ is not one of the layers"
+    if HEIGHTS[target_layer] >= HEIGHTS[layer]:
+        return f"{target_layer}/ is not below {layer}/"
     return None
 
 
 def check(source):
     mistakes = []
-    if source.startswith("src/") and layer(source) not in HEIGHTS:
-        return [f"{source}: {layer(source)} is not one of the layers"]
+    layer = os.path.dirname(source)
+    if area_of(source) in LAYERED_AREAS and layer not in HEIGHTS:
+        return [f"{source}: {layer}/ is not one of the layers"]
     with open(os.path.join(ROOT, source), encoding="utf-8") as file:
         for number, line in enumerate(file, 1):
             include = INCLUDE.match(line)

@@ -8,9 +8,9 @@
 #include <utility>
 #include <vector>
 
+#include "simulator/ports/driver_service.h"
 #include "simulator/ports/usb.h"
 #include "simulator/usb/driver/bus.h"
-#include "simulator/usb/driver_service.h"
 #include "tests/usb/usb_host.h"
 
 namespace {

@@ -1,16 +1,17 @@
+/// @file bus.h
+/// What the bus driver and the program that plays a device say to each other.
+///
+/// A program opens the bus and plugs a device in. It is told what hosts ask of that device, and
+/// executes it. The driver itself knows nothing of USB. It only keeps the bytes on their way to the
+/// host, so that a read that is cancelled at the last moment loses none.
+///
+/// Closing the handle unplugs the device. So does the program's death.
 #ifndef SIMULATOR_USB_DRIVER_BUS_H_
 #define SIMULATOR_USB_DRIVER_BUS_H_
 
 #include <cstddef>
 #include <cstdint>
 
-// What the bus driver and the program that plays a device say to each other.
-//
-// A program that opens the bus and plugs a device in is told of what hosts ask of that device, and
-// carries it out. The driver itself knows nothing of USB. It only keeps the bytes on their way to
-// the host, so that a read that is cancelled at the last moment loses none.
-//
-// Closing the handle, which the program's death does too, unplugs the device.
 namespace usb_bus {
 
 inline constexpr wchar_t kServiceName[] = L"rcvlink-usb-bus";
@@ -28,7 +29,7 @@ inline constexpr uint32_t kPlugIn = BufferedCode(0x800);
 // The device goes: whatever is pending fails, and so does every later request. No input. When it
 // is done, the path can no longer be opened.
 inline constexpr uint32_t kUnplug = BufferedCode(0x801);
-// Input: Actions, carried out one after the other. The first that is wrong ends the call.
+// Input: Actions, executed one after the other. The first that is wrong ends the call.
 inline constexpr uint32_t kAct = BufferedCode(0x802);
 // The same, and then waits for requests of the host; one such call at a time. Output: one or more
 // Requests in the order in which they came. There must be room for the largest one.
@@ -64,7 +65,7 @@ struct Request {
 };
 
 enum class ActionKind : uint32_t {
-  // Answers a request. One that the host has cancelled meanwhile is passed over.
+  // Answers a request. An answer to one that the host has cancelled is ignored.
   kAnswer,
   // One transfer to the host: a read gets no more than what is left of it.
   kSend

@@ -1,4 +1,4 @@
-#include "simulator/usb/driver_service.h"
+#include "simulator/ports/driver_service.h"
 
 #include <chrono>
 #include <string>

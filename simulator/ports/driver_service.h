@@ -1,5 +1,5 @@
-#ifndef SIMULATOR_USB_DRIVER_SERVICE_H_
-#define SIMULATOR_USB_DRIVER_SERVICE_H_
+#ifndef SIMULATOR_PORTS_DRIVER_SERVICE_H_
+#define SIMULATOR_PORTS_DRIVER_SERVICE_H_
 
 #include "simulator/ports/handle.h"
 
@@ -12,4 +12,4 @@ UniqueHandle OpenUsbBus();
 
 }  // namespace sim
 
-#endif  // SIMULATOR_USB_DRIVER_SERVICE_H_
+#endif  // SIMULATOR_PORTS_DRIVER_SERVICE_H_
