@@ -9,7 +9,6 @@
 #include "handle.h"
 #include "names.h"
 #include "port_list.h"
-#include "port_memory.h"
 #include "rcvlink.h"
 #include "text.h"
 
@@ -82,15 +81,14 @@ SearchResult SearchSerial(const Context& context,
                           const std::wstring& port,
                           SearchDisplay& display) {
   const Arguments& arguments = context.arguments;
-  const PortMemory memory(arguments.no_memory ? std::filesystem::path() : PortMemory::UsualFile());
+  const PortMemory memory = MemoryOf(arguments);
   SearchedPort searched(context, port, display);
   const SweepResult result = RunSweep(TriesOn(port, arguments, memory), searched);
   if (result.receiver == nullptr) return {.code = result.code};
   // A speed of 0 would say nothing the next time.
   if (result.setting.line.speed != 0 && !memory.Remember(port, result.setting) &&
       arguments.verbose) {
-    display.PrintStatus(Printable(port) + ": its setting could not be remembered in " +
-                        Printable(PortMemory::UsualFile().native()) + "\n");
+    display.PrintStatus(UnwrittenMemory(port));
   }
   return {S_OK, {result.receiver, eInstanceSerial, result.setting}};
 }
@@ -194,6 +192,15 @@ std::optional<DCB> CurrentSettings(const std::wstring& port) {
   if (handle.get() == INVALID_HANDLE_VALUE) return std::nullopt;
   if (GetCommState(handle.get(), &settings) == FALSE) return std::nullopt;
   return settings;
+}
+
+PortMemory MemoryOf(const Arguments& arguments) {
+  return PortMemory(arguments.no_memory ? std::filesystem::path() : PortMemory::UsualFile());
+}
+
+std::string UnwrittenMemory(const std::wstring& port) {
+  return Printable(port) + ": what is known of its setting could not be written to " +
+         Printable(PortMemory::UsualFile().native()) + "\n";
 }
 
 FoundReceiver FindReceiver(Context& context) {

@@ -9,6 +9,7 @@
 #include <string>
 
 #include "context.h"
+#include "port_memory.h"
 #include "rcvlink.h"
 #include "search_display.h"
 #include "sweep.h"
@@ -43,6 +44,12 @@ long TryPort(const Context& context, DCB settings, void** receiver);
 /// The settings that a serial port has: those with which it was used last. Nothing when it cannot be
 /// opened.
 std::optional<DCB> CurrentSettings(const std::wstring& port);
+
+/// What is remembered of ports; nothing with --no-memory.
+PortMemory MemoryOf(const Arguments& arguments);
+
+/// What --verbose says when the memory of a port could not be written down.
+std::string UnwrittenMemory(const std::wstring& port);
 
 }  // namespace cli
 

@@ -87,11 +87,12 @@ Json EntryOf(const KnownSetting& setting) {
           {"protocol", FamilyWord(setting.family)}};
 }
 
-/// Puts the text into the place of the file in one step, so that nobody sees half of it.
-bool Replace(const std::filesystem::path& file, const std::string& text) {
+/// Puts the ports into the place of the file in one step, so that nobody sees half of it.
+bool Replace(const std::filesystem::path& file, const Json& ports) {
+  constexpr int kIndent = 2;
   const std::filesystem::path fresh = file.native() + L".new";
   std::ofstream stream(fresh, std::ios::binary | std::ios::trunc);
-  stream << text;
+  stream << Json{{"ports", ports}}.dump(kIndent) << "\n";
   stream.close();
   const bool replaced =
       stream && MoveFileExW(fresh.c_str(), file.c_str(), MOVEFILE_REPLACE_EXISTING) != FALSE;
@@ -121,7 +122,6 @@ std::optional<KnownSetting> PortMemory::Recall(const std::wstring& port) const {
 }
 
 bool PortMemory::Remember(const std::wstring& port, const KnownSetting& setting) const {
-  constexpr int kIndent = 2;
   if (file_.empty()) return true;
   const MemoryLock lock;
   if (!lock.held()) return false;
@@ -134,7 +134,15 @@ bool PortMemory::Remember(const std::wstring& port, const KnownSetting& setting)
   } catch (const Failure&) {
     return false;
   }
-  return Replace(file_, Json{{"ports", ports}}.dump(kIndent) + "\n");
+  return Replace(file_, ports);
+}
+
+bool PortMemory::Forget(const std::wstring& port) const {
+  if (file_.empty()) return true;
+  const MemoryLock lock;
+  if (!lock.held()) return false;
+  Json ports = PortsIn(file_);
+  return ports.erase(KeyOf(port)) == 0 || Replace(file_, ports);
 }
 
 }  // namespace cli

@@ -28,6 +28,9 @@ class PortMemory {
   /// @return false when it could not be written down
   bool Remember(const std::wstring& port, const KnownSetting& setting) const;
 
+  /// @return false when it could not be written down
+  bool Forget(const std::wstring& port) const;
+
  private:
   std::filesystem::path file_;
 };

@@ -25,8 +25,8 @@ Line::Line(const LineOptions& options, Transcript& transcript)
     : options_(options), transcript_(transcript), speed_(options.speed) {}
 
 void Line::SetSpeed(uint32_t speed) {
-  speed_ = speed;
-  transcript_.Setting("speed " + std::to_string(speed));
+  speed_ = options_.stray_speed == 0 ? speed : options_.stray_speed;
+  transcript_.Setting("speed " + std::to_string(speed_));
 }
 
 bool Line::Matches(uint32_t host_speed) const { return host_speed == 0 || host_speed == speed_; }

@@ -17,6 +17,8 @@ inline constexpr uint32_t kDefaultPieceGapMs = 5;
 
 struct LineOptions {
   uint32_t speed = kDefaultSpeed;
+  // The speed that is taken, whatever is asked for; 0 means what is asked for.
+  uint32_t stray_speed = 0;
   // What passes between two ends of different speed arrives as garbage; otherwise not at all.
   bool garbled = false;
   // Output takes the time it needs on a wire, 10 bits a byte.

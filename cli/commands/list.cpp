@@ -47,7 +47,10 @@ class List : public Command {
                                  {"files", list},
                                  {"bytes", total},
                                  {"complete", directory.doubt.empty()}}};
-    if (!directory.doubt.empty()) outcome.document["warning"] = directory.doubt;
+    if (!directory.doubt.empty()) {
+      outcome.document["warning"] = directory.doubt;
+      outcome.exit = ExitCode::kFailed;
+    }
     return outcome;
   }
 

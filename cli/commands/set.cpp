@@ -1,4 +1,4 @@
-#include <algorithm>
+#include <optional>
 
 #include "command.h"
 #include "discovery.h"
@@ -70,6 +70,15 @@ bool AnswersAt(const Context& context, const DCB& settings) {
   return true;
 }
 
+/// Lets the next command begin with this setting; with none that is known when it is nothing.
+void Remember(Context& context, const std::optional<KnownSetting>& setting) {
+  const Arguments& arguments = context.arguments;
+  const PortMemory memory = MemoryOf(arguments);
+  const bool written =
+      setting ? memory.Remember(arguments.port, *setting) : memory.Forget(arguments.port);
+  if (!written && arguments.verbose) context.PrintStatus(UnwrittenMemory(arguments.port));
+}
+
 /// Whether this program looks for receivers with that setting.
 bool IsFoundAgain(const SettingChange& change) {
   if (change.setting == Setting::kParity)
@@ -126,10 +135,16 @@ class Set : public Command {
     const SettingChange change = CheckedChange(setting_, value_);
     const std::string name = SettingName(change.setting);
     const std::string tried = "set the receiver's " + name + " to " + ValueWord(change);
-    const EInstanceType link = Change(context, change, tried);
+    std::optional<KnownSetting> found = Change(context, change, tried);
     // What the RTS line does cannot be seen from here, nor what a receiver's port does over USB.
-    const bool confirmed = link == eInstanceSerial && change.setting != Setting::kRts;
-    if (confirmed) Confirm(context, change, tried);
+    const bool confirmed = found && change.setting != Setting::kRts;
+    if (confirmed) {
+      Confirm(context, change, tried);
+      if (change.setting == Setting::kBaud) {
+        found->line.speed = change.value;
+        Remember(context, found);
+      }
+    }
     context.PrintDone(Printable(arguments.port) + ": the receiver's " + name + " was set to " +
                       ValueWord(change) +
                       (confirmed ? ", and it answers there.\n" : "; it does not confirm that.\n") +
@@ -142,11 +157,11 @@ class Set : public Command {
 
  private:
   /// Sends the change, and lets go of the receiver.
-  /// @return the link on which it was found
+  /// @return where it was found, on a serial port
   /// @throws Failure
-  static EInstanceType Change(Context& context,
-                              const SettingChange& change,
-                              const std::string& tried) {
+  static std::optional<KnownSetting> Change(Context& context,
+                                            const SettingChange& change,
+                                            const std::string& tried) {
     Receiver receiver(context);
     const unsigned family = receiver.Identify().family;
     const auto number = FamilyNumber(change, static_cast<EProtocol>(family));
@@ -161,14 +176,12 @@ class Set : public Command {
     receiver.ThrowIfCancelled(tried);
     const long code = Send(receiver.handle(), change.setting, *number);
     if (code != S_OK) throw receiver.FailureOf(tried, code);
-    return receiver.link();
+    return receiver.setting();
   }
 
   /// Asks the receiver at its new setting, and when it does not answer there, at the old one.
   /// @throws Failure when it was not changed, or is lost
-  static void Confirm(const Context& context,
-                      const SettingChange& change,
-                      const std::string& tried) {
+  static void Confirm(Context& context, const SettingChange& change, const std::string& tried) {
     const auto before = CurrentSettings(context.arguments.port);
     if (before && AnswersAt(context, Changed(*before, change))) return;
     Failure failure{.tried = tried, .code = ResultOfWin32(ERROR_DEVICE_NOT_CONNECTED)};
@@ -182,6 +195,7 @@ class Set : public Command {
       failure.exit = ExitCode::kNoReceiver;
       failure.meaning = "after the change the receiver answers neither as asked nor as before";
       failure.hint = "`rcvlink-cli find` tries all the usual speeds.";
+      Remember(context, std::nullopt);
     }
     throw failure;
   }

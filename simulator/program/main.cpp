@@ -55,6 +55,9 @@ void AddPortOptions(CLI::App& command, PortOptions& port, sim::LineOptions& line
       ->capture_default_str()
       ->check(CLI::PositiveNumber)
       ->group(sim::kPortGroup);
+  command.add_option("--stray-speed", line.stray_speed, "take this speed, whatever is asked for")
+      ->check(CLI::PositiveNumber)
+      ->group(sim::kPortGroup);
   command
       .add_flag("--garbled", line.garbled, "at a wrong speed bytes arrive as garbage, not as none")
       ->group(sim::kPortGroup);

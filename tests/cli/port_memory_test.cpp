@@ -38,6 +38,16 @@ TEST_F(PortMemoryTest, TheLetterCaseOfAPortDoesNotCount) {
   EXPECT_EQ(memory_.Recall(L"COM7"), kSetting);
 }
 
+TEST_F(PortMemoryTest, ForgetsOnePort) {
+  EXPECT_TRUE(memory_.Forget(L"COM7"));
+  EXPECT_FALSE(folder_.Has(L"ports.json"));
+  EXPECT_TRUE(memory_.Remember(L"COM7", kSetting));
+  EXPECT_TRUE(memory_.Remember(L"COM8", kOther));
+  EXPECT_TRUE(memory_.Forget(L"com7"));
+  EXPECT_EQ(memory_.Recall(L"COM7"), std::nullopt);
+  EXPECT_EQ(memory_.Recall(L"COM8"), kOther);
+}
+
 TEST_F(PortMemoryTest, MakesItsFolder) {
   const PortMemory deep(folder_.path() / L"a" / L"b" / L"ports.json");
   EXPECT_TRUE(deep.Remember(L"COM7", kSetting));
@@ -47,6 +57,7 @@ TEST_F(PortMemoryTest, MakesItsFolder) {
 TEST_F(PortMemoryTest, WithoutAFileNothingIsRemembered) {
   const PortMemory none{{}};
   EXPECT_TRUE(none.Remember(L"COM7", kSetting));
+  EXPECT_TRUE(none.Forget(L"COM7"));
   EXPECT_EQ(none.Recall(L"COM7"), std::nullopt);
 }
 
@@ -118,6 +129,8 @@ TEST_F(PortMemoryTest, WritesOnlyWhatIsNew) {
   const HeldFile held(file_, FILE_SHARE_READ);
   EXPECT_TRUE(memory_.Remember(L"COM7", kSetting));
   EXPECT_FALSE(memory_.Remember(L"COM7", kOther));
+  EXPECT_TRUE(memory_.Forget(L"COM8"));
+  EXPECT_FALSE(memory_.Forget(L"COM7"));
 }
 
 TEST_F(PortMemoryTest, ProgramsThatRunAtTheSameTimeLoseNothing) {

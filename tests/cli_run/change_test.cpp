@@ -7,6 +7,7 @@ namespace cli_run {
 namespace {
 
 using testing::HasSubstr;
+using testing::Not;
 
 TEST_F(Cli, RemoveDeletesEachFile) {
   const bed::SimulatedPort receiver({"quorin"}, {{"a.jps", "a"}, {"b.jps", "b"}, {"c.jps", "c"}});
@@ -74,14 +75,70 @@ TEST_F(Cli, ANewSpeedIsTried) {
 }
 
 TEST_F(Cli, ARefusedSpeedIsSaidToBeRefused) {
-  for (const std::vector<std::string>& simulator :
-       std::vector<std::vector<std::string>>{{"quorin"}, {"velmar"}}) {
-    const bed::SimulatedPort receiver(simulator, {{"a.jps", "a"}});
-    const auto result = RunOn(receiver, {"set", "baud", "12345"});
+  for (const char* family : {"quorin", "velmar"}) {
+    const bed::SimulatedPort receiver({family}, {{"a.jps", "a"}});
+    const auto result = RunOn(receiver, {"set", "baud", "12345", "--protocol", family});
     EXPECT_EQ(result.status, kFailed) << result.output;
     EXPECT_THAT(result.errors, HasSubstr("refused"));
-    EXPECT_EQ(RunOn(receiver, {"ls"}).status, kDone);
+    EXPECT_EQ(RunOn(receiver, {"ls", "--protocol", family}).status, kDone);
   }
+}
+
+class SetMemory : public Cli {
+ protected:
+  // One family is asked only: each that is not there takes long.
+  bed::ProgramResult SetBaud(const bed::SimulatedPort& receiver,
+                             const std::string& speed,
+                             const std::string& option) const {
+    return RunOn(receiver, {"set", "baud", speed, "--protocol", "quorin", option});
+  }
+  // What a search begins with.
+  std::string FirstTry(const bed::SimulatedPort& receiver) const {
+    bed::Program search(kProgram,
+                        {"find", Port(receiver), "--protocol", "quorin"},
+                        bed::Output::kTerminal,
+                        folder.unix_path());
+    search.Expect("try 1 of ");
+    search.Interrupt();
+    for (const std::string& line : search.Finish().history) {
+      if (line.find("try 1 of ") != std::string::npos) return line;
+    }
+    return "";
+  }
+};
+
+// A speed that no search begins with.
+constexpr char kOtherSpeed[] = "57600";
+
+TEST_F(SetMemory, ANewSpeedIsRemembered) {
+  const bed::SimulatedPort receiver({"quorin"});
+  EXPECT_EQ(SetBaud(receiver, kOtherSpeed, "--quiet").status, kDone);
+  EXPECT_THAT(FirstTry(receiver), HasSubstr(": 57600 bit/s, RTS on"));
+}
+
+TEST_F(SetMemory, ASpeedThatWasRefusedIsNotRemembered) {
+  const bed::SimulatedPort receiver({"quorin"});
+  EXPECT_EQ(SetBaud(receiver, "12345", "--quiet").status, kFailed);
+  EXPECT_THAT(FirstTry(receiver), HasSubstr(": 9600 bit/s, RTS on"));
+}
+
+TEST_F(SetMemory, WithoutMemoryANewSpeedIsNotRemembered) {
+  const bed::SimulatedPort receiver({"quorin"});
+  ASSERT_EQ(RunOn(receiver, {"find", "--rts", "off"}).status, kDone);
+  EXPECT_EQ(SetBaud(receiver, kOtherSpeed, "--no-memory").status, kDone);
+  EXPECT_THAT(FirstTry(receiver), HasSubstr(": 9600 bit/s, RTS off"));
+}
+
+TEST_F(SetMemory, ALostReceiverIsSaidToBeAndForgotten) {
+  const bed::SimulatedPort receiver({"quorin", "--stray-speed", "19200"});
+  const auto result = SetBaud(receiver, kOtherSpeed, "--json");
+  EXPECT_EQ(result.status, kNoReceiver);
+  const auto error = nlohmann::json::parse(result.output).at("error");
+  EXPECT_EQ(error.at("exit"), kNoReceiver);
+  EXPECT_EQ(error.at("tried"), "set the receiver's baud rate to 57600");
+  EXPECT_THAT(error.at("meaning"), HasSubstr("answers neither as asked nor as before"));
+  EXPECT_THAT(error.at("hint"), HasSubstr("rcvlink-cli find"));
+  EXPECT_THAT(FirstTry(receiver), HasSubstr(": 115200 bit/s, RTS on"));
 }
 
 TEST_F(Cli, ASettingThatLosesTheReceiverNeedsAYes) {
@@ -92,7 +149,7 @@ TEST_F(Cli, ASettingThatLosesTheReceiverNeedsAYes) {
     EXPECT_EQ(result.status, kUsage);
     EXPECT_THAT(result.errors, HasSubstr("--yes"));
   }
-  EXPECT_THAT(receiver.Transcript(), testing::Not(HasSubstr("set,")));
+  EXPECT_THAT(receiver.Transcript(), Not(HasSubstr("set,")));
   EXPECT_EQ(RunOn(receiver, {"set", "parity", "none"}).status, kDone);
 }
 

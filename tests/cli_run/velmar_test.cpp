@@ -1,4 +1,6 @@
 // The program with a Velmar receiver, whose refusals the library does not tell.
+#include <chrono>
+#include <deque>
 #include <nlohmann/json.hpp>
 
 #include "tests/cli_run/cli.h"
@@ -61,11 +63,13 @@ TEST_F(VelmarCli, AListThatMayBeCutIsSaidToBe) {
   };
   add_until(30);
   const bed::SimulatedPort few({"velmar"}, files);
-  EXPECT_THAT(RunOn(few, {"ls"}).errors, testing::Not(HasSubstr("may be missing")));
+  const auto all = RunOn(few, {"ls"});
+  EXPECT_EQ(all.status, kDone);
+  EXPECT_THAT(all.errors, testing::Not(HasSubstr("may be missing")));
   add_until(120);
   const bed::SimulatedPort many({"velmar"}, files);
   const auto result = RunOn(many, {"ls", "--json"});
-  EXPECT_EQ(result.status, kDone);
+  EXPECT_EQ(result.status, kFailed);
   EXPECT_THAT(result.errors, HasSubstr("may be missing"));
   const size_t listed = json::parse(result.output).at("files").size();
   EXPECT_GT(listed, 50U);
@@ -129,6 +133,31 @@ TEST_F(VelmarCli, AllIsNeverDoneWhenTheListIsRefused) {
   const auto result = RunOn(receiver, {"get", "--all", "--quiet"});
   EXPECT_EQ(result.status, kFailed) << result.output;
   EXPECT_THAT(result.errors, HasSubstr("may be missing"));
+}
+
+// Each of them waits twice for 30 s, so they wait side by side.
+TEST_F(VelmarCli, AListThatIsNotAnsweredIsNeverDone) {
+  const std::vector<std::vector<std::string>> commands = {
+      {"ls", "--json"}, {"get", "--all", "--json"}, {"mirror", "out", "--json"}};
+  std::deque<bed::SimulatedPort> receivers;
+  std::deque<bed::Program> programs;
+  for (std::vector<std::string> command : commands) {
+    receivers.emplace_back(std::vector<std::string>{"velmar", "--mute", "log direnta"},
+                           Files{{"a.log", "a"}});
+    command.insert(command.end(), {"--protocol", "velmar"});
+    programs.emplace_back(
+        kProgram, On(receivers.back(), command), bed::Output::kPipe, folder.unix_path());
+  }
+  for (size_t i = 0; i < programs.size(); ++i) {
+    const auto result = programs[i].Finish(std::chrono::seconds(150));
+    EXPECT_EQ(result.status, kFailed) << commands[i][0];
+    EXPECT_THAT(result.errors, HasSubstr("files may be missing")) << commands[i][0];
+    const json document = json::parse(result.output);
+    EXPECT_EQ(document.at("complete"), false) << commands[i][0];
+    EXPECT_THAT(document.at("warning"), HasSubstr("did not answer")) << commands[i][0];
+    EXPECT_EQ(document.at("files"), json::array()) << commands[i][0];
+  }
+  EXPECT_THAT(LocalFiles(), testing::IsEmpty());
 }
 
 TEST_F(VelmarCli, AListThatWasRefusedIsReadAgain) {

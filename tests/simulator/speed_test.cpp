@@ -118,6 +118,14 @@ TEST(SpeedTest, AReceiverMayKeepItsSpeed) {
   EXPECT_EQ(session.Ask("%2%\r\n"), "RE003%2%\r\n");
 }
 
+TEST(SpeedTest, AReceiverMayTakeAnotherSpeed) {
+  QuorinOptions options;
+  options.line.stray_speed = 19200;
+  Session session(options);
+  EXPECT_EQ(session.Ask("%1%set,cur/term/rate,115200\r\n"), "RE003%1%\r\n");
+  EXPECT_EQ(session.receiver.speed(), 19200U);
+}
+
 TEST(SpeedTest, TheEndOfASpeedCommandIsFound) {
   const Session session;
   const auto end = [&](std::string_view text) {
