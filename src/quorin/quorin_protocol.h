@@ -3,13 +3,12 @@
 #ifndef RCVLINK_QUORIN_QUORIN_PROTOCOL_H_
 #define RCVLINK_QUORIN_QUORIN_PROTOCOL_H_
 
-#include <cstdint>
 #include <memory>
-#include <optional>
 
-#include "quorin/block.h"
 #include "quorin/quorin_command.h"
 #include "receiver/abstract_protocol.h"
+
+class LinkPolicy;
 
 class CQuorinProtocol : public CAbstractProtocol {
  public:
@@ -52,24 +51,10 @@ class CQuorinProtocol : public CAbstractProtocol {
 
   // The parts of a download.
   HRESULT Transfer(const wchar_t* name, IStream* stream, EInstanceType link);
+  HRESULT TakeBlocks(IStream* stream, int size, LinkPolicy& policy);
   void RestoreSpeed(DWORD saved_speed);
   HRESULT RaiseReceiver(DWORD speed) override { return ChangeSpeed(speed); }
   void SetReceiverBack(DWORD speed) override;
-
-  // The steps of a block transfer; one that gives a result ends it.
-  struct Download;
-  std::optional<HRESULT> TakeSerialBlock(Download& download, IStream* stream, uint32_t size);
-  std::optional<HRESULT> TakeUsbBlock(Download& download, IStream* stream, uint32_t size);
-  HRESULT ReadWholeBlock(Block& block);
-  void ReportUsbProgress(Download& download, uint32_t size);
-  std::optional<HRESULT> AfterFailedRead(HRESULT failure,
-                                         Download& download,
-                                         const wchar_t* trace_line);
-  std::optional<HRESULT> AskAgain();
-  std::optional<HRESULT> AskAgain(const wchar_t* trace_line);
-  HRESULT EndTransfer();
-  HRESULT EndCancelledDownload(const wchar_t* trace_line);
-  HRESULT WriteControl(uint8_t control);
 
   DWORD download_read_timeout_ms_;
 };

@@ -1,41 +1,18 @@
 // The download of CVelmarProtocol: the link is raised to full speed, the file made current on the
-// receiver, its size asked for, and its log taken chunk by chunk.
+// receiver, its size asked for, its chunks taken (file_download.h), and the speed put back.
 #include <algorithm>
 #include <cstdint>
-#include <memory>
 #include <span>
-#include <string_view>
 
-#include "platform/clock.h"
 #include "platform/hresult.h"
 #include "platform/text.h"
 #include "report/report_file.h"
+#include "velmar/file_download.h"
 #include "velmar/velmar_protocol.h"
-
-#include <objidl.h>
 
 using namespace VelmarCommands;
 
 namespace {
-
-struct StreamDeleter {
-  void operator()(IStream* stream) const { stream->Release(); }
-};
-// A counted reference to the host's stream.
-using StreamReference = std::unique_ptr<IStream, StreamDeleter>;
-
-StreamReference AddReference(IStream* stream) {
-  stream->AddRef();
-  return StreamReference(stream);
-}
-
-// In 32-bit arithmetic, as hosts have always seen it: it wraps for files beyond 42949672 bytes. A
-// file that was said to be empty is complete with whatever comes of it.
-uint8_t Percent(uint32_t total, uint32_t remaining) {
-  constexpr uint32_t kComplete = 100;
-  if (total == 0) return kComplete;
-  return static_cast<uint8_t>((total - remaining) * kComplete / total);
-}
 
 // Whether the receiver refused, with an error text or without: the response type tells only the
 // second. A reply that came in pieces is kept with its beginning repeated, and stands whole at its
@@ -47,15 +24,6 @@ bool IsRefusal(const CVelmarCommand& command) {
 }
 
 }  // namespace
-
-struct CVelmarProtocol::TransferContext {
-  CVelmarProtocol* driver;
-  const CReadFileCmd* read_command;
-  StreamReference stream;
-  uint32_t total;
-  uint32_t remaining;
-  uint8_t last_percent;
-};
 
 HRESULT CVelmarProtocol::DownloadFile(const wchar_t* name, IStream* stream, CProgressCallback*) {
   if (!name || !stream) return E_INVALIDARG;
@@ -96,6 +64,33 @@ HRESULT CVelmarProtocol::DownloadLocked(const wchar_t* name, IStream* stream) {
   if (saved_speed == 0 || saved_speed >= kTransferSpeed) return result;
   // What the put-back gives replaces what the transfer gave.
   return RestoreSpeed(saved_speed, is_aborted);
+}
+
+HRESULT CVelmarProtocol::Transfer(const wchar_t* name, IStream* stream, bool* is_sending) {
+  CSetCurrentFileCmd set_current(ToNarrow(name).c_str());
+  HRESULT result = ExecuteCommand(set_current);
+  ThrowIfFailed(result);
+  if (set_current.Response() == RESPONSE_OK) {
+    CGetFileHeaderCmd get_header;
+    result = ExecuteCommand(get_header);
+    ThrowIfFailed(result);
+    if (get_header.Response() == RESPONSE_DATA) {
+      const auto size = static_cast<uint32_t>(get_header.FileHeader().file_size);
+      const auto tell = [this](uint8_t percent) { ReportProgress(percent); };
+      FileDownload download(*this, tell, stream, size);
+      result = download.Run();
+      *is_sending = download.IsSending();
+      ThrowIfFailed(result);
+    }
+  }
+  // Also for a file that the receiver does not know: the stream stays empty, and that is no
+  // failure.
+  ReportProgress(100);
+  return result;
+}
+
+HRESULT CVelmarProtocol::OnDataReceived(void* context) {
+  return context ? static_cast<FileDownload*>(context)->TakeChunk() : E_INVALIDARG;
 }
 
 HRESULT CVelmarProtocol::RaiseReceiver(DWORD speed) {
@@ -150,53 +145,7 @@ HRESULT CVelmarProtocol::TellSpeed(DWORD speed, bool is_aborted) {
   if (is_aborted || result == S_FALSE) {
     // The line must have left before the host changes its own speed; an answer would have shown that.
     connection()->Flush();
-    cut_off_at_ = CurrentClock().Ticks();
+    NoteCutOff();
   }
   return result;
-}
-
-HRESULT CVelmarProtocol::Transfer(const wchar_t* name, IStream* stream, bool* is_sending) {
-  CSetCurrentFileCmd set_current(ToNarrow(name).c_str());
-  HRESULT result = ExecuteCommand(set_current);
-  ThrowIfFailed(result);
-  if (set_current.Response() == RESPONSE_OK) {
-    CGetFileHeaderCmd get_header;
-    result = ExecuteCommand(get_header);
-    ThrowIfFailed(result);
-    if (get_header.Response() == RESPONSE_DATA) {
-      const auto total = static_cast<uint32_t>(get_header.FileHeader().file_size);
-      TransferContext context{.driver = this,
-                              .read_command = nullptr,
-                              .stream = AddReference(stream),
-                              .total = total,
-                              .remaining = total,
-                              .last_percent = 0};
-      CReadFileCmd read_file(this, &context);
-      context.read_command = &read_file;
-      result = ExecuteCommand(read_file);
-      // An aborted command went out whole, and the file comes although nothing has come yet.
-      const bool has_begun = read_file.HasBegun() || result == S_FALSE;
-      *is_sending = has_begun && read_file.Response() != RESPONSE_DATA;
-      ThrowIfFailed(result);
-    }
-  }
-  // Also for a file that the receiver does not know: the stream stays empty, and that is no
-  // failure.
-  ReportProgress(100);
-  return result;
-}
-
-HRESULT CVelmarProtocol::OnDataReceived(void* context) {
-  if (!context) return E_INVALIDARG;
-  auto& transfer = *static_cast<TransferContext*>(context);
-  const CReadFileCmd& command = *transfer.read_command;
-  ULONG written = 0;
-  const HRESULT result = transfer.stream->Write(command.GetData(), command.GetDataSize(), &written);
-  if (FAILED(result)) return result;
-  transfer.remaining -= command.GetDataSize();
-  const uint8_t percent = Percent(transfer.total, transfer.remaining);
-  if (percent == transfer.last_percent) return S_OK;
-  transfer.last_percent = percent;
-  ReportProgress(percent);
-  return S_OK;
 }

@@ -48,10 +48,12 @@ HRESULT CVelmarProtocol::ExecuteForCertain(CVelmarCommand& command) {
 }
 
 HRESULT CVelmarProtocol::Conclude(HRESULT result, const CVelmarCommand& command) {
-  if (result == S_FALSE) cut_off_at_ = CurrentClock().Ticks();
+  if (result == S_FALSE) NoteCutOff();
   DumpInvalidResponse(result, connection(), command);
   return result;
 }
+
+void CVelmarProtocol::NoteCutOff() { cut_off_at_ = CurrentClock().Ticks(); }
 
 void CVelmarProtocol::AwaitLateAnswer() {
   constexpr DWORD kLatestAnswerMs = 500;
@@ -63,7 +65,7 @@ void CVelmarProtocol::AwaitLateAnswer() {
 bool CVelmarProtocol::IsAnswering(HANDLE abort_event) {
   AwaitLateAnswer();
   const bool is_answering = Probe(connection(), abort_event);
-  if (!is_answering) cut_off_at_ = CurrentClock().Ticks();
+  if (!is_answering) NoteCutOff();
   return is_answering;
 }
 

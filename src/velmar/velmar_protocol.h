@@ -31,11 +31,10 @@ class CVelmarProtocol : public CAbstractProtocol, public VelmarCommands::CReadFi
   // Runs one command as the current one.
   virtual HRESULT ExecuteCommand(VelmarCommands::CVelmarCommand& command);
 
+  // The context is the FileDownload that is running.
   HRESULT OnDataReceived(void* context) override;
 
  private:
-  struct TransferContext;
-
   bool IsAnswering(HANDLE abort_event) override;
 
   // Runs a command whose line goes out whatever comes: an abort ends only the wait for its answer.
@@ -47,6 +46,8 @@ class CVelmarProtocol : public CAbstractProtocol, public VelmarCommands::CReadFi
   // Lets the answer come of a command that was cut off: answers do not tell to which command they
   // belong, and the next command would take it for its own.
   void AwaitLateAnswer();
+  void NoteCutOff();
+
   void ReadIdentity(HANDLE abort_event, CReceiverInfo* info);
   // The pattern of deleting and renaming: one command under the lock, whose answer is not looked
   // at.

@@ -1,0 +1,155 @@
+#include "quorin/block_download.h"
+
+#include <span>
+#include <utility>
+
+#include "platform/hresult.h"
+#include "quorin/quorin_command.h"
+#include "report/report_file.h"
+#include "transport/wait_scope.h"
+
+namespace {
+
+constexpr int kMaxTimeouts = 3;
+
+HRESULT WriteToStream(IStream* stream, std::span<const uint8_t> bytes) {
+  ULONG written = 0;
+  return stream->Write(bytes.data(), static_cast<ULONG>(bytes.size()), &written);
+}
+
+}  // namespace
+
+HRESULT WriteControl(CIConnection* connection, uint8_t control) {
+  const WaitScope shield = WaitScope::Shielded(connection);
+  return connection->Write(&control, sizeof(control), QuorinCommands::kWriteTimeoutMs);
+}
+
+BlockDownload::BlockDownload(CIConnection* connection,
+                             AbortSwitch& abort,
+                             ProgressFunction tell_progress,
+                             IStream* stream,
+                             int size,
+                             LinkPolicy& policy)
+    : connection_(connection),
+      abort_(abort),
+      tell_progress_(std::move(tell_progress)),
+      stream_(stream),
+      size_(size),
+      policy_(policy) {}
+
+HRESULT BlockDownload::Run() {
+  if (!stream_ || size_ < 1) return E_INVALIDARG;
+  for (;;) {
+    if (const auto ended = TakeBlock()) return *ended;
+  }
+}
+
+std::optional<HRESULT> BlockDownload::TakeBlock() {
+  if (abort_.Take()) return EndCancelled();
+
+  Block block;
+  const HRESULT header_result = policy_.ReadHeader(block);
+  if (FAILED(header_result)) return AfterFailedRead(header_result);
+  if (abort_.Take()) return EndCancelled();
+
+  switch (block.Type()) {
+    case BlockType::kEnd:
+      TraceWhy(L"recognisable byte is 0x23");
+      return S_FALSE;
+    case BlockType::kData:
+      if (block.Sequence() != expected_sequence_) return AskAgain(L"out of sequence");
+      break;
+    case BlockType::kLast:
+      break;
+    default:
+      return AskAgain(L"recognisable byte is not recognised");
+  }
+  const std::optional<size_t> payload_length = block.PayloadLength();
+  if (!payload_length) return kNotConnected;
+
+  const HRESULT rest_result = policy_.ReadRest(block);
+  if (FAILED(rest_result)) return AfterFailedRead(rest_result);
+  // Another call on this receiver took the abort; the receiver must hear of it all the same.
+  if (rest_result == S_FALSE) EndTransfer();
+  if (rest_result != S_OK) return rest_result;
+  if (!block.HasEndByte()) return AskAgain(L"eob character is missed");
+  if (!block.IsChainedTo(crc_)) return AskAgain(L"cheksum missmatch");
+
+  return Accept(block, *payload_length);
+}
+
+std::optional<HRESULT> BlockDownload::Accept(const Block& block, size_t payload_length) {
+  crc_ = block.Crc();
+  const HRESULT store_result = WriteToStream(stream_, block.Payload().first(payload_length));
+  if (FAILED(store_result)) {
+    if (policy_.TellsWhy()) {
+      Trace(L"CQuorinProtocol::%s - write to stream failed [0x%08X]\r\n",
+            policy_.Name(),
+            store_result);
+    }
+    EndTransfer();
+    return Passed(store_result);
+  }
+  delivered_ += static_cast<uint32_t>(payload_length);
+  TellProgress();
+
+  if (block.Type() == BlockType::kLast) {
+    EndTransfer();
+    return Passed(store_result);
+  }
+  if (abort_.Take()) return EndCancelled();
+  const HRESULT ack_result = WriteControl(connection_, kAck);
+  if (FAILED(ack_result)) return ack_result;
+  if (ack_result != S_OK) return Passed(ack_result);
+  ++expected_sequence_;
+  if (policy_.CountsTimeoutsPerBlock()) timeouts_ = 0;
+  return std::nullopt;
+}
+
+void BlockDownload::TellProgress() {
+  const uint8_t percent = policy_.Percent(delivered_, static_cast<uint32_t>(size_));
+  if (percent == percent_) return;
+  percent_ = percent;
+  if (policy_.IsTimeToTell()) tell_progress_(percent);
+}
+
+// A silence is answered by asking again, three times; any other failure ends the transfer.
+std::optional<HRESULT> BlockDownload::AfterFailedRead(HRESULT failure) {
+  if (failure != kTimedOut) return failure;
+  TraceText(policy_.TimeoutText());
+  if (timeouts_ == kMaxTimeouts) return kTimedOut;
+  ++timeouts_;
+  return AskAgain();
+}
+
+// Empties the line and asks for the current block again; a result only when that cannot be sent.
+std::optional<HRESULT> BlockDownload::AskAgain() {
+  connection_->Flush();
+  const HRESULT result = WriteControl(connection_, kNak);
+  return FAILED(result) ? std::optional(result) : std::nullopt;
+}
+
+std::optional<HRESULT> BlockDownload::AskAgain(const wchar_t* why) {
+  TraceWhy(why);
+  return AskAgain();
+}
+
+HRESULT BlockDownload::EndCancelled() {
+  TraceText(L"download is cancelled");
+  const HRESULT result = EndTransfer();
+  return FAILED(result) ? result : S_FALSE;
+}
+
+HRESULT BlockDownload::EndTransfer() { return WriteControl(connection_, kEndOfTransfer); }
+
+HRESULT BlockDownload::Passed(HRESULT result) const {
+  return policy_.PassesResultsOn() ? result : S_OK;
+}
+
+void BlockDownload::TraceText(const wchar_t* text) const {
+  Trace(L"CQuorinProtocol::%s - %s\r\n", policy_.Name(), text);
+}
+
+void BlockDownload::TraceWhy(const wchar_t* text) const {
+  if (policy_.TellsWhy()) TraceText(text);
+}
