@@ -170,8 +170,6 @@ HRESULT CQuorinProtocol::DeleteFile(const wchar_t* name) {
   });
 }
 
-HRESULT CQuorinProtocol::RenameFile(const wchar_t*, const wchar_t*) { return E_NOTIMPL; }
-
 // Called once, before any operation: it needs no lock.
 void CQuorinProtocol::SetCallback(CIProtocolCallback* callback) { callback_ = callback; }
 

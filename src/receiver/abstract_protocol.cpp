@@ -30,6 +30,17 @@ HRESULT CAbstractProtocol::CheckConnection(HANDLE abort_event, short* answer) {
 }
 
 HRESULT CAbstractProtocol::UploadFile(const CFileInfo*, IStream*) { return E_NOTIMPL; }
+HRESULT CAbstractProtocol::DeleteFile(const wchar_t*) { return E_NOTIMPL; }
+HRESULT CAbstractProtocol::RenameFile(const wchar_t*, const wchar_t*) { return E_NOTIMPL; }
+HRESULT CAbstractProtocol::DCSetRcvBaudrate(DWORD) { return E_NOTIMPL; }
+HRESULT CAbstractProtocol::DCSetRcvRTSControl(BYTE) { return E_NOTIMPL; }
+HRESULT CAbstractProtocol::DCSetRcvParity(BYTE) { return E_NOTIMPL; }
+HRESULT CAbstractProtocol::DCSetRcvStopbits(BYTE) { return E_NOTIMPL; }
+
+void CAbstractProtocol::SetCallback(CIProtocolCallback* callback) {
+  const std::scoped_lock lock(callback_lock_);
+  callback_ = callback;
+}
 
 void CAbstractProtocol::Abort() { abort_.Abort(); }
 

@@ -19,7 +19,16 @@
 class CAbstractProtocol : public CIProtocol {
  public:
   HRESULT CheckConnection(HANDLE abort_event, short* answer) override;
+  // The operations that a family may not offer: E_NOTIMPL.
   HRESULT UploadFile(const CFileInfo* info, IStream* stream) override;
+  HRESULT DeleteFile(const wchar_t* name) override;
+  HRESULT RenameFile(const wchar_t* old_name, const wchar_t* new_name) override;
+  HRESULT DCSetRcvBaudrate(DWORD baud_rate) override;
+  HRESULT DCSetRcvRTSControl(BYTE rts) override;
+  HRESULT DCSetRcvParity(BYTE parity) override;
+  HRESULT DCSetRcvStopbits(BYTE stop_bits) override;
+
+  void SetCallback(CIProtocolCallback* callback) override;
   void Abort() override;
   HRESULT LockConnection(HANDLE abort_event) override;
   HRESULT UnlockConnection() override;
@@ -60,9 +69,10 @@ class CAbstractProtocol : public CIProtocol {
   // Whether a receiver of the family answers.
   virtual bool IsAnswering(HANDLE abort_event) = 0;
   // The receiver's half of RaiseSpeed. S_OK only when it was told and may have changed its speed.
-  virtual HRESULT RaiseReceiver(DWORD speed) = 0;
+  // A family whose files go at the speed that the link has need not override it.
+  virtual HRESULT RaiseReceiver(DWORD) { return E_NOTIMPL; }
   // Undoes it, for a host that could not follow. No abort that came before disturbs it.
-  virtual void SetReceiverBack(DWORD speed) = 0;
+  virtual void SetReceiverBack(DWORD) {}
 
   const wchar_t* class_name_;
   std::unique_ptr<CIConnection> connection_;  // declared last, so that the link is closed first

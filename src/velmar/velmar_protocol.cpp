@@ -163,11 +163,6 @@ HRESULT CVelmarProtocol::RenameFile(const wchar_t* old_name, const wchar_t* new_
       [&] { return CRenameFileCmd(ToNarrow(old_name).c_str(), ToNarrow(new_name).c_str()); });
 }
 
-void CVelmarProtocol::SetCallback(CIProtocolCallback* callback) {
-  const std::scoped_lock lock(callback_lock_);
-  callback_ = callback;
-}
-
 template <typename Change>
 HRESULT CVelmarProtocol::ChangePort(Change change) {
   if (!connection()) return kNotConnected;
@@ -188,8 +183,6 @@ HRESULT CVelmarProtocol::ChangePort(Change change) {
 HRESULT CVelmarProtocol::DCSetRcvBaudrate(DWORD baud_rate) {
   return ChangePort([&](PortConfigLog& settings) { settings.baud = static_cast<int>(baud_rate); });
 }
-
-HRESULT CVelmarProtocol::DCSetRcvRTSControl(BYTE) { return E_NOTIMPL; }
 
 HRESULT CVelmarProtocol::DCSetRcvParity(BYTE parity) {
   return ChangePort([&](PortConfigLog& settings) { settings.parity = parity; });

@@ -22,9 +22,7 @@ class CVelmarProtocol : public CAbstractProtocol, public VelmarCommands::CReadFi
   HRESULT DownloadFile(const wchar_t* name, IStream* stream, CProgressCallback* progress) override;
   HRESULT DeleteFile(const wchar_t* name) override;
   HRESULT RenameFile(const wchar_t* old_name, const wchar_t* new_name) override;
-  void SetCallback(CIProtocolCallback* callback) override;
   HRESULT DCSetRcvBaudrate(DWORD baud_rate) override;
-  HRESULT DCSetRcvRTSControl(BYTE rts) override;
   HRESULT DCSetRcvParity(BYTE parity) override;
   HRESULT DCSetRcvStopbits(BYTE stop_bits) override;
 

@@ -1,12 +1,13 @@
 #!/usr/bin/env python3
 """Refuses an #include that points up the layers, or across the borders of the project.
 
-  src/        the public header api/rcvlink.h is for all
-  cli/        of src/ only the public header
-  simulator/  nothing of src/, and src/ nothing of simulator/
+  include/    nothing of the project
+  src/        include/
+  cli/        include/, and nothing of src/
+  simulator/  nothing of the others, and nobody sees it
 
 In src/ and simulator/ a folder is a layer. It includes itself and lower ones, none of its own height:
-quorin and velmar do not see each other.
+families do not see each other.
 """
 
 import os
@@ -21,20 +22,18 @@ HEIGHTS = {
     "src/transport": 2,
     "src/commands": 3,
     "src/receiver": 4,
-    "src/quorin": 5,
-    "src/velmar": 5,
     "src/api": 6,
     "simulator": 0,
     "simulator/usb/driver": 0,
-    "simulator/quorin": 1,
-    "simulator/velmar": 1,
     "simulator/usb": 1,
     "simulator/ports": 2,
     "simulator/program": 3,
 }
+# A folder that holds such a file is a family's.
+FAMILY_HEIGHTS = {"src/{0}/{0}_protocol.h": 5, "simulator/{0}/receiver.h": 1}
 LAYERED_AREAS = ("src", "simulator")
-PUBLIC_HEADER = "src/api/rcvlink.h"
-INCLUDE_FOLDERS = ["", "src", "src/api"]
+SEEN_BY = {"include": ("src", "cli")}
+INCLUDE_FOLDERS = ["", "src", "include"]
 INCLUDE = re.compile(r'^\s*#\s*include\s*["<]([^">]+)[">]')
 SOURCE_ENDINGS = (".h", ".cpp", ".in", ".inc")
 
@@ -59,19 +58,28 @@ def area_of(path):
     return path.split("/")[0]
 
 
+def height(layer):
+    """None for a folder that is no layer."""
+    for pattern, family_height in FAMILY_HEIGHTS.items():
+        marker = pattern.format(os.path.basename(layer))
+        if os.path.dirname(marker) == layer and os.path.isfile(os.path.join(ROOT, marker)):
+            return family_height
+    return HEIGHTS.get(layer)
+
+
 def refusal(source, target):
     """Why `source` may not include `target`, or None."""
     area, target_area = area_of(source), area_of(target)
-    if target == PUBLIC_HEADER and area != "simulator":
+    if area in SEEN_BY.get(target_area, ()):
         return None
     if area != target_area:
         return f"{area}/ does not see {target_area}/"
     layer, target_layer = os.path.dirname(source), os.path.dirname(target)
     if area not in LAYERED_AREAS or layer == target_layer:
         return None
-    if target_layer not in HEIGHTS:
+    if height(target_layer) is None:
         return f"{target_layer}/ is not one of the layers"
-    if HEIGHTS[target_layer] >= HEIGHTS[layer]:
+    if height(target_layer) >= height(layer):
         return f"{target_layer}/ is not below {layer}/"
     return None
 
@@ -79,7 +87,7 @@ def refusal(source, target):
 def check(source):
     mistakes = []
     layer = os.path.dirname(source)
-    if area_of(source) in LAYERED_AREAS and layer not in HEIGHTS:
+    if area_of(source) in LAYERED_AREAS and height(layer) is None:
         return [f"{source}: {layer}/ is not one of the layers"]
     with open(os.path.join(ROOT, source), encoding="utf-8") as file:
         for number, line in enumerate(file, 1):
@@ -92,7 +100,7 @@ def check(source):
 
 
 def main():
-    files = [source for area in ("src", "cli", "simulator") for source in sources(area)]
+    files = [source for area in ("include", "src", "cli", "simulator") for source in sources(area)]
     mistakes = [mistake for source in files for mistake in check(source)]
     print("\n".join(mistakes) if mistakes else f"{len(files)} files keep to the layers")
     return 1 if mistakes or not files else 0

@@ -53,6 +53,7 @@ PROGRAMS = [
     Program("check_exports", "tests/bed/check_exports.py", SCRIPT),
     Program("check_statics", "tests/bed/check_statics.py", SCRIPT),
     Program("check_readme", "tests/bed/check_readme.py", SCRIPT),
+    Program("check_docs", "tests/bed/check_docs.py", SCRIPT),
     Program("simulator_tests", "build/native/bin/simulator_tests", NATIVE),
     Program("unit_tests", "build/release/bin/unit_tests.exe", WINE),
     Program("cli_unit_tests", "build/release/bin/cli_unit_tests.exe", WINE),
