@@ -5,6 +5,7 @@
 #include <cstdlib>
 #include <sstream>
 
+#include "families.h"
 #include "names.h"
 #include "options.h"
 #include "results.h"
@@ -79,6 +80,22 @@ std::string Examples() {
          "command.";
 }
 
+std::map<std::string, EProtocol> FamilyWords() {
+  std::map<std::string, EProtocol> words = {{"any", eProtocolAny}};
+  for (const Family& family : kFamilies)
+    words.emplace(FamilyWord(family.protocol), family.protocol);
+  return words;
+}
+
+/// "The family: any (default), quorin or velmar"
+std::string FamilyHelp() {
+  std::string help = "The family: any (default)";
+  for (const Family& family : kFamilies) {
+    help += (&family == &kFamilies.back() ? " or " : ", ") + FamilyWord(family.protocol);
+  }
+  return help;
+}
+
 void AddLinkOptions(CLI::App& app, Arguments& arguments) {
   AddWord<EInstanceType>(
       app,
@@ -87,13 +104,7 @@ void AddLinkOptions(CLI::App& app, Arguments& arguments) {
       "LINK",
       {{"serial", eInstanceSerial}, {"usb", eInstanceUSB}, {"any", eInstanceAny}},
       arguments.link);
-  AddWord<EProtocol>(
-      app,
-      "--protocol",
-      "The family: any (default), quorin or velmar",
-      "FAMILY",
-      {{"any", eProtocolAny}, {"quorin", eProtocolQuorin}, {"velmar", eProtocolVelmar}},
-      arguments.protocol);
+  AddWord<EProtocol>(app, "--protocol", FamilyHelp(), "FAMILY", FamilyWords(), arguments.protocol);
   app.get_option("--link")->envname("RCVLINK_LINK");
   app.get_option("--protocol")->envname("RCVLINK_PROTOCOL");
   app.add_option("--speed", arguments.speed, "Try this speed only, instead of searching for it")

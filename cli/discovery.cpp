@@ -6,6 +6,7 @@
 #include <utility>
 #include <vector>
 
+#include "families.h"
 #include "handle.h"
 #include "names.h"
 #include "port_list.h"
@@ -135,14 +136,17 @@ bool IsMissing(long code) {
 std::string OtherFamily(const Context& context, std::wstring port) {
   const Arguments& arguments = context.arguments;
   if (arguments.protocol == eProtocolAny || !IsOneTry(arguments)) return {};
-  const EProtocol other = arguments.protocol == eProtocolQuorin ? eProtocolVelmar : eProtocolQuorin;
   DCB settings = PortSettings(arguments.speed.value_or(0), arguments.rts.value_or(RtsMode::kOn));
-  void* receiver = nullptr;
-  devapi::CreateReceiverOnSerial(
-      port.data(), other, &settings, context.interrupt.event(), &receiver);
-  if (receiver == nullptr) return {};
-  devapi::CloseReceiver(receiver);
-  return FamilyName(other);
+  for (const Family& other : kFamilies) {
+    if (other.protocol == arguments.protocol) continue;
+    void* receiver = nullptr;
+    devapi::CreateReceiverOnSerial(
+        port.data(), other.protocol, &settings, context.interrupt.event(), &receiver);
+    if (receiver == nullptr) continue;
+    devapi::CloseReceiver(receiver);
+    return other.name;
+  }
+  return {};
 }
 
 /// What a result of the search on a link means to the user.
@@ -177,10 +181,10 @@ Failure SearchFailure(const Arguments& arguments, const SearchPlace& place, long
 
 }  // namespace
 
-long TryPort(const Context& context, DCB settings, void** receiver) {
+long TryPort(const Context& context, EProtocol family, DCB settings, void** receiver) {
   std::wstring port = context.arguments.port;
   return devapi::CreateReceiverOnSerial(
-      port.data(), context.arguments.protocol, &settings, context.interrupt.event(), receiver);
+      port.data(), family, &settings, context.interrupt.event(), receiver);
 }
 
 std::optional<DCB> CurrentSettings(const std::wstring& port) {

@@ -5,6 +5,8 @@
 #include <cctype>
 #include <charconv>
 
+#include "families.h"
+
 namespace cli {
 namespace {
 
@@ -67,19 +69,11 @@ std::optional<unsigned long> ParseValue(Setting setting, std::string_view text) 
   return word->value;
 }
 
-unsigned long ParityNumber(Parity parity, bool quorin) {
-  constexpr unsigned long kFirst = 1;  // odd for Quorin, even for Velmar
-  constexpr unsigned long kSecond = 2;
-  if (parity == Parity::kNone) return 0;
-  return (parity == Parity::kOdd) == quorin ? kFirst : kSecond;
-}
-
 }  // namespace
 
 std::string FamilyName(unsigned family) {
-  if (family == eProtocolQuorin) return "Quorin";
-  if (family == eProtocolVelmar) return "Velmar";
-  return "unknown";
+  const Family* const known = FindFamily(family);
+  return known == nullptr ? "unknown" : known->name;
 }
 
 std::string FamilyWord(unsigned family) {
@@ -108,8 +102,8 @@ std::optional<RtsMode> ParseRts(std::string_view word) {
 }
 
 std::optional<EProtocol> ParseFamily(std::string_view word) {
-  for (const EProtocol family : {eProtocolQuorin, eProtocolVelmar}) {
-    if (word == FamilyWord(family)) return family;
+  for (const Family& family : kFamilies) {
+    if (word == FamilyWord(family.protocol)) return family.protocol;
   }
   return std::nullopt;
 }
@@ -137,14 +131,16 @@ std::string ValueWord(const SettingChange& change) {
 }
 
 std::optional<unsigned long> FamilyNumber(const SettingChange& change, EProtocol family) {
-  const bool quorin = family == eProtocolQuorin;
+  const Family* const known = FindFamily(family);
+  if (known == nullptr) return std::nullopt;
   switch (change.setting) {
     case Setting::kParity:
-      return ParityNumber(static_cast<Parity>(change.value), quorin);
+      if (change.value == Value(Parity::kNone)) return 0;
+      return change.value == Value(Parity::kOdd) ? known->odd : known->even;
     case Setting::kStopBits:
-      return quorin ? change.value - 1 : change.value;
+      return change.value - 1 + known->one_stop_bit;
     case Setting::kRts:
-      if (!quorin) return std::nullopt;
+      if (!known->sets_rts) return std::nullopt;
       return change.value;
     case Setting::kBaud:
       break;

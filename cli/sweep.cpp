@@ -5,17 +5,18 @@
 #include <algorithm>
 #include <array>
 
+#include "families.h"
+
 namespace cli {
 namespace {
 
-// Fresh from the factory, or left behind by a download that raised the speed.
-constexpr std::array<unsigned long, 2> kQuorinUsual = {CBR_115200, CBR_9600};
-constexpr std::array<unsigned long, 2> kVelmarUsual = {CBR_9600, CBR_115200};
+constexpr std::array<unsigned long, 2> kUsualOfAny = {CBR_9600, CBR_115200};
 constexpr std::array<unsigned long, 3> kOtherSpeeds = {CBR_57600, CBR_38400, CBR_19200};
 constexpr std::array<RtsMode, 3> kRtsModes = {RtsMode::kOn, RtsMode::kHandshake, RtsMode::kOff};
 
 std::vector<unsigned long> SpeedsToTry(EProtocol protocol, unsigned long port_speed) {
-  const auto& usual = protocol == eProtocolQuorin ? kQuorinUsual : kVelmarUsual;
+  const Family* const family = FindFamily(protocol);
+  const auto& usual = family == nullptr ? kUsualOfAny : family->usual_speeds;
   std::vector<unsigned long> speeds(usual.begin(), usual.end());
   const auto add = [&speeds](unsigned long speed) {
     if (std::find(speeds.begin(), speeds.end(), speed) == speeds.end()) speeds.push_back(speed);
@@ -34,8 +35,10 @@ std::string InWords(const LineSetting& line) {
 }
 
 std::vector<EProtocol> FamiliesOf(EProtocol protocol) {
-  if (protocol == eProtocolQuorin || protocol == eProtocolVelmar) return {protocol};
-  return {eProtocolQuorin, eProtocolVelmar};
+  if (FindFamily(protocol) != nullptr) return {protocol};
+  std::vector<EProtocol> all;
+  for (const Family& family : kFamilies) all.push_back(family.protocol);
+  return all;
 }
 
 std::vector<Try> PlanSweep(EProtocol protocol,

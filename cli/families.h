@@ -1,0 +1,53 @@
+/// @file families.h
+/// What the program knows of each family of receivers.
+#ifndef RCVLINK_CLI_FAMILIES_H_
+#define RCVLINK_CLI_FAMILIES_H_
+
+#include <windows.h>
+
+#include <array>
+
+#include "rcvlink.h"
+
+namespace cli {
+
+struct Family {
+  EProtocol protocol;
+  const char* name;  ///< in small letters it is the word of --protocol
+  /// The speeds to try first: fresh from the factory, or left behind by a download that raised it.
+  std::array<unsigned long, 2> usual_speeds;
+  /// What the family's port settings take for odd and even parity and for one stop bit; two stop
+  /// bits are one more.
+  unsigned long odd;
+  unsigned long even;
+  unsigned long one_stop_bit;
+  bool sets_rts;  ///< offers to control its RTS line
+};
+
+/// A new family is one more entry.
+inline constexpr std::array kFamilies = {Family{.protocol = eProtocolQuorin,
+                                                .name = "Quorin",
+                                                .usual_speeds = {CBR_115200, CBR_9600},
+                                                .odd = 1,
+                                                .even = 2,
+                                                .one_stop_bit = 0,
+                                                .sets_rts = true},
+                                         Family{.protocol = eProtocolVelmar,
+                                                .name = "Velmar",
+                                                .usual_speeds = {CBR_9600, CBR_115200},
+                                                .odd = 2,
+                                                .even = 1,
+                                                .one_stop_bit = 1,
+                                                .sets_rts = false}};
+
+/// Null for a number that is no family's.
+constexpr const Family* FindFamily(unsigned protocol) {
+  for (const Family& family : kFamilies) {
+    if (family.protocol == static_cast<EProtocol>(protocol)) return &family;
+  }
+  return nullptr;
+}
+
+}  // namespace cli
+
+#endif  // RCVLINK_CLI_FAMILIES_H_
