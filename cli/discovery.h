@@ -39,7 +39,7 @@ FoundReceiver FindReceiverAt(const Context& context,
 
 /// One try on a serial port.
 /// @return as `devapi::CreateReceiverOnSerial`
-long TryPort(const Context& context, DCB settings, void** receiver);
+long TryPort(const Context& context, EProtocol family, DCB settings, void** receiver);
 
 /// The settings that a serial port has: those with which it was used last. Nothing when it cannot be
 /// opened.

@@ -136,7 +136,7 @@ void CheckSize(Receiver& receiver, const RemoteFile& file) {
   constexpr std::uint64_t kBlockBytes = 512;
   constexpr std::uint64_t kMostBytes = kMostBlocks * kBlockBytes;
   if (file.size <= kMostBytes || receiver.link() == eInstanceUSB) return;
-  if (receiver.Identify().family != eProtocolQuorin) return;
+  if (receiver.Family() != eProtocolQuorin) return;
   throw Failure{.tried = "download " + Printable(file.name),
                 .code = ResultOfWin32(ERROR_FILE_TOO_LARGE),
                 .meaning = "it has " + std::to_string(file.size) +

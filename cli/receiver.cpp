@@ -92,6 +92,10 @@ const Identity& Receiver::Identify() {
   return *identity_;
 }
 
+unsigned Receiver::Family() {
+  return setting_ ? static_cast<unsigned>(setting_->family) : Identify().family;
+}
+
 Directory Receiver::ListFiles() {
   Directory directory{.files = ReadDirectory()};
   directory.doubt = DoubtAbout(directory.files);

@@ -77,6 +77,10 @@ class Receiver {
   /// @throws Failure
   const Identity& Identify();
 
+  /// A number of EProtocol. Asked for only when the search did not tell it.
+  /// @throws Failure
+  unsigned Family();
+
   /// Reads the receiver's directory. Warns when some of it may be missing.
   /// @throws Failure
   Directory ListFiles();

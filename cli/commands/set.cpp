@@ -62,9 +62,9 @@ DCB Changed(DCB settings, const SettingChange& change) {
   return settings;
 }
 
-bool AnswersAt(const Context& context, const DCB& settings) {
+bool AnswersAt(const Context& context, EProtocol family, const DCB& settings) {
   void* receiver = nullptr;
-  TryPort(context, settings, &receiver);
+  TryPort(context, family, settings, &receiver);
   if (receiver == nullptr) return false;
   devapi::CloseReceiver(receiver);
   return true;
@@ -139,7 +139,7 @@ class Set : public Command {
     // What the RTS line does cannot be seen from here, nor what a receiver's port does over USB.
     const bool confirmed = found && change.setting != Setting::kRts;
     if (confirmed) {
-      Confirm(context, change, tried);
+      Confirm(context, found->family, change, tried);
       if (change.setting == Setting::kBaud) {
         found->line.speed = change.value;
         Remember(context, found);
@@ -163,7 +163,7 @@ class Set : public Command {
                                             const SettingChange& change,
                                             const std::string& tried) {
     Receiver receiver(context);
-    const unsigned family = receiver.Identify().family;
+    const unsigned family = receiver.Family();
     const auto number = FamilyNumber(change, static_cast<EProtocol>(family));
     if (!number) {
       throw Failure{.tried = tried,
@@ -181,14 +181,17 @@ class Set : public Command {
 
   /// Asks the receiver at its new setting, and when it does not answer there, at the old one.
   /// @throws Failure when it was not changed, or is lost
-  static void Confirm(Context& context, const SettingChange& change, const std::string& tried) {
+  static void Confirm(Context& context,
+                      EProtocol family,
+                      const SettingChange& change,
+                      const std::string& tried) {
     const auto before = CurrentSettings(context.arguments.port);
-    if (before && AnswersAt(context, Changed(*before, change))) return;
+    if (before && AnswersAt(context, family, Changed(*before, change))) return;
     Failure failure{.tried = tried, .code = ResultOfWin32(ERROR_DEVICE_NOT_CONNECTED)};
     if (context.interrupt.requested()) {
       failure.exit = ExitCode::kCancelled;
       failure.meaning = "ended by Ctrl-C while it was asked whether it had changed";
-    } else if (before && AnswersAt(context, *before)) {
+    } else if (before && AnswersAt(context, family, *before)) {
       failure.meaning = "refused: the receiver still answers as before";
       failure.hint = "Receivers know certain values only, such as 115200, 57600 or 9600.";
     } else {

@@ -84,6 +84,41 @@ TEST_F(Cli, ARefusedSpeedIsSaidToBeRefused) {
   }
 }
 
+// The other family is not asked again: it would take seconds in which nothing answers.
+TEST_F(Cli, ANewSpeedIsConfirmedByTheFamilyThatWasFound) {
+  const bed::SimulatedPort receiver({"velmar"}, {{"a.log", "a"}});
+  EXPECT_EQ(RunOn(receiver, {"set", "baud", "57600"}).status, kDone);
+  const std::string transcript = receiver.Transcript();
+  const size_t change = transcript.find("> COM 57600");
+  ASSERT_NE(change, std::string::npos) << transcript;
+  EXPECT_NE(transcript.find("> unlogall", change), std::string::npos);
+  EXPECT_EQ(transcript.find("%", change), std::string::npos) << transcript;
+}
+
+// A question that nobody needs is time at the cable. Two questions of each are the greeting's.
+TEST_F(Cli, CommandsAskOnlyWhatTheyNeed) {
+  const bed::SimulatedPort receiver({"quorin"}, {{"a.jps", "a"}, {"b.jps", "b"}});
+  const auto questions = [&receiver] {
+    const std::string transcript = receiver.Transcript();
+    size_t count = 0;
+    for (size_t at = 0; (at = transcript.find("\n> %", at)) != std::string::npos; ++at) ++count;
+    return count;
+  };
+  size_t before = questions();
+  for (const auto& [line, needed] :
+       std::vector<std::pair<std::vector<std::string>, size_t>>{{{"find"}, 4},
+                                                                {{"info"}, 4},
+                                                                {{"ls"}, 3},
+                                                                {{"get", "a.jps"}, 6},
+                                                                {{"rm", "b.jps"}, 5},
+                                                                {{"check"}, 4},
+                                                                {{"set", "baud", "9600"}, 5}}) {
+    EXPECT_EQ(RunOn(receiver, line).status, kDone) << line.front();
+    EXPECT_EQ(questions() - before, needed) << line.front() << "\n" << receiver.Transcript();
+    before = questions();
+  }
+}
+
 class SetMemory : public Cli {
  protected:
   // One family is asked only: each that is not there takes long.
