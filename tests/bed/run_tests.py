@@ -50,6 +50,7 @@ PORT_SETS = 8
 # Those with ports run side by side at the end, the longest first.
 PROGRAMS = [
     Program("check_layers", "tests/bed/check_layers.py", SCRIPT),
+    Program("check_sources", "tests/bed/check_sources.py", SCRIPT),
     Program("check_exports", "tests/bed/check_exports.py", SCRIPT),
     Program("check_statics", "tests/bed/check_statics.py", SCRIPT),
     Program("check_readme", "tests/bed/check_readme.py", SCRIPT),
