@@ -1,3 +1,5 @@
+/// @file files.h
+/// The files that a receiver serves.
 #ifndef SIMULATOR_FILES_H_
 #define SIMULATOR_FILES_H_
 

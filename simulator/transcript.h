@@ -1,3 +1,5 @@
+/// @file transcript.h
+/// The record of a session between host and receiver.
 #ifndef SIMULATOR_TRANSCRIPT_H_
 #define SIMULATOR_TRANSCRIPT_H_
 

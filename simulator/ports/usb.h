@@ -1,3 +1,5 @@
+/// @file usb.h
+/// A receiver on the bus of simulated USB devices (Windows).
 #ifndef SIMULATOR_PORTS_USB_H_
 #define SIMULATOR_PORTS_USB_H_
 

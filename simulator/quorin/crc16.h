@@ -1,3 +1,5 @@
+/// @file crc16.h
+/// The CRC of Quorin blocks.
 #ifndef SIMULATOR_QUORIN_CRC16_H_
 #define SIMULATOR_QUORIN_CRC16_H_
 

@@ -1,3 +1,5 @@
+/// @file receiver.h
+/// The simulated Quorin receiver.
 #ifndef SIMULATOR_QUORIN_RECEIVER_H_
 #define SIMULATOR_QUORIN_RECEIVER_H_
 

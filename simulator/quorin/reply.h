@@ -1,3 +1,5 @@
+/// @file reply.h
+/// The frame of a Quorin reply.
 #ifndef SIMULATOR_QUORIN_REPLY_H_
 #define SIMULATOR_QUORIN_REPLY_H_
 

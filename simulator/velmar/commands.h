@@ -1,3 +1,5 @@
+/// @file commands.h
+/// What a Velmar receiver does on each command.
 #ifndef SIMULATOR_VELMAR_COMMANDS_H_
 #define SIMULATOR_VELMAR_COMMANDS_H_
 

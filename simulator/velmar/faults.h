@@ -1,3 +1,5 @@
+/// @file faults.h
+/// What a Velmar receiver can be told to do wrong.
 #ifndef SIMULATOR_VELMAR_FAULTS_H_
 #define SIMULATOR_VELMAR_FAULTS_H_
 

@@ -1,3 +1,5 @@
+/// @file receiver.h
+/// The simulated Velmar receiver.
 #ifndef SIMULATOR_VELMAR_RECEIVER_H_
 #define SIMULATOR_VELMAR_RECEIVER_H_
 

@@ -1,3 +1,5 @@
+/// @file version.h
+/// A Velmar receiver's identity, and the log that tells it.
 #ifndef SIMULATOR_VELMAR_VERSION_H_
 #define SIMULATOR_VELMAR_VERSION_H_
 
