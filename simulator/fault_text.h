@@ -16,9 +16,6 @@
 
 namespace sim {
 
-// What the faults of all families have in common when they are written on a command line. Whatever
-// parses throws std::invalid_argument with a message for the user when the text does not fit.
-
 // "NAME=SIZE".
 SizeLie ParseSizeLie(std::string_view text);
 

@@ -9,8 +9,8 @@
 
 namespace sim {
 
-// Adds an option that may be given several times and whose texts are handed to `take`, which throws
-// std::invalid_argument when a text does not fit.
+// Adds an option that may be given several times. `take` gets each text, and throws
+// std::invalid_argument when the text does not fit.
 CLI::Option* AddTextOption(CLI::App& command,
                            const std::string& name,
                            const std::string& form,
