@@ -1,3 +1,6 @@
+/// @file fault_text.h
+/// The command-line form of faults, as far as all families share it. Whatever parses throws
+/// std::invalid_argument with a message for the user when the text does not fit.
 #ifndef SIMULATOR_FAULT_TEXT_H_
 #define SIMULATOR_FAULT_TEXT_H_
 
@@ -12,9 +15,6 @@
 #include "simulator/faults.h"
 
 namespace sim {
-
-// What the faults of all families have in common when they are written on a command line. Whatever
-// parses throws std::invalid_argument with a message for the user when the text does not fit.
 
 // "NAME=SIZE".
 SizeLie ParseSizeLie(std::string_view text);

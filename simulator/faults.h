@@ -1,3 +1,5 @@
+/// @file faults.h
+/// Faults of a receiver, as far as all families share them: how often they happen.
 #ifndef SIMULATOR_FAULTS_H_
 #define SIMULATOR_FAULTS_H_
 
@@ -10,7 +12,7 @@ namespace sim {
 inline constexpr uint32_t kOnce = 1;
 inline constexpr uint32_t kAlways = UINT32_MAX;
 
-// Uses up one occurrence of a fault; false when none is left.
+// Counts one occurrence of a fault; false when none is left.
 inline bool TakeOccurrence(uint32_t& times) {
   if (times == 0) {
     return false;
@@ -21,7 +23,7 @@ inline bool TakeOccurrence(uint32_t& times) {
   return true;
 }
 
-// The receiver tells this size for a file, whatever it sends.
+// The receiver gives the file this size, whatever it sends.
 struct SizeLie {
   std::string file;
   uint64_t size = 0;

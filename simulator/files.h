@@ -1,3 +1,5 @@
+/// @file files.h
+/// The files that a receiver serves.
 #ifndef SIMULATOR_FILES_H_
 #define SIMULATOR_FILES_H_
 
@@ -20,8 +22,8 @@ struct FileEntry {
   std::time_t modified = 0;
 };
 
-// The files a receiver serves: real ones of a folder, or ones made up in memory. Removing or
-// renaming a file changes what is served; nothing on disk is ever changed.
+// The files a receiver serves: those of a folder, or ones made up in memory. Removing or renaming a
+// file changes what is served; nothing on disk is ever changed.
 class FileStore {
  public:
   FileStore() = default;

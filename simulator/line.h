@@ -1,3 +1,5 @@
+/// @file line.h
+/// The receiver's end of a link: its speed, and what it still has to send.
 #ifndef SIMULATOR_LINE_H_
 #define SIMULATOR_LINE_H_
 
@@ -19,12 +21,12 @@ struct LineOptions {
   uint32_t speed = kDefaultSpeed;
   // The speed that is taken, whatever is asked for; 0 means what is asked for.
   uint32_t stray_speed = 0;
-  // What passes between two ends of different speed arrives as garbage; otherwise not at all.
+  // Bytes between two ends of different speed arrive as garbage; otherwise they do not arrive.
   bool garbled = false;
   // Output takes the time it needs on a wire, 10 bits a byte.
   bool paced = false;
-  // Output comes in pieces of this many bytes with a pause between them, wherever one message ends
-  // and the next begins; 0 means message by message.
+  // Output comes in pieces of this many bytes with a pause between them. A piece may hold the end
+  // of one message and the start of the next. 0 means message by message.
   size_t piece_size = 0;
   uint32_t piece_gap_ms = kDefaultPieceGapMs;
 };
@@ -60,7 +62,7 @@ class Line {
   // How many bytes have not left yet.
   size_t Waiting() const;
 
-  // Takes back what has not left yet. A change of speed that was to follow it happens now.
+  // Discards what has not left yet. A change of speed that was to follow it happens now.
   void DropOutput();
 
   std::optional<uint64_t> NextSendTime() const;

@@ -1,3 +1,5 @@
+/// @file receiver.h
+/// What a port needs to know of a receiver, of whatever family.
 #ifndef SIMULATOR_RECEIVER_H_
 #define SIMULATOR_RECEIVER_H_
 
@@ -10,8 +12,8 @@
 
 namespace sim {
 
-// A receiver at the far end of a link. It never sleeps and owns no clock: whoever plugs it in hands
-// in the time, so that the same receiver runs behind a real port and in memory.
+// A receiver at the far end of a link. It never sleeps and owns no clock: its caller passes the
+// time, so that the same receiver runs on a real port and in memory.
 //
 // `host_speed` is the speed in bit/s the host's end of the link is set to at that moment; 0 stands
 // for a link that has no speed (USB).
@@ -22,20 +24,20 @@ class Receiver {
   // Bytes the host sent arrive.
   virtual void Receive(std::span<const uint8_t> bytes, uint32_t host_speed, uint64_t now_ms) = 0;
 
-  // When the next output is due, or nothing while the receiver has nothing to say. The answer
+  // When the next output is due, or nothing while the receiver has nothing to send. The answer
   // changes with every call of Receive and Send.
   virtual std::optional<uint64_t> NextSendTime() const = 0;
 
-  // Gives one write's worth of output, which may be empty: what is sent at a speed that the host
-  // does not listen at is lost. Call it until NextSendTime lies in the future.
+  // Gives the output of one write. It may be empty: bytes at a speed that the host does not listen
+  // at are lost. Call this until NextSendTime lies in the future.
   virtual Bytes Send(uint64_t now_ms, uint32_t host_speed) = 0;
 
   // True once the receiver has gone from the link for good, as when its plug is pulled.
   virtual bool gone() const = 0;
 
-  // How many of `bytes` end with the last command in them that changes the line speed; 0 if none
-  // does. A port that cannot tell whether bytes were sent before or after the host changed its own
-  // speed takes the command that asks for a change as sent before it.
+  // The length of `bytes` up to the end of the last command that changes the line speed; 0 if there
+  // is none. Some ports cannot tell whether bytes were sent before or after the host changed its own
+  // speed. They take the command that asks for a change, and all before it, as sent before.
   virtual size_t EndOfSpeedCommand(std::span<const uint8_t> bytes) const {
     static_cast<void>(bytes);
     return 0;

@@ -1,3 +1,5 @@
+/// @file transcript.h
+/// The record of a session between host and receiver.
 #ifndef SIMULATOR_TRANSCRIPT_H_
 #define SIMULATOR_TRANSCRIPT_H_
 
@@ -15,9 +17,9 @@ namespace sim {
 std::string Escape(std::span<const uint8_t> bytes);
 std::string Escape(std::string_view text);
 
-// Writes what passes over a link, one event a line, flushed at once so that the file can be read
-// while the receiver runs. It holds no times and does not show how the bytes were cut into reads,
-// so two identical sessions give identical transcripts.
+// Writes what goes over a link, one event a line. Each line is flushed at once, so that the file can
+// be read while the receiver runs. There are no times in it, and it does not show how the bytes were
+// cut into reads: two identical sessions give identical transcripts.
 //
 //   > what the host sent        < what the receiver sent
 //   = a setting that took hold  - a remark
@@ -32,8 +34,7 @@ class Transcript {
   void FromHost(std::string_view text) { WriteLine('>', Escape(text)); }
   void FromHost(uint8_t control) { WriteLine('>', Escape(std::span(&control, 1))); }
 
-  // `description` is written as it is: bytes have to be escaped by the caller, a block is told in
-  // words instead.
+  // `description` is written as it is: the caller escapes bytes, and describes a block in words.
   void FromReceiver(std::string_view description) { WriteLine('<', description); }
 
   void Setting(std::string_view text) { WriteLine('=', text); }

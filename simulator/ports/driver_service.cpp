@@ -26,14 +26,14 @@ struct ServiceCloser {
 };
 using UniqueService = std::unique_ptr<SC_HANDLE, ServiceCloser>;
 
-// Holds off other programs that want to start the driver.
+// Makes other programs that want to start the driver wait.
 class StartLock {
  public:
   StartLock() : mutex_(CreateMutexW(nullptr, FALSE, kStartMutex)) {
     if (mutex_.get() == nullptr) {
       Throw(GetLastError(), "cannot make a mutex");
     }
-    // A program that died while it held the mutex has left nothing half done that matters.
+    // It does not matter if the last holder died: whatever it left half done is done again.
     WaitForSingleObject(mutex_.get(), INFINITE);
   }
   StartLock(const StartLock&) = delete;
@@ -96,7 +96,7 @@ UniqueService InstallService() {
   if (!service) {
     Throw(GetLastError(), "cannot open the USB bus driver's service");
   }
-  // It may be that of another build.
+  // The service may name the driver of another build.
   ChangeServiceConfigW(service.get(),
                        SERVICE_NO_CHANGE,
                        SERVICE_NO_CHANGE,
@@ -111,7 +111,7 @@ UniqueService InstallService() {
   return service;
 }
 
-// Errors that pass: the service manager is busy, or the driver is on its way up or down.
+// Errors that go away: the service manager is busy, or the driver is starting or stopping.
 bool MayPass(DWORD error) {
   return error == ERROR_SERVICE_ALREADY_RUNNING || error == ERROR_SERVICE_DATABASE_LOCKED ||
          error == ERROR_SERVICE_CANNOT_ACCEPT_CTRL || error == ERROR_SERVICE_REQUEST_TIMEOUT;

@@ -1,7 +1,7 @@
 #include "simulator/ports/host_speed.h"
 
-// These headers tell the speed as a number, not as one of a few codes. They cannot be used together
-// with <termios.h>, which is why this is a file of its own.
+// These headers give the speed as a number, not as one of a few codes. They cannot be used together
+// with <termios.h>, so this is a file of its own.
 #include <asm/ioctls.h>
 #include <asm/termbits.h>
 #include <sys/ioctl.h>

@@ -1,3 +1,5 @@
+/// @file memory.h
+/// A receiver in memory, for tests: no port, no waiting.
 #ifndef SIMULATOR_PORTS_MEMORY_H_
 #define SIMULATOR_PORTS_MEMORY_H_
 
@@ -33,10 +35,10 @@ class MemoryPort {
   // Reads on until `size` bytes have come or `timeout_ms` have passed since the call.
   Bytes ReadFull(size_t size, uint64_t timeout_ms);
 
-  // Drops the bytes that wait for the host.
+  // Discards the bytes that wait for the host.
   void Purge();
 
-  // Lets time pass; what the receiver sends meanwhile waits for the host.
+  // Moves the clock; what the receiver sends in that time waits for the host.
   void Advance(uint64_t ms);
 
   uint64_t Now() const { return now_ms_; }

@@ -102,7 +102,7 @@ void PtyPort::PrepareSlave() {
   if (tcsetattr(slave_.get(), TCSANOW, &settings) != 0) {
     ThrowErrno("cannot set the pseudo-terminal");
   }
-  // In packet mode the master is told of changes of the settings in order with what it reads.
+  // In packet mode the master gets changes of the settings in order with the bytes that it reads.
   const int on = 1;
   if (ioctl(master_.get(), TIOCPKT, &on) != 0) {
     ThrowErrno("cannot switch the pseudo-terminal to packet mode");
@@ -110,7 +110,7 @@ void PtyPort::PrepareSlave() {
   AnnounceChanges();
 }
 
-// Changes are told only while the slave has this flag, which a host may clear without knowing it.
+// Changes are announced only while the slave has this flag, which a host may clear by accident.
 void PtyPort::AnnounceChanges() {
   termios settings{};
   if (tcgetattr(slave_.get(), &settings) == 0 && (settings.c_lflag & EXTPROC) == 0) {
@@ -168,14 +168,14 @@ void PtyPort::TakeInput(Receiver& receiver) {
       if (count < 0 && errno != EAGAIN && errno != EINTR) {
         ThrowErrno("cannot read from the pseudo-terminal");
       }
-      // Nothing waits, so whatever comes next is sent at the speed known by now.
+      // Nothing waits, so whatever comes next is sent at the speed known now.
       order_unknown_ = false;
       return;
     }
-    // The first byte of each packet tells what it is.
+    // The first byte of each packet says what kind it is.
     if (buffer[0] == TIOCPKT_DATA) {
-      // A change that was made while the read was under way is told only after the bytes that were
-      // written behind it.
+      // A change that was made during the read is announced only after the bytes that were written
+      // after it.
       NoteSpeed();
       Deliver(receiver, std::span(buffer).subspan(1, static_cast<size_t>(count) - 1));
     } else if ((buffer[0] & TIOCPKT_IOCTL) != 0) {
@@ -193,8 +193,9 @@ void PtyPort::NoteSpeed() {
   }
 }
 
-// News of a changed speed overtakes the bytes that were written just before the change. On a wire
-// the command that asks for the change is out by then, so it is taken as sent at the old speed.
+// The announcement of a new speed comes before the bytes that were written just before the change.
+// On a wire the command that asks for the change has left by then, so it counts as sent at the old
+// speed.
 void PtyPort::Deliver(Receiver& receiver, std::span<const uint8_t> bytes) {
   if (std::exchange(order_unknown_, false)) {
     const size_t earlier = receiver.EndOfSpeedCommand(bytes);

@@ -1,3 +1,5 @@
+/// @file pty.h
+/// A receiver on a pseudo-terminal, which a host opens like a serial port (Linux).
 #ifndef SIMULATOR_PORTS_PTY_H_
 #define SIMULATOR_PORTS_PTY_H_
 
@@ -29,7 +31,7 @@ class Descriptor {
 };
 
 // A symbolic link that lives as long as the object. It replaces a link or file of that name in one
-// step, and at the end is taken away only if it is still the same one.
+// step. At the end it is removed, unless another link has replaced it.
 class PortLink {
  public:
   // Makes no link when `path` is empty. Throws std::filesystem::filesystem_error.

@@ -98,7 +98,7 @@ void UsbPort::Serve(UsbDevice& device, const Receiver& receiver, HANDLE stop) {
     } else if (!actions.empty()) {
       Call(usb_bus::kAct, actions);
     }
-    // The stop comes first, so that it is seen whatever else has happened.
+    // The stop is the first handle, so that it is seen even when others are set too.
     const std::array<HANDLE, 2> events = {stop, waiting_call_.event()};
     const DWORD happened = WaitForMultipleObjects(
         static_cast<DWORD>(events.size()), events.data(), /*bWaitAll=*/FALSE, WaitTime(receiver));

@@ -1,3 +1,5 @@
+/// @file usb.h
+/// A receiver on the bus of simulated USB devices (Windows).
 #ifndef SIMULATOR_PORTS_USB_H_
 #define SIMULATOR_PORTS_USB_H_
 
@@ -15,17 +17,17 @@
 
 namespace sim {
 
-// A call of the bus that may be on its way for a while. One at a time.
+// A call of the bus that may be pending for a while. One at a time.
 class BusCall {
  public:
   // `bus` must outlive the object.
   explicit BusCall(HANDLE bus);
   BusCall(const BusCall&) = delete;
   BusCall& operator=(const BusCall&) = delete;
-  // Takes back a call that is on its way.
+  // Cancels a call that is pending, and waits for its end.
   ~BusCall();
 
-  // `input` need not outlive the call of this, `output` must live until the end.
+  // `input` is copied; `output` must live until the call has ended.
   void Start(uint32_t code, std::span<const uint8_t> input, std::span<uint8_t> output);
   bool on_its_way() const { return on_its_way_; }
   // Set when it has ended.
@@ -61,7 +63,7 @@ class UsbPort {
 
   UniqueHandle bus_;
   Bytes requests_;
-  // Behind what they use, so that they end first.
+  // After what they use, so that they end first.
   BusCall waiting_call_;
   BusCall call_;
   std::chrono::steady_clock::time_point start_;

@@ -23,7 +23,7 @@ volatile std::sig_atomic_t stop_requested = 0;
 
 void RequestStop(int) { stop_requested = 1; }
 
-// Lets the signals that end the program in only while it waits; gives the mask to wait with.
+// Blocks the signals that end the program; gives the mask that lets them in, for the waits.
 sigset_t CatchSignals() {
   sigset_t ending;
   sigemptyset(&ending);
@@ -59,7 +59,7 @@ void AddPortOptions(CLI::App& command, PortOptions& port, sim::LineOptions& line
       ->check(CLI::PositiveNumber)
       ->group(sim::kPortGroup);
   command
-      .add_flag("--garbled", line.garbled, "at a wrong speed bytes arrive as garbage, not as none")
+      .add_flag("--garbled", line.garbled, "at a wrong speed, deliver garbage instead of nothing")
       ->group(sim::kPortGroup);
   command.add_flag("--pace", line.paced, "send no faster than the line speed")
       ->group(sim::kPortGroup);

@@ -20,11 +20,11 @@ void AddFileOptions(CLI::App& command, FileOptions& files) {
       ->required()
       ->check(RefuseMissingFolder)
       ->type_name("DIR");
-  command.add_option("--transcript", files.transcript, "write down what passes")->type_name("FILE");
+  command.add_option("--transcript", files.transcript, "record the session")->type_name("FILE");
 }
 
 void AddPieceOptions(CLI::App& command, LineOptions& line) {
-  command.add_option("--pieces", line.piece_size, "send in pieces of so many bytes")
+  command.add_option("--pieces", line.piece_size, "send in pieces of this many bytes")
       ->type_name("BYTES")
       ->check(CLI::PositiveNumber)
       ->group(kPortGroup);

@@ -1,3 +1,5 @@
+/// @file port_options.h
+/// What the two programs have in common, whatever the family and the port.
 #ifndef SIMULATOR_PROGRAM_PORT_OPTIONS_H_
 #define SIMULATOR_PROGRAM_PORT_OPTIONS_H_
 
@@ -16,7 +18,7 @@ inline constexpr const char* kPortGroup = "Port";
 // The path that a command line in UTF-8 names.
 std::filesystem::path ToPath(const std::string& text);
 
-// What is asked about the files, whatever the family and the port.
+// Which files are served, and which one is written.
 struct FileOptions {
   std::string folder;
   std::string transcript;
@@ -24,7 +26,7 @@ struct FileOptions {
 
 void AddFileOptions(CLI::App& command, FileOptions& files);
 
-// Sending in pieces, which any port can.
+// Sending in pieces, which every port can do.
 void AddPieceOptions(CLI::App& command, LineOptions& line);
 
 // A stream that is not open when there is no path. Throws std::runtime_error.

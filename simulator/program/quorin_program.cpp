@@ -10,10 +10,10 @@ namespace sim {
 namespace {
 
 constexpr const char* kReceiverGroup = "Receiver";
-constexpr const char* kBlockGroup = "Block faults (BLOCK[@TIMES], blocks from 0, once unless told)";
+constexpr const char* kBlockGroup = "Block faults (BLOCK[@TIMES], blocks from 0, once by default)";
 constexpr const char* kReplyGroup =
-    "Reply faults (COMMAND is how a command begins, 'ping' the empty line, '*' any; always unless "
-    "told)";
+    "Reply faults (COMMAND is the start of a command, 'ping' the empty line, '*' any; always by "
+    "default)";
 constexpr const char* kOtherGroup = "Other faults";
 
 struct BlockFaultOption {
@@ -24,14 +24,16 @@ struct BlockFaultOption {
 
 constexpr std::array<BlockFaultOption, 9> kBlockFaults = {{
     {"--bad-crc", BlockFaultKind::kDamagedCrc, "a damaged CRC"},
-    {"--unchained-crc", BlockFaultKind::kUnchainedCrc, "a CRC not chained to the block before"},
+    {"--unchained-crc",
+     BlockFaultKind::kUnchainedCrc,
+     "a CRC that does not go on from the block before"},
     {"--bad-sequence", BlockFaultKind::kWrongSequence, "a wrong sequence number"},
     {"--bad-end", BlockFaultKind::kWrongEnd, "a wrong end byte"},
     {"--lost-byte", BlockFaultKind::kLostByte, "one byte of the payload missing"},
     {"--bad-type", BlockFaultKind::kUnknownType, "an unknown block type"},
-    {"--end-block", BlockFaultKind::kEndBlock, "instead of it, a block of type '#'"},
-    {"--end-byte", BlockFaultKind::kEndByte, "instead of it, '#' alone"},
-    {"--block-silence", BlockFaultKind::kSilence, "silence ahead of the block"},
+    {"--end-block", BlockFaultKind::kEndBlock, "a block of type '#' instead of the block"},
+    {"--end-byte", BlockFaultKind::kEndByte, "'#' alone instead of the block"},
+    {"--block-silence", BlockFaultKind::kSilence, "silence before the block"},
 }};
 
 struct ReplyFaultOption {
@@ -43,24 +45,21 @@ struct ReplyFaultOption {
 
 constexpr std::array<ReplyFaultOption, 7> kReplyFaults = {{
     {"--refuse", ReplyFaultKind::kRefused, "COMMAND[@TIMES]", "answer with ER"},
-    {"--mute", ReplyFaultKind::kMute, "COMMAND[@TIMES]", "take no notice of the command"},
+    {"--mute", ReplyFaultKind::kMute, "COMMAND[@TIMES]", "ignore the command"},
     {"--reply-silence", ReplyFaultKind::kSilence, "SECONDS[:COMMAND][@TIMES]", "answer late"},
     {"--garbage",
      ReplyFaultKind::kGarbageBefore,
      "BYTES[:COMMAND][@TIMES]",
-     "bytes that are no message ahead of the reply"},
+     "so many bytes of garbage before the reply"},
     {"--other-tag-first",
      ReplyFaultKind::kOtherTagBefore,
      "COMMAND[@TIMES]",
-     "a message with another tag ahead of the reply"},
-    {"--other-tag",
-     ReplyFaultKind::kOtherTagOnly,
-     "COMMAND[@TIMES]",
-     "the reply carries another tag"},
+     "a message with another tag before the reply"},
+    {"--other-tag", ReplyFaultKind::kOtherTagOnly, "COMMAND[@TIMES]", "a reply with another tag"},
     {"--bad-length",
      ReplyFaultKind::kWrongLength,
      "BYTES[:COMMAND][@TIMES]",
-     "the reply's header is off by so many bytes (write --bad-length=-3 for fewer)"},
+     "a reply with a wrong length in its header, by so many bytes (fewer: --bad-length=-3)"},
 }};
 
 void AddIdentityOptions(CLI::App& command, QuorinOptions& options) {
@@ -75,14 +74,16 @@ void AddIdentityOptions(CLI::App& command, QuorinOptions& options) {
       ->capture_default_str()
       ->check(CLI::IsMember({'a', 'b', 'c', 'd'}))
       ->group(kReceiverGroup);
-  command.add_option("--port-name", identity.port_name, "what it calls the port, e.g. /dev/usb")
+  command
+      .add_option(
+          "--port-name", identity.port_name, "the port's name on the receiver, e.g. /dev/usb")
       ->group(kReceiverGroup);
-  command.add_flag("--echo", options.echo, "send back what is heard until that is turned off")
+  command.add_flag("--echo", options.echo, "echo each byte until the host turns that off")
       ->group(kReceiverGroup);
   command
       .add_flag("--empty-last-block",
                 options.empty_last_block,
-                "a file that fills its last block is followed by an empty one")
+                "send an empty block after a file that fills its last one")
       ->group(kReceiverGroup);
 }
 
@@ -103,7 +104,7 @@ void AddBlockFaults(CLI::App& command, Faults& faults) {
       command,
       "--negative-length",
       "TIMES",
-      "a last block of negative length",
+      "a last block with a negative length",
       [&faults](const std::string& text) {
         faults.blocks.push_back({BlockFaultKind::kNegativeLength, 0, ParseTimes(text), 0});
       })
@@ -111,7 +112,7 @@ void AddBlockFaults(CLI::App& command, Faults& faults) {
   command
       .add_option("--vanish-after",
                   faults.vanish_after_block,
-                  "hang up and end when the host has answered the block")
+                  "hang up and end after the host has answered the block")
       ->type_name("BLOCK")
       ->group(kBlockGroup);
 }
@@ -133,12 +134,12 @@ void AddReplyFaults(CLI::App& command, Faults& faults) {
 void AddOtherFaults(CLI::App& command, Faults& faults) {
   command.add_flag("--keep-speed", faults.keeps_speed, "refuse to change the line speed")
       ->group(kOtherGroup);
-  command.add_flag("--long-names", faults.long_names, "list file names of more than 32 bytes")
+  command.add_flag("--long-names", faults.long_names, "list file names with more than 32 bytes")
       ->group(kOtherGroup);
   AddTextOption(command,
                 "--lie-size",
                 "NAME=SIZE",
-                "tell another size for a file than is sent",
+                "give the file this size, whatever is sent",
                 [&faults](const std::string& text) { faults.sizes.push_back(ParseSizeLie(text)); })
       ->group(kOtherGroup);
 }

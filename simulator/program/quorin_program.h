@@ -1,3 +1,5 @@
+/// @file quorin_program.h
+/// The command line of a Quorin receiver.
 #ifndef SIMULATOR_PROGRAM_QUORIN_PROGRAM_H_
 #define SIMULATOR_PROGRAM_QUORIN_PROGRAM_H_
 

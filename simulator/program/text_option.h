@@ -1,3 +1,5 @@
+/// @file text_option.h
+/// Options whose text is a small language of its own, such as "3@always".
 #ifndef SIMULATOR_PROGRAM_TEXT_OPTION_H_
 #define SIMULATOR_PROGRAM_TEXT_OPTION_H_
 
@@ -7,8 +9,8 @@
 
 namespace sim {
 
-// Adds an option that may be given several times and whose texts are handed to `take`, which throws
-// std::invalid_argument when a text does not fit.
+// Adds an option that may be given several times. `take` gets each text, and throws
+// std::invalid_argument when the text does not fit.
 CLI::Option* AddTextOption(CLI::App& command,
                            const std::string& name,
                            const std::string& form,

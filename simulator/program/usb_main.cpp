@@ -32,7 +32,7 @@ struct LocalFreer {
   void operator()(wchar_t** memory) const { LocalFree(memory); }
 };
 
-// The words behind the program's name in UTF-8, from the last to the first.
+// The words after the program's name in UTF-8, from the last to the first.
 std::vector<std::string> CommandLineWords() {
   int count = 0;
   const std::unique_ptr<wchar_t*, LocalFreer> words(CommandLineToArgvW(GetCommandLineW(), &count));
@@ -44,7 +44,7 @@ std::vector<std::string> CommandLineWords() {
   return reversed;
 }
 
-// Lives as long as the program, as the system and a thread set it at any time.
+// Lives as long as the program: the system and a thread may set it at any time.
 HANDLE StopEvent() {
   static const sim::UniqueHandle event(
       CreateEventW(nullptr, /*bManualReset=*/TRUE, FALSE, nullptr));
@@ -56,7 +56,7 @@ BOOL WINAPI StopForControl(DWORD) {
   return TRUE;
 }
 
-// Whoever has started the program ends it by closing its input, and does so when it dies.
+// The parent ends the program by closing its input. That also happens when the parent dies.
 void StopAtEndOfInput() {
   const HANDLE input = GetStdHandle(STD_INPUT_HANDLE);
   std::array<char, 256> ignored;

@@ -10,7 +10,7 @@ namespace sim {
 namespace {
 
 constexpr const char* kDeviceGroup = "USB device";
-constexpr const char* kFaultGroup = "USB faults (always unless told, write errors once)";
+constexpr const char* kFaultGroup = "USB faults (always by default, write errors once)";
 constexpr const char* kEndpointForm = "ADDRESS[@TIMES]";
 
 void AddDeviceOptions(CLI::App& command, UsbOptions& options) {
@@ -19,7 +19,7 @@ void AddDeviceOptions(CLI::App& command, UsbOptions& options) {
       command,
       "--endpoints",
       "ADDRESS[:TYPE],...",
-      "other endpoints than 0x81,0x02; bulk unless told",
+      "other endpoints than 0x81,0x02; bulk by default",
       [&descriptor](const std::string& text) { descriptor.endpoints = ParseEndpoints(text); })
       ->group(kDeviceGroup);
   command
@@ -36,10 +36,13 @@ void AddDeviceOptions(CLI::App& command, UsbOptions& options) {
   command
       .add_option("--endpoint-length",
                   descriptor.endpoint_length,
-                  "the length that endpoint descriptors tell; longer ones are filled up")
+                  "the length of endpoint descriptors; longer ones are filled up with zeros")
       ->type_name("BYTES")
       ->group(kDeviceGroup);
-  command.add_option("--total-length", descriptor.total_length, "tell this length of it all")
+  command
+      .add_option("--total-length",
+                  descriptor.total_length,
+                  "the total length in the descriptor, instead of the true one")
       ->type_name("BYTES")
       ->group(kDeviceGroup);
   command
@@ -54,8 +57,9 @@ void AddDeviceOptions(CLI::App& command, UsbOptions& options) {
 
 void AddFaults(CLI::App& command, UsbFaults& faults) {
   command
-      .add_option(
-          "--short-descriptor", faults.short_descriptor, "give no more bytes of the descriptor")
+      .add_option("--short-descriptor",
+                  faults.short_descriptor,
+                  "give only so many bytes of the descriptor")
       ->type_name("BYTES")
       ->group(kFaultGroup);
   AddTextOption(command,
@@ -84,7 +88,7 @@ void AddFaults(CLI::App& command, UsbFaults& faults) {
       command,
       "--write-error",
       "NUMBER[:WRITES][@TIMES]",
-      "writes fail with the error, such as 0xE0000001, after so many that went well",
+      "writes fail with the error, such as 0xE0000001, after so many good ones",
       [&faults](const std::string& text) { faults.writes.push_back(ParseWriteError(text)); })
       ->group(kFaultGroup);
 }

@@ -1,3 +1,5 @@
+/// @file usb_options.h
+/// The command line of a simulated USB device.
 #ifndef SIMULATOR_PROGRAM_USB_OPTIONS_H_
 #define SIMULATOR_PROGRAM_USB_OPTIONS_H_
 

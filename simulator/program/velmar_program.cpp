@@ -13,9 +13,9 @@ namespace sim {
 namespace {
 
 constexpr const char* kReceiverGroup = "Receiver";
-constexpr const char* kChunkGroup = "Chunk faults (CHUNK[@TIMES], chunks from 0, once unless told)";
+constexpr const char* kChunkGroup = "Chunk faults (CHUNK[@TIMES], chunks from 0, once by default)";
 constexpr const char* kReplyGroup =
-    "Reply faults (COMMAND is how a command begins, '*' any; always unless told)";
+    "Reply faults (COMMAND is the start of a command, '*' any; always by default)";
 constexpr const char* kOtherGroup = "Other faults";
 
 struct ChunkFaultOption {
@@ -32,19 +32,19 @@ constexpr std::array<ChunkFaultOption, 7> kChunkFaults = {{
     {"--message-length",
      VelmarChunkFaultKind::kMessageLength,
      "CHUNK:BYTES[@TIMES]",
-     "the header tells another message length"},
+     "another message length in the header"},
     {"--body-length",
      VelmarChunkFaultKind::kBodyLength,
      "CHUNK:BYTES[@TIMES]",
-     "the message really is of another length, cut off or filled up"},
+     "a message of another length, cut off or filled up with zeros"},
     {"--header-length",
      VelmarChunkFaultKind::kHeaderLength,
      "CHUNK:BYTES[@TIMES]",
-     "the header tells another header length"},
+     "another header length in the header"},
     {"--chunk-silence",
      VelmarChunkFaultKind::kSilence,
      "CHUNK:SECONDS[@TIMES]",
-     "silence ahead of the chunk"},
+     "silence before the chunk"},
 }};
 
 struct ReplyFaultOption {
@@ -65,7 +65,7 @@ constexpr std::array<ReplyFaultOption, 16> kReplyFaults = {{
      VelmarReplyFaultKind::kRefusedBare,
      kCommandForm,
      "answer with an error that has no text"},
-    {"--mute", VelmarReplyFaultKind::kMute, kCommandForm, "take no notice of the command"},
+    {"--mute", VelmarReplyFaultKind::kMute, kCommandForm, "ignore the command"},
     {"--reply-silence", VelmarReplyFaultKind::kSilence, kSecondsForm, "answer late"},
     {"--late-prompt",
      VelmarReplyFaultKind::kLatePrompt,
@@ -78,7 +78,7 @@ constexpr std::array<ReplyFaultOption, 16> kReplyFaults = {{
     {"--garbage",
      VelmarReplyFaultKind::kGarbageBefore,
      kBytesForm,
-     "bytes that are no reply ahead of it"},
+     "so many bytes of garbage before the reply"},
     {"--endless-prompt",
      VelmarReplyFaultKind::kEndlessPrompt,
      kBytesForm,
@@ -86,11 +86,11 @@ constexpr std::array<ReplyFaultOption, 16> kReplyFaults = {{
     {"--line-end-after-prompt",
      VelmarReplyFaultKind::kLineEndAfterPrompt,
      kCommandForm,
-     "CR LF behind the prompt"},
+     "CR LF after the prompt"},
     {"--abbreviated-log",
      VelmarReplyFaultKind::kAbbreviatedLog,
      kCommandForm,
-     "an abbreviated log behind the prompt, and nothing else"},
+     "an abbreviated log after the prompt, and nothing else"},
     {"--bad-log-crc",
      VelmarReplyFaultKind::kDamagedCrc,
      kCommandForm,
@@ -98,23 +98,23 @@ constexpr std::array<ReplyFaultOption, 16> kReplyFaults = {{
     {"--open-quotes",
      VelmarReplyFaultKind::kOpenQuotes,
      kCommandForm,
-     "the last log ends within quotation marks"},
+     "a last log that ends within quotation marks"},
     {"--fields",
      VelmarReplyFaultKind::kFewerFields,
      kNumberForm,
-     "the bodies of logs end behind so many fields"},
+     "log bodies that end after so many fields"},
     {"--count",
      VelmarReplyFaultKind::kCount,
      kNumberForm,
-     "logs tell so many components or ports (write --count=-1 for a negative number)"},
+     "another number of components or ports in logs (negative: --count=-1)"},
     {"--sequence-gap",
      VelmarReplyFaultKind::kSequenceGap,
      kNumberForm,
-     "a sequence number is left out ahead of this log (from 0, so 1 at least)"},
+     "a sequence number is left out before this log (logs from 0; at least 1)"},
     {"--sequence-open",
      VelmarReplyFaultKind::kSequenceOpen,
      kCommandForm,
-     "the sequence numbers of logs end at 1"},
+     "sequence numbers of logs that end at 1"},
 }};
 
 void AddReceiverOptions(CLI::App& command, VelmarOptions& options) {
@@ -126,15 +126,16 @@ void AddReceiverOptions(CLI::App& command, VelmarOptions& options) {
       ->capture_default_str()
       ->group(kReceiverGroup);
   command
-      .add_option("--port-name", identity.port_name, "what it calls the port, e.g. COM2 or USB1")
+      .add_option(
+          "--port-name", identity.port_name, "the port's name on the receiver, e.g. COM2 or USB1")
       ->capture_default_str()
       ->group(kReceiverGroup);
-  // The first one given replaces those that the receiver has otherwise.
+  // The first one given replaces the default ones.
   auto replaced = std::make_shared<bool>(false);
   AddTextOption(command,
                 "--component",
                 "TYPE[:MODEL]",
-                "a component that it tells the version of, in the order given",
+                "a component in the version log, in the order given",
                 [&identity, replaced](const std::string& text) {
                   if (!*replaced) {
                     identity.components.clear();
@@ -147,7 +148,7 @@ void AddReceiverOptions(CLI::App& command, VelmarOptions& options) {
       .add_flag(
           "--no-components",
           [&identity](int64_t) { identity.components.clear(); },
-          "tells no component at all")
+          "a version log without components")
       ->group(kReceiverGroup);
   command.add_option("--chunk", options.chunk_length, "the bytes of a file in one log")
       ->capture_default_str()
@@ -163,12 +164,12 @@ void AddReceiverOptions(CLI::App& command, VelmarOptions& options) {
                 options.listing.blank_entry,
                 "list an empty directory as one file without a name")
       ->group(kReceiverGroup);
-  command.add_flag("--bare-errors", options.bare_errors, "errors have no text")
+  command.add_flag("--bare-errors", options.bare_errors, "answer with errors that have no text")
       ->group(kReceiverGroup);
   command
       .add_flag("--stop-for-commands",
                 options.stops_for_commands,
-                "any command ends a transfer, not only unlogall")
+                "end a transfer at any command, not only at unlogall")
       ->group(kReceiverGroup);
 }
 
@@ -187,11 +188,11 @@ void AddChunkFaults(CLI::App& command, VelmarFaults& faults) {
   command
       .add_flag("--endless-sequence",
                 faults.endless_sequence,
-                "the last chunk says that another one follows")
+                "a last chunk that says another one follows")
       ->group(kChunkGroup);
   command
       .add_option(
-          "--vanish-after", faults.vanish_after_chunk, "hang up and end when the chunk has left")
+          "--vanish-after", faults.vanish_after_chunk, "hang up and end after the chunk has left")
       ->type_name("CHUNK")
       ->group(kChunkGroup);
 }
@@ -214,7 +215,7 @@ void AddOtherFaults(CLI::App& command, VelmarFaults& faults) {
   command
       .add_flag("--keep-speed",
                 faults.keeps_speed,
-                "acknowledge commands that change the port and do nothing")
+                "acknowledge commands that change the port, and ignore them")
       ->group(kOtherGroup);
   command
       .add_flag("--hide-port",
@@ -224,7 +225,7 @@ void AddOtherFaults(CLI::App& command, VelmarFaults& faults) {
   AddTextOption(command,
                 "--lie-size",
                 "NAME=SIZE",
-                "tell another size for a file than is sent",
+                "give the file this size, whatever is sent",
                 [&faults](const std::string& text) { faults.sizes.push_back(ParseSizeLie(text)); })
       ->group(kOtherGroup);
 }

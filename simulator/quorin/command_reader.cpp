@@ -8,7 +8,8 @@ namespace {
 constexpr size_t kMaxLineLength = 1024;
 constexpr std::string_view kEchoOff = "#OFF#";
 
-// A '#' the host sent to end a transfer that had already ended stays in front of the next command.
+// A host may send '#' to end a transfer that has ended already. It then stands before the next
+// command.
 std::string_view WithoutStrayHashes(std::string_view line) {
   while (line.starts_with('#') && line != kEchoOff) {
     line.remove_prefix(1);

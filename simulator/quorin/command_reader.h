@@ -1,3 +1,5 @@
+/// @file command_reader.h
+/// From the bytes that a host sends to the commands of a Quorin receiver.
 #ifndef SIMULATOR_QUORIN_COMMAND_READER_H_
 #define SIMULATOR_QUORIN_COMMAND_READER_H_
 
@@ -20,8 +22,8 @@ class CommandReader {
   // Takes one byte; gives the line that it completes.
   std::optional<CommandLine> Push(uint8_t byte);
 
-  // Starts a new line with a '#' that has already been acted on: it may turn out to be the first
-  // character of "#OFF#".
+  // Starts a new line with a '#' that has taken effect already. It may also be the first character
+  // of "#OFF#".
   void RestartAfterHash();
 
   const std::string& unfinished() const { return raw_; }
@@ -31,14 +33,14 @@ class CommandReader {
   std::string text_;
 };
 
-// A command with the tag taken off.
+// A command without its tag.
 struct Command {
   std::optional<std::string> tag;
   std::string text;
 };
 
-// Splits "%tag%text". A tag whose command never came (the host gave up in between) is replaced by
-// the one that follows it.
+// Splits "%tag%text". When the host gave up after a tag, another tag follows; then the last one
+// counts.
 Command SplitTag(std::string_view line);
 
 }  // namespace sim

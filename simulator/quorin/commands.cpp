@@ -45,7 +45,7 @@ std::string_view Relative(std::string_view path) {
   return path;
 }
 
-// Takes `prefix` off `text` if it is there.
+// Removes `prefix` from `text` if it is there.
 bool Consume(std::string_view& text, std::string_view prefix) {
   if (!text.starts_with(prefix)) {
     return false;
@@ -88,7 +88,7 @@ QuorinCommandSet::QuorinCommandSet(QuorinIdentity identity, FileStore files)
 
 const PortSettings& QuorinCommandSet::port_settings(char letter) const { return ports_.at(letter); }
 
-Answer QuorinCommandSet::Carry(std::string_view command, const Faults& faults) {
+Answer QuorinCommandSet::Execute(std::string_view command, const Faults& faults) {
   if (command.empty()) {
     return {};
   }
@@ -173,7 +173,7 @@ Answer QuorinCommandSet::Set(std::string_view path_and_value, const Faults& faul
     }
     ports_[identity_.port_letter]["rate"] = value;
     Answer answer;
-    // The host has to read the reply before it can follow.
+    // The host must be able to read the reply, so the speed changes after it.
     answer.speed_after_reply = speed;
     return answer;
   }

@@ -1,3 +1,5 @@
+/// @file commands.h
+/// What a Quorin receiver does on each command.
 #ifndef SIMULATOR_QUORIN_COMMANDS_H_
 #define SIMULATOR_QUORIN_COMMANDS_H_
 
@@ -15,7 +17,7 @@
 
 namespace sim {
 
-// What a receiver tells about itself.
+// What a receiver says about itself.
 struct QuorinIdentity {
   std::string id = "QR00421";
   std::string model = "HVA3-G3T";
@@ -30,10 +32,10 @@ struct TransferRequest {
   size_t block_length = 0;
 };
 
-// What comes of a command.
+// The result of a command.
 struct Answer {
   bool ok = true;
-  // The texts of the messages to send, or the complaint when not ok.
+  // The texts of the messages to send, or the error text when not ok.
   std::vector<std::string> texts = {""};
 
   // What the receiver has to do about it.
@@ -42,11 +44,11 @@ struct Answer {
   std::optional<bool> echo = std::nullopt;
   std::optional<TransferRequest> transfer = std::nullopt;
   bool stop_output = false;
-  // What the transcript says about a setting that took hold; empty for nothing.
+  // What the transcript says about a setting that took effect; empty for nothing.
   std::string setting = {};
 };
 
-// Whether a command is carried out without a word when it has no tag.
+// Whether a command is executed without a reply when it has no tag.
 bool IsSilentWithoutTag(std::string_view command);
 
 // Understands the commands and keeps what they change.
@@ -54,8 +56,8 @@ class QuorinCommandSet {
  public:
   QuorinCommandSet(QuorinIdentity identity, FileStore files);
 
-  // `faults` decides on lies about sizes, drawn-out names and speeds.
-  Answer Carry(std::string_view command, const Faults& faults);
+  // `faults` says which sizes are wrong, which names are too long, and whether speeds change.
+  Answer Execute(std::string_view command, const Faults& faults);
 
   const FileStore& files() const { return files_; }
 

@@ -1,3 +1,5 @@
+/// @file crc16.h
+/// The CRC of Quorin blocks.
 #ifndef SIMULATOR_QUORIN_CRC16_H_
 #define SIMULATOR_QUORIN_CRC16_H_
 
@@ -6,8 +8,8 @@
 
 namespace sim {
 
-// CRC-16 of polynomial 0x1021, most significant bit first, nothing inverted. `start` is the value
-// that the bytes are chained to.
+// CRC-16 of polynomial 0x1021, most significant bit first, nothing inverted. It goes on from
+// `start`.
 uint16_t Crc16(std::span<const uint8_t> bytes, uint16_t start);
 
 }  // namespace sim

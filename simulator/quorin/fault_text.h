@@ -1,3 +1,6 @@
+/// @file fault_text.h
+/// The command-line form of the faults of a Quorin receiver. Whatever parses throws
+/// std::invalid_argument with a message for the user when the text does not fit.
 #ifndef SIMULATOR_QUORIN_FAULT_TEXT_H_
 #define SIMULATOR_QUORIN_FAULT_TEXT_H_
 
@@ -8,13 +11,10 @@
 
 namespace sim {
 
-// Faults as they are written on a command line. Each of these throws std::invalid_argument with a
-// message for the user when the text does not fit.
-
-// "BLOCK[@TIMES]", once unless told; for kSilence "BLOCK:SECONDS[@TIMES]".
+// "BLOCK[@TIMES]", once by default; for kSilence "BLOCK:SECONDS[@TIMES]".
 BlockFault ParseBlockFault(BlockFaultKind kind, std::string_view text);
 
-// "COMMAND[@TIMES]", always unless told; for the kinds with an amount "AMOUNT[:COMMAND][@TIMES]".
+// "COMMAND[@TIMES]", always by default; for the kinds with an amount "AMOUNT[:COMMAND][@TIMES]".
 // The amount is in seconds for kSilence and in bytes for the others.
 ReplyFault ParseReplyFault(ReplyFaultKind kind, std::string_view text);
 

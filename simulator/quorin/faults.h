@@ -1,3 +1,5 @@
+/// @file faults.h
+/// What a Quorin receiver can be told to do wrong.
 #ifndef SIMULATOR_QUORIN_FAULTS_H_
 #define SIMULATOR_QUORIN_FAULTS_H_
 
@@ -21,11 +23,11 @@ enum class BlockFaultKind {
   kNegativeLength,  // In the last block, whichever number that is.
   kEndBlock,        // A block of type '#': the receiver ends the transfer.
   kEndByte,         // '#' and nothing else: the receiver ends the transfer.
-  kSilence,         // The block comes, but late; NAKs heard meanwhile are dropped.
+  kSilence,         // The block comes, but late; ACK and NAK before it are discarded.
 };
 
-// Happens to the sendings of one block, the first `times` of them: once means that the block is
-// right when it is sent again.
+// Happens the first `times` that a block is sent: once means that the block is right when it is sent
+// again.
 struct BlockFault {
   BlockFaultKind kind = BlockFaultKind::kDamagedCrc;
   uint32_t block = 0;  // Blocks are counted from 0.
@@ -34,7 +36,7 @@ struct BlockFault {
 };
 
 enum class ReplyFaultKind {
-  kRefused,         // Answered with ER and not carried out.
+  kRefused,         // Answered with ER and not executed.
   kMute,            // As if the command had not been heard.
   kSilence,         // The reply comes `amount` ms late.
   kGarbageBefore,   // `amount` bytes that are no message come first.
@@ -43,7 +45,7 @@ enum class ReplyFaultKind {
   kWrongLength,     // The header's length is off by `amount`.
 };
 
-// What a fault's command is called when it concerns any command that is answered.
+// The command of a fault that concerns every command that is answered.
 inline constexpr std::string_view kAnyCommand = "*";
 // The name of the empty line.
 inline constexpr std::string_view kPingCommand = "ping";
@@ -62,20 +64,20 @@ struct Faults {
   std::vector<SizeLie> sizes = {};
   // Commands that change the line speed have no effect: ER when tagged, nothing otherwise.
   bool keeps_speed = false;
-  // File names in a listing are drawn out beyond 32 bytes.
+  // File names in a listing are padded to more than 32 bytes.
   bool long_names = false;
   // The receiver is gone once the host has answered this block.
   std::optional<uint32_t> vanish_after_block = std::nullopt;
 };
 
-// The block fault of one of the kinds that come instead of a good block, if one is due for this
-// sending; uses up one occurrence.
+// The fault that is due this time that the block is sent, other than a silence. Counts one
+// occurrence.
 std::optional<BlockFaultKind> TakeBlockFault(Faults& faults, uint32_t block, bool last);
 
-// How long the receiver is silent ahead of this sending of a block; uses up one occurrence.
+// How long the receiver is silent before it sends the block this time. Counts one occurrence.
 uint32_t TakeBlockSilence(Faults& faults, uint32_t block);
 
-// The fault of one kind that is due for a command; uses up one occurrence. `answered` tells whether
+// The fault of one kind that is due for a command. Counts one occurrence. `answered` says whether
 // the command would be answered.
 std::optional<ReplyFault> TakeReplyFault(Faults& faults,
                                          ReplyFaultKind kind,

@@ -44,7 +44,7 @@ QuorinReceiver::~QuorinReceiver() {
 
 void QuorinReceiver::Receive(std::span<const uint8_t> bytes, uint32_t host_speed, uint64_t now_ms) {
   for (const uint8_t byte : bytes) {
-    // Each byte for itself: a command among them may change the speed that the rest is heard at.
+    // One byte at a time: a command may change the speed at which the rest is heard.
     const std::optional<uint8_t> heard = line_.Hear(byte, host_speed);
     if (heard) {
       HearByte(*heard, now_ms);
@@ -102,8 +102,8 @@ void QuorinReceiver::HearControl(uint8_t byte, uint64_t now_ms) {
     reader_.RestartAfterHash();
     return;
   }
-  // An answer is listened for between two blocks only. Whatever comes while a block has not left
-  // cannot be meant for it, and acting on it would send blocks twice.
+  // An answer counts only between two blocks. One that comes while a block has not left yet cannot
+  // be meant for that block, and would make the receiver send blocks twice.
   if (line_.Idle()) {
     HearTransferAnswer(byte == kTransferAck, now_ms);
   }
@@ -130,12 +130,12 @@ void QuorinReceiver::HearLine(const CommandLine& line, uint64_t now_ms) {
     if (line.text.empty()) {
       return;
     }
-    // A host that starts anew does not know about the transfer of its predecessor.
+    // A host that starts anew does not know of a transfer that the last one left.
     transcript_.Remark("transfer abandoned");
     transfer_.reset();
     line_.DropOutput();
   }
-  CarryOut(SplitTag(line.text), now_ms);
+  Execute(SplitTag(line.text), now_ms);
 }
 
 void QuorinReceiver::FlushEcho(std::string_view line, uint64_t now_ms) {
@@ -146,7 +146,7 @@ void QuorinReceiver::FlushEcho(std::string_view line, uint64_t now_ms) {
   line_.Queue({std::exchange(unsent_echo_, {}), now_ms, description});
 }
 
-void QuorinReceiver::CarryOut(const Command& command, uint64_t now_ms) {
+void QuorinReceiver::Execute(const Command& command, uint64_t now_ms) {
   const bool answered = command.tag.has_value() || !IsSilentWithoutTag(command.text);
   if (TakeReplyFault(faults_, ReplyFaultKind::kMute, command.text, answered)) {
     return;
@@ -156,7 +156,7 @@ void QuorinReceiver::CarryOut(const Command& command, uint64_t now_ms) {
     answer.ok = false;
     answer.texts = {"{refused}"};
   } else {
-    answer = commands_.Carry(command.text, faults_);
+    answer = commands_.Execute(command.text, faults_);
   }
 
   if (answer.stop_output) {

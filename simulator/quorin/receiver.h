@@ -1,3 +1,5 @@
+/// @file receiver.h
+/// The simulated Quorin receiver.
 #ifndef SIMULATOR_QUORIN_RECEIVER_H_
 #define SIMULATOR_QUORIN_RECEIVER_H_
 
@@ -58,7 +60,7 @@ class QuorinReceiver : public Receiver {
   void HearLine(const CommandLine& line, uint64_t now_ms);
   void FlushEcho(std::string_view line, uint64_t now_ms);
 
-  void CarryOut(const Command& command, uint64_t now_ms);
+  void Execute(const Command& command, uint64_t now_ms);
   void SendAnswer(const Command& command, const Answer& answer, uint64_t now_ms);
   void QueueMessage(Bytes message, uint64_t not_before_ms);
 
@@ -78,7 +80,7 @@ class QuorinReceiver : public Receiver {
   bool gone_ = false;
 
   std::optional<Transfer> transfer_;
-  // The good CRC of the block that is out, or nothing before the first one.
+  // The right CRC of the block that was sent last, or nothing before the first one.
   std::optional<uint16_t> block_crc_;
 };
 

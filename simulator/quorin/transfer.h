@@ -1,3 +1,5 @@
+/// @file transfer.h
+/// A file as the blocks of a Quorin transfer.
 #ifndef SIMULATOR_QUORIN_TRANSFER_H_
 #define SIMULATOR_QUORIN_TRANSFER_H_
 
@@ -25,8 +27,8 @@ struct Block {
   uint16_t crc = 0;
 };
 
-// The sending of one file, block by block. Each block's CRC goes on from the block accepted before,
-// so a block that is sent again is the same to the bit.
+// The sending of one file, block by block. Each block's CRC goes on from that of the last block that
+// was accepted, so a block that is sent again has the same bytes.
 class Transfer {
  public:
   // With `empty_last`, a file that fills its last block exactly is followed by a last block of
@@ -40,13 +42,13 @@ class Transfer {
   // The current block; nothing if the file can no longer be read.
   std::optional<Block> CurrentBlock() const;
 
-  // The host has accepted the current block, which `crc` was the CRC of.
+  // The host has accepted the current block, whose CRC was `crc`.
   void Accept(uint16_t crc);
 
-  // Makes of a good block the bad one that the fault asks for.
+  // Makes the bad block that the fault asks for out of a good one.
   Block Spoil(const Block& block, BlockFaultKind fault) const;
 
-  // A block by which the receiver ends the transfer.
+  // The block with which the receiver ends the transfer.
   Block EndBlock() const;
 
  private:

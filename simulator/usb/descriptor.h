@@ -1,3 +1,5 @@
+/// @file descriptor.h
+/// The configuration descriptor of a simulated USB device.
 #ifndef SIMULATOR_USB_DESCRIPTOR_H_
 #define SIMULATOR_USB_DESCRIPTOR_H_
 
@@ -29,15 +31,15 @@ struct Endpoint {
   static constexpr uint8_t kDirectionBit = 0x80;
 };
 
-// How a device describes itself. It has one configuration, and that one interface.
+// How a device describes itself. It has one configuration with one interface.
 struct DescriptorOptions {
-  // Those that the receiver is reached through are the first bulk ones in and out.
+  // The receiver is on the first bulk one in and the first one out.
   std::vector<Endpoint> endpoints = {{kDefaultInEndpoint}, {kDefaultOutEndpoint}};
   // Class-specific descriptors stand between the interface and its endpoints.
   bool class_descriptor = false;
-  // The length that an endpoint descriptor tells. A longer one is filled up with zeros.
+  // The length in an endpoint descriptor. A longer one is filled up with zeros.
   uint8_t endpoint_length = kEndpointDescriptorLength;
-  // The whole length that is told, instead of the true one.
+  // The whole length in the descriptor, instead of the true one.
   std::optional<uint16_t> total_length = std::nullopt;
 };
 

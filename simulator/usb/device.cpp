@@ -117,7 +117,7 @@ void UsbDevice::TakeControl(const Request& request, std::span<const uint8_t> byt
   }
 }
 
-// The driver keeps the reads of the receiver's endpoint to itself.
+// Reads of the receiver's endpoint do not come here: the driver answers them itself.
 void UsbDevice::TakeRead(const Request& request) {
   const std::optional<uint8_t> address = BoundTo(request.handle);
   if (!address) {

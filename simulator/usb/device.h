@@ -1,3 +1,5 @@
+/// @file device.h
+/// A simulated USB device with a receiver in it.
 #ifndef SIMULATOR_USB_DEVICE_H_
 #define SIMULATOR_USB_DEVICE_H_
 
@@ -29,21 +31,21 @@ struct UsbOptions {
   bool configured = false;
 };
 
-// A USB device with a receiver in it: what a host asks for goes in, what the bus driver is to do
-// about it comes out.
+// A USB device with a receiver in it. It takes requests of hosts, and gives the actions that the bus
+// driver has to execute for them.
 class UsbDevice {
  public:
   // `receiver` and `transcript` must outlive the device.
   UsbDevice(const UsbOptions& options, Receiver& receiver, Transcript& transcript);
 
-  // Carries out a host's request, with the bytes that came with it.
+  // Executes a host's request, with the bytes that came with it.
   void Take(const usb_bus::Request& request, std::span<const uint8_t> bytes, uint64_t now_ms);
 
-  // Puts what the receiver has to say now on its way to the host: one write of it at a time, so
-  // that a receiver with a lot to send still listens.
+  // Sends what is due to the host. One write at a time, so that a receiver with a lot to send still
+  // listens.
   void SendDue(uint64_t now_ms);
 
-  // The actions that have come up since the last call, as the bus takes them.
+  // The actions since the last call, in the form of kAct (bus.h).
   Bytes TakeActions();
 
  private:
@@ -74,14 +76,14 @@ class UsbDevice {
   Receiver& receiver_;
   Transcript& transcript_;
   Bytes descriptor_;
-  // The endpoints that the receiver is reached through, if the device has them.
+  // The endpoints of the receiver, if the device has them.
   std::optional<uint8_t> in_;
   std::optional<uint8_t> out_;
   bool configured_;
   uint32_t writes_ = 0;
   // The endpoints that handles are bound to.
   std::map<uint32_t, uint8_t> bound_;
-  // Reads of endpoints that never have anything to say.
+  // Reads of endpoints that never send anything.
   std::vector<usb_bus::Request> idle_reads_;
   Bytes actions_;
 };

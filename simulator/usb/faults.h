@@ -1,3 +1,5 @@
+/// @file faults.h
+/// What a simulated USB device can be told to do wrong, and the command-line form of that.
 #ifndef SIMULATOR_USB_FAULTS_H_
 #define SIMULATOR_USB_FAULTS_H_
 
@@ -12,8 +14,8 @@
 
 namespace sim {
 
-// The two times that a host asks for the descriptor: with room for its header only, to learn its
-// length, and for all of it.
+// A host asks for the descriptor twice: first for its header, to learn the length, then for all of
+// it.
 enum class DescriptorPart { kHeader, kWhole };
 
 struct DescriptorRefusal {
@@ -21,13 +23,13 @@ struct DescriptorRefusal {
   uint32_t times = kAlways;
 };
 
-// An endpoint that something is refused for.
+// An endpoint for which requests are refused.
 struct EndpointRefusal {
   uint8_t address = 0;
   uint32_t times = kAlways;
 };
 
-// Writes fail after so many that went well, and what was written is lost.
+// Writes fail after `after` good ones, and their bytes are lost.
 struct WriteError {
   uint32_t status = 0;
   uint32_t after = 0;
@@ -35,7 +37,7 @@ struct WriteError {
 };
 
 struct UsbFaults {
-  // A descriptor is never told beyond this many bytes.
+  // No more bytes than this are given of a descriptor.
   std::optional<size_t> short_descriptor = std::nullopt;
   std::vector<DescriptorRefusal> descriptors = {};
   std::vector<EndpointRefusal> binds = {};
@@ -43,17 +45,17 @@ struct UsbFaults {
   std::vector<WriteError> writes = {};
 };
 
-// Whether a fault is due; uses up one occurrence.
+// Whether a fault is due. Counts one occurrence.
 bool TakeRefusal(std::vector<DescriptorRefusal>& refusals, DescriptorPart part);
 bool TakeRefusal(std::vector<EndpointRefusal>& refusals, uint8_t address);
-// The status that a write ends with after `written` that went well.
+// The status of a write after `written` good ones, if it fails.
 std::optional<uint32_t> TakeWriteError(std::vector<WriteError>& errors, uint32_t written);
 
 // The texts of a command line. They throw std::invalid_argument with a message for the user.
 
-// A number up to 32 bits, in decimal or with 0x in front.
+// A number of up to 32 bits, decimal or with 0x before it.
 uint32_t ParseCode(std::string_view text, std::string_view what);
-// "ADDRESS[:TYPE],..." with control, isochronous, bulk or interrupt; bulk unless told.
+// "ADDRESS[:TYPE],..." with control, isochronous, bulk or interrupt; bulk by default.
 std::vector<Endpoint> ParseEndpoints(std::string_view text);
 // "header[@TIMES]" or "whole[@TIMES]".
 DescriptorRefusal ParseDescriptorRefusal(std::string_view text);

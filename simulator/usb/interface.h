@@ -1,10 +1,11 @@
+/// @file interface.h
+/// What a host says to the USB driver that real receivers are attached through.
 #ifndef SIMULATOR_USB_INTERFACE_H_
 #define SIMULATOR_USB_INTERFACE_H_
 
 #include <cstddef>
 #include <cstdint>
 
-// What a host says to the USB driver that real receivers are attached through.
 namespace sim::usb {
 
 // Control codes.
@@ -32,8 +33,8 @@ inline constexpr size_t kAlternateOffset = 2;
 inline constexpr size_t kTransferOffset = 4;
 inline constexpr size_t kMaxInterfaces = 32;
 
-// What requests end with: NTSTATUS values, and the driver's own numbers, which reach the host's
-// GetLastError as they are.
+// Results of requests: NTSTATUS values, and the driver's own numbers, which the host gets from
+// GetLastError unchanged.
 inline constexpr uint32_t kSuccess = 0;
 inline constexpr uint32_t kInvalidParameter = 0xC000000D;
 inline constexpr uint32_t kInvalidDeviceRequest = 0xC0000010;

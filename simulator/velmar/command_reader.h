@@ -1,3 +1,5 @@
+/// @file command_reader.h
+/// From the bytes that a host sends to the commands of a Velmar receiver.
 #ifndef SIMULATOR_VELMAR_COMMAND_READER_H_
 #define SIMULATOR_VELMAR_COMMAND_READER_H_
 
@@ -10,7 +12,7 @@
 
 namespace sim {
 
-// Collects bytes into commands, which end in CR; a LF behind the CR is dropped.
+// Collects bytes into commands, which end in CR; a LF after the CR is discarded.
 class VelmarCommandReader {
  public:
   // Takes one byte; gives the command that it completes, without its end.
@@ -23,7 +25,7 @@ class VelmarCommandReader {
   bool after_end_ = false;
 };
 
-// Takes the first word off `text`, and the blanks around it.
+// Removes the first word from `text`, and the blanks around it; gives the word.
 std::string_view TakeWord(std::string_view& text);
 
 // Words, whatever their case.
@@ -33,8 +35,8 @@ bool StartsWithWord(std::string_view text, std::string_view start);
 // The word of the command that changes the line speed.
 inline constexpr std::string_view kPortCommand = "com";
 
-// How many of `bytes` end with the last command in them that changes the line speed, a LF behind it
-// included; 0 if there is none. `unfinished` is what came before of a command.
+// The length of `bytes` up to the end of the last command that changes the line speed, with a LF
+// after it; 0 if there is none. `unfinished` is the start of a command that came before `bytes`.
 size_t EndOfPortCommand(std::string_view unfinished, std::span<const uint8_t> bytes);
 
 }  // namespace sim

@@ -33,9 +33,9 @@ VelmarCommandSet::VelmarCommandSet(VelmarIdentity identity,
                                    FileStore files)
     : identity_(std::move(identity)), listing_(listing), files_(std::move(files)) {}
 
-VelmarAnswer VelmarCommandSet::Carry(std::string_view command,
-                                     uint32_t speed,
-                                     const VelmarFaults& faults) {
+VelmarAnswer VelmarCommandSet::Execute(std::string_view command,
+                                       uint32_t speed,
+                                       const VelmarFaults& faults) {
   const std::string_view word = TakeWord(command);
   if (SameWord(word, "interfacemode")) {
     return SetInterfaceMode(command);
@@ -152,8 +152,7 @@ VelmarAnswer VelmarCommandSet::LogFile() const {
   return answer.transfer ? answer : Complain("No current file");
 }
 
-// Names are not quoted and may have blanks in them: the name is all there is but for the word
-// behind it.
+// Names are not quoted and may have blanks in them: the name is everything before "all".
 VelmarAnswer VelmarCommandSet::SetCurrentFile(std::string_view arguments) {
   if (arguments.empty()) {
     current_file_.clear();
@@ -178,7 +177,7 @@ VelmarAnswer VelmarCommandSet::Delete(std::string_view arguments) {
   return files_.Remove(std::string(arguments)) ? VelmarAnswer{} : Complain("No such file");
 }
 
-// Where both names may have blanks in them, the old one is the longest that there is a file of.
+// Both names may have blanks in them: the old one is the longest that there is a file of.
 VelmarAnswer VelmarCommandSet::Rename(std::string_view arguments) {
   for (size_t blank = arguments.rfind(' '); blank != std::string_view::npos && blank > 0;
        blank = arguments.rfind(' ', blank - 1)) {
@@ -208,7 +207,7 @@ VelmarAnswer VelmarCommandSet::SetPort(std::string_view arguments, const VelmarF
   }
   port_ = *settings;
   VelmarAnswer answer;
-  // The host has to read the reply before it can follow.
+  // The host must be able to read the reply, so the speed changes after it.
   answer.speed_after_reply = settings->speed;
   answer.setting = "port " + settings->parity + " " + settings->data_bits + " " +
                    settings->stop_bits + " " + settings->handshake;

@@ -1,3 +1,5 @@
+/// @file commands.h
+/// What a Velmar receiver does on each command.
 #ifndef SIMULATOR_VELMAR_COMMANDS_H_
 #define SIMULATOR_VELMAR_COMMANDS_H_
 
@@ -15,11 +17,11 @@
 
 namespace sim {
 
-// What comes of a command.
+// The result of a command.
 struct VelmarAnswer {
-  // Why it was refused; empty if it was carried out.
+  // Why it was refused; empty if it was executed.
   std::string error = {};
-  // The reason is not told.
+  // The error is sent without its text.
   bool bare = false;
   std::vector<AsciiLog> logs = {};
   // The file to send, as binary logs.
@@ -28,14 +30,14 @@ struct VelmarAnswer {
   // What the receiver has to do about it.
   std::optional<uint32_t> speed_after_reply = std::nullopt;
   bool stop_logs = false;
-  // What the transcript says about a setting that took hold; empty for nothing.
+  // What the transcript says about a setting that took effect; empty for nothing.
   std::string setting = {};
 };
 
 struct VelmarListing {
-  // File names are told in quotation marks.
+  // File names are in quotation marks.
   bool quoted_names = false;
-  // An empty directory is told by one log with an empty name, not by none.
+  // An empty directory gives one log with an empty name, not none.
   bool blank_entry = false;
 };
 
@@ -44,8 +46,8 @@ class VelmarCommandSet {
  public:
   VelmarCommandSet(VelmarIdentity identity, const VelmarListing& listing, FileStore files);
 
-  // `speed` is that of the line; `faults` decides on lies about sizes and ports.
-  VelmarAnswer Carry(std::string_view command, uint32_t speed, const VelmarFaults& faults);
+  // `speed` is that of the line; `faults` says which sizes are wrong and which ports are missing.
+  VelmarAnswer Execute(std::string_view command, uint32_t speed, const VelmarFaults& faults);
 
   const FileStore& files() const { return files_; }
   const std::string& port_name() const { return identity_.port_name; }

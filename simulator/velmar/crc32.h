@@ -1,3 +1,5 @@
+/// @file crc32.h
+/// The CRC of Velmar logs.
 #ifndef SIMULATOR_VELMAR_CRC32_H_
 #define SIMULATOR_VELMAR_CRC32_H_
 

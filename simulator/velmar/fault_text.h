@@ -1,3 +1,6 @@
+/// @file fault_text.h
+/// The command-line form of the faults and components of a Velmar receiver. Whatever parses throws
+/// std::invalid_argument with a message for the user when the text does not fit.
 #ifndef SIMULATOR_VELMAR_FAULT_TEXT_H_
 #define SIMULATOR_VELMAR_FAULT_TEXT_H_
 
@@ -9,17 +12,14 @@
 
 namespace sim {
 
-// Faults as they are written on a command line. Each of these throws std::invalid_argument with a
-// message for the user when the text does not fit.
-
 bool HasAmount(VelmarChunkFaultKind kind);
 bool HasAmount(VelmarReplyFaultKind kind);
 
-// "CHUNK[@TIMES]", once unless told; for the kinds with an amount "CHUNK:AMOUNT[@TIMES]". The
+// "CHUNK[@TIMES]", once by default; for the kinds with an amount "CHUNK:AMOUNT[@TIMES]". The
 // amount is in seconds for kSilence and in bytes for the others.
 VelmarChunkFault ParseChunkFault(VelmarChunkFaultKind kind, std::string_view text);
 
-// "COMMAND[@TIMES]", always unless told; for the kinds with an amount "AMOUNT[:COMMAND][@TIMES]".
+// "COMMAND[@TIMES]", always by default; for the kinds with an amount "AMOUNT[:COMMAND][@TIMES]".
 // The amount is in seconds for whatever comes late.
 VelmarReplyFault ParseReplyFault(VelmarReplyFaultKind kind, std::string_view text);
 

@@ -1,3 +1,5 @@
+/// @file faults.h
+/// What a Velmar receiver can be told to do wrong.
 #ifndef SIMULATOR_VELMAR_FAULTS_H_
 #define SIMULATOR_VELMAR_FAULTS_H_
 
@@ -15,7 +17,7 @@ enum class VelmarChunkFaultKind {
   kDamagedCrc,
   kFlippedBit,  // The last bit of the data is wrong on the wire; the CRC is that of the right one.
   kWrongSync,   // The first of the three sync bytes is right, the others are not; the CRC fits.
-  kMessageLength,  // The header says `amount`, the body is as ever; the CRC fits.
+  kMessageLength,  // The header says `amount`, the body is unchanged; the CRC fits.
   kBodyLength,     // The body has `amount` bytes, cut off or filled up with 0; header and CRC fit.
   kHeaderLength,   // The header says that it has `amount` bytes; the CRC fits.
   kSilence,        // The chunk comes `amount` ms late.
@@ -30,7 +32,7 @@ struct VelmarChunkFault {
 };
 
 enum class VelmarReplyFaultKind {
-  kRefused,             // Answered with an error and not carried out.
+  kRefused,             // Answered with an error and not executed.
   kRefusedBare,         // The same with an error that has no text.
   kMute,                // As if the command had not been heard.
   kSilence,             // The reply comes `amount` ms late.
@@ -42,13 +44,13 @@ enum class VelmarReplyFaultKind {
   kAbbreviatedLog,      // An abbreviated log comes instead of what was asked for.
   kDamagedCrc,          // The CRC of every ASCII log is damaged.
   kOpenQuotes,          // The body of the last ASCII log ends within quotation marks.
-  kFewerFields,         // The body of every ASCII log ends behind `amount` fields.
-  kCount,               // A body that tells how many entries it has tells `amount`.
-  kSequenceGap,         // A number is left out ahead of the ASCII log `amount`, from 0.
+  kFewerFields,         // The body of every ASCII log ends after `amount` fields.
+  kCount,               // A body that begins with its number of entries says `amount`.
+  kSequenceGap,         // A number is left out before the ASCII log `amount`, from 0.
   kSequenceOpen,        // The sequence numbers of the ASCII logs end at 1.
 };
 
-// What a fault's command is called when it concerns all of them.
+// The command of a fault that concerns every command.
 inline constexpr std::string_view kAnyVelmarCommand = "*";
 
 // Happens to the commands that begin with `command`, whatever its case. A fault in a log happens
@@ -74,17 +76,17 @@ struct VelmarFaults {
   std::optional<uint32_t> vanish_after_chunk = std::nullopt;
 };
 
-// The fault of one kind that is due for this sending of a chunk; uses up one occurrence.
+// The fault of one kind that is due this time that the chunk is sent. Counts one occurrence.
 std::optional<VelmarChunkFault> TakeChunkFault(VelmarFaults& faults,
                                                VelmarChunkFaultKind kind,
                                                uint64_t chunk);
 
-// The fault of one kind that is due for a command; uses up one occurrence.
+// The fault of one kind that is due for a command. Counts one occurrence.
 std::optional<VelmarReplyFault> TakeReplyFault(VelmarFaults& faults,
                                                VelmarReplyFaultKind kind,
                                                std::string_view command);
 
-// The size that the receiver tells for a file.
+// The size that the receiver gives for a file.
 uint64_t ToldSize(const VelmarFaults& faults, std::string_view file, uint64_t size);
 
 // The word for a fault in a transcript.

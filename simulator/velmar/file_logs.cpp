@@ -43,7 +43,7 @@ std::vector<AsciiLog> DirectoryLogs(const std::vector<FileEntry>& files, bool qu
   std::vector<AsciiLog> logs;
   for (const FileEntry& file : files) {
     const std::string name = quoted_names ? Quoted(file.name) : file.name;
-    // What lies between size and date is a mark for the file that is being written: none is.
+    // Between size and date there is a mark for a file that is being written. No file is.
     logs.push_back(
         {"DIRENTA", name + "," + std::to_string(file.size) + ",0," + DateAndTime(file.modified)});
   }

@@ -8,7 +8,7 @@
 namespace sim {
 namespace {
 
-// The receiver's clock stands still, so that the same session gives the same bytes every time.
+// The receiver's clock stands still, so that equal sessions give equal bytes.
 constexpr uint16_t kWeek = 2290;
 constexpr uint32_t kMillisecondsOfWeek = 172'800'000;
 constexpr std::string_view kSecondsOfWeek = "172800.000";

@@ -1,3 +1,5 @@
+/// @file log.h
+/// The frames of Velmar logs: ASCII, abbreviated and binary.
 #ifndef SIMULATOR_VELMAR_LOG_H_
 #define SIMULATOR_VELMAR_LOG_H_
 
@@ -29,7 +31,7 @@ std::string FrameAsciiLog(const AsciiLog& log,
 // The same log abbreviated, which has no CRC.
 std::string FrameAbbreviatedLog(std::string_view name, std::string_view port_name);
 
-// A binary log with what its header says, be it right or not.
+// A binary log, with a header that may be wrong.
 struct BinaryLog {
   uint16_t message_id = 0;
   uint8_t port_address = 0;
@@ -48,7 +50,7 @@ Bytes FrameBinaryLog(const BinaryLog& log);
 void AppendLittleEndian16(Bytes& bytes, uint16_t value);
 void AppendLittleEndian32(Bytes& bytes, uint32_t value);
 
-// A log's body cut behind its first `count` fields.
+// A log's body, cut after its first `count` fields.
 std::string FirstFields(std::string_view body, size_t count);
 
 // A log's body that ends within quotation marks.

@@ -34,7 +34,7 @@ std::optional<uint32_t> ParseSpeed(std::string_view text) {
   return speed;
 }
 
-// Takes the next word of `arguments`, which must be one of `choices` unless there is none.
+// Takes the next word of `arguments`, if there is one; it must be one of `choices`.
 bool TakeChoice(std::string_view& arguments,
                 std::span<const std::string_view> choices,
                 std::string& value) {

@@ -1,3 +1,5 @@
+/// @file port_settings.h
+/// The settings of a Velmar receiver's serial ports.
 #ifndef SIMULATOR_VELMAR_PORT_SETTINGS_H_
 #define SIMULATOR_VELMAR_PORT_SETTINGS_H_
 

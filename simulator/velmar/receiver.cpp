@@ -14,7 +14,7 @@ constexpr const char* kRefusal = "Refused";
 // No reply starts within these: there is no CR, LF or '<' among them.
 constexpr std::string_view kGarbage = "\x81$GK\xFF,27*\x0F?";
 
-// How long the plug stays in after the last byte, so that a host can take it from the port.
+// How long the port stays open after the last byte, so that a host can read that byte.
 constexpr uint64_t kUnplugMs = 500;
 
 Bytes MakeGarbage(int64_t count) {
@@ -48,7 +48,7 @@ VelmarReceiver::~VelmarReceiver() {
 
 void VelmarReceiver::Receive(std::span<const uint8_t> bytes, uint32_t host_speed, uint64_t now_ms) {
   for (const uint8_t byte : bytes) {
-    // Each byte for itself: a command among them may change the speed that the rest is heard at.
+    // One byte at a time: a command may change the speed at which the rest is heard.
     const std::optional<uint8_t> heard = line_.Hear(byte, host_speed);
     if (!heard && !unheard_) {
       transcript_.Remark("not heard at " + std::to_string(host_speed));
@@ -73,7 +73,7 @@ void VelmarReceiver::HearCommand(std::string_view command, uint64_t now_ms) {
   if (command.empty() || TakeReplyFault(faults_, VelmarReplyFaultKind::kMute, command)) {
     return;
   }
-  const VelmarAnswer answer = CarryOut(command);
+  const VelmarAnswer answer = Execute(command);
   if (transfer_ && (answer.stop_logs || stops_for_commands_)) {
     transcript_.Remark("transfer stopped");
     transfer_.reset();
@@ -84,7 +84,7 @@ void VelmarReceiver::HearCommand(std::string_view command, uint64_t now_ms) {
   SendAnswer(command, answer, now_ms);
 }
 
-VelmarAnswer VelmarReceiver::CarryOut(std::string_view command) {
+VelmarAnswer VelmarReceiver::Execute(std::string_view command) {
   VelmarAnswer refusal;
   refusal.error = kRefusal;
   if (TakeReplyFault(faults_, VelmarReplyFaultKind::kRefused, command)) {
@@ -94,7 +94,7 @@ VelmarAnswer VelmarReceiver::CarryOut(std::string_view command) {
     refusal.bare = true;
     return refusal;
   }
-  VelmarAnswer answer = commands_.Carry(command, line_.speed(), faults_);
+  VelmarAnswer answer = commands_.Execute(command, line_.speed(), faults_);
   answer.bare = bare_errors_;
   return answer;
 }
@@ -235,8 +235,8 @@ Bytes VelmarReceiver::Send(uint64_t now_ms, uint32_t host_speed) {
   return bytes;
 }
 
-// Chunks are made as the line needs them, and no sooner than all before has left, but that a piece
-// may have the end of one and the beginning of the next in it.
+// A chunk is made when the line has sent everything before it. It is made earlier only where a piece
+// holds the end of one chunk and the start of the next.
 bool VelmarReceiver::ChunkDue(uint64_t now_ms) const {
   return transfer_ && silence_ms_ == 0 && silent_until_ms_ <= now_ms &&
          line_.Waiting() < std::max<size_t>(piece_size_, 1);

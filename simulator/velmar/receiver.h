@@ -1,3 +1,5 @@
+/// @file receiver.h
+/// The simulated Velmar receiver.
 #ifndef SIMULATOR_VELMAR_RECEIVER_H_
 #define SIMULATOR_VELMAR_RECEIVER_H_
 
@@ -56,7 +58,7 @@ class VelmarReceiver : public Receiver {
 
  private:
   void HearCommand(std::string_view command, uint64_t now_ms);
-  VelmarAnswer CarryOut(std::string_view command);
+  VelmarAnswer Execute(std::string_view command);
   void SendAnswer(std::string_view command, const VelmarAnswer& answer, uint64_t now_ms);
   void SendLogs(std::string_view command, std::vector<AsciiLog> logs, uint64_t due_ms);
   std::vector<uint32_t> SequenceNumbers(std::string_view command, size_t count);
@@ -82,7 +84,7 @@ class VelmarReceiver : public Receiver {
   bool gone_ = false;
 
   std::optional<VelmarTransfer> transfer_;
-  // How long the line stays silent ahead of the current chunk, and when that is over.
+  // How long the line is silent before the current chunk, and when that is over.
   uint64_t silence_ms_ = 0;
   uint64_t silent_until_ms_ = 0;
   bool vanishes_ = false;

@@ -30,7 +30,7 @@ VelmarTransfer::VelmarTransfer(const FileStore& files,
       chunk_length_(chunk_length),
       port_address_(PortAddress(port_name)) {}
 
-// How many chunks follow. There are files of more chunks than the field can tell.
+// How many chunks follow; the most that the field can hold where there are more.
 uint16_t VelmarTransfer::Sequence(const VelmarFaults& faults) const {
   const uint64_t left = file_.size - offset_;
   const uint64_t chunks = (left + chunk_length_ - 1) / chunk_length_;
@@ -51,7 +51,7 @@ std::optional<VelmarChunk> VelmarTransfer::CurrentChunk(VelmarFaults& faults) co
   log.message_id = kFileTransferId;
   log.port_address = port_address_;
   log.sequence = Sequence(faults);
-  // A chunk begins with where it belongs and how long it is.
+  // A chunk begins with its offset and its length.
   AppendLittleEndian32(log.body, static_cast<uint32_t>(offset_));
   AppendLittleEndian32(log.body, static_cast<uint32_t>(length));
   log.body.insert(log.body.end(), data->begin(), data->end());

@@ -1,3 +1,5 @@
+/// @file version.h
+/// A Velmar receiver's identity, and the log with it.
 #ifndef SIMULATOR_VELMAR_VERSION_H_
 #define SIMULATOR_VELMAR_VERSION_H_
 
@@ -8,7 +10,7 @@
 
 namespace sim {
 
-// A part of the receiver that has a version. Without a model of its own it has a plausible one.
+// A part of the receiver that has a version. Without a model it gets a plausible one.
 struct VelmarComponent {
   std::string type;
   std::string model = {};
@@ -17,14 +19,14 @@ struct VelmarComponent {
 // The part that stands for the receiver itself, whose model and serial number are the receiver's.
 inline constexpr const char* kReceiverCard = "GPSCARD";
 
-// What a receiver tells about itself.
+// What a receiver says about itself.
 struct VelmarIdentity {
   // The serial number.
   std::string id = "VM00731";
   std::string model = "VR4-L1L2";
   // What the receiver calls the port that the host is on.
   std::string port_name = "COM1";
-  // In the order in which they are told.
+  // In the order in which they are listed.
   std::vector<VelmarComponent> components = {{kReceiverCard}, {"DB_HEIGHTMODEL"}};
 };
 

@@ -1,9 +1,9 @@
 /// @file bus.h
 /// What the bus driver and the program that plays a device say to each other.
 ///
-/// A program opens the bus and plugs a device in. It is told what hosts ask of that device, and
-/// executes it. The driver itself knows nothing of USB. It only keeps the bytes on their way to the
-/// host, so that a read that is cancelled at the last moment loses none.
+/// A program opens the bus and plugs a device in. It then gets the requests of hosts for that
+/// device, and executes them. The driver itself knows nothing of USB. It only keeps the bytes on
+/// their way to the host, so that a read that is cancelled at the last moment loses none.
 ///
 /// Closing the handle unplugs the device. So does the program's death.
 #ifndef SIMULATOR_USB_DRIVER_BUS_H_
@@ -26,8 +26,8 @@ constexpr uint32_t BufferedCode(uint32_t function) {
 // Input: the name of the device, of 1 to kMaxNameLength UTF-16 letters, digits, '-', '_' or '.'.
 // The host then opens \\?\NAME.
 inline constexpr uint32_t kPlugIn = BufferedCode(0x800);
-// The device goes: whatever is pending fails, and so does every later request. No input. When it
-// is done, the path can no longer be opened.
+// Unplugs the device: pending requests fail, and so does every later one. No input. After the call
+// the path can no longer be opened.
 inline constexpr uint32_t kUnplug = BufferedCode(0x801);
 // Input: Actions, executed one after the other. The first that is wrong ends the call.
 inline constexpr uint32_t kAct = BufferedCode(0x802);
@@ -73,8 +73,8 @@ enum class ActionKind : uint32_t {
 
 enum class Reads : uint32_t {
   kUnchanged,
-  kGetTransfers,  // The handle's reads get what is sent, and are not told of.
-  kAreRequests    // They are requests, as they are in the beginning. Pending ones are cancelled.
+  kGetTransfers,  // The handle's reads get what is sent, and are no requests.
+  kAreRequests    // They are requests, as they are at first. Pending ones are cancelled.
 };
 
 // What a program does. Its bytes follow, and then the next action.
@@ -84,7 +84,7 @@ struct Action {
   ActionKind kind;
   // Of an answer, an NTSTATUS. With an error no byte reaches the host.
   uint32_t status;
-  // What the host is told as the number of bytes: all that follow, or how many of a write's.
+  // The number of bytes that the host gets as result: all that follow, or how many of a write's.
   uint32_t count;
   // What becomes of the reads of the handle that the request came from.
   Reads reads;
