@@ -27,12 +27,6 @@ inline const std::vector<std::string> kStart = {
 inline const std::vector<std::string> kBlocks = {"\x06", "#"};
 inline const std::vector<std::string> kRestore = {"%%set,cur/term/rate,9600\r\n", "speed 9600"};
 
-inline std::vector<std::string> Joined(std::initializer_list<std::vector<std::string>> parts) {
-  std::vector<std::string> all;
-  for (const auto& part : parts) all.insert(all.end(), part.begin(), part.end());
-  return all;
-}
-
 class QuorinDownloadTest : public QuorinDriverTest {
  protected:
   QuorinDownloadTest() {
