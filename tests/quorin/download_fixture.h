@@ -42,6 +42,13 @@ class QuorinDownloadTest : public QuorinDriverTest {
     });
   }
 
+  // Instead of the serial link. A speed of 0 would be one to raise.
+  void UseUsb() {
+    connection->instance_type = eInstanceUSB;
+    connection->speed = 0;
+    connection->speed_result = S_FALSE;
+    connection->set_speed_result = S_FALSE;
+  }
   HRESULT Download() { return driver.DownloadFile(L"A0101.log", &stream, nullptr); }
   void ExpectSaid(std::initializer_list<std::vector<std::string>> parts) {
     EXPECT_THAT(Said(), testing::ElementsAreArray(Joined(parts)));
