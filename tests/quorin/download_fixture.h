@@ -27,12 +27,6 @@ inline const std::vector<std::string> kStart = {
 inline const std::vector<std::string> kBlocks = {"\x06", "#"};
 inline const std::vector<std::string> kRestore = {"%%set,cur/term/rate,9600\r\n", "speed 9600"};
 
-inline std::vector<std::string> Joined(std::initializer_list<std::vector<std::string>> parts) {
-  std::vector<std::string> all;
-  for (const auto& part : parts) all.insert(all.end(), part.begin(), part.end());
-  return all;
-}
-
 class QuorinDownloadTest : public QuorinDriverTest {
  protected:
   QuorinDownloadTest() {
@@ -48,6 +42,13 @@ class QuorinDownloadTest : public QuorinDriverTest {
     });
   }
 
+  // Instead of the serial link. A speed of 0 would be one to raise.
+  void UseUsb() {
+    connection->instance_type = eInstanceUSB;
+    connection->speed = 0;
+    connection->speed_result = S_FALSE;
+    connection->set_speed_result = S_FALSE;
+  }
   HRESULT Download() { return driver.DownloadFile(L"A0101.log", &stream, nullptr); }
   void ExpectSaid(std::initializer_list<std::vector<std::string>> parts) {
     EXPECT_THAT(Said(), testing::ElementsAreArray(Joined(parts)));

@@ -3,6 +3,9 @@
 #include <gtest/gtest.h>
 
 #include <algorithm>
+#include <cstddef>
+#include <cstdio>
+#include <initializer_list>
 #include <string>
 #include <vector>
 
@@ -18,6 +21,10 @@ namespace {
 
 using QuorinDownload = QuorinDownloadTest;
 
+std::string LinkName(const testing::TestParamInfo<bool>& is_usb) {
+  return is_usb.param ? "USB" : "Serial";
+}
+
 TEST_F(QuorinDownload, RaisesTheSpeedGetsTheFileAndPutsTheSpeedBack) {
   EXPECT_EQ(Download(), S_OK);
   EXPECT_EQ(stream.bytes, content);
@@ -30,15 +37,6 @@ TEST_F(QuorinDownload, ReportsProgress) {
   Download();
   // 512 * 99 / 600 + 1
   EXPECT_THAT(progress.percents, ElementsAre(0, 1, 85, 100));
-}
-
-TEST_F(QuorinDownload, EmptiesTheLineBeforeItStartsTheTransfer) {
-  Download();
-  const auto& calls = connection->calls;
-  const auto start = std::ranges::find(calls, "write \x15");
-  ASSERT_NE(start, calls.end());
-  EXPECT_EQ(*(start - 1), "flush");
-  EXPECT_THAT(*(start - 2), testing::StartsWith("read "));
 }
 
 TEST_F(QuorinDownload, IsTraced) {
@@ -167,13 +165,33 @@ TEST_F(QuorinDownload, TakesAHostThatHadNothingToChange) {
   ExpectSaid({kSpeedUp, kStart, kBlocks, kRestore});
 }
 
+// Over both links. What is said is told without the speed, which is raised and put back on a serial one.
+class QuorinDownloadOverBoth : public QuorinDownload, public testing::WithParamInterface<bool> {
+ protected:
+  QuorinDownloadOverBoth() {
+    if (is_usb) UseUsb();
+  }
+
+  void ExpectSaidWithin(std::initializer_list<std::vector<std::string>> said) {
+    const std::vector<std::string> all = Joined(said);
+    if (is_usb) {
+      ExpectSaid({all});
+    } else {
+      ExpectSaid({kSpeedUp, all, kRestore});
+    }
+  }
+
+  const bool is_usb = GetParam();
+};
+
 // The speed is put back after every failure, and the failure is the result.
-class QuorinFailedDownload : public QuorinDownload {
+class QuorinFailedDownload : public QuorinDownloadOverBoth {
  protected:
   void ExpectFailure(HRESULT failure, std::initializer_list<std::vector<std::string>> said) {
+    const DWORD speed = connection->speed;
     EXPECT_EQ(Download(), failure);
-    ExpectSaid(said);
-    EXPECT_EQ(connection->speed, 9600U);
+    ExpectSaidWithin(said);
+    EXPECT_EQ(connection->speed, speed);
     EXPECT_TRUE(IsFreeForOthers(driver));
     char code[16] = {};
     std::snprintf(code, sizeof(code), "[0x%08X]", static_cast<unsigned>(failure));
@@ -185,71 +203,86 @@ class QuorinFailedDownload : public QuorinDownload {
   }
 };
 
-TEST_F(QuorinFailedDownload, OfAReceiverThatDoesNotAnswer) {
+INSTANTIATE_TEST_SUITE_P(Over, QuorinDownloadOverBoth, testing::Bool(), LinkName);
+INSTANTIATE_TEST_SUITE_P(Over, QuorinFailedDownload, testing::Bool(), LinkName);
+
+TEST_P(QuorinFailedDownload, OfAReceiverThatDoesNotAnswer) {
   receiver.On("\n", [](const std::string&) {});
-  ExpectFailure(kTimedOut, {kSpeedUp, Start(1), kRestore});
+  ExpectFailure(kTimedOut, {Start(1)});
 }
 
-TEST_F(QuorinFailedDownload, OfASizeThatIsRefused) {
+TEST_P(QuorinFailedDownload, OfASizeThatIsRefused) {
   receiver.Reply(kGetSize, "{no such file}", "ER");
-  ExpectFailure(kNotConnected, {kSpeedUp, Start(2), kRestore});
+  ExpectFailure(kNotConnected, {Start(2)});
   EXPECT_THAT(progress.percents, ElementsAre(0));
 }
 
-TEST_F(QuorinFailedDownload, OfAFileOfSizeZero) {
+TEST_P(QuorinFailedDownload, OfAFileOfSizeZero) {
   receiver.Reply(kGetSize, "0");
-  ExpectFailure(E_FAIL, {kSpeedUp, Start(2), kRestore});
+  ExpectFailure(E_FAIL, {Start(2)});
   EXPECT_TRUE(report.Has("CQuorinProtocol::DownloadFile - file [A0101.log] size is zero"));
   EXPECT_EQ(stream.writes, 0U);
 }
 
-TEST_F(QuorinFailedDownload, OfAFileWithoutASize) {
+TEST_P(QuorinFailedDownload, OfAFileWithoutASize) {
   receiver.Reply(kGetSize, "");
-  ExpectFailure(E_FAIL, {kSpeedUp, Start(2), kRestore});
+  ExpectFailure(E_FAIL, {Start(2)});
   EXPECT_TRUE(report.Has("CQuorinProtocol::DownloadFile - file [A0101.log] size is zero"));
 }
 
-TEST_F(QuorinFailedDownload, OfAFileOfNegativeSize) {
+TEST_P(QuorinFailedDownload, OfAFileOfNegativeSize) {
   receiver.Reply(kGetSize, "-5");
-  ExpectFailure(E_INVALIDARG, {kSpeedUp, kStart, {"#"}, kRestore});
+  ExpectFailure(E_INVALIDARG, {kStart, {"#"}});
   EXPECT_TRUE(report.Has("CQuorinProtocol::DownloadFile - file size [A0101.log] is -5 bytes"));
 }
 
-TEST_F(QuorinFailedDownload, OfAFileThatIsRefused) {
+TEST_P(QuorinFailedDownload, OfAFileThatIsRefused) {
   receiver.Reply(kGetFile, "{no}", "ER");
-  ExpectFailure(kNotConnected, {kSpeedUp, Start(3), kRestore});
+  ExpectFailure(kNotConnected, {Start(3)});
   EXPECT_THAT(progress.percents, ElementsAre(0));
 }
 
-TEST_F(QuorinFailedDownload, OfATransferThatCannotBeStarted) {
+TEST_P(QuorinFailedDownload, OfATransferThatCannotBeStarted) {
   receiver.FailWriteOf("\x15", E_HANDLE);
-  ExpectFailure(E_HANDLE, {kSpeedUp, kStart, kRestore});
+  ExpectFailure(E_HANDLE, {kStart});
   EXPECT_THAT(progress.percents, ElementsAre(0, 1));
 }
 
-TEST_F(QuorinFailedDownload, OfATransferThatStaysSilent) {
+TEST_P(QuorinFailedDownload, OfATransferThatStaysSilent) {
   receiver.On("\x15", [](const std::string&) {});
-  ExpectFailure(kTimedOut, {kSpeedUp, kStart, {"\x15", "\x15", "\x15", "#"}, kRestore});
+  ExpectFailure(kTimedOut, {kStart, {"\x15", "\x15", "\x15", "#"}});
 }
 
-TEST_F(QuorinFailedDownload, OfALastBlockOfNegativeLength) {
+TEST_P(QuorinFailedDownload, OfALastBlockOfNegativeLength) {
   receiver.On("\x15", [this](const std::string&) {
-    connection->GiveRead(BlockStream::Make(0x04, 0xFFFF, "", 0).substr(0, 3));
+    const std::string block = BlockStream::Make(0x04, 0xFFFF, "", 0);
+    connection->GiveRead(is_usb ? block : block.substr(0, 3));  // as much as is read of it
   });
-  ExpectFailure(kNotConnected, {kSpeedUp, kStart, {"#"}, kRestore});
+  ExpectFailure(kNotConnected, {kStart, {"#"}});
 }
 
-TEST_F(QuorinFailedDownload, IsThatOfTheTransferThoughTheEndCannotBeWritten) {
+TEST_P(QuorinFailedDownload, IsThatOfTheTransferThoughTheEndCannotBeWritten) {
   receiver.On("\x15", [](const std::string&) {});
   receiver.FailWriteOf("#", E_HANDLE);
-  ExpectFailure(kTimedOut, {kSpeedUp, kStart, {"\x15", "\x15", "\x15", "#"}, kRestore});
+  ExpectFailure(kTimedOut, {kStart, {"\x15", "\x15", "\x15", "#"}});
 }
 
-TEST_F(QuorinFailedDownload, AtASpeedThatWasNotRaisedPutsNothingBack) {
+TEST_P(QuorinFailedDownload, OfTheLink) {
+  constexpr auto kFailure = static_cast<HRESULT>(0xE0001009);
+  receiver.On("\x15", [&](const std::string&) { connection->GiveResult(kFailure); });
+  ExpectFailure(kFailure, {kStart, {"#"}});
+}
+
+TEST_P(QuorinFailedDownload, OfAnAckThatCannotBeWritten) {
+  receiver.FailWriteOf("\x06", E_HANDLE);
+  ExpectFailure(E_HANDLE, {kStart, {"\x06", "#"}});
+}
+
+TEST_F(QuorinDownload, ThatFailsAtASpeedThatWasNotRaisedPutsNothingBack) {
   connection->speed = 115200;
   receiver.Reply(kGetSize, "0");
   EXPECT_EQ(Download(), E_FAIL);
-  ExpectSaid({Start(2)});
+  ExpectSaid({{kStart[0], kStart[1]}});
 }
 
 TEST_F(QuorinDownload, OverALinkOfNoKnownKindIsUnexpected) {
@@ -260,10 +293,24 @@ TEST_F(QuorinDownload, OverALinkOfNoKnownKindIsUnexpected) {
       report.Has("CQuorinProtocol::DownloadFile - download [A0101.log] is failed [0x8000FFFF]"));
 }
 
-TEST_F(QuorinDownload, IsNotDoneWhenTheReceiverEndsIt) {
-  receiver.On("\x15", [this](const std::string&) { connection->GiveRead({'#', 0, 0}); });
+TEST_P(QuorinDownloadOverBoth, StartsTheTransferOnAnEmptyLine) {
+  Download();
+  const auto& calls = connection->calls;
+  const auto start = std::ranges::find(calls, "write \x15");
+  ASSERT_NE(start, calls.end());
+  EXPECT_THAT(*(start - 2), testing::StartsWith("read "));
+  EXPECT_EQ(*(start - 1), "flush");
+  EXPECT_EQ(*(start + 1), is_usb ? "read 512 30000" : "read 3 3000");
+  EXPECT_EQ(*(start + 2), is_usb ? "read 6 30000" : "read 515 3000");
+  EXPECT_EQ(*(start + 3), "write \x06");
+}
+
+TEST_P(QuorinDownloadOverBoth, IsNotDoneWhenTheReceiverEndsIt) {
+  receiver.On("\x15", [this](const std::string&) {
+    connection->GiveRead("#" + std::string(is_usb ? 517 : 2, '\0'));
+  });
   EXPECT_EQ(Download(), S_FALSE);
-  ExpectSaid({kSpeedUp, kStart, kRestore});
+  ExpectSaidWithin({kStart});
   EXPECT_FALSE(report.HasStart("CQuorinProtocol::DownloadFile - download"));
 }
 

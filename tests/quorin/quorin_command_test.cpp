@@ -10,7 +10,6 @@
 #include "platform/handle.h"
 #include "platform/hresult.h"
 #include "tests/quorin/quorin_responder.h"
-#include "tests/quorin/timed_writes.h"
 #include "tests/support/report_capture.h"
 #include "tests/support/scripted_connection.h"
 
@@ -235,10 +234,10 @@ TEST_F(QuorinCommandSending, IsNotShieldedOtherwise) {
 }
 
 TEST(QuorinCommandTimeouts, AreThreeSecondsForEachWrite) {
-  TimedWrites connection;
+  ScriptedConnection connection;
   CQuorinCommand command("dm\r\n", kTagged | kNoReply);
   command.Execute(&connection, nullptr);
-  EXPECT_THAT(connection.timeouts, ElementsAre(3000, 3000));
+  EXPECT_THAT(connection.write_timeouts, ElementsAre(3000, 3000));
 }
 
 TEST_F(QuorinCommandSending, TracesEachReadWithItsTimeout) {

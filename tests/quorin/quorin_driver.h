@@ -5,6 +5,7 @@
 #include <gtest/gtest.h>
 
 #include <functional>
+#include <initializer_list>
 #include <memory>
 #include <string>
 #include <vector>
@@ -24,6 +25,12 @@ class ProgressRecorder : public CIProtocolCallback {
     if (on_progress) on_progress(percent);
   }
 };
+
+inline std::vector<std::string> Joined(std::initializer_list<std::vector<std::string>> parts) {
+  std::vector<std::string> all;
+  for (const auto& part : parts) all.insert(all.end(), part.begin(), part.end());
+  return all;
+}
 
 // The driver under test, with the handle of its lock for the report's lines.
 using QuorinDriver = WithLockText<CQuorinProtocol>;

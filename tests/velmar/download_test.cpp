@@ -1,67 +1,15 @@
-// The download of a Velmar receiver, on a scripted connection.
+// The download of a Velmar receiver: what is said and done around the transfer of the file.
 #include <algorithm>
 #include <string>
 #include <utility>
 #include <vector>
 
 #include "platform/hresult.h"
-#include "tests/support/memory_stream.h"
-#include "tests/velmar/velmar_driver.h"
+#include "tests/velmar/download_fixture.h"
 
 namespace {
 
 using testing::ElementsAre;
-
-const std::string kCurrent = "currentfile a.pdc all\r";
-const std::string kHeader = "log filehdra\r";
-const std::string kRead = "log filetransferb\r";
-const std::string kConfig = "log comconfiga once\r";
-const std::string kStop = "unlogall thisport\r";
-const std::string kRaise = "COM 115200 N 8 1 N\r";
-const std::string kRestore = "COM 9600 N 8 1 N\r";
-
-std::string HeaderReply(const std::string& size) {
-  std::string body = "\"a.pdc\"," + size;
-  for (int i = 2; i < 23; ++i) body += ",0";
-  return kOkPrompt + AsciiLog("FILEHDRA", body);
-}
-
-class VelmarDownload : public VelmarDriver {
- protected:
-  VelmarDownload() {
-    connection->speed = 115200;
-    answers = {
-        {kCurrent, kOkPrompt},
-        {kConfig,
-         kOkPrompt + AsciiLog("COMCONFIGA", "1,COM1,9600,N,8,1,N,ON,OFF,NOVATEL,NOVATEL,ON")},
-        {kRaise, kOkPrompt},
-        {kRestore, kOkPrompt}};
-  }
-  // A file in chunks of 100 bytes.
-  void Serve(int chunks) {
-    answers[kHeader] = HeaderReply(std::to_string(chunks * 100));
-    std::string reply = kOkPrompt;
-    for (int i = chunks - 1; i >= 0; --i) {
-      reply +=
-          BinaryLog{std::string(100, static_cast<char>('a' + i)), static_cast<uint16_t>(i)}.Bytes();
-    }
-    answers[kRead] = reply;
-  }
-  HRESULT Download() { return driver.DownloadFile(L"a.pdc", &stream, nullptr); }
-
-  MemoryStream stream;
-};
-
-TEST_F(VelmarDownload, BringsTheFileAndReportsEachPercentOnce) {
-  Serve(10);
-  EXPECT_EQ(Download(), S_OK);
-  EXPECT_EQ(stream.bytes.size(), 1000u);
-  EXPECT_EQ(stream.bytes.substr(0, 1), "j");
-  EXPECT_EQ(stream.bytes.substr(999), "a");
-  EXPECT_THAT(percents, ElementsAre(0, 10, 20, 30, 40, 50, 60, 70, 80, 90, 100, 100));
-  EXPECT_EQ(stream.references, 1u);
-  EXPECT_TRUE(report.HasStart("CVelmarProtocol::DownloadFile - connection is locked [0x"));
-}
 
 TEST_F(VelmarDownload, HoldsTheConnectionUntilAllIsDone) {
   Serve(2);
@@ -73,23 +21,6 @@ TEST_F(VelmarDownload, HoldsTheConnectionUntilAllIsDone) {
   EXPECT_EQ(free.size(), 7u + 4u);
   EXPECT_THAT(free, testing::Each(false));
   EXPECT_TRUE(IsFreeForOthers(driver));
-}
-
-// Each chunk is in the stream before its percent is told, and the last percent is told while the
-// link is still fast.
-TEST_F(VelmarDownload, TellsThePercentOfWhatIsWritten) {
-  Serve(2);
-  connection->speed = 9600;
-  std::vector<size_t> written;
-  std::vector<DWORD> speeds;
-  on_percent = [&](int) {
-    written.push_back(stream.bytes.size());
-    speeds.push_back(connection->speed);
-  };
-  EXPECT_EQ(Download(), S_OK);
-  EXPECT_THAT(percents, ElementsAre(0, 50, 100, 100));
-  EXPECT_THAT(written, ElementsAre(0u, 100u, 200u, 200u));
-  EXPECT_THAT(speeds, ElementsAre(9600u, 115200u, 115200u, 115200u));
 }
 
 TEST_F(VelmarDownload, NamesAreInTheCodePageOfTheThread) {
@@ -315,16 +246,6 @@ TEST_F(VelmarDownload, AFailingCommandEndsItWithoutALastReport) {
   EXPECT_EQ(stream.writes, 0u);
 }
 
-// What came is there, and nothing tells that it is not all.
-TEST_F(VelmarDownload, ATransferThatStopsInBetweenIsASuccess) {
-  Serve(4);
-  const std::string reply = answers[kRead];
-  answers[kRead] = reply.substr(0, reply.size() - 1);
-  EXPECT_EQ(Download(), S_OK);
-  EXPECT_EQ(stream.bytes.size(), 300u);
-  EXPECT_THAT(percents, ElementsAre(0, 25, 50, 75, 100));
-}
-
 // The size of a header that is not whole is not known yet.
 TEST_F(VelmarDownload, AHeaderThatStopsInBetweenCountsAsASizeOfNothing) {
   Serve(1);
@@ -339,26 +260,6 @@ TEST_F(VelmarDownload, WithoutAHeaderNothingIsRead) {
   EXPECT_EQ(Download(), S_OK);
   EXPECT_THAT(connection->Writes(), ElementsAre(kCurrent, kHeader));
   EXPECT_THAT(percents, ElementsAre(0, 100));
-}
-
-TEST_F(VelmarDownload, AFileSaidToBeEmptyIsCompleteAtOnce) {
-  Serve(2);
-  answers[kHeader] = HeaderReply("0");
-  EXPECT_EQ(Download(), S_OK);
-  EXPECT_EQ(stream.bytes.size(), 200u);
-  EXPECT_THAT(percents, ElementsAre(0, 100, 100));
-}
-
-TEST_F(VelmarDownload, AFailingStreamEndsIt) {
-  Serve(3);
-  stream.fail_at_write = 1;
-  EXPECT_EQ(Download(), STG_E_MEDIUMFULL);
-  EXPECT_EQ(stream.writes, 2u);
-  EXPECT_EQ(stream.bytes, std::string(100, 'c'));
-  EXPECT_THAT(percents, ElementsAre(0, 33));
-  EXPECT_EQ(stream.references, 1u);
-  EXPECT_TRUE(IsFreeForOthers(driver));
-  EXPECT_TRUE(report.Has("CVelmarProtocol::DumpInvalidResponse - [0x80030070] [] [COM7]"));
 }
 
 // The put-back's result takes the place of the transfer's.
@@ -471,63 +372,6 @@ TEST_F(VelmarDownload, AnAbortWhileTheReceiverConfirmsItsSpeedPutsItBackAtOnce) 
   EXPECT_FALSE(report.Has("CVelmarCommand::Execute - read failed [0x800705B4]"));
 }
 
-// What may still be sending is told to stop, at any speed; what has not begun is not.
-class VelmarUnfinishedDownload : public VelmarDownload {
- protected:
-  size_t TimesStopped() const {
-    return static_cast<size_t>(std::ranges::count(connection->Writes(), kStop));
-  }
-};
-
-TEST_F(VelmarUnfinishedDownload, IsStoppedAfterAnAbort) {
-  Serve(3);
-  before_command = [&](const std::string& command) {
-    if (command == kRead) driver.Abort();
-  };
-  EXPECT_EQ(Download(), S_FALSE);
-  EXPECT_EQ(TimesStopped(), 1u);
-}
-
-TEST_F(VelmarUnfinishedDownload, IsStoppedWhenTheStreamFails) {
-  Serve(3);
-  stream.fail_at_write = 1;
-  EXPECT_EQ(Download(), stream.failure);
-  EXPECT_EQ(TimesStopped(), 1u);
-}
-
-TEST_F(VelmarUnfinishedDownload, IsStoppedWhenTheFileBreaksOff) {
-  Serve(3);
-  answers[kRead].resize(answers[kRead].size() - 50);
-  EXPECT_EQ(Download(), S_OK);
-  EXPECT_EQ(TimesStopped(), 1u);
-}
-
-TEST_F(VelmarUnfinishedDownload, IsStoppedWhenTheAnswerCannotBeUnderstood) {
-  Serve(3);
-  answers[kRead] = "x" + answers[kRead];
-  EXPECT_EQ(Download(), S_OK);
-  EXPECT_EQ(TimesStopped(), 1u);
-}
-
-TEST_F(VelmarUnfinishedDownload, IsNotStoppedWhenItIsComplete) {
-  Serve(3);
-  EXPECT_EQ(Download(), S_OK);
-  EXPECT_EQ(TimesStopped(), 0u);
-}
-
-TEST_F(VelmarUnfinishedDownload, IsNotStoppedBeforeItBegan) {
-  const std::string refused = "\r\n<ERROR:No such file\r\n[COM1]";
-  for (const std::string& command : {kCurrent, kHeader, kRead}) {
-    for (const std::string& answer : {std::string(), kErrorPrompt, refused}) {
-      Serve(3);
-      answers[command] = answer;
-      EXPECT_EQ(Download(), S_OK);
-      EXPECT_EQ(TimesStopped(), 0u) << command << answer;
-      answers[command] = kOkPrompt;
-    }
-  }
-}
-
 // An abort while the link is put in order ends its waits, and the receiver is told its old speed all
 // the same: with the settings that it had before.
 class VelmarAbortedPutBack : public VelmarDownload {
@@ -632,59 +476,6 @@ TEST_F(VelmarDownload, WhatFollowsACutOffCommandWaitsForItsLateAnswer) {
   EXPECT_EQ(clock.paused, 500u + 500u) << "once before it, and after it as after every command";
   driver.DeleteFile(L"a");
   EXPECT_EQ(clock.paused, 500u + 500u + 500u);
-}
-
-// A file that turns out longer than its header said: the percent is kept in a byte, and told as 100
-// at the most.
-TEST_F(VelmarDownload, ThePercentOfAFileThatIsLongerThanSaid) {
-  Serve(3);
-  answers[kHeader] = HeaderReply("100");
-  EXPECT_EQ(Download(), S_OK);
-  EXPECT_THAT(percents, ElementsAre(0, 100, 100, 300 - 256, 100));
-}
-
-TEST_F(VelmarDownload, APercentThatDoesNotChangeIsNotTold) {
-  Serve(4);
-  answers[kHeader] = HeaderReply("20000");
-  EXPECT_EQ(Download(), S_OK);
-  EXPECT_THAT(percents, ElementsAre(0, 1, 2, 100));
-}
-
-// Sizes of 2 GB and more do not fit the number of the header, which ends at its largest; a negative
-// one is a very large one.
-TEST_F(VelmarDownload, SizesBeyondTheNumberAreTakenAsTheyCome) {
-  for (const char* size : {"4000000000", "-1"}) {
-    Serve(1);
-    answers[kHeader] = HeaderReply(size);
-    percents.clear();
-    EXPECT_EQ(Download(), S_OK);
-    EXPECT_THAT(percents, ElementsAre(0, 100)) << size;
-  }
-}
-
-// In 32-bit arithmetic the product of a large file wraps, as hosts have always seen it.
-TEST_F(VelmarDownload, ThePercentOfALargeFileWraps) {
-  constexpr size_t kChunk = 1024;
-  constexpr size_t kChunksUntilItWraps = 42949672 / kChunk + 1;
-  answers[kHeader] = HeaderReply("100000000");
-  answers[kRead] = kOkPrompt + BinaryLog{std::string(kChunk, 'x'), 1}.Bytes();
-  const auto answer = connection->on_write;
-  connection->on_write = [&](std::string_view bytes) {
-    const HRESULT result = answer(bytes);
-    if (bytes == kRead) {
-      const std::string more = BinaryLog{std::string(kChunk, 'x'), 1}.Bytes();
-      for (size_t i = 2; i < kChunksUntilItWraps; ++i) connection->GiveRead(more);
-      connection->GiveRead(BinaryLog{std::string(kChunk, 'x'), 0}.Bytes());
-    }
-    return result;
-  };
-  EXPECT_EQ(Download(), S_OK);
-  EXPECT_EQ(stream.bytes.size(), kChunksUntilItWraps * kChunk);
-  std::vector<int> expected;
-  for (int percent = 0; percent <= 42; ++percent) expected.push_back(percent);
-  expected.push_back(0);
-  expected.push_back(100);
-  EXPECT_EQ(percents, expected);
 }
 
 }  // namespace
