@@ -22,7 +22,7 @@ using testing::Contains;
 
 namespace {
 
-constexpr auto kPlain = static_cast<EProtocol>(77);
+constexpr auto kPlain = static_cast<EProtocol>(3);
 constexpr wchar_t kPort[] = L"COM7";
 
 // A receiver that has one file, from its own side of the wire.

@@ -13,7 +13,7 @@
 namespace {
 
 // A number of EProtocol that no other family has.
-constexpr DWORD kPlain = 77;
+constexpr DWORD kPlain = 3;
 
 }  // namespace
 

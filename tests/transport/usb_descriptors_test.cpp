@@ -165,11 +165,11 @@ TEST(UsbDescriptors, OfAClassBetweenAreOfAnotherLayout) {
   const std::string class_specific = Bytes({5, 0x24, 0, 0x10, 0x01});
   const std::string out = EndpointBytes(0x02, kBulk);
   const std::string in = EndpointBytes(0x83, kBulk);
-  const std::string interface = InterfaceBytes(2);
-  EXPECT_EQ(Find(ConfigurationBytes(class_specific + interface + out + in)), kNone);
-  EXPECT_EQ(Find(ConfigurationBytes(interface + class_specific + out + in)), kNone);
-  EXPECT_EQ(Find(ConfigurationBytes(interface + out + class_specific + in)), kNone);
-  EXPECT_EQ(Find(ConfigurationBytes(interface + out + in + class_specific)), kNone);
+  const std::string usb_interface = InterfaceBytes(2);
+  EXPECT_EQ(Find(ConfigurationBytes(class_specific + usb_interface + out + in)), kNone);
+  EXPECT_EQ(Find(ConfigurationBytes(usb_interface + class_specific + out + in)), kNone);
+  EXPECT_EQ(Find(ConfigurationBytes(usb_interface + out + class_specific + in)), kNone);
+  EXPECT_EQ(Find(ConfigurationBytes(usb_interface + out + in + class_specific)), kNone);
 }
 
 TEST(UsbDescriptors, OfASecondInterfaceAreOfAnotherLayout) {
@@ -212,12 +212,12 @@ TEST(UsbDescriptors, WithAWrongLengthOfTheConfigurationAreOfAnotherLayout) {
   }
 }
 
-// An interface of no length would be its own first endpoint, though the sum is right.
+// An usb_interface of no length would be its own first endpoint, though the sum is right.
 TEST(UsbDescriptors, OfAnInterfaceWithoutLengthAreOfAnotherLayout) {
-  const std::string interface = Bytes({0, 0x04, 0x02, kBulk, 2, 0, 0});
+  const std::string usb_interface = Bytes({0, 0x04, 0x02, kBulk, 2, 0, 0});
   const std::string in = EndpointBytes(0x83, kBulk);
-  EXPECT_EQ(Find(ConfigurationBytes(interface + in)), kNone);
-  EXPECT_EQ(Find(interface + in), kNone);  // nor of a configuration without one
+  EXPECT_EQ(Find(ConfigurationBytes(usb_interface + in)), kNone);
+  EXPECT_EQ(Find(usb_interface + in), kNone);  // nor of a configuration without one
 }
 
 TEST(UsbDescriptors, ThatEndEarlyAreOfAnotherLayout) {
@@ -233,7 +233,7 @@ TEST(UsbDescriptors, ThatGoOnAreOfAnotherLayout) {
   }
 }
 
-// The interface's count may be the last byte there is.
+// The usb_interface's count may be the last byte there is.
 TEST(UsbDescriptors, AreNotReadBehindTheirEnd) {
   for (size_t size = 1; size <= 20; ++size) {
     for (unsigned first = 0; first < 256; ++first) {
