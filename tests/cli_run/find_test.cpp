@@ -2,6 +2,7 @@
 #include <windows.h>
 
 #include <nlohmann/json.hpp>
+#include <sstream>
 
 #include "tests/cli_run/cli.h"
 #include "tests/host/support/simulated_usb.h"
@@ -53,6 +54,38 @@ TEST_F(Find, SaysEachTryToo) {
                     HasSubstr(": 9600 bit/s, RTS on\n")));
   EXPECT_THAT(result.errors, Not(HasSubstr("try 3 of ")));
   EXPECT_THAT(result.output, HasSubstr("(serial, 9600 bit/s, RTS on)"));
+}
+
+TEST_F(Find, EachTryIsAlsoJson) {
+  const bed::SimulatedPort receiver({"quorin", "--speed", "9600"});
+  const auto result = Sweep(receiver, {"find", "--no-memory", "--progress", "json"});
+  EXPECT_EQ(result.status, kDone) << result.errors;
+  std::istringstream lines(result.errors);
+  std::vector<json> tries;
+  for (std::string line; std::getline(lines, line);) tries.push_back(json::parse(line));
+  ASSERT_EQ(tries.size(), 2U) << result.errors;
+  const json number_of_tries = tries[0].at("tries");
+  EXPECT_GE(number_of_tries, 15);  // five speeds with three modes, and what the port has
+  EXPECT_EQ(tries[0],
+            (json{{"port", NameOf(receiver)},
+                  {"try", 1},
+                  {"tries", number_of_tries},
+                  {"speed", 115200},
+                  {"rts", "on"}}));
+  EXPECT_EQ(tries[1],
+            (json{{"port", NameOf(receiver)},
+                  {"try", 2},
+                  {"tries", number_of_tries},
+                  {"speed", 9600},
+                  {"rts", "on"}}));
+  EXPECT_THAT(result.output, HasSubstr("(serial, 9600 bit/s, RTS on)"));
+}
+
+// One try at a setting that was asked for is no progress.
+TEST_F(Find, ASingleTryHasNoLine) {
+  const bed::SimulatedPort receiver({"quorin"});
+  EXPECT_EQ(RunOn(receiver, {"find", "--protocol", "quorin", "--progress", "json"}).errors, "");
+  EXPECT_EQ(RunOn(receiver, {"find", "--protocol", "quorin", "--progress", "lines"}).errors, "");
 }
 
 TEST_F(Find, ATerminalShowsTheTryAndTakesItAway) {
