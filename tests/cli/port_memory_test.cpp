@@ -151,6 +151,14 @@ TEST_F(PortMemoryTest, ProgramsThatRunAtTheSameTimeLoseNothing) {
   }
 }
 
+// It had the lock of all memories, and left it behind.
+TEST_F(PortMemoryTest, AProgramThatWasKilledHoldsUpNobody) {
+  const UniqueHandle mutex(CreateMutexW(nullptr, FALSE, L"Local\\rcvlink-cli port memory"));
+  std::jthread([&mutex] { WaitForSingleObject(mutex.get(), INFINITE); }).join();
+  EXPECT_TRUE(memory_.Remember(L"COM7", kSetting));
+  EXPECT_EQ(memory_.Recall(L"COM7"), kSetting);
+}
+
 TEST_F(PortMemoryTest, TheUsualFileIsTheUsers) {
   const std::filesystem::path file = PortMemory::UsualFile();
   EXPECT_TRUE(file.is_absolute());
