@@ -168,6 +168,28 @@ TEST_F(Find, APortThatAnswersIsToldBeforeTheSilentOnesEnd) {
   EXPECT_THAT(result.output, HasSubstr(NameOf(silent) + ": ended by Ctrl-C"));
 }
 
+TEST_F(Find, APortThatIsNamedTwiceIsAskedOnce) {
+  const json found = json::parse(Run({"find", "COM98", "com98", "COM98:", "--json"}).output);
+  EXPECT_EQ(found.at("failures").size(), 1U);
+}
+
+TEST_F(Find, AComPortIsSerialAmongUsbDevices) {
+  const bed::SimulatedPort receiver({"quorin"});
+  const json found = json::parse(
+      Sweep(receiver, {"find", R"(\\?\rcvlink-none)", "--link", "usb", "--json"}).output);
+  ASSERT_EQ(found.at("receivers").size(), 1U);
+  EXPECT_EQ(found.at("receivers")[0].at("link"), "serial");
+  ASSERT_EQ(found.at("failures").size(), 1U);
+}
+
+TEST_F(Find, WithoutASpeedThatOfThePortIsTold) {
+  const bed::SimulatedPort receiver({"quorin"});
+  ASSERT_EQ(RunOn(receiver, {"find"}).status, kDone);
+  const auto result = Sweep(receiver, {"find", "--rts", "on", "--json"});
+  ASSERT_EQ(result.status, kDone) << result.output;
+  EXPECT_EQ(json::parse(result.output).at("speed"), 9600);
+}
+
 TEST_F(Find, AllSilentIsNoReceiver) {
   const bed::SimulatedPort silent({"quorin", "--mute", "*"});
   const auto result =
