@@ -101,6 +101,20 @@ TEST_F(Find, ATerminalShowsTheTryAndTakesItAway) {
   EXPECT_THAT(result.output, AllOf(HasSubstr("Quorin receiver"), Not(HasSubstr("try 1"))));
 }
 
+// Nothing else is shown after the try, which would cover it.
+TEST_F(Find, NothingIsLeftOfATryThatWasInVain) {
+  const bed::SimulatedPort silent({"quorin", "--mute", "*"});
+  const auto result =
+      bed::Program(kProgram,
+                   On(silent, {"find", "--protocol", "quorin", "--json", "--progress", "bar"}),
+                   bed::Output::kTerminal,
+                   folder.unix_path())
+          .Finish();
+  EXPECT_EQ(result.status, kNoReceiver) << result.output;
+  EXPECT_THAT(result.history, testing::Contains(HasSubstr("(Ctrl-C ends it)")));
+  EXPECT_THAT(result.output, Not(HasSubstr("Ctrl-C")));
+}
+
 TEST_F(Find, WhatWasFoundIsTriedFirstTheNextTime) {
   const bed::SimulatedPort receiver({"quorin", "--speed", "9600"}, {{"a.jps", "a"}});
   ASSERT_EQ(RunOn(receiver, {"find"}).status, kDone);

@@ -76,6 +76,7 @@ TEST_F(Cli, SilenceIsNoReceiver) {
   EXPECT_EQ(result.status, kNoReceiver);
   EXPECT_EQ(result.output, "");
   EXPECT_THAT(result.errors, HasSubstr("no receiver answered"));
+  EXPECT_THAT(result.errors, HasSubstr("is this its speed?"));  // and not asked for on USB
   EXPECT_THAT(result.errors, testing::Not(HasSubstr("0x0000")));
 }
 
