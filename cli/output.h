@@ -29,9 +29,11 @@ class Output {
   /// Win32 error of the first write that failed; 0 for none.
   DWORD first_error() const { return first_error_; }
 
-  /// Whether that was because the reader had enough, as `more` and `head` do.
+  /// Whether that was because the reader had enough, as `more` and `head` do. What Windows calls it
+  /// depends on the kind of the pipe, and Wine has a third name for it.
   bool IsClosed() const {
-    return first_error_ == ERROR_BROKEN_PIPE || first_error_ == ERROR_NO_DATA;
+    return first_error_ == ERROR_BROKEN_PIPE || first_error_ == ERROR_NO_DATA ||
+           first_error_ == ERROR_PIPE_NOT_CONNECTED;
   }
 
  private:

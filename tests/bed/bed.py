@@ -14,9 +14,9 @@ Simulated receivers, by port name ("COM12"):
   {"do": "status", "port": P}                        -> {"status": exit status, null while it runs}
 
 Windows programs (paths relative to the folder of the release build's programs):
-  {"do": "run", "program": "rcvlink-cli.exe", "arguments": [...], "terminal": false, "folder": DIR}
-      -> {"job": N}. DIR, the folder to run in, may be left out. With "terminal" the program has a
-      console (a pseudo-terminal of 100 columns), otherwise its output is a pipe.
+  {"do": "run", "program": "rcvlink-cli.exe", "arguments": [...], "output": "pipe", "folder": DIR}
+      -> {"job": N}. DIR, the folder to run in, may be left out. Its output is a "pipe", one whose
+      reader has "closed" it, or a "terminal" (a console on a pseudo-terminal of 100 columns).
   {"do": "expect", "job": N, "text": T, "seconds": S}
       waits until the output holds T; fails when the program ends without, or after S seconds
   {"do": "interrupt", "job": N}                      Ctrl-C
@@ -134,10 +134,14 @@ class Connection(socketserver.StreamRequestHandler):
         program = os.path.join(BUILD, "release", "bin", request["program"])
         if not os.path.exists(program):
             raise Refused(f"there is no {program}")
-        kind = TerminalJob if request.get("terminal") else Job
         number = len(self._jobs) + 1
         command = ["wine", program, *request["arguments"]]
-        self._jobs[number] = kind(command, request.get("folder"))
+        folder = request.get("folder")
+        output = request["output"]
+        if output == "terminal":
+            self._jobs[number] = TerminalJob(command, folder)
+        else:
+            self._jobs[number] = Job(command, folder, closed=output == "closed")
         return {"job": number}
 
     def _expect(self, request):

@@ -16,22 +16,33 @@ TERMINAL_ROWS = 50
 TERMINAL_COLUMNS = 100
 
 
+def pipe_without_reader():
+    reader, writer = os.pipe()
+    os.close(reader)
+    return writer
+
+
 class Job:
     """A Windows program with its output on pipes."""
 
-    def __init__(self, command, folder):
+    def __init__(self, command, folder, closed=False):
         self._condition = threading.Condition()
         self._chunks = {"output": [], "errors": []}
-        self._open_streams = 2
+        output = pipe_without_reader() if closed else subprocess.PIPE
         self._process = subprocess.Popen(
             bound_to_this_process(command),
             cwd=folder,
             stdin=subprocess.DEVNULL,
-            stdout=subprocess.PIPE,
+            stdout=output,
             stderr=subprocess.PIPE,
             start_new_session=True,
         )
-        for name, stream in (("output", self._process.stdout), ("errors", self._process.stderr)):
+        streams = {"output": self._process.stdout, "errors": self._process.stderr}
+        if closed:
+            os.close(output)
+            del streams["output"]
+        self._open_streams = len(streams)
+        for name, stream in streams.items():
             threading.Thread(target=self._read, args=(name, stream), daemon=True).start()
 
     def _read(self, name, stream):

@@ -147,6 +147,8 @@ TEST(ExchangeTest, ALineOfAMultiByteCodePageMayRunIntoTheNext) {
   EXPECT_EQ(exchange.entries[1].since_ms, 5U);
   ASSERT_EQ(exchange.remarks.size(), 1U);
   EXPECT_NE(exchange.remarks[0].find("code page"), std::string::npos);
+  // Its own end is no sign of a report that breaks off.
+  EXPECT_EQ(ReadExchange(report.substr(0, report.find("Bye") - 21), kJapanese).remarks.size(), 1U);
   // In a line of ASCII alone it is the receiver's text.
   EXPECT_EQ(Parse("12:00:00.0000      7 a 12:00:00.0005      7 b\r\n").entries.size(), 1U);
 }
@@ -162,6 +164,95 @@ TEST(ExchangeTest, ThreadsDoNotMix) {
   const ExchangeEntry command = Only(exchange, "print,/par/rcvid");
   EXPECT_EQ(command.end, ExchangeEnd::kTimeout);
   EXPECT_EQ(command.until_ms, 200U);
+}
+
+TEST(ExchangeTest, BlocksFollowOnlyARequestThatWasAnswered) {
+  const Exchange exchange = Parse(
+      "12:00:00.0000      7 CGetFileCmd::CGetFileCmd\r\n"
+      "12:00:00.0000      7 CSerialConnection::Flush\r\n"
+      "12:00:00.0000      7 CQuorinCommand::Execute - start reading. Timeout is [30000 msec]\r\n"
+      "12:00:30.0000      7 CAbstractConnection::Read - wait timeout [COM7]\r\n"
+      "12:00:30.0000      7 CSerialConnection::Flush\r\n");
+  EXPECT_EQ(exchange.Count(TraceKind::kBlocks), 0U);
+  EXPECT_EQ(exchange.entries.back().kind, TraceKind::kCommand);
+}
+
+TEST(ExchangeTest, ACommandThatWasNotSentIsNotTheOneThatIs) {
+  const Exchange exchange = Parse(
+      "12:00:00.0000      7 CPingCmd::CPingCmd\r\n"
+      "12:00:00.0000      7 CAbstractReceiver::GetFiles\r\n"
+      "12:00:00.0000      7 CSerialConnection::Flush\r\n");
+  EXPECT_EQ(Only(exchange, "(not named)").kind, TraceKind::kCommand);
+}
+
+TEST(ExchangeTest, AnOpenedPortIsEmptiedWithoutACommand) {
+  const Exchange exchange = Parse(
+      "12:00:00.0000      7 CreateReceiverOnSerial - opening serial port [COM7]\r\n"
+      "12:00:00.0000      7 CSerialConnection::Flush\r\n");
+  EXPECT_EQ(exchange.Count(TraceKind::kCommand), 0U);
+}
+
+TEST(ExchangeTest, ACodeIsExplainedOnce) {
+  const std::string refusal =
+      "12:00:00.0000      7 CQuorinProtocol::DumpInvalidResponse - [0x8007048F] [no] [COM7]\r\n";
+  EXPECT_EQ(Parse(refusal + refusal).Codes().size(), 1U);
+}
+
+TEST(ExchangeTest, AnEditorsUtf16IsRemarked) {
+  for (const char* mark : {"\xFF\xFE", "\xFE\xFF"}) {
+    EXPECT_EQ(Parse(mark).remarks.size(), 2U) << "the marks are no line either";
+  }
+  EXPECT_EQ(Parse("a").remarks.size(), 1U);
+}
+
+constexpr char kSentCommand[] =
+    "12:00:00.0000      7 CPingCmd::CPingCmd\r\n"
+    "12:00:00.0300      7 CSerialConnection::Flush\r\n"
+    "12:00:01.0000      7 CQuorinCommand::Execute - start reading. Timeout is [8000 msec]\r\n";
+
+// The text does without the line that a command was sent, so its times do too.
+TEST(ExchangeTest, TheTextHasALineForEachStep) {
+  const Exchange exchange = Parse(kSentCommand);
+  const std::string text = ToText(exchange, false);
+  EXPECT_EQ(text.find("12:00:00.000           command library -> receiver"), 0U) << text;
+  EXPECT_NE(text.find("\n12:00:01.000   +1.0 s  read"), std::string::npos) << text;
+  EXPECT_EQ(text.find("Flush"), std::string::npos);
+  EXPECT_NE(ToText(exchange, true).find("    | CSerialConnection::Flush\n"), std::string::npos);
+}
+
+TEST(ExchangeTest, TellsAGapInTheUnitThatFits) {
+  EXPECT_EQ(Gap(0), "");
+  EXPECT_EQ(Gap(999), "+999 ms");
+  EXPECT_EQ(Gap(1000), "+1.0 s");
+}
+
+TEST(ExchangePageTest, HostAndReceiverHaveAColumnEach) {
+  const std::string page = ToPage(
+      Parse(std::string(kSentCommand) + "12:00:01.0999      7 CAbstractReceiver::Abort\r\n"), "a");
+  const auto has = [&page](const char* text) { return page.find(text) != std::string::npos; };
+  EXPECT_TRUE(
+      has("<tr class=\"command\"><td class=\"time\">12:00:00.000</td><td class=\"gap\"></td>"
+          "<td class=\"thread\">7</td><td></td><td><b>"));
+  EXPECT_TRUE(has("<td class=\"gap long\">+1.0 s</td>"));
+  EXPECT_TRUE(has("<td class=\"gap\">+999 ms</td>"));
+  EXPECT_TRUE(
+      has("<tr class=\"cancel\"><td class=\"time\">12:00:01.999</td><td class=\"gap\"></td>"
+          "<td class=\"thread\">7</td><td><b>"));
+}
+
+TEST(ExchangePageTest, AHostsCallLastsAsLongAsItsThread) {
+  const std::string page = ToPage(Parse("12:00:00.0000      1 CAbstractReceiver::GetFiles\r\n"
+                                        "12:00:00.0100      1 a note\r\n"
+                                        "12:00:00.0905      2 another's\r\n"),
+                                  "a");
+  // A lane is 905 wide, so each millisecond is one.
+  EXPECT_NE(page.find("<rect class=\"fill-host\" x=\"80\" y=\"6\" width=\"100\""),
+            std::string::npos);
+}
+
+TEST(ExchangePageTest, WhatWasCancelledHasNotFailed) {
+  const std::string page = ToPage(Parse(Recorded("velmar-silent.txt")), "a");
+  EXPECT_NE(page.find("<rect class=\"fill-retry\""), std::string::npos);
 }
 
 TEST(ExchangePageTest, DeviceTextCannotBecomeMarkup) {

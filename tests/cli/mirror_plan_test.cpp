@@ -41,9 +41,14 @@ TEST(MirrorPlanTest, TellsTheFileAndTheTimeLeftOverAll) {
             "File 3 of 300: A.JPS, 1.2 MB, 5 min 10 s left over all");
 }
 
+TEST(MirrorPlanTest, ABegunSecondCounts) {
+  const MirrorState state{.file = 2, .files = 2, .done = 2000, .total = 2001, .elapsed_ms = 1000};
+  EXPECT_EQ(InWords(state, L"A", 1), "File 2 of 2: A, 1 B, 1 s left over all");
+}
+
 // A log that is being recorded may turn out larger than it was listed.
 TEST(MirrorPlanTest, NoTimeIsLeftWhenMoreCameThanListed) {
-  const MirrorState state{.file = 2, .files = 2, .done = 900, .total = 800, .elapsed_ms = 1000};
+  const MirrorState state{.file = 2, .files = 2, .done = 900, .total = 800, .elapsed_ms = 10'000};
   EXPECT_EQ(InWords(state, L"A", 0), "File 2 of 2: A, 0 B, 0 s left over all");
 }
 

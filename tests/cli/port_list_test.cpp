@@ -74,8 +74,10 @@ TEST(PortListTest, ADeviceIsListedOnce) {
 
 TEST(PortListTest, APathWithoutIdsHasNone) {
   FakeSource source;
-  for (const wchar_t* const path :
-       {LR"(\\?\receiver)", LR"(\\?\usb#vid_12&pid_)", LR"(\\?\usb#vid_12xy&pid_zzzz)"}) {
+  for (const wchar_t* const path : {LR"(\\?\receiver)",
+                                    LR"(\\?\usb#vid_12&pid_)",
+                                    LR"(\\?\usb#pid_12)",
+                                    LR"(\\?\usb#vid_12xy&pid_zzzz)"}) {
     source.usb = {{path, L"usbio", L""}};
     const std::vector<Port> ports = ListPorts(source);
     ASSERT_EQ(ports.size(), 1U);

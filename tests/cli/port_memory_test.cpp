@@ -77,6 +77,15 @@ TEST_F(PortMemoryTest, ADamagedFileIsAnEmptyOneAndReplaced) {
   }
 }
 
+TEST_F(PortMemoryTest, AFileThatIsMuchTooLongIsAnEmptyOne) {
+  constexpr std::size_t kMebibyte = 1 << 20;
+  std::string text = R"({"ports": {"COM7": {"speed": 57600, "rts": "on", "protocol": "velmar"}}})";
+  folder_.Write(L"ports.json", text);
+  EXPECT_NE(memory_.Recall(L"COM7"), std::nullopt);
+  folder_.Write(L"ports.json", text.append(kMebibyte, ' '));
+  EXPECT_EQ(memory_.Recall(L"COM7"), std::nullopt);
+}
+
 TEST_F(PortMemoryTest, EntriesThatMakeNoSenseDoNotCount) {
   const auto entry = [](const char* speed, const char* rts, const char* protocol) {
     return std::string(R"({"ports": {"COM7": {"speed": )") + speed + R"(, "rts": ")" + rts +
@@ -149,6 +158,14 @@ TEST_F(PortMemoryTest, ProgramsThatRunAtTheSameTimeLoseNothing) {
   for (int i = 0; i < kPrograms; ++i) {
     EXPECT_EQ(memory_.Recall(L"COM" + std::to_wstring(i)), kOther) << i;
   }
+}
+
+// It had the lock of all memories, and left it behind.
+TEST_F(PortMemoryTest, AProgramThatWasKilledHoldsUpNobody) {
+  const UniqueHandle mutex(CreateMutexW(nullptr, FALSE, L"Local\\rcvlink-cli port memory"));
+  std::jthread([&mutex] { WaitForSingleObject(mutex.get(), INFINITE); }).join();
+  EXPECT_TRUE(memory_.Remember(L"COM7", kSetting));
+  EXPECT_EQ(memory_.Recall(L"COM7"), kSetting);
 }
 
 TEST_F(PortMemoryTest, TheUsualFileIsTheUsers) {

@@ -92,12 +92,12 @@ const std::vector<Try> kTries = {{{9600, RtsMode::kOn}, {eProtocolQuorin, eProto
 
 TEST(SweepTest, EndsWhereTheReceiverAnswers) {
   FakePort port;
-  port.answers_at = {{19200, RtsMode::kOff}, eProtocolQuorin};
+  port.answers_at = {{19200, RtsMode::kOff}, eProtocolVelmar};
   const SweepResult result = RunSweep(kTries, port);
   EXPECT_EQ(result.code, S_OK);
   EXPECT_EQ(result.receiver, &port);
   EXPECT_EQ(result.setting, port.answers_at);
-  EXPECT_EQ(port.asked.size(), 3U);
+  EXPECT_EQ(port.asked.size(), 4U);
   EXPECT_EQ(port.begun, (std::vector<std::string>{"1/2 9600", "2/2 19200"}));
 }
 

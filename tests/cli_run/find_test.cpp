@@ -2,6 +2,7 @@
 #include <windows.h>
 
 #include <nlohmann/json.hpp>
+#include <sstream>
 
 #include "tests/cli_run/cli.h"
 #include "tests/host/support/simulated_usb.h"
@@ -55,6 +56,38 @@ TEST_F(Find, SaysEachTryToo) {
   EXPECT_THAT(result.output, HasSubstr("(serial, 9600 bit/s, RTS on)"));
 }
 
+TEST_F(Find, EachTryIsAlsoJson) {
+  const bed::SimulatedPort receiver({"quorin", "--speed", "9600"});
+  const auto result = Sweep(receiver, {"find", "--no-memory", "--progress", "json"});
+  EXPECT_EQ(result.status, kDone) << result.errors;
+  std::istringstream lines(result.errors);
+  std::vector<json> tries;
+  for (std::string line; std::getline(lines, line);) tries.push_back(json::parse(line));
+  ASSERT_EQ(tries.size(), 2U) << result.errors;
+  const json number_of_tries = tries[0].at("tries");
+  EXPECT_GE(number_of_tries, 15);  // five speeds with three modes, and what the port has
+  EXPECT_EQ(tries[0],
+            (json{{"port", NameOf(receiver)},
+                  {"try", 1},
+                  {"tries", number_of_tries},
+                  {"speed", 115200},
+                  {"rts", "on"}}));
+  EXPECT_EQ(tries[1],
+            (json{{"port", NameOf(receiver)},
+                  {"try", 2},
+                  {"tries", number_of_tries},
+                  {"speed", 9600},
+                  {"rts", "on"}}));
+  EXPECT_THAT(result.output, HasSubstr("(serial, 9600 bit/s, RTS on)"));
+}
+
+// One try at a setting that was asked for is no progress.
+TEST_F(Find, ASingleTryHasNoLine) {
+  const bed::SimulatedPort receiver({"quorin"});
+  EXPECT_EQ(RunOn(receiver, {"find", "--protocol", "quorin", "--progress", "json"}).errors, "");
+  EXPECT_EQ(RunOn(receiver, {"find", "--protocol", "quorin", "--progress", "lines"}).errors, "");
+}
+
 TEST_F(Find, ATerminalShowsTheTryAndTakesItAway) {
   const bed::SimulatedPort receiver({"quorin", "--speed", "115200"});
   bed::Program program(kProgram,
@@ -66,6 +99,20 @@ TEST_F(Find, ATerminalShowsTheTryAndTakesItAway) {
   EXPECT_EQ(result.status, kDone) << result.output;
   EXPECT_THAT(result.history, testing::Contains(HasSubstr("try 1 of ")));
   EXPECT_THAT(result.output, AllOf(HasSubstr("Quorin receiver"), Not(HasSubstr("try 1"))));
+}
+
+// Nothing else is shown after the try, which would cover it.
+TEST_F(Find, NothingIsLeftOfATryThatWasInVain) {
+  const bed::SimulatedPort silent({"quorin", "--mute", "*"});
+  const auto result =
+      bed::Program(kProgram,
+                   On(silent, {"find", "--protocol", "quorin", "--json", "--progress", "bar"}),
+                   bed::Output::kTerminal,
+                   folder.unix_path())
+          .Finish();
+  EXPECT_EQ(result.status, kNoReceiver) << result.output;
+  EXPECT_THAT(result.history, testing::Contains(HasSubstr("(Ctrl-C ends it)")));
+  EXPECT_THAT(result.output, Not(HasSubstr("Ctrl-C")));
 }
 
 TEST_F(Find, WhatWasFoundIsTriedFirstTheNextTime) {
@@ -133,6 +180,28 @@ TEST_F(Find, APortThatAnswersIsToldBeforeTheSilentOnesEnd) {
   const auto result = program.Finish();
   EXPECT_EQ(result.status, kCancelled) << result.output;
   EXPECT_THAT(result.output, HasSubstr(NameOf(silent) + ": ended by Ctrl-C"));
+}
+
+TEST_F(Find, APortThatIsNamedTwiceIsAskedOnce) {
+  const json found = json::parse(Run({"find", "COM98", "com98", "COM98:", "--json"}).output);
+  EXPECT_EQ(found.at("failures").size(), 1U);
+}
+
+TEST_F(Find, AComPortIsSerialAmongUsbDevices) {
+  const bed::SimulatedPort receiver({"quorin"});
+  const json found = json::parse(
+      Sweep(receiver, {"find", R"(\\?\rcvlink-none)", "--link", "usb", "--json"}).output);
+  ASSERT_EQ(found.at("receivers").size(), 1U);
+  EXPECT_EQ(found.at("receivers")[0].at("link"), "serial");
+  ASSERT_EQ(found.at("failures").size(), 1U);
+}
+
+TEST_F(Find, WithoutASpeedThatOfThePortIsTold) {
+  const bed::SimulatedPort receiver({"quorin"});
+  ASSERT_EQ(RunOn(receiver, {"find"}).status, kDone);
+  const auto result = Sweep(receiver, {"find", "--rts", "on", "--json"});
+  ASSERT_EQ(result.status, kDone) << result.output;
+  EXPECT_EQ(json::parse(result.output).at("speed"), 9600);
 }
 
 TEST_F(Find, AllSilentIsNoReceiver) {

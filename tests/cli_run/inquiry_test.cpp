@@ -76,6 +76,7 @@ TEST_F(Cli, SilenceIsNoReceiver) {
   EXPECT_EQ(result.status, kNoReceiver);
   EXPECT_EQ(result.output, "");
   EXPECT_THAT(result.errors, HasSubstr("no receiver answered"));
+  EXPECT_THAT(result.errors, HasSubstr("is this its speed?"));  // and not asked for on USB
   EXPECT_THAT(result.errors, testing::Not(HasSubstr("0x0000")));
 }
 
@@ -151,6 +152,30 @@ TEST_F(Cli, APortIsUnderstoodHoweverItIsWritten) {
     EXPECT_EQ(result.status, kDone) << result.errors;
     EXPECT_EQ(json::parse(result.output).at("port"), Port(receiver));
   }
+}
+
+// As `more` and `head` do when they have seen enough.
+TEST_F(Cli, AReaderThatHasGoneIsNoFailure) {
+  const bed::SimulatedPort receiver({"quorin"}, {{"a.jps", "a"}});
+  for (const std::vector<std::string>& line : std::vector<std::vector<std::string>>{
+           {"--help"}, On(receiver, {"ls"}), On(receiver, {"ls", "--json"})}) {
+    const auto result =
+        bed::Program(kProgram, line, bed::Output::kClosed, folder.unix_path()).Finish();
+    EXPECT_EQ(result.status, kDone) << testing::PrintToString(line);
+    EXPECT_EQ(result.errors, "") << testing::PrintToString(line);
+  }
+}
+
+// Its bytes are lost, which whoever asked for them has to know.
+TEST_F(Cli, ADownloadWhoseReaderHasGoneIsAFailure) {
+  const bed::SimulatedPort receiver({"quorin"}, {{"a.jps", Content(3000)}});
+  const auto result = bed::Program(kProgram,
+                                   On(receiver, {"get", "a.jps", "-o", "-"}),
+                                   bed::Output::kClosed,
+                                   folder.unix_path())
+                          .Finish();
+  EXPECT_EQ(result.status, kLocalFile);
+  EXPECT_THAT(result.errors, HasSubstr("could not write to the standard output"));
 }
 
 TEST_F(Cli, ACodeIsExplained) {

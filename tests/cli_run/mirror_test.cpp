@@ -109,6 +109,28 @@ TEST_F(Mirror, GoesOnAfterAFileThatFailed) {
   EXPECT_EQ(FileOf(document, "b.jps").at("done"), "downloaded");
   EXPECT_EQ(document.at("summary").at("downloaded"), 1);
   EXPECT_EQ(document.at("summary").at("failed"), 1);
+
+  // The next time it is out of date.
+  const bed::SimulatedPort ready({"quorin"}, {{"a.jps", Content(4000)}, {"b.jps", Content(30)}});
+  EXPECT_EQ(RunMirror(ready).status, kDone);
+  EXPECT_EQ(Mirrored(), (Names{"a.jps", "b.jps"}));
+  EXPECT_EQ(folder.Read("out/a.jps"), Content(4000));
+}
+
+TEST_F(Mirror, TheWorstFailureCounts) {
+  folder.Write("out/b.jps.new", "left");
+  const bed::SimulatedPort receiver({"quorin", "--lie-size", "a.jps=4000"},
+                                    {{"a.jps", Content(3000)}, {"b.jps", Content(30)}});
+  EXPECT_EQ(RunMirror(receiver).status, kFailed);
+}
+
+TEST_F(Mirror, AFileThatTheProtocolCannotNumberIsLeftOut) {
+  const bed::SimulatedPort receiver({"quorin", "--lie-size", "a.jps=33554433"},
+                                    {{"a.jps", Content(3000)}});
+  const auto result = RunMirror(receiver);
+  EXPECT_EQ(result.status, kFailed);
+  EXPECT_THAT(result.errors, HasSubstr("33554432"));
+  EXPECT_THAT(receiver.Transcript(), Not(HasSubstr("get,")));
 }
 
 TEST_F(Mirror, AFileThatIsLeftFromAnEarlierRunStopsOnlyItsOwn) {
@@ -133,6 +155,24 @@ TEST_F(Mirror, AnEmptyFileIsMadeWithoutATransfer) {
   EXPECT_EQ(RunMirror(receiver).status, kDone);
   EXPECT_TRUE(Has("out/a.jps"));
   EXPECT_THAT(receiver.Transcript(), Not(HasSubstr("get,")));
+}
+
+TEST_F(Mirror, AnEmptyFileReplacesAnotherOnlyWhenForced) {
+  folder.Write("out/a.jps", "mine");
+  const bed::SimulatedPort receiver({"quorin"}, {{"a.jps", ""}});
+  const auto result = RunMirror(receiver);
+  EXPECT_EQ(result.status, kFailed);
+  EXPECT_THAT(result.errors, HasSubstr("it has no bytes, but the file of that name"));
+  EXPECT_EQ(folder.Read("out/a.jps"), "mine");
+  EXPECT_EQ(RunMirror(receiver, {"--force"}).status, kDone);
+  EXPECT_EQ(folder.Read("out/a.jps"), "");
+}
+
+// No second download has verified it.
+TEST_F(Mirror, AnEmptyFileIsNotDeleted) {
+  const bed::SimulatedPort receiver({"quorin"}, {{"a.jps", ""}});
+  EXPECT_EQ(RunMirror(receiver, {"--then-delete"}).status, kDone);
+  EXPECT_EQ(NamesOn(receiver), Names{"a.jps"});
 }
 
 TEST_F(Mirror, KeepsFileTimesAndSaysTheZone) {
@@ -242,6 +282,25 @@ TEST_F(VelmarMirror, ADirectoryThatDidNotFitIsNeverDone) {
   EXPECT_THAT(document.at("warning"), HasSubstr("8192 bytes"));
   EXPECT_EQ(Mirrored(), Names{"file100"});
   EXPECT_THAT(RunMirror(receiver, {"file100", "--quiet"}).errors, HasSubstr("may be missing"));
+}
+
+TEST_F(VelmarMirror, FilesThatTheDiskHasNoRoomForAreRefusedAtOnce) {
+  constexpr std::uint64_t kListed = 2'147'483'647;
+  constexpr std::uint64_t kMostFiles = 60;  // a longer list is cut
+  const std::uint64_t needed = std::filesystem::space(folder.path()).available / kListed + 1;
+  if (needed > kMostFiles) GTEST_SKIP() << "this disk has room for all that can be listed";
+  std::vector<std::string> simulator = {"velmar"};
+  Files files;
+  for (std::uint64_t i = 0; i < needed; ++i) {
+    const std::string name = "f" + std::to_string(i);
+    files.emplace(name, "x");
+    simulator.insert(simulator.end(), {"--lie-size", name + "=" + std::to_string(kListed)});
+  }
+  const bed::SimulatedPort receiver(simulator, files);
+  const auto result = RunMirror(receiver, {});
+  EXPECT_EQ(result.status, kLocalFile);
+  EXPECT_THAT(result.errors, HasSubstr("there is room for"));
+  EXPECT_EQ(Mirrored(), Names{});
 }
 
 TEST_F(VelmarMirror, ADirectoryThatWasRefusedIsNeverDone) {

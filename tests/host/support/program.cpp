@@ -3,12 +3,24 @@
 namespace bed {
 namespace {
 
+const char* NameOf(Output output) {
+  switch (output) {
+    case Output::kClosed:
+      return "closed";
+    case Output::kTerminal:
+      return "terminal";
+    case Output::kPipe:
+      break;
+  }
+  return "pipe";
+}
+
 nlohmann::json RunRequest(const std::string& file_name,
                           const std::vector<std::string>& arguments,
                           Output output,
                           const std::string& unix_folder) {
   nlohmann::json request = {{"do", "run"}, {"program", file_name}, {"arguments", arguments}};
-  request["terminal"] = output == Output::kTerminal;
+  request["output"] = NameOf(output);
   if (!unix_folder.empty()) request["folder"] = unix_folder;
   return request;
 }

@@ -12,8 +12,9 @@
 namespace bed {
 
 enum class Output {
-  kPipe,     // as in a script
-  kTerminal  // on a console of 100 columns
+  kPipe,      // as in a script
+  kClosed,    // a pipe whose reader has gone; errors have one of their own
+  kTerminal,  // on a console of 100 columns
 };
 
 struct ProgramResult {
