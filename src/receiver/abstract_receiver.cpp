@@ -15,22 +15,25 @@ HRESULT CAbstractReceiver::Reserved1() { return driver_ ? E_NOTIMPL : kNotConnec
 
 HRESULT CAbstractReceiver::Reserved2() { return Reserved1(); }
 
-HRESULT CAbstractReceiver::CheckConnection(HANDLE abort_event, short* answer) {
+template <typename... Parameters, typename... Arguments>
+HRESULT CAbstractReceiver::PassOn(const wchar_t* name,
+                                  HRESULT (CIProtocol::*operation)(Parameters...),
+                                  Arguments... arguments) {
   if (!driver_) return kNotConnected;
-  Trace(L"CAbstractReceiver::CheckConnection\r\n");
-  return driver_->CheckConnection(abort_event, answer);
+  Trace(L"CAbstractReceiver::%s\r\n", name);
+  return (driver_.get()->*operation)(arguments...);
+}
+
+HRESULT CAbstractReceiver::CheckConnection(HANDLE abort_event, short* answer) {
+  return PassOn(L"CheckConnection", &CIProtocol::CheckConnection, abort_event, answer);
 }
 
 HRESULT CAbstractReceiver::GetReceiverInfo(HANDLE abort_event, CReceiverInfo* info) {
-  if (!driver_) return kNotConnected;
-  Trace(L"CAbstractReceiver::GetReceiverInfo\r\n");
-  return driver_->GetReceiverInfo(abort_event, info);
+  return PassOn(L"GetReceiverInfo", &CIProtocol::GetReceiverInfo, abort_event, info);
 }
 
 HRESULT CAbstractReceiver::GetFiles(CFileList* files) {
-  if (!driver_) return kNotConnected;
-  Trace(L"CAbstractReceiver::GetFiles\r\n");
-  return driver_->GetFiles(files);
+  return PassOn(L"GetFiles", &CIProtocol::GetFiles, files);
 }
 
 template <typename Transfer>
@@ -52,29 +55,24 @@ HRESULT CAbstractReceiver::WithProgress(const CProgressCallback* progress, Trans
 HRESULT CAbstractReceiver::DownloadFile(const wchar_t* name,
                                         IStream* stream,
                                         CProgressCallback* progress) {
-  if (!driver_) return kNotConnected;
-  Trace(L"CAbstractReceiver::DownloadFile\r\n");
-  return WithProgress(progress, [&] { return driver_->DownloadFile(name, stream, progress); });
+  return WithProgress(progress, [&] {
+    return PassOn(L"DownloadFile", &CIProtocol::DownloadFile, name, stream, progress);
+  });
 }
 
 HRESULT CAbstractReceiver::UploadFile(const CFileInfo* info,
                                       IStream* stream,
                                       CProgressCallback* progress) {
-  if (!driver_) return kNotConnected;
-  Trace(L"CAbstractReceiver::UploadFile\r\n");
-  return WithProgress(progress, [&] { return driver_->UploadFile(info, stream); });
+  return WithProgress(progress,
+                      [&] { return PassOn(L"UploadFile", &CIProtocol::UploadFile, info, stream); });
 }
 
 HRESULT CAbstractReceiver::DeleteFile(const wchar_t* name) {
-  if (!driver_) return kNotConnected;
-  Trace(L"CAbstractReceiver::DeleteFile\r\n");
-  return driver_->DeleteFile(name);
+  return PassOn(L"DeleteFile", &CIProtocol::DeleteFile, name);
 }
 
 HRESULT CAbstractReceiver::RenameFile(const wchar_t* old_name, const wchar_t* new_name) {
-  if (!driver_) return kNotConnected;
-  Trace(L"CAbstractReceiver::RenameFile\r\n");
-  return driver_->RenameFile(old_name, new_name);
+  return PassOn(L"RenameFile", &CIProtocol::RenameFile, old_name, new_name);
 }
 
 HRESULT CAbstractReceiver::Abort() {
@@ -95,27 +93,19 @@ HRESULT CAbstractReceiver::UnlockConnection() {
 }
 
 HRESULT CAbstractReceiver::DCSetRcvBaudrate(DWORD baud_rate) {
-  if (!driver_) return kNotConnected;
-  Trace(L"CAbstractReceiver::DCSetRcvBaudrate\r\n");
-  return driver_->DCSetRcvBaudrate(baud_rate);
+  return PassOn(L"DCSetRcvBaudrate", &CIProtocol::DCSetRcvBaudrate, baud_rate);
 }
 
 HRESULT CAbstractReceiver::DCSetRcvRTSControl(BYTE rts) {
-  if (!driver_) return kNotConnected;
-  Trace(L"CAbstractReceiver::DCSetRcvRTSControl\r\n");
-  return driver_->DCSetRcvRTSControl(rts);
+  return PassOn(L"DCSetRcvRTSControl", &CIProtocol::DCSetRcvRTSControl, rts);
 }
 
 HRESULT CAbstractReceiver::DCSetRcvParity(BYTE parity) {
-  if (!driver_) return kNotConnected;
-  Trace(L"CAbstractReceiver::DCSetRcvParity\r\n");
-  return driver_->DCSetRcvParity(parity);
+  return PassOn(L"DCSetRcvParity", &CIProtocol::DCSetRcvParity, parity);
 }
 
 HRESULT CAbstractReceiver::DCSetRcvStopbits(BYTE stop_bits) {
-  if (!driver_) return kNotConnected;
-  Trace(L"CAbstractReceiver::DCSetRcvStopbits\r\n");
-  return driver_->DCSetRcvStopbits(stop_bits);
+  return PassOn(L"DCSetRcvStopbits", &CIProtocol::DCSetRcvStopbits, stop_bits);
 }
 
 HRESULT CAbstractReceiver::SetProgressCallback(ProgressFunction function, void* context) {

@@ -37,6 +37,12 @@ class CAbstractReceiver : public CIReceiver, public CIProtocolCallback {
   void OnProgress(BYTE percent) override;
 
  private:
+  // Writes an operation into the report and passes it on to the driver.
+  template <typename... Parameters, typename... Arguments>
+  HRESULT PassOn(const wchar_t* name,
+                 HRESULT (CIProtocol::*operation)(Parameters...),
+                 Arguments... arguments);
+
   // The bracket of a transfer: the host's progress record is in place while it runs, and never
   // after.
   template <typename Transfer>
