@@ -2,10 +2,10 @@
 # Makes the build folder's own Wine prefix (once), the serial ports in it, and build/bed/tcflush.so
 # for the programs that open them.
 #
-# COM7 and COM10 to COM33 are links in the prefix's folder of devices that lead to build/ports/com7
-# and so on. Whoever wants a receiver on a port puts a link to its pseudo-terminal there; no link, no
-# port: opening it then fails with ERROR_FILE_NOT_FOUND. (A port named in Wine's registry instead
-# would open although nothing is there.)
+# The ports of tests/bed/ports.conf are links in the prefix's folder of devices: COM7 leads to
+# build/ports/com7, and so on. Whoever wants a receiver on a port puts a link to its pseudo-terminal
+# there; no link, no port: opening it then fails with ERROR_FILE_NOT_FOUND. (A port named in Wine's
+# registry instead would open although nothing is there.)
 set -euo pipefail
 
 root="$(cd "$(dirname "${BASH_SOURCE[0]}")/.." && pwd)"
@@ -32,7 +32,9 @@ if [ "$(cat "$marker" 2>/dev/null)" != "$made_for" ]; then
 fi
 
 mkdir -p "$root/build/ports"
-for number in 7 {10..33}; do
+# shellcheck source=tests/bed/ports.conf
+. "$root/tests/bed/ports.conf"
+for number in "$DEMO_PORT" $(seq "$FIRST_PORT" $((FIRST_PORT + PORT_SETS * PORTS_PER_SET - 1))); do
   ln -sfn "$root/build/ports/com$number" "$WINEPREFIX/dosdevices/com$number"
 done
 

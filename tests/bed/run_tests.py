@@ -44,12 +44,20 @@ class Program:
     time_limit: int = 120
 
 
-# Sets of three serial ports, COM10 to COM12 the first. A shard that runs has one of them.
-PORT_SETS = 8
+
+def port_sets():
+    """The names of the ports of each set, "COM10 COM11 COM12" the first."""
+    with open(os.path.join(ROOT, "tests", "bed", "ports.conf"), encoding="utf-8") as file:
+        numbers = {name: int(value) for name, value in re.findall(r"^(\w+)=(\d+)$", file.read(), re.M)}
+    first, size = numbers["FIRST_PORT"], numbers["PORTS_PER_SET"]
+    starts = range(first, first + numbers["PORT_SETS"] * size, size)
+    return [" ".join(f"COM{start + i}" for i in range(size)) for start in starts]
+
 
 # Those with ports run side by side at the end, the longest first.
 PROGRAMS = [
     Program("check_layers", "tests/bed/check_layers.py", SCRIPT),
+    Program("check_format", "tests/bed/check_format.py", SCRIPT),
     Program("check_exports", "tests/bed/check_exports.py", SCRIPT),
     Program("check_statics", "tests/bed/check_statics.py", SCRIPT),
     Program("check_readme", "tests/bed/check_readme.py", SCRIPT),
@@ -58,8 +66,8 @@ PROGRAMS = [
     Program("unit_tests", "build/release/bin/unit_tests.exe", WINE),
     Program("cli_unit_tests", "build/release/bin/cli_unit_tests.exe", WINE),
     Program("msvc_host", "build/release/bin/msvc_host.exe", WINE_SCRIPT),
-    Program("host_tests", "build/release/bin/host_tests.exe", BED, shards=8, time_limit=600),
-    Program("cli_tests", "build/release/bin/cli_tests.exe", BED, shards=8, time_limit=300),
+    Program("host_tests", "build/release/bin/host_tests.exe", BED, shards=24, time_limit=600),
+    Program("cli_tests", "build/release/bin/cli_tests.exe", BED, shards=16, time_limit=300),
     Program("usb_tests", "build/release/bin/usb_tests.exe", BED, shards=4),
 ]
 
@@ -276,20 +284,21 @@ def outcome_of(program, name, status, results, log):
 def run_programs(programs, gtest_filter, environment):
     """Runs the shards of these programs side by side, as many as there are sets of ports."""
     start = time.monotonic()
-    port_sets = queue.SimpleQueue()
-    for number in range(PORT_SETS):
-        port_sets.put(number)
+    sets = port_sets()
+    free = queue.SimpleQueue()
+    for ports in sets:
+        free.put(ports)
 
     def run(program, shard):
-        ports = port_sets.get()
+        ports = free.get()
         try:
-            own = dict(environment, RCVLINK_PORT_SET=str(ports))
+            own = dict(environment, RCVLINK_PORTS=ports)
             return run_shard(program, shard, gtest_filter, own)
         finally:
-            port_sets.put(ports)
+            free.put(ports)
 
     total = Outcome()
-    with concurrent.futures.ThreadPoolExecutor(PORT_SETS) as pool:
+    with concurrent.futures.ThreadPoolExecutor(len(sets)) as pool:
         runs = [
             [pool.submit(run, program, shard) for shard in range(program.shards)]
             for program in programs

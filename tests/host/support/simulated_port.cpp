@@ -1,51 +1,57 @@
 #include "tests/host/support/simulated_port.h"
 
 #include <algorithm>
-#include <array>
 #include <cstdlib>
+#include <deque>
 #include <mutex>
+#include <sstream>
 #include <thread>
 #include <utility>
 
 namespace bed {
 namespace {
 
-constexpr int kFirstPort = 10;
-constexpr int kPortsPerSet = 3;
 constexpr const char* kTranscript = "transcript.txt";
 constexpr auto kPollInterval = std::chrono::milliseconds(5);
 
-std::mutex slots_mutex;
-std::array<bool, kPortsPerSet> slots_in_use{};
+// The ports that this process has.
+class Ports {
+ public:
+  static Ports& All() {
+    static Ports ports;
+    return ports;
+  }
 
-// Which set of ports is this process's.
-int PortSet() {
-  const char* const value = std::getenv("RCVLINK_PORT_SET");
-  return value == nullptr ? 0 : std::atoi(value);
-}
+  std::string Take() {
+    const std::scoped_lock lock(mutex_);
+    if (free_.empty()) throw Error("no port is left for this test");
+    std::string name = free_.front();
+    free_.pop_front();
+    return name;
+  }
+  void GiveBack(std::string name) {
+    const std::scoped_lock lock(mutex_);
+    free_.push_front(std::move(name));
+  }
 
-int TakeSlot() {
-  const std::scoped_lock lock(slots_mutex);
-  const auto slot = std::find(slots_in_use.begin(), slots_in_use.end(), false);
-  if (slot == slots_in_use.end()) throw Error("no port is left for this test");
-  *slot = true;
-  return static_cast<int>(slot - slots_in_use.begin());
-}
+ private:
+  Ports() {
+    const char* const names = std::getenv("RCVLINK_PORTS");
+    std::istringstream list(names == nullptr ? "" : names);
+    for (std::string name; list >> name;) free_.push_back(name);
+  }
+
+  std::mutex mutex_;
+  std::deque<std::string> free_;
+};
 
 std::wstring Widen(const std::string& ascii) { return std::wstring(ascii.begin(), ascii.end()); }
 
 }  // namespace
 
-PortLease::PortLease() : slot_(TakeSlot()) {}
+PortLease::PortLease() : name_(Ports::All().Take()) {}
 
-PortLease::~PortLease() {
-  const std::scoped_lock lock(slots_mutex);
-  slots_in_use.at(static_cast<size_t>(slot_)) = false;
-}
-
-std::string PortLease::name() const {
-  return "COM" + std::to_string(kFirstPort + kPortsPerSet * PortSet() + slot_);
-}
+PortLease::~PortLease() { Ports::All().GiveBack(name_); }
 
 SimulatedPort::SimulatedPort(std::vector<std::string> arguments,
                              const std::map<std::string, std::string>& files) {

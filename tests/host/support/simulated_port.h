@@ -14,21 +14,22 @@
 
 namespace bed {
 
-// The right to use one of the serial ports of this test process. Each that runs has three of its
-// own, so those that run side by side do not meet. Nothing is plugged in.
+// The right to use one of the serial ports of this test process. Each process that runs has ports of
+// its own (RCVLINK_PORTS, set by run_tests.py), so those that run side by side do not meet. Nothing is
+// plugged in.
 class PortLease {
  public:
-  // Raises Error when all three are in use.
+  // Raises Error when all are in use.
   PortLease();
   PortLease(const PortLease&) = delete;
   PortLease& operator=(const PortLease&) = delete;
   ~PortLease();
 
   // "COM12"
-  std::string name() const;
+  const std::string& name() const { return name_; }
 
  private:
-  int slot_;
+  std::string name_;
 };
 
 // A serial port with a simulated receiver plugged in.
