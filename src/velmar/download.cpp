@@ -2,7 +2,6 @@
 // receiver, its size asked for, its chunks taken (file_download.h), and the speed put back.
 #include <algorithm>
 #include <cstdint>
-#include <span>
 
 #include "platform/hresult.h"
 #include "platform/text.h"
@@ -20,7 +19,8 @@ namespace {
 bool IsRefusal(const CVelmarCommand& command) {
   const uint8_t* const reply = command.GetReply();
   if (!reply) return false;
-  return !std::ranges::search(std::span(reply, command.GetReplyLength()), kRefusal).empty();
+  const uint8_t* const end = reply + command.GetReplyLength();
+  return std::search(reply, end, kRefusal.begin(), kRefusal.end()) != end;
 }
 
 }  // namespace
