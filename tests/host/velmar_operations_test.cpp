@@ -138,7 +138,7 @@ TEST(ApiVelmarDownload, AbortEndsItAndTheNextOperation) {
   constexpr size_t kHalfAMinuteAndMore = 600000;
   constexpr auto kMuchLess = std::chrono::seconds(10);
   const std::string content = host::Content(kHalfAMinuteAndMore);
-  Velmar receiver({"--pace", "--stop-for-commands"},
+  Velmar receiver({"--pieces", "1000", "--piece-gap", "85", "--stop-for-commands"},
                   {{"A.log", content}, {"B.log", "b"}, {"C.log", "c"}},
                   CBR_115200);
   host::MemoryStream stream;
