@@ -4,6 +4,11 @@
 build="${root:?}/build"
 mkdir -p "$build"
 
+# A compiler cache when there is one. A precompiled header is compared by its sources, not by its time.
+if command -v ccache >/dev/null; then
+  export CMAKE_CXX_COMPILER_LAUNCHER=ccache CCACHE_SLOPPINESS=pch_defines,time_macros
+fi
+
 die() {
   echo "$*" >&2
   exit 1
