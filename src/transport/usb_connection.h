@@ -1,5 +1,5 @@
-// The link over USB, through the USBIO kernel driver. Each handle on the device is bound to one bulk
-// endpoint, so there are two of them: one for each direction.
+// The link over USB, through the USBIO kernel driver. Each handle on the device is bound to one
+// bulk endpoint, so there are two of them: one for each direction.
 #ifndef RCVLINK_TRANSPORT_USB_CONNECTION_H_
 #define RCVLINK_TRANSPORT_USB_CONNECTION_H_
 
@@ -37,8 +37,8 @@ class CUSBConnection : public CAbstractConnection {
   virtual HRESULT Open(const wchar_t* device);
 
  protected:
-  // Disconnect sends the unbind request only at kBound. Nothing in the library sets it, so the driver
-  // never gets that request; a derived class may set it.
+  // Disconnect sends the unbind request only at kBound. Nothing in the library sets it, so the
+  // driver never gets that request; a derived class may set it.
   static constexpr char16_t kClosed = u'0';
   static constexpr char16_t kBound = u'2';
   char16_t link_state_ = kClosed;
