@@ -25,8 +25,7 @@ class LinkPolicy {
   // its own count.
   virtual bool CountsTimeoutsPerBlock() const = 0;
   // Whether the result of the host's stream, or of an ACK that was cut off, is given to the host.
-  // Over
-  // a serial line it is S_OK instead. Hosts rely on either: over a serial line they ask their
+  // Over a serial line it is S_OK instead. Hosts rely on either: over a serial line they ask their
   // stream what it has written, over USB they look at the result.
   virtual bool PassesResultsOn() const = 0;
 

@@ -180,9 +180,9 @@ HRESULT CSerialConnection::Flush() {
 }
 
 // Waits until everything queued has been sent: a command or a control byte that the purge discarded
-// would never reach the receiver. It does not sleep: commands are short, and the sleep
-// would make each of them slower. A queue that stands still, since the receiver holds the line by
-// flow control, is left to the purge.
+// would never reach the receiver. It does not sleep: commands are short, and the sleep would make
+// each of them slower. A queue that stands still, since the receiver holds the line by flow
+// control, is left to the purge.
 void CSerialConnection::WaitUntilSent() {
   Clock& clock = CurrentClock();
   DWORD last_progress = clock.Ticks();
