@@ -309,7 +309,7 @@ RCVLINK_API long Abort(void* receiver);
 ///                      the file list. It is also given when the stream's Write failed, with a
 ///                      Quorin receiver on a serial port. A Velmar receiver gives it also for a
 ///                      file that it does not have (nothing is written then), after it fell silent,
-///                      and whenever a raised speed was put back, whatever became of the transfer.
+///                      and, when the download raised the speed, after any failure of the transfer.
 /// @retval S_FALSE      aborted, or ended by the receiver
 /// @retval E_INVALIDARG `name` or `stream` is null
 /// @retval E_FAIL       a Quorin receiver says that the file's size is 0, or does not say it
