@@ -64,8 +64,8 @@ CGetPortCmd::CGetPortCmd(uint32_t flags) : CQuorinCommand("print,/cur/term\r\n",
   Trace(L"CGetPortCmd::CGetPortCmd\r\n");
 }
 
-// "/d" is also a part of "/dev", so it is looked for last. A terminal under "/dev" with another letter
-// counts as port d therefore, and its receiver is found.
+// "/d" is also a part of "/dev", so it is looked for last. A terminal under "/dev" with another
+// letter counts as port d therefore, and its receiver is found.
 int CGetPortCmd::PortIndex() const {
   constexpr std::array<std::string_view, 4> kPorts = {"/a", "/b", "/c", "/d"};
   const std::string reply = ReplyText();

@@ -108,8 +108,8 @@ void ReportFile::WriteEntry(const wchar_t* format, va_list arguments) {
                           nullptr) == 0) {
     return;
   }
-  // As many bytes as the text has characters: with multi-byte characters the end of the line is cut.
-  // A host that compares reports byte for byte with those of another version relies on it.
+  // As many bytes as the text has characters: with multi-byte characters the end of the line is
+  // cut. A host that compares reports byte for byte with those of another version relies on it.
   Write(converted, text.size());
 }
 
