@@ -14,7 +14,7 @@ static void ShowPercent(void*, unsigned char percent) { std::printf("\r%3u %%", 
 int wmain(int argc, wchar_t** argv) {
   if (argc != 4) return std::puts("usage: download PORT NAME FILE"), 2;
 
-  void* receiver = nullptr;  // the search wants it null
+  void* receiver = nullptr;  // the search reads it, so it must be null
   long result = devapi::SearchReceiver(argv[1], eInstanceSerial, eProtocolAny, nullptr, &receiver);
   if (result != S_OK) return std::printf("no receiver: 0x%08lX\n", result), 1;
 
@@ -24,7 +24,7 @@ int wmain(int argc, wchar_t** argv) {
     SysFreeString(info.bstrModel);
     SysFreeString(info.bstrReceiverId);
   } else {
-    devapi::UnlockConnection(receiver);  // a failure leaves the receiver locked
+    devapi::UnlockConnection(receiver);  // after a failure the receiver is still locked
   }
 
   IStream* file = nullptr;

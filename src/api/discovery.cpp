@@ -26,11 +26,13 @@ struct RtsTry {
   DWORD control;
   const wchar_t* name;
 };
+// Receivers and cables differ in how they use RTS, and with the wrong mode nothing may come
+// through.
 constexpr std::array<RtsTry, 3> kRtsTries = {{{RTS_CONTROL_HANDSHAKE, L"handshake"},
                                               {RTS_CONTROL_ENABLE, L"enable"},
                                               {RTS_CONTROL_DISABLE, L"disable"}}};
 
-constexpr DWORD kCurrentSpeed = 0;
+constexpr DWORD kCurrentSpeed = 0;  // a DCB with this speed keeps that of the port
 constexpr std::array<DWORD, 6> kSpeedTries = {
     kCurrentSpeed, CBR_9600, CBR_115200, CBR_57600, CBR_38400, CBR_19200};
 
@@ -50,21 +52,22 @@ DCB SettingsOfTry(DWORD speed, DWORD rts_control) {
   return settings;
 }
 
-// Only the family that is asked for. A number that is no family's stands for all of them.
+// The family that is asked for. Any number that is not a family's means all of them.
 std::span<const Family> FamiliesOnSerial(EProtocol protocol) {
   const std::span<const Family> all = rcvlink::kFamilies;
   const auto asked = std::ranges::find(all, protocol, &Family::protocol);
   return asked == all.end() ? all : std::span(asked, 1);
 }
 
-// Whatever family is asked for.
+// All families with a USB link, whatever family is asked for: a host that asks for another one
+// would find nothing, although a receiver is there.
 std::vector<Family> FamiliesOnUsb() {
   std::vector<Family> families;
   std::ranges::copy_if(rcvlink::kFamilies, std::back_inserter(families), &Family::is_on_usb);
   return families;
 }
 
-// Makes the receiver around the driver that was found, and registers it.
+// Creates a receiver with the driver that was found, and registers it.
 HRESULT Register(const Inquiry& inquiry, std::unique_ptr<CIProtocol> driver, void** receiver) {
   auto object = std::make_shared<CAbstractReceiver>(std::move(driver));
   void* handle = nullptr;
@@ -139,6 +142,8 @@ long SearchReceiver(
       return E_UNEXPECTED;
   }
 
+  // A name is either that of a port or that of a device, so one of the two links cannot be opened.
+  // That failure is only written to the report, and the result is that of USB.
   const HRESULT serial_result = SearchReceiverOnSerial(port, protocol, abortEvent, receiver);
   if (*receiver) return serial_result;
   if (FAILED(serial_result)) {
@@ -166,6 +171,7 @@ long SearchReceiverOnSerial(wchar_t* port, EProtocol protocol, void* abortEvent,
       DCB settings = SettingsOfTry(speed, rts.control);
       const HRESULT result =
           devapi::CreateReceiverOnSerial(port, protocol, &settings, abortEvent, receiver);
+      // A port that cannot be opened cannot be opened with other settings either.
       if (FAILED(result)) return result;
       if (*receiver) return S_OK;
       if (IsSignalled(abortEvent)) return S_FALSE;

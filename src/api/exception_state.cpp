@@ -1,11 +1,13 @@
 // The C++ ABI has two functions that give a thread its exception state, __cxa_get_globals and
-// __cxa_get_globals_fast. Those of libsupc++ keep it in an emulated thread-local variable: its key is
-// never freed, and neither is what the thread library keeps for each thread that raised, so a host
-// that loads and unloads the DLL runs out of TLS slots. The definitions here, which the linker
-// takes instead, keep it in a fiber-local slot. Unlike a TLS slot it has a callback, which frees the
-// state of a thread when that thread ends, and those of all threads when the slot is freed.
+// __cxa_get_globals_fast. Those of libsupc++ keep the state in an emulated thread-local variable.
+// Its key is never freed, nor is the memory of each thread that raised an exception, so a host that
+// loads and unloads the DLL again and again runs out of TLS slots.
 //
-// Only the DLL has this source. Programs end with their runtime, and need none of it.
+// The linker takes the definitions below instead. They keep the state in a fiber-local slot. Unlike
+// a TLS slot it has a callback, which frees a thread's state when the thread ends, and the states
+// of all threads when the slot is freed.
+//
+// Only the DLL needs this source: in a program the runtime ends with the process.
 #include "api/exception_state.h"
 
 #include <cxxabi.h>
@@ -17,7 +19,7 @@
 
 namespace __cxxabiv1 {
 
-// As the ABI lays it out. All zero for a new thread.
+// The layout is that of the C++ ABI. All zero for a new thread.
 struct __cxa_eh_globals {
   void* caught_exceptions;
   unsigned int uncaught_exceptions;
@@ -27,8 +29,8 @@ struct __cxa_eh_globals {
 
 namespace __gnu_cxx {
 
-// Frees the memory that libsupc++ sets aside at load for exceptions raised when there is no other.
-// No header declares it.
+// Frees the memory that libsupc++ allocates at load, for exceptions that are raised when no memory
+// is left. No header declares the function.
 void __freeres();
 
 }  // namespace __gnu_cxx
@@ -41,8 +43,8 @@ constinit std::atomic<DWORD> state_slot = FLS_OUT_OF_INDEXES;
 
 void WINAPI FreeState(void* state) { std::free(state); }
 
-// The slot, made when the first exception of all is raised. Without one there is no way to go on: a
-// raise calls this, so it cannot raise.
+// The slot, allocated when the first exception is raised. Without a slot the process ends: this is
+// a part of raising an exception, so it cannot raise one.
 DWORD StateSlot() {
   const DWORD slot = state_slot;
   if (slot != FLS_OUT_OF_INDEXES) return slot;
@@ -50,16 +52,17 @@ DWORD StateSlot() {
   if (own == FLS_OUT_OF_INDEXES) std::abort();
   DWORD first = FLS_OUT_OF_INDEXES;
   if (state_slot.compare_exchange_strong(first, own)) return own;
-  FlsFree(own);  // another thread was first
+  FlsFree(own);  // another thread has set its slot meanwhile
   return first;
 }
 
 State* ThreadState() {
-  const DWORD last_error = GetLastError();  // a raise leaves it as it is
+  const DWORD last_error = GetLastError();  // raising an exception must not change it
   const DWORD slot = StateSlot();
   auto* state = static_cast<State*>(FlsGetValue(slot));
   if (!state) {
-    // Not operator new: libsupc++'s raises inside, even the one that gives null.
+    // Not operator new: that of libsupc++ raises an exception when there is no memory, also inside
+    // the form that gives null, and would come here again.
     state = static_cast<State*>(std::calloc(1, sizeof(State)));
     if (!state || !FlsSetValue(slot, state)) std::abort();
   }

@@ -1,8 +1,8 @@
-// What the C++ runtime inside the DLL keeps for exceptions, given back at unload.
+// Frees at unload what the C++ runtime inside the DLL keeps for exceptions.
 #ifndef RCVLINK_API_EXCEPTION_STATE_H_
 #define RCVLINK_API_EXCEPTION_STATE_H_
 
-// Frees it for all threads. The last that the library does at unload: nothing may be raised after.
+// Frees it for all threads. It is the last step of the unload: no exception may be raised after it.
 void FreeExceptionState();
 
 #endif  // RCVLINK_API_EXCEPTION_STATE_H_

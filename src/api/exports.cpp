@@ -1,5 +1,5 @@
-// The exported functions that hand a call on: they look the handle up, then leave the registry's
-// lock before the receiver works.
+// The exported functions that pass a call to a receiver. The registry's lock is released before the
+// receiver works, so that one receiver does not block the calls to another.
 #include <memory>
 
 #include "api/registry.h"
@@ -8,8 +8,8 @@
 
 namespace {
 
-// The pointer keeps the receiver alive until the operation returns, also when it is closed
-// meanwhile.
+// The shared pointer keeps the receiver alive until the operation returns, also when another thread
+// closes it meanwhile.
 template <typename Operation>
 long Forward(void* handle, Operation operation) {
   const std::shared_ptr<CIReceiver> receiver = Receivers().Find(handle);

@@ -12,10 +12,10 @@
 
 namespace rcvlink {
 
-// What discovery has to know of a family.
+// What discovery needs to know of a family.
 struct Family {
   EProtocol protocol;
-  const wchar_t* name;  // as the report has it
+  const wchar_t* name;  // for the report
   bool is_on_usb;
   // Whether a receiver of the family answers on the connection.
   bool (*probe)(CIConnection* connection, HANDLE abort_event);
@@ -24,7 +24,7 @@ struct Family {
 
 enum class OnUsb { kNo, kYes };
 
-// The family that a driver speaks with.
+// The table's entry for the family of a driver.
 template <typename Driver>
 constexpr Family FamilyOf(EProtocol protocol, const wchar_t* name, OnUsb usb) {
   return {.protocol = protocol,
@@ -36,7 +36,7 @@ constexpr Family FamilyOf(EProtocol protocol, const wchar_t* name, OnUsb usb) {
           }};
 }
 
-// In the order in which they are asked. A new family is one more line.
+// In the order in which discovery asks for them. A new family is one more line.
 inline constexpr std::array kFamilies = {
     FamilyOf<CQuorinProtocol>(eProtocolQuorin, L"Quorin", OnUsb::kYes),
     FamilyOf<CVelmarProtocol>(eProtocolVelmar, L"Velmar", OnUsb::kNo)};

@@ -38,6 +38,7 @@ long OpenFileList(void* receiver, void** fileList) {
     auto files = std::make_unique<CFileList>();
     const HRESULT result = found->GetFiles(files.get());
     if (FAILED(result)) return result;
+    // Also after S_FALSE, which is no failure: a host that tests for failures closes this list.
     *fileList = OpenLists().Insert(std::move(files));
     return result;
   });
@@ -56,8 +57,8 @@ long GetFileInfo(void* fileList, long index, CFileInfo* info) {
   const CFileList* const files = OpenLists().Find(fileList);
   if (!files) return E_INVALIDARG;
   if (index >= files->Count()) return E_INVALIDARG;
-  // A negative index goes on to the bounds check of the list: it is the host's mistake, not an
-  // answer to be had.
+  // A negative index gets no result code: it is a mistake in the host's program, which the bounds
+  // check of the list shows where it is made.
   const CFileInfo& file = files->At(index);
   *info = file;
   info->bstrName = nullptr;

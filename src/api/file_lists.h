@@ -1,5 +1,5 @@
-// The table of open file lists. A list's handle is its address. The table has no lock: hosts do not
-// use file lists from several threads at once.
+// The table of open file lists. A list's handle is its address. The table has no lock: rcvlink.h
+// asks hosts not to use file lists from two threads at once.
 #ifndef RCVLINK_API_FILE_LISTS_H_
 #define RCVLINK_API_FILE_LISTS_H_
 
@@ -23,7 +23,7 @@ class FileLists {
   std::unordered_map<void*, std::unique_ptr<CFileList>> lists_;
 };
 
-// The process's own.
+// The table of the process.
 FileLists& OpenLists();
 
 #endif  // RCVLINK_API_FILE_LISTS_H_

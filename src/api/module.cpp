@@ -1,4 +1,4 @@
-// The module's start and end.
+// Load and unload of the DLL.
 #include <array>
 #include <cstddef>
 #include <vector>
@@ -12,9 +12,9 @@
 
 namespace {
 
-// Writes the load line with the module's path and product version; nothing when a step fails. No
-// report can be open this early, so the line never shows: hosts open one through the loaded
-// library.
+// Writes a line with the module's path and product version; nothing when a step fails. A host opens
+// a report through the loaded library, so none is open yet and the line is dropped: it shows in a
+// debugger only.
 void TraceModule(HMODULE module) {
   std::array<wchar_t, MAX_PATH> path{};
   if (GetModuleFileNameW(module, path.data(), MAX_PATH) == 0) return;
@@ -43,7 +43,8 @@ void Start(HMODULE module) {
   TraceModule(module);
 }
 
-// What the host has not closed goes after the farewell, while the report still takes its lines.
+// Closes what the host left open. The report is still open, so the lines of the ports that are
+// closed stand in it, after the module's last line.
 void End() {
   Trace(L"Bye!\r\n");
   OpenLists().Clear();
@@ -61,8 +62,8 @@ extern "C" BOOL WINAPI DllMain(HINSTANCE module, DWORD reason, void* process_end
       End();
       return S_OK;
     });
-    // The end of a process frees everything. It has stopped the other threads wherever they were,
-    // in the middle of an allocation too, so the less is done the better.
+    // At the end of a process Windows frees everything. It has stopped the other threads wherever
+    // they were, also in the middle of an allocation, so this step is left out.
     if (!process_ends) FreeExceptionState();
   }
   return TRUE;

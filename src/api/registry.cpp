@@ -10,7 +10,7 @@
 
 namespace {
 
-// Letter case counts; a null name is the same as an empty one.
+// Letter case counts: names are compared as the host gave them. A null name equals an empty one.
 bool IsSameName(wchar_t* left, wchar_t* right) {
   constexpr ULONG kNoFlags = 0;
   return VarBstrCmp(left, right, LOCALE_USER_DEFAULT, kNoFlags) == static_cast<HRESULT>(VARCMP_EQ);
@@ -66,7 +66,7 @@ HRESULT ReceiverRegistry::Close(void* handle) {
     Trace(L"CloseReceiver - ref [%u] [%s]\r\n", entry.use_count, entry.port.get());
     return S_FALSE;
   }
-  devapi::Abort(handle);  // takes the lock again
+  devapi::Abort(handle);  // takes the lock again, which is recursive
   Trace(L"CloseReceiver - removed [%s]\r\n", entry.port.get());
   entries_.erase(found);
   return S_OK;
@@ -79,12 +79,14 @@ HRESULT ReceiverRegistry::Destroy(const wchar_t* port) {
   const UniqueBstr name = CopyBstr(port);
   for (auto entry = entries_.begin(); entry != entries_.end(); ++entry) {
     if (!IsSameName(entry->second.port.get(), name.get())) continue;
-    // Every equal-named receiver that is passed loses one user, and nothing is written for it.
+    // Receivers of that name with more users lose one on the way: a host that lost its handles
+    // calls this until nothing is left, and need not know how many users there were.
     if (--entry->second.use_count != 0) continue;
     Trace(L"DestroyReceiver - removed [%s]\r\n", port);
     const std::shared_ptr<CIReceiver> receiver = std::move(entry->second.receiver);
     entries_.erase(entry);
-    // A call that is running keeps the receiver, and no host can reach it any more to abort it.
+    // A call that is running keeps the receiver, and without a handle no host can abort it any
+    // more.
     if (receiver.use_count() > 1) receiver->Stop();
     return S_OK;
   }

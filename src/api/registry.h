@@ -1,5 +1,5 @@
-// The process-wide table that owns every live receiver, counts its users and finds it by the name
-// of its port. A receiver's handle is its address.
+// The process-wide table of receivers. It owns them, counts their users and finds them by the names
+// of their ports. A receiver's handle is its address.
 #ifndef RCVLINK_API_REGISTRY_H_
 #define RCVLINK_API_REGISTRY_H_
 
@@ -13,20 +13,21 @@
 
 class ReceiverRegistry {
  public:
-  // Registers a new receiver with one user and gives its handle. E_OUTOFMEMORY: it is destroyed.
+  // Registers a new receiver with one user and gives its handle. E_OUTOFMEMORY: the receiver is
+  // destroyed.
   HRESULT Insert(const wchar_t* port, std::shared_ptr<CIReceiver> receiver, void** handle);
 
   // The receiver of a handle, kept alive for as long as the caller holds the pointer; null when the
   // handle is unknown.
   std::shared_ptr<CIReceiver> Find(void* handle);
 
-  // As the exported functions of these names, which hand their arguments on.
+  // OpenReceiver, CloseReceiver and DestroyReceiver of rcvlink.h.
   HRESULT Open(const wchar_t* port, void** handle);
   HRESULT Close(void* handle);
   HRESULT Destroy(const wchar_t* port);
 
-  // Lets go of every receiver, at unload. No other thread runs in the library then. Takes no lock: a
-  // thread that the end of the process has stopped may hold it.
+  // Closes every receiver, at unload. It takes no lock: no other thread is in the library then, but
+  // one that the end of the process has stopped may hold it.
   void Clear() { entries_.clear(); }
 
  private:
@@ -40,7 +41,7 @@ class ReceiverRegistry {
   std::unordered_map<void*, Entry> entries_;
 };
 
-// The process's own.
+// The registry of the process.
 ReceiverRegistry& Receivers();
 
 #endif  // RCVLINK_API_REGISTRY_H_

@@ -10,7 +10,7 @@
 struct FileEntry {
   std::wstring name;
   uint32_t size = 0;  // bytes
-  SYSTEMTIME time{};  // all zero when the receiver's time could not be read
+  SYSTEMTIME time{};  // as the receiver gives it; all zero when it could not be read
 };
 
 #endif  // RCVLINK_COMMANDS_FILE_ENTRY_H_

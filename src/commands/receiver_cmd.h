@@ -1,5 +1,5 @@
-// The base of every command sent to a receiver, of either family: the bytes to send, the bytes kept
-// of the reply, flags that only the family reads, two time-outs and the cancelled mark.
+// The base of every command, of either family: the bytes to send, the bytes kept of the reply,
+// flags whose meaning is the family's, two time-outs and the cancelled mark.
 #ifndef RCVLINK_COMMANDS_RECEIVER_CMD_H_
 #define RCVLINK_COMMANDS_RECEIVER_CMD_H_
 
@@ -10,8 +10,8 @@
 #include "platform/win32.h"
 #include "transport/connection.h"
 
-// A command serves one exchange: construct, Execute, read the results, destroy. One thread drives
-// it; only Cancel may come from another.
+// A command serves one exchange: construct it, execute it, read the results, destroy it. One thread
+// uses it; only Cancel may be called from another.
 class CReceiverCmd {
  public:
   // `text` is sent without its terminating zero.
@@ -30,7 +30,8 @@ class CReceiverCmd {
   // Replaces the reply by a copy of the text without its terminating zero. The old reply stays when
   // the copy cannot be allocated.
   virtual void SetReply(const char* text);
-  // Frees the reply; its length stays as it was and means nothing from then on.
+  // Frees the reply. GetReplyLength keeps its old value, and counts only while GetReply is not
+  // null.
   virtual void FreeReply();
   // E_INVALIDARG for null bytes, S_FALSE for none, E_OUTOFMEMORY with the reply unchanged.
   virtual HRESULT AppendReply(const void* bytes, uint32_t length);
@@ -45,23 +46,23 @@ class CReceiverCmd {
   virtual uint32_t GetReplyLength() const;
   virtual const uint8_t* GetReply() const;  // may be null
 
-  // Whether Cancel was called, or else the event (which may be null) is signalled; never waits.
+  // Whether Cancel was called or the event (which may be null) is signalled. It does not wait.
   virtual bool IsCancelled(HANDLE abort_event) const;
 
-  // Runs the exchange. S_OK: it ran, and the command knows the outcome; S_FALSE: cancelled; else
-  // the failure that ended it.
+  // Runs the exchange. S_OK: it ran, and the command's results say whether the receiver did what
+  // was asked; S_FALSE: cancelled; else the failure that ended it.
   virtual HRESULT Execute(CIConnection* connection, HANDLE abort_event) = 0;
 
-  // Marks the command for good; Execute ends at its next checkpoint.
+  // Marks the command as cancelled: Execute ends at its next step. The mark is never cleared.
   virtual void Cancel();
 
-  // Makes Execute send the command whole once it begins: an abort then ends only the wait for the
-  // reply. Half a line would stand in front of the next command.
+  // Makes Execute send the whole line once it begins, so that an abort ends only the wait for the
+  // reply: the receiver would take half a line as the beginning of the next command.
   void SendWhole() { sends_whole_ = true; }
 
  protected:
   bool SendsWhole() const { return sends_whole_; }
-  // Writes bytes of the command with its write time-out; results as the connection's Write.
+  // Writes bytes with the command's write time-out. Results as those of the connection's Write.
   HRESULT Send(CIConnection* connection, const void* bytes, uint32_t length) const;
 
  private:

@@ -1,4 +1,4 @@
-// The millisecond clock that time-outs and pauses are measured with.
+// The millisecond clock of time-outs and pauses. Unit tests replace it, so that they never wait.
 #ifndef RCVLINK_PLATFORM_CLOCK_H_
 #define RCVLINK_PLATFORM_CLOCK_H_
 
@@ -7,16 +7,17 @@
 class Clock {
  public:
   virtual ~Clock() = default;
-  // Milliseconds since some start; wraps as GetTickCount does, so only differences count.
+  // Milliseconds since an unknown start. The number wraps as that of GetTickCount does: only the
+  // difference of two of them means something.
   virtual DWORD Ticks() = 0;
-  // Lets the thread rest.
+  // Blocks the calling thread.
   virtual void Pause(DWORD milliseconds) = 0;
 };
 
-// The clock in force: the system's, unless a test has put its own in place.
+// The system's clock, unless a test has replaced it.
 Clock& CurrentClock();
 
-// Puts another clock in force for a scope; for tests, on one thread.
+// Replaces the clock for a scope; for tests, on one thread.
 class ClockOverride {
  public:
   explicit ClockOverride(Clock& clock);

@@ -7,8 +7,9 @@
 
 class CriticalSection {
  public:
-  // Raises the HRESULT of the Win32 error when the section cannot be made.
+  // Raises the HRESULT of the Win32 error when the section cannot be created.
   CriticalSection() {
+    // No spinning: who holds such a lock may write to a file or call the host, which takes longer.
     constexpr DWORD kSpinCount = 0;
     if (!InitializeCriticalSectionAndSpinCount(&section_, kSpinCount)) {
       throw HResultError(HResultFromError(GetLastError()));
@@ -18,7 +19,7 @@ class CriticalSection {
   CriticalSection& operator=(const CriticalSection&) = delete;
   ~CriticalSection() { DeleteCriticalSection(&section_); }
 
-  // Named as std::scoped_lock wants them.
+  // The names that std::scoped_lock calls.
   void lock() { EnterCriticalSection(&section_); }
   void unlock() { LeaveCriticalSection(&section_); }
 

@@ -1,10 +1,10 @@
-// The question that every layer asks of an event.
+// A test of an event that does not wait.
 #ifndef RCVLINK_PLATFORM_EVENT_H_
 #define RCVLINK_PLATFORM_EVENT_H_
 
 #include "platform/win32.h"
 
-// Whether the event is signalled, without waiting. A null event never is.
+// Whether the event is signalled; a null event never is. The test clears an auto-reset event.
 inline bool IsSignalled(HANDLE event) {
   return event != nullptr && WaitForSingleObject(event, 0) == WAIT_OBJECT_0;
 }

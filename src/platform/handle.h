@@ -7,7 +7,8 @@
 #include "platform/win32.h"
 
 // Owns one handle of the kind that Traits describes (its type, its empty value, how it is closed).
-// Closing keeps the thread's last error.
+// Closing keeps the thread's last error: callers read it after a failed call, when owners may have
+// closed their handles already.
 template <typename Traits>
 class UniqueHandle {
  public:
@@ -40,6 +41,8 @@ class UniqueHandle {
   Handle handle_ = Traits::Empty();
 };
 
+// CreateFile gives INVALID_HANDLE_VALUE when it fails; the functions that create events and mutexes
+// give null.
 struct FileHandleTraits {
   using Handle = HANDLE;
   static Handle Empty() { return INVALID_HANDLE_VALUE; }

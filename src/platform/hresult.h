@@ -7,8 +7,9 @@
 
 #include "platform/win32.h"
 
-// The HRESULT of a Win32 error: a positive error gets the Win32 facility; zero and negative values
-// (a driver's own error numbers) pass unchanged.
+// The HRESULT of a Win32 error. A positive error gets the Win32 facility. Negative ones are a
+// device driver's own error numbers (usbio.h): they are failing HRESULTs already, and a host would
+// lose their upper bits. Zero is S_OK.
 constexpr HRESULT HResultFromError(DWORD error) {
   constexpr DWORD kErrorMask = 0xFFFF;
   constexpr DWORD kWin32Failure = 0x80070000;  // SEVERITY_ERROR, FACILITY_WIN32
@@ -19,8 +20,8 @@ constexpr HRESULT HResultFromError(DWORD error) {
 constexpr HRESULT kNotConnected = HResultFromError(ERROR_DEVICE_NOT_CONNECTED);  // 0x8007048F
 constexpr HRESULT kTimedOut = HResultFromError(ERROR_TIMEOUT);                   // 0x800705B4
 
-// A failure on its way up. Its code is an HRESULT; operations that stop early without a failure
-// raise S_FALSE.
+// Ends an operation with a result code, from any depth of it. The code is an HRESULT; an operation
+// that stops early without a failure raises S_FALSE.
 class HResultError : public std::exception {
  public:
   explicit HResultError(HRESULT code) : code_(code) {}
@@ -31,13 +32,13 @@ class HResultError : public std::exception {
   HRESULT code_;
 };
 
-// Raises a failing code; S_OK, S_FALSE and other successes go on.
+// Raises a failing code. With S_OK, S_FALSE and other successes the caller goes on.
 inline void ThrowIfFailed(HRESULT result) {
   if (FAILED(result)) throw HResultError(result);
 }
 
-// Runs one operation and gives the code that it returns or raises; what it holds is released by
-// then.
+// Runs one operation and gives the code that it returns or raises. The locks and objects that the
+// operation holds are released before.
 template <typename Operation>
 HRESULT CatchResult(Operation operation) {
   try {
@@ -47,7 +48,7 @@ HRESULT CatchResult(Operation operation) {
   } catch (const std::bad_alloc&) {
     return E_OUTOFMEMORY;
   } catch (const std::exception&) {
-    return E_UNEXPECTED;  // none may leave the library: its hosts have exceptions of their own
+    return E_UNEXPECTED;  // a host of another compiler could not catch an exception of this one
   }
 }
 

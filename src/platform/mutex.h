@@ -6,7 +6,7 @@
 
 class Mutex {
  public:
-  Mutex();  // not owned; raises the HRESULT of the Win32 error when it cannot be made
+  Mutex();  // not held; raises the HRESULT of the Win32 error when it cannot be created
 
   HANDLE handle() const { return handle_.get(); }
 

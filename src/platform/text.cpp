@@ -32,7 +32,7 @@ std::string ToNarrow(std::wstring_view text) {
 
 namespace {
 
-// Measures, then writes into a string of just that length.
+// The length is measured first, since vsprintf_s does not cut a text that is too long, but fails.
 template <typename Character, typename Measure, typename Print>
 std::basic_string<Character> Format(const Character* format, Measure measure, Print print) {
   if (!format) throw HResultError(E_INVALIDARG);

@@ -18,10 +18,11 @@ struct BstrDeleter {
 // Owns a BSTR; null is the empty state. release() hands it to a record of the host.
 using UniqueBstr = std::unique_ptr<wchar_t, BstrDeleter>;
 
-// A fresh BSTR copy; null for a null text. Raises E_OUTOFMEMORY.
+// A BSTR copy; null for a null text. Raises E_OUTOFMEMORY.
 UniqueBstr CopyBstr(const wchar_t* text);
 
-// Conversions in the thread's ANSI code page (CP_THREAD_ACP). What cannot be converted is empty.
+// Conversions in the thread's ANSI code page (CP_THREAD_ACP). A text that cannot be converted gives
+// an empty one.
 std::wstring ToWide(std::string_view text);
 std::string ToNarrow(std::wstring_view text);
 

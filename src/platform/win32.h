@@ -1,5 +1,5 @@
-// <windows.h> as this library wants it: lean, without min and max, and without the macros that
-// would rename operations of ours.
+// <windows.h> without what would disturb the library: the macros min and max, which replace
+// std::min and std::max, and those that would rename member functions (DeleteFile to DeleteFileW).
 #ifndef RCVLINK_PLATFORM_WIN32_H_
 #define RCVLINK_PLATFORM_WIN32_H_
 

@@ -7,7 +7,7 @@
 //   515     2     checksum of the 515 bytes before, carried on from the previous block
 //   517     1     0x03
 //
-// Each block is answered with one control byte.
+// The host answers each block with one control byte.
 #ifndef RCVLINK_QUORIN_BLOCK_H_
 #define RCVLINK_QUORIN_BLOCK_H_
 
@@ -34,13 +34,14 @@ class Block {
 
   BlockType Type() const { return static_cast<BlockType>(bytes_[0]); }
   uint16_t Sequence() const { return Word(1); }
-  // How much of the payload counts; none when a last block says less than 0 or more than it holds.
+  // How many bytes of the payload belong to the file. None when a last block gives a negative
+  // length, or more than a block holds.
   std::optional<size_t> PayloadLength() const;
   std::span<const uint8_t> Payload() const { return {bytes_.data() + kBlockHeader, kBlockPayload}; }
 
   uint16_t Crc() const { return Word(kBlockHeader + kBlockPayload); }
   bool HasEndByte() const;
-  // Whether the checksum carries on from that of the previous accepted block.
+  // Whether the checksum is right when it goes on from that of the block accepted before.
   bool IsChainedTo(uint16_t previous_crc) const;
 
  private:

@@ -10,6 +10,7 @@
 
 namespace {
 
+// A silence may be a lost control byte, so the receiver is asked again before the transfer ends.
 constexpr int kMaxTimeouts = 3;
 
 HRESULT WriteToStream(IStream* stream, std::span<const uint8_t> bytes) {
@@ -69,7 +70,8 @@ std::optional<HRESULT> BlockDownload::TakeBlock() {
 
   const HRESULT rest_result = policy_.ReadRest(block);
   if (FAILED(rest_result)) return AfterFailedRead(rest_result);
-  // Another call on this receiver took the abort; the receiver must hear of it all the same.
+  // An abort ended the read, and another operation has cleared its flag since. The receiver is told
+  // all the same, or it would wait for a control byte.
   if (rest_result == S_FALSE) EndTransfer();
   if (rest_result != S_OK) return rest_result;
   if (!block.HasEndByte()) return AskAgain(L"eob character is missed");
@@ -113,7 +115,8 @@ void BlockDownload::TellProgress() {
   if (policy_.IsTimeToTell()) tell_progress_(percent);
 }
 
-// A silence is answered by asking again, three times; any other failure ends the transfer.
+// After a time-out the block is asked for again, up to kMaxTimeouts times. Any other failure is one
+// of the link, which asking again does not mend.
 std::optional<HRESULT> BlockDownload::AfterFailedRead(HRESULT failure) {
   if (failure != kTimedOut) return failure;
   TraceText(policy_.TimeoutText());
@@ -122,7 +125,8 @@ std::optional<HRESULT> BlockDownload::AfterFailedRead(HRESULT failure) {
   return AskAgain();
 }
 
-// Empties the line and asks for the current block again; a result only when that cannot be sent.
+// Discards what is left of the block and asks for it again. A NAK that cannot be sent ends the
+// transfer: the receiver would not know that it is to send.
 std::optional<HRESULT> BlockDownload::AskAgain() {
   connection_->Flush();
   const HRESULT result = WriteControl(connection_, kNak);

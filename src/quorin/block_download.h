@@ -1,5 +1,5 @@
-// The block transfer of a Quorin download (block.h): takes block after block into the host's stream
-// and answers each.
+// The block transfer of a Quorin download: writes each block (block.h) to the host's stream and
+// answers it.
 #ifndef RCVLINK_QUORIN_BLOCK_DOWNLOAD_H_
 #define RCVLINK_QUORIN_BLOCK_DOWNLOAD_H_
 
@@ -15,15 +15,16 @@
 
 #include <objidl.h>
 
-// Writes one of the control bytes. No abort cuts it off: the host would not know whether the
-// receiver has heard it.
+// Writes one of the control bytes. No abort ends the write: the host would not know whether the
+// receiver has got the byte.
 HRESULT WriteControl(CIConnection* connection, uint8_t control);
 
 class BlockDownload {
  public:
   using ProgressFunction = std::function<void(uint8_t percent)>;
 
-  // `size` is what the receiver said, and serves the progress only.
+  // `size` is the file's size as the receiver gave it. It is used for the progress only: a file
+  // that is still being recorded may have grown, and the last block marks its end.
   BlockDownload(CIConnection* connection,
                 AbortSwitch& abort,
                 ProgressFunction tell_progress,
@@ -31,13 +32,14 @@ class BlockDownload {
                 int size,
                 LinkPolicy& policy);
 
-  // Runs the transfer, whose first block has been asked for. S_OK: the stream has the file; S_FALSE:
-  // aborted, or ended by the receiver; E_INVALIDARG: no stream, or a size below 1; kTimedOut;
-  // kNotConnected: a last block of an impossible length; else what ended it.
+  // Runs the transfer, after the caller has asked for the first block. S_OK: the transfer ended
+  // (over a serial line also when the stream failed); S_FALSE: aborted, or ended by the receiver;
+  // E_INVALIDARG: no stream, or a size below 1; kTimedOut; kNotConnected: a last block of an
+  // invalid length; else the failure of the connection, or over USB that of the stream.
   HRESULT Run();
 
  private:
-  // The steps of a round; a result ends the transfer.
+  // The steps for one block. A result ends the transfer.
   std::optional<HRESULT> TakeBlock();
   std::optional<HRESULT> Accept(const Block& block, size_t payload_length);
   void TellProgress();
@@ -47,6 +49,7 @@ class BlockDownload {
 
   HRESULT EndCancelled();
   HRESULT EndTransfer();
+  // The result, or S_OK over a link whose host does not get it (LinkPolicy).
   HRESULT Passed(HRESULT result) const;
   void TraceText(const wchar_t* text) const;
   void TraceWhy(const wchar_t* text) const;
@@ -58,10 +61,10 @@ class BlockDownload {
   int size_;
   LinkPolicy& policy_;
 
-  uint16_t crc_ = 0;  // of the blocks accepted so far
+  uint16_t crc_ = 0;  // of all blocks accepted so far
   uint32_t expected_sequence_ = 0;
   uint32_t delivered_ = 0;
-  uint8_t percent_ = 0;  // the last that was counted
+  uint8_t percent_ = 0;  // the last that was computed, also when it was not reported
   int timeouts_ = 0;
 };
 

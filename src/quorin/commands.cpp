@@ -14,11 +14,12 @@
 namespace QuorinCommands {
 namespace {
 
+// Shorter than that of other commands: a search of a silent port waits for it at 18 settings.
 constexpr uint32_t kPingReadTimeoutMs = 8000;
 
 int PortLetter(int port_index) { return 'a' + port_index; }
 
-// "N" beside the two words is what receivers take for none.
+// Receivers take words for odd and even parity, but the letter N for none.
 std::string ParityWord(uint8_t parity) {
   constexpr uint8_t kOdd = 1;
   constexpr uint8_t kEven = 2;
@@ -52,7 +53,8 @@ CPingCmd::CPingCmd(uint32_t flags) : CQuorinCommand("\r\n", flags | kTagged) {
 }
 
 HRESULT CPingCmd::ParseReply(const char* body, uint32_t length, ReplyKind kind, bool* done) {
-  // Stricter than other commands: only "RE" proves that a receiver of this family answers.
+  // Stricter than other commands, which accept an answer of blanks: only "RE" proves that a
+  // receiver of this family answers, and not noise.
   const HRESULT result = CQuorinCommand::ParseReply(body, length, kind, done);
   SetResult(SUCCEEDED(result) && kind == ReplyKind::kReply ? S_OK : kNotConnected);
   return Result();
@@ -62,6 +64,8 @@ CGetPortCmd::CGetPortCmd(uint32_t flags) : CQuorinCommand("print,/cur/term\r\n",
   Trace(L"CGetPortCmd::CGetPortCmd\r\n");
 }
 
+// "/d" is also a part of "/dev", so it is looked for last. A terminal under "/dev" with another
+// letter counts as port d therefore, and its receiver is found.
 int CGetPortCmd::PortIndex() const {
   constexpr std::array<std::string_view, 4> kPorts = {"/a", "/b", "/c", "/d"};
   const std::string reply = ReplyText();
@@ -120,6 +124,7 @@ HRESULT CGetFileListCmd::ParseReply(const char* body, uint32_t length, ReplyKind
 }
 
 bool CGetFileListCmd::Append(FileEntry entry) {
+  // Far more than a reply holds. It keeps the bytes of the list within 32 bits.
   constexpr size_t kMaxEntries = 0x3FFFFFF;
   if (entries_.size() >= kMaxEntries) return false;
   try {
@@ -135,7 +140,8 @@ CDeleteFileCmd::CDeleteFileCmd(const std::string& name, uint32_t flags)
   Trace(L"CDeleteFileCmd::CDeleteFileCmd\r\n");
 }
 
-// What the first number means to the receiver is its own business; it is always 500.
+// The protocol does not say what the first number means. Receivers send blocks with 500, so nothing
+// else is sent.
 CGetFileCmd::CGetFileCmd(const std::string& name, uint32_t block_length, uint32_t flags)
     : CQuorinCommand(FormatText("get,\"%s\":{500,%u}\r\n", name.c_str(), block_length).c_str(),
                      flags) {
@@ -163,7 +169,7 @@ CGetReceiverModelCmd::CGetReceiverModelCmd(uint32_t flags)
 
 std::wstring CGetReceiverModelCmd::Text() const { return TextWithoutLeadingSpace(ReplyText()); }
 
-// The path of the current terminal goes without a leading slash; receivers take it so.
+// In this command receivers take the path of the current terminal without a leading slash.
 CSetBoudRateCmd::CSetBoudRateCmd(uint32_t rate, uint32_t flags)
     : CQuorinCommand(FormatText("set,cur/term/rate,%u\r\n", rate).c_str(), flags) {
   Trace(L"CSetBoudRateCmd::CSetBoudRateCmd\r\n");

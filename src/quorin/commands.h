@@ -1,8 +1,8 @@
-// The commands of the Quorin language. Each is built, executed once over a connection, asked for
-// its results and thrown away. A port index is the number of the receiver's serial port: 0 is port
-// a.
+// The commands of the Quorin protocol. Each is constructed, executed once over a connection, asked
+// for its results and destroyed. A port index is the number of a serial port of the receiver: 0 is
+// port a.
 //
-// The commands whose `flags` are ignored never wait for a reply.
+// Commands that ignore `flags` do not wait for a reply: receivers do not answer them.
 #ifndef RCVLINK_QUORIN_COMMANDS_H_
 #define RCVLINK_QUORIN_COMMANDS_H_
 
@@ -15,7 +15,7 @@
 
 namespace QuorinCommands {
 
-// "#OFF#": stops the receiver's echo, whatever state it is in.
+// "#OFF#": stops the receiver's echo. It needs no port, so it can be sent before the port is known.
 class CEchoOffCmd : public CQuorinCommand {
  public:
   explicit CEchoOffCmd(uint32_t flags);
@@ -26,18 +26,18 @@ class CDisableEchoCmd : public CQuorinCommand {
   CDisableEchoCmd(int port_index, uint32_t flags);
 };
 
-// An empty line, which a receiver answers with an "RE" message and nothing else.
+// An empty line: the proof that a receiver of this family answers, with an "RE" message.
 class CPingCmd : public CQuorinCommand {
  public:
   explicit CPingCmd(uint32_t flags);
   HRESULT ParseReply(const char* body, uint32_t length, ReplyKind kind, bool* done) override;
 };
 
-// Asks on which of its ports the receiver is talking.
+// Asks which of its ports the receiver uses for this link.
 class CGetPortCmd : public CQuorinCommand {
  public:
   explicit CGetPortCmd(uint32_t flags);
-  int PortIndex() const;  // -1 when the reply names none of the ports a to d
+  int PortIndex() const;  // -1 when the reply names no port
 };
 
 class CChangeBaudRateCmd : public CQuorinCommand {
@@ -64,7 +64,7 @@ class CChangeStopbitsCmd : public CQuorinCommand {
 class CGetFileListCmd : public CQuorinCommand {
  public:
   explicit CGetFileListCmd(uint32_t flags);
-  // One message holds one entry; done with the last.
+  // One message holds one entry; the last one sets `done`.
   HRESULT ParseReply(const char* body, uint32_t length, ReplyKind kind, bool* done) override;
   const std::vector<FileEntry>& Entries() const { return entries_; }
 
@@ -74,7 +74,7 @@ class CGetFileListCmd : public CQuorinCommand {
   std::vector<FileEntry> entries_;
 };
 
-// Names are put into the commands as they are.
+// Names are put into the commands unchanged, as the file list gave them.
 class CDeleteFileCmd : public CQuorinCommand {
  public:
   CDeleteFileCmd(const std::string& name, uint32_t flags);
@@ -89,13 +89,13 @@ class CGetFileCmd : public CQuorinCommand {
 class CGetFileSizeCmd : public CQuorinCommand {
  public:
   CGetFileSizeCmd(const std::string& name, uint32_t flags);
-  int Size() const;  // 0 when the receiver did not say
+  int Size() const;  // bytes; 0 when the receiver did not give it
 };
 
 class CGetReceiverIDCmd : public CQuorinCommand {
  public:
   explicit CGetReceiverIDCmd(uint32_t flags);
-  std::wstring Text() const;  // without white space in front
+  std::wstring Text() const;  // without white space at the beginning
 };
 
 class CGetReceiverModelCmd : public CQuorinCommand {
@@ -104,7 +104,9 @@ class CGetReceiverModelCmd : public CQuorinCommand {
   std::wstring Text() const;
 };
 
-// Sets the speed of the port that the receiver is talking on, and waits for its word.
+// Sets the speed of the port that the receiver uses for this link, and waits for the answer, which
+// still comes at the old speed. The class's misspelt name stands in a line of the report, for which
+// people search.
 class CSetBoudRateCmd : public CQuorinCommand {
  public:
   CSetBoudRateCmd(uint32_t rate, uint32_t flags);

@@ -1,5 +1,5 @@
-// The download of CQuorinProtocol: the link is raised to full speed, the receiver asked for the file,
-// its blocks taken (block_download.h), and the speed put back.
+// The download of CQuorinProtocol: raises the speed of a serial link, asks for the file's size and
+// for the file, runs the block transfer (block_download.h), and sets the old speed again.
 #include <cstdint>
 #include <string>
 
@@ -42,7 +42,9 @@ HRESULT CQuorinProtocol::DownloadFile(const wchar_t* name, IStream* stream, CPro
   });
 }
 
-// An abort while the receiver is asked for its port cuts that off: it is asked once more.
+// An abort that comes while the receiver is asked for its port ends that command. The receiver is
+// then asked once more: without its port it cannot be set back, and would stay at another speed
+// than the host.
 void CQuorinProtocol::SetReceiverBack(DWORD speed) {
   constexpr int kTries = 2;
   for (int i = 0; i < kTries; ++i) {
@@ -58,8 +60,8 @@ void CQuorinProtocol::SetReceiverBack(DWORD speed) {
 
 void CQuorinProtocol::RestoreSpeed(DWORD saved_speed) {
   if (saved_speed == 0 || saved_speed >= kTransferSpeed) return;
-  // The abort that ended the transfer does not end this wait: the receiver changes its speed after its
-  // answer.
+  // The abort that ended the transfer does not end this wait: the receiver changes its speed after
+  // its answer, and the host must not change its own before.
   abort_.ClearCancel();
   CSetBoudRateCmd set_speed(saved_speed, kCommandFlags);
   ThrowIfFailed(ExecuteCommand(set_speed));
@@ -86,7 +88,7 @@ HRESULT CQuorinProtocol::Transfer(const wchar_t* name, IStream* stream, EInstanc
   CGetFileCmd get_file(narrow_name, kBlockPayload, kCommandFlags);
   ThrowIfFailed(ExecuteCommand(get_file));
   if (abort_.Take()) {
-    // The receiver has heard the command and waits for a control byte.
+    // The receiver has executed the command and waits for a control byte.
     WriteControl(connection(), kEndOfTransfer);
     return S_FALSE;
   }

@@ -11,17 +11,17 @@
 namespace QuorinCommands {
 namespace {
 
-constexpr size_t kMaxNameBytes = 32;
+constexpr size_t kMaxNameBytes = 32;  // names of receivers are not longer
 constexpr int kDecimal = 10;
 constexpr int kTmYearBase = 1900;
 constexpr int kEpochYear = 1988;
 
-// When receivers start counting, in the runtime library's seconds.
+// The time from which receivers count, in the runtime library's seconds.
 int64_t ReceiverEpoch() {
   std::tm epoch{};
   epoch.tm_year = kEpochYear - kTmYearBase;
   epoch.tm_mday = 1;
-  epoch.tm_isdst = -1;  // the runtime library knows
+  epoch.tm_isdst = -1;  // the runtime library finds out whether it was daylight saving time
   const int64_t seconds = _mktime64(&epoch);
   if (seconds == -1) throw HResultError(E_INVALIDARG);
   return seconds;
@@ -67,6 +67,7 @@ ListMessage ParseListMessage(std::string_view text) {
   message.entry.size = static_cast<uint32_t>(std::strtoul(numbers.c_str(), &end_of_size, kDecimal));
   const char* const time = *end_of_size == '\0' ? end_of_size : end_of_size + 1;
   const int64_t seconds = std::strtoll(time, nullptr, kDecimal);
+  // A file whose time cannot be read stays in the list: it can be downloaded all the same.
   message.entry.time = TimeFromReceiver(seconds).value_or(SYSTEMTIME{});
   message.last = numbers.find("}}") != std::string::npos;
   return message;

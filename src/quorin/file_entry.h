@@ -12,19 +12,20 @@ namespace QuorinCommands {
 
 struct ListMessage {
   enum class Kind {
-    kNothing,  // no more than braces and blanks
-    kEnd,      // a closing brace: the list is empty
+    kNothing,  // only opening braces and blanks
+    kEnd,      // a closing brace and no entry: the list is empty
     kEntry
   };
   Kind kind = Kind::kNothing;
   FileEntry entry;
-  bool last = false;  // the list closes behind this entry
+  bool last = false;  // the list ends after this entry
 };
 
-// Reads one message. Raises E_INVALIDARG when the time base cannot be computed.
+// Reads one message. Raises E_INVALIDARG when the runtime library cannot compute the year 1988.
 ListMessage ParseListMessage(std::string_view text);
 
-// The local time so many seconds after 1988-01-01 00:00:00 local time; none when it cannot be said.
+// The local time at `seconds` after 1988-01-01 00:00:00 local time, from which receivers count.
+// None when it is out of the runtime library's range.
 std::optional<SYSTEMTIME> TimeFromReceiver(int64_t seconds);
 
 }  // namespace QuorinCommands

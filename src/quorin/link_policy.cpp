@@ -23,11 +23,12 @@ HRESULT SerialPolicy::ReadRest(Block& block) {
   DWORD count = 0;
   const HRESULT result =
       connection_->Read(block.data() + kBlockHeader, kRest, &count, kSerialReadTimeoutMs);
-  // A read that did not bring all lacks the end byte: the block is asked for again for that.
+  // After a read that brought less the end byte is missing, and the block is asked for again.
   return FAILED(result) ? result : S_OK;
 }
 
-// In 32-bit arithmetic, which wraps beyond 43383508 bytes, and cut to 8 bits.
+// In 32-bit arithmetic: beyond 43383508 bytes the percent starts again from 1. It decides nothing;
+// a host that compares the reports of a transfer with recorded ones would see others if it did not.
 uint8_t SerialPolicy::Percent(uint32_t delivered, uint32_t size) const {
   return static_cast<uint8_t>(delivered * 99 / size + 1);
 }
@@ -40,14 +41,14 @@ UsbPolicy::UsbPolicy(CIConnection* connection, AbortSwitch& abort, DWORD read_ti
 
 HRESULT UsbPolicy::ReadHeader(Block& block) {
   read_result_ = ReadWhole(block);
-  // An abort counts more than how the read ended.
+  // An abort comes before a failure of the read: the host wants the end, and no further try.
   return abort_.IsSet() ? S_FALSE : read_result_;
 }
 
 HRESULT UsbPolicy::ReadRest(Block&) { return read_result_; }
 
-// In pieces of no more than a bulk packet, until all is there, a read does not succeed or an abort
-// is seen.
+// Reads pieces of at most one bulk packet, until the block is whole, a read fails or an abort came.
+// A receiver may send a packet that holds only a part of the block.
 HRESULT UsbPolicy::ReadWhole(Block& block) {
   constexpr DWORD kMaxPiece = 512;
   DWORD held = 0;
@@ -61,12 +62,12 @@ HRESULT UsbPolicy::ReadWhole(Block& block) {
   return S_OK;
 }
 
-// Cut to 8 bits; right for files of any size.
+// In floating point, so it is right for files of any size.
 uint8_t UsbPolicy::Percent(uint32_t delivered, uint32_t size) const {
   return static_cast<uint8_t>(static_cast<uint64_t>(delivered * 99.0 / size + 1.0));
 }
 
-// Twice a second at most.
+// At most twice a second: blocks come fast, and the transfer waits while the host's function runs.
 bool UsbPolicy::IsTimeToTell() {
   constexpr DWORD kReportIntervalMs = 500;
   const DWORD now = CurrentClock().Ticks();

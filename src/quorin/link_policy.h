@@ -1,4 +1,4 @@
-// What a block transfer does its own way over each kind of link.
+// The differences between a block transfer over a serial line and one over USB.
 #ifndef RCVLINK_QUORIN_LINK_POLICY_H_
 #define RCVLINK_QUORIN_LINK_POLICY_H_
 
@@ -12,30 +12,36 @@ class LinkPolicy {
  public:
   virtual ~LinkPolicy() = default;
 
-  // Reads a new block at least so far that its header can be judged; a header that did not come
-  // counts as one of an unknown type. Results as the connection's Read.
+  // Reads at least the header of the next block. A header that did not come whole counts as one of
+  // an unknown type, so that the block is asked for again. Results as those of the connection's
+  // Read.
   virtual HRESULT ReadHeader(Block& block) = 0;
-  // Reads what is left of the block. Anything but S_OK ends the transfer, or is a time-out.
+  // Reads the rest of the block. A time-out asks for the block again; any other result but S_OK
+  // ends the transfer.
   virtual HRESULT ReadRest(Block& block) = 0;
 
-  // Whether the time-outs are counted anew for each block, or over the whole transfer.
+  // Whether the time-outs are counted for each block, or over the whole transfer. Over USB a read
+  // waits ten times as long, so a silent receiver would keep the host too long if each block had
+  // its own count.
   virtual bool CountsTimeoutsPerBlock() const = 0;
-  // Whether the caller gets what the host's stream or an interrupted ACK gave; else S_OK, as the host
-  // knows its own stream.
+  // Whether the result of the host's stream, or of an ACK that was cut off, is given to the host.
+  // Over a serial line it is S_OK instead. Hosts rely on either: over a serial line they ask their
+  // stream what it has written, over USB they look at the result.
   virtual bool PassesResultsOn() const = 0;
 
   virtual uint8_t Percent(uint32_t delivered, uint32_t size) const = 0;
-  // Whether a percent that has changed is told now; if not, it is not made up for.
+  // Whether a percent that has changed is reported now; if not, it is left out.
   virtual bool IsTimeToTell() = 0;
 
   // What the report calls the transfer, and a time-out in it.
   virtual const wchar_t* Name() const = 0;
   virtual const wchar_t* TimeoutText() const = 0;
-  // Whether the report says why a block was not taken.
+  // Whether the report says why a block was not accepted. On a serial line with much noise the
+  // lines would fill it.
   virtual bool TellsWhy() const = 0;
 };
 
-// A serial link is slow: the rest of a block whose header is wrong is not waited for.
+// A serial line is slow: the rest of a block whose header is wrong is not waited for.
 class SerialPolicy : public LinkPolicy {
  public:
   explicit SerialPolicy(CIConnection* connection) : connection_(connection) {}
@@ -54,10 +60,10 @@ class SerialPolicy : public LinkPolicy {
   CIConnection* connection_;
 };
 
-// Over USB a block is read whole before it is judged.
+// Over USB data comes in packets, so a block is read whole before its header is tested.
 class UsbPolicy : public LinkPolicy {
  public:
-  // Made as the transfer starts.
+  // Constructed as the transfer starts: the first progress report comes half a second later.
   UsbPolicy(CIConnection* connection, AbortSwitch& abort, DWORD read_timeout_ms);
 
   HRESULT ReadHeader(Block& block) override;
@@ -77,7 +83,7 @@ class UsbPolicy : public LinkPolicy {
   AbortSwitch& abort_;
   DWORD read_timeout_ms_;
   HRESULT read_result_ = S_OK;  // of the current block
-  DWORD told_at_;               // when progress was told last, in ticks
+  DWORD told_at_;               // when progress was reported last, in ticks of the clock
 };
 
 #endif  // RCVLINK_QUORIN_LINK_POLICY_H_

@@ -6,7 +6,8 @@
 
 #include "quorin/quorin_command.h"
 
-// Tagged; 0x0002 is set as it always was, and nothing reads it.
+// Tagged, so that a late answer to an earlier command is not taken for this one's. The library does
+// not read 0x0002; a class derived from a command finds it in GetFlags.
 constexpr uint32_t kCommandFlags = QuorinCommands::kTagged | 0x0002;
 
 #endif  // RCVLINK_QUORIN_PROTOCOL_FLAGS_H_

@@ -13,11 +13,14 @@
 namespace QuorinCommands {
 namespace {
 
+// Holds a whole reply, with all messages of a directory.
 constexpr uint32_t kBufferLength = 65536;
 
+// Counted for the process, not for a command or a receiver: no number comes twice, so a late answer
+// to an earlier command never has the tag of a later one.
 constinit std::atomic<int32_t> last_tag = 0;
 
-// The next tag of the process: a number between two percent signs.
+// A number between two percent signs.
 std::string NextTag() { return FormatText("%%%i%%", ++last_tag); }
 
 }  // namespace
@@ -36,7 +39,7 @@ HRESULT CQuorinCommand::Execute(CIConnection* connection, HANDLE abort_event) {
   return ReceiveReply(connection, abort_event, tag);
 }
 
-// A write that was aborted (S_FALSE) ends the command as much as one that failed.
+// Gives S_FALSE when an abort ended a write: the command ends then, as after a failure.
 HRESULT CQuorinCommand::SendLine(CIConnection* connection,
                                  HANDLE abort_event,
                                  std::string_view tag) {
@@ -48,7 +51,7 @@ HRESULT CQuorinCommand::SendLine(CIConnection* connection,
   return Send(connection, GetCommand(), GetCommandLength());
 }
 
-// What has come of a reply so far, and how far it has been searched.
+// The bytes of a reply that have come, and from where they are searched next.
 class CQuorinCommand::Receiving {
  public:
   bool Allocate() {
@@ -56,7 +59,7 @@ class CQuorinCommand::Receiving {
     return buffer_ != nullptr;
   }
 
-  // Reads into the free end of the buffer.
+  // Appends what comes to the buffer.
   HRESULT Read(CIConnection* connection, DWORD timeout_ms, DWORD* count) {
     const HRESULT result = connection->Read(buffer_.get() + received_, Free(), count, timeout_ms);
     if (result == S_OK) received_ += *count;
@@ -93,6 +96,8 @@ HRESULT CQuorinCommand::ReceiveReply(CIConnection* connection,
   Receiving receiving;
   if (!receiving.Allocate()) return E_OUTOFMEMORY;
   bool done = false;
+  // The body is one zero byte: it reads as an empty text, and the report's line of a failed command
+  // then shows an empty reply.
   const auto parse_nothing = [&] { return ParseReply("", 1, ReplyKind::kBlank, &done); };
 
   Clock& clock = CurrentClock();
@@ -115,7 +120,8 @@ HRESULT CQuorinCommand::ReceiveReply(CIConnection* connection,
     } else if (const size_t missing = receiving.Missing(*header); missing != 0) {
       if (!receiving.HasRoomFor(missing)) return kNotConnected;
     } else if (std::string_view body = receiving.Body(*header); !body.starts_with(tag)) {
-      // An answer to somebody else's command; ours may be in the buffer already.
+      // The answer to another command. The right one may be in the buffer already, so that is
+      // searched first: another read could wait for nothing.
       receiving.SearchFrom(header->position + 1);
       read_needed = false;
     } else {

@@ -1,4 +1,4 @@
-// The base of the Quorin commands: writes one command and collects the framed reply.
+// The base of the Quorin commands: writes one command and reads its framed reply.
 #ifndef RCVLINK_QUORIN_QUORIN_COMMAND_H_
 #define RCVLINK_QUORIN_QUORIN_COMMAND_H_
 
@@ -11,10 +11,9 @@
 
 namespace QuorinCommands {
 
-// Flags of a command: nothing is read after it; a tag goes ahead of it, and only a reply that
-// carries the same tag is taken.
-constexpr uint32_t kNoReply = 0x0001;
-constexpr uint32_t kTagged = 0x1000;
+// Flags of a command.
+constexpr uint32_t kNoReply = 0x0001;  // no reply is read
+constexpr uint32_t kTagged = 0x1000;   // a tag is sent before it; only a reply with that tag counts
 
 constexpr uint32_t kWriteTimeoutMs = 3000;
 constexpr uint32_t kReadTimeoutMs = 30000;
@@ -23,16 +22,16 @@ class CQuorinCommand : public CReceiverCmd {
  public:
   CQuorinCommand(const char* text, uint32_t flags);
 
-  // S_OK: the exchange ran, and Result() tells its outcome. S_FALSE: cancelled. E_INVALIDARG: no
-  // connection. 0x8007048F: the reply did not become whole in time, or is too long for the buffer.
+  // S_OK: the exchange ran, and Result() says how. S_FALSE: cancelled. E_INVALIDARG: no connection.
+  // 0x8007048F: the reply did not become whole in time, or does not fit into the buffer.
   HRESULT Execute(CIConnection* connection, HANDLE abort_event) override;
 
-  // Takes the body of one message; `done` is set when the command needs no further one.
+  // Evaluates the body of one message, and sets `done` when the command needs no further message.
   virtual HRESULT ParseReply(const char* body, uint32_t length, ReplyKind kind, bool* done);
 
-  // The outcome: 0, 0x8007048F when the receiver refused, or the code of a failed read.
+  // 0, 0x8007048F when the receiver refused, or the code of a failed read.
   HRESULT Result() const { return result_; }
-  // The kind of the last message that was taken.
+  // The kind of the last message that was evaluated.
   ReplyKind Kind() const { return kind_; }
 
  protected:

@@ -16,6 +16,7 @@ using namespace QuorinCommands;
 
 namespace {
 
+// What CReceiverInfo has for this family (rcvlink.h).
 constexpr DWORD kFeatures = 9;
 constexpr DWORD kVariantUsual = 1;
 constexpr DWORD kVariantOfNewModels = 2;
@@ -49,7 +50,7 @@ CQuorinProtocol::CQuorinProtocol(std::unique_ptr<CIConnection> connection)
       download_read_timeout_ms_(ReadDownloadReadTimeout()) {}
 
 HRESULT CQuorinProtocol::ExecuteCommand(CQuorinCommand& command) {
-  // Half a line, or a tag alone, would stand in front of the next command.
+  // The receiver would take half a line, or a tag alone, as the beginning of the next command.
   command.SendWhole();
   const HRESULT result = ExecuteAsCurrent(command);
   if (connection()) DumpInvalidResponse(connection(), command);
@@ -58,7 +59,7 @@ HRESULT CQuorinProtocol::ExecuteCommand(CQuorinCommand& command) {
 
 bool CQuorinProtocol::Probe(CIConnection* connection, HANDLE abort_event) {
   const WaitScope watching = WaitScope::Watching(connection, abort_event);
-  // False ends the handshake with no receiver found: the command failed or was cancelled.
+  // False: the command failed or was cancelled, and no receiver is found.
   const auto run = [&](CQuorinCommand& command) {
     const HRESULT result = command.Execute(connection, abort_event);
     DumpInvalidResponse(connection, command);
@@ -66,6 +67,8 @@ bool CQuorinProtocol::Probe(CIConnection* connection, HANDLE abort_event) {
   };
   const auto aborted = [&] { return IsSignalled(abort_event); };
 
+  // The receiver may hold half a line, echo what it gets, and send messages without being asked.
+  // All three are ended first, since they would stand before the answer to the ping.
   CQuorinCommand line_end("\n", kNoReply);
   if (!run(line_end)) return false;
   CEchoOffCmd echo_off(kCommandFlags);
@@ -97,7 +100,8 @@ HRESULT CQuorinProtocol::GetReceiverInfo(HANDLE abort_event, CReceiverInfo* info
   return CatchResult([&] {
     const HRESULT lock_result = LockConnection(abort_event);
     if (lock_result != S_OK) return lock_result;
-    // From here a failure leaves the connection locked, for the caller's UnlockConnection.
+    // A failure from here on leaves the connection locked. Hosts call UnlockConnection after it; if
+    // it were released here too, a host that holds the lock itself would lose it by that call.
     ReadIdentity(info);
     Trace(L"CQuorinProtocol::GetReceiverInfo - OK\r\n");
     return S_OK;
@@ -170,7 +174,7 @@ HRESULT CQuorinProtocol::DeleteFile(const wchar_t* name) {
   });
 }
 
-// Called once, before any operation: it needs no lock.
+// Called once, when the receiver object is constructed and no operation runs: it needs no lock.
 void CQuorinProtocol::SetCallback(CIProtocolCallback* callback) { callback_ = callback; }
 
 template <typename MakeCommand>

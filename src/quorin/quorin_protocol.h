@@ -14,8 +14,9 @@ class CQuorinProtocol : public CAbstractProtocol {
  public:
   explicit CQuorinProtocol(std::unique_ptr<CIConnection> connection);
 
-  // Whether a Quorin receiver, in whatever state, answers on the connection. The abort event (may
-  // be null) is looked at between the steps and ends the wait for an answer, as Cancel does.
+  // Whether a Quorin receiver answers on the connection, whatever it was doing before. The abort
+  // event (may be null) is tested between the steps and ends the wait for an answer, as Cancel
+  // does.
   static bool Probe(CIConnection* connection, HANDLE abort_event);
 
   HRESULT GetReceiverInfo(HANDLE abort_event, CReceiverInfo* info) override;
@@ -28,19 +29,21 @@ class CQuorinProtocol : public CAbstractProtocol {
   HRESULT DCSetRcvParity(BYTE parity) override;
   HRESULT DCSetRcvStopbits(BYTE stop_bits) override;
 
-  // Runs one command as the current one. The failure that ended it, else the command's own result.
+  // Executes one command as the current one. Gives the failure that ended it, else the command's
+  // Result().
   virtual HRESULT ExecuteCommand(QuorinCommands::CQuorinCommand& command);
-  // The block transfer that follows a get command, into the stream. `size` is what the receiver
-  // said (at least 1) and serves the progress only. `block_length` is the payload of a block; no
-  // other than kBlockPayload is in use.
+  // The block transfer that follows a get command, into the stream. `size` is the file's size as
+  // the receiver gave it (at least 1), for the progress. `block_length` is the payload of a block:
+  // E_INVALIDARG for any other than kBlockPayload.
   virtual HRESULT DownloadOverSerial(IStream* stream, int size);
   virtual HRESULT DownloadOverUSB(IStream* stream, int size, DWORD block_length);
 
  private:
   bool IsAnswering(HANDLE abort_event) override { return Probe(connection(), abort_event); }
 
-  // Asks for the receiver's port and sends it one setting. S_FALSE when it names none, or the
-  // command's failure. An abort that came before the setting was sent raises S_FALSE.
+  // Asks for the receiver's port and sends it one setting. S_FALSE when the receiver names no port,
+  // else the command's result. An abort that came before the setting was sent raises S_FALSE. It
+  // takes no connection lock: that is the caller's task (rcvlink.h).
   template <typename MakeCommand>
   HRESULT ChangePort(MakeCommand make_command);
   HRESULT SendPortSetting(QuorinCommands::CQuorinCommand&& command);

@@ -26,8 +26,8 @@ struct ReplyHeader {
   size_t MessageLength() const { return kReplyHeaderLength + body_length; }
 };
 
-// The first header at or after `scan_from`, which moves past what proved to be none. A header needs
-// all its five bytes: one that is cut off at the end stays to be found once more has come.
+// Finds the first header at or after `scan_from`, and moves `scan_from` past bytes that begin no
+// header. A header whose five bytes have not all come stays, and is found when more has come.
 std::optional<ReplyHeader> FindReplyHeader(std::string_view bytes, size_t& scan_from);
 
 }  // namespace QuorinCommands

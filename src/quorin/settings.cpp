@@ -28,7 +28,8 @@ DWORD ReadDownloadReadTimeout() {
   DWORD timeout_ms = kDefaultTimeoutMs;
   const RegistryKey key = OpenKey();
   if (!key) return timeout_ms;
-  // Four bytes of whatever type are taken as they are; only the right type is worth a line.
+  // Up to four bytes of any type count: a user who made the value with another type gets the
+  // time-out all the same. Only a REG_DWORD is written to the report.
   DWORD value = kDefaultTimeoutMs;
   DWORD type = REG_NONE;
   DWORD size = sizeof(value);

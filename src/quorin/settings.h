@@ -1,4 +1,4 @@
-// The one setting that a user can make: the registry value DownloadReadTimeout.
+// The only setting that a user can change: the registry value DownloadReadTimeout.
 #ifndef RCVLINK_QUORIN_SETTINGS_H_
 #define RCVLINK_QUORIN_SETTINGS_H_
 

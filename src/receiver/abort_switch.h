@@ -1,6 +1,6 @@
-// How another thread ends what a driver is doing. An abort has two halves: a flag, which operations
-// look for between their steps, and the connection's cancel, which ends a wait that is running or
-// the next one. The command that is being executed is marked as well.
+// Lets another thread end the operation of a driver. An abort does three things: it sets a flag,
+// which operations test between their steps; it marks the command that is being executed; and it
+// cancels the connection, which ends the wait that is running or else the next one.
 #ifndef RCVLINK_RECEIVER_ABORT_SWITCH_H_
 #define RCVLINK_RECEIVER_ABORT_SWITCH_H_
 
@@ -8,7 +8,7 @@
 #include "platform/critical_section.h"
 #include "transport/connection.h"
 
-// All operations may come from any thread; none waits for the link.
+// Any thread may call these functions; none of them waits for the link.
 class AbortSwitch {
  public:
   // The connection is not owned; without one (null) nothing can be aborted. Raises the HRESULT of
@@ -17,17 +17,18 @@ class AbortSwitch {
 
   void Abort();
 
-  // Whether an abort came. Clears both its halves, so that one abort ends one operation.
+  // Tests and clears the flag, and with it a cancel that has not ended a wait: one abort ends one
+  // operation.
   bool Take();
 
-  // Whether an abort came that nobody has taken yet.
+  // Tests the flag and does not clear it.
   bool IsSet();
 
-  // Clears a cancel that has not ended a wait yet; the flag stays. What comes next is then not
-  // disturbed by an abort that came before it.
+  // Clears a cancel that has not ended a wait yet; the flag stays. The abort that came before then
+  // ends no wait of the next step.
   void ClearCancel();
 
-  // Names the command that Abort marks, for a scope.
+  // The command that Abort marks, for a scope: it must not be marked after it was destroyed.
   class CurrentCommand {
    public:
     CurrentCommand(AbortSwitch& abort_switch, CReceiverCmd& command) : switch_(abort_switch) {
@@ -45,7 +46,9 @@ class AbortSwitch {
   void SetCurrentCommand(CReceiverCmd* command);
 
   CIConnection* connection_;
-  CriticalSection lock_;  // guards the two below, and keeps the halves of an abort together
+  // Guards the two members below, and keeps the steps of an abort together: without it, Take could
+  // clear the flag and leave the cancel for the next operation.
+  CriticalSection lock_;
   bool aborted_ = false;
   CReceiverCmd* current_command_ = nullptr;
 };

@@ -22,8 +22,8 @@ HRESULT CAbstractProtocol::CheckConnection(HANDLE abort_event, short* answer) {
     *answer = IsAnswering(abort_event) ? VARIANT_TRUE : VARIANT_FALSE;
     return S_OK;
   });
-  // An abort that came during the check ends no wait after it. Its flag stays for the next operation
-  // that looks for it.
+  // The check has ended, so the abort ends no wait after it. Its flag stays: the abort may be meant
+  // for an operation of another thread that waits for the lock.
   abort_.ClearCancel();
   UnlockConnection();
   return result;

@@ -1,6 +1,5 @@
-// What the drivers of both families share: the connection they own, its lock, the abort switch, the
-// way of progress upward, and the operations and steps that are the same in both. A driver speaks
-// its family's commands only.
+// The base of all drivers: the connection that a driver owns, its lock, the abort switch, progress,
+// and the operations and steps that are the same in every family.
 #ifndef RCVLINK_RECEIVER_ABSTRACT_PROTOCOL_H_
 #define RCVLINK_RECEIVER_ABSTRACT_PROTOCOL_H_
 
@@ -19,7 +18,7 @@
 class CAbstractProtocol : public CIProtocol {
  public:
   HRESULT CheckConnection(HANDLE abort_event, short* answer) override;
-  // The operations that a family may not offer: E_NOTIMPL.
+  // Not every family offers these operations: E_NOTIMPL unless a driver overrides it.
   HRESULT UploadFile(const CFileInfo* info, IStream* stream) override;
   HRESULT DeleteFile(const wchar_t* name) override;
   HRESULT RenameFile(const wchar_t* old_name, const wchar_t* new_name) override;
@@ -34,30 +33,33 @@ class CAbstractProtocol : public CIProtocol {
   HRESULT UnlockConnection() override;
 
  protected:
-  // The speed of file transfers on a serial port, in bit/s.
+  // The speed to which a serial link is raised for the transfer of a file, in bit/s. It is the
+  // highest that discovery tries, so that a receiver that keeps it is found again.
   static constexpr DWORD kTransferSpeed = 115200;
 
-  // `class_name` opens the driver's report lines and lives as long as the driver. Raises the
-  // HRESULT of the Win32 error when a lock cannot be made.
+  // `class_name` stands at the beginning of the driver's lines of the report; it must stay valid as
+  // long as the driver. Raises the HRESULT of the Win32 error when a lock cannot be created.
   CAbstractProtocol(const wchar_t* class_name, std::unique_ptr<CIConnection> connection);
 
   CIConnection* connection() const { return connection_.get(); }
 
-  // Executes a command as the current one, so that Abort reaches it.
+  // Executes a command as the current one, which Abort marks.
   HRESULT ExecuteAsCurrent(CReceiverCmd& command);
 
-  // Takes the abort, if one came, and raises S_FALSE.
+  // Ends the operation by raising S_FALSE when an abort came, and clears the abort.
   void ThrowIfAborted();
 
-  // Raises the link from `speed` to kTransferSpeed, the receiver before the host. False: it could
-  // not be raised, which is written to the report, and both ends are at the old speed. Raises
-  // S_FALSE when an abort came before the receiver was told.
+  // Raises the link from `speed` to kTransferSpeed: first the receiver, which still hears the
+  // command at the old speed, then the host's port. False: it could not be raised, which is written
+  // to the report, and both ends are at the old speed. Raises S_FALSE when an abort came before the
+  // command was sent.
   bool RaiseSpeed(DWORD speed);
 
-  // Hands a directory to the host's list, the last tenth of the progress. Raises E_OUTOFMEMORY.
+  // Copies a directory into the host's list and reports the last tenth of the progress. Raises
+  // E_OUTOFMEMORY.
   void AppendEntries(const std::vector<FileEntry>& entries, CFileList& files);
 
-  // A progress report, at most 100.
+  // Reports progress; a higher percent counts as 100.
   void ReportProgress(DWORD percent);
 
   AbortSwitch abort_;
@@ -68,14 +70,15 @@ class CAbstractProtocol : public CIProtocol {
  private:
   // Whether a receiver of the family answers.
   virtual bool IsAnswering(HANDLE abort_event) = 0;
-  // The receiver's half of RaiseSpeed. S_OK only when it was told and may have changed its speed.
-  // A family whose files go at the speed that the link has need not override it.
+  // Sets the receiver to the speed. S_OK only when the command was sent and the receiver may have
+  // changed its speed. A family that transfers files at the speed of the link does not override it.
   virtual HRESULT RaiseReceiver(DWORD) { return E_NOTIMPL; }
-  // Undoes it, for a host that could not follow. No abort that came before disturbs it.
+  // Sets the receiver back to the speed, when the host's port cannot change to the new one. An
+  // abort that came before does not end it: the link would stay cut.
   virtual void SetReceiverBack(DWORD) {}
 
   const wchar_t* class_name_;
-  std::unique_ptr<CIConnection> connection_;  // declared last, so that the link is closed first
+  std::unique_ptr<CIConnection> connection_;  // declared last, destroyed first: it closes the link
 };
 
 // The name of a connection for the report, in the thread's ANSI code page; empty when it has none.

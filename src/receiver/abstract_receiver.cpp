@@ -43,7 +43,8 @@ HRESULT CAbstractReceiver::WithProgress(const CProgressCallback* progress, Trans
   } else {
     SetProgressCallback(nullptr, nullptr);
   }
-  // Also when the transfer raises something.
+  // Removes the function also when the transfer raises an exception: the host may free its record
+  // as soon as the call returns.
   struct Removal {
     CAbstractReceiver& receiver;
     ~Removal() { receiver.SetProgressCallback(nullptr, nullptr); }

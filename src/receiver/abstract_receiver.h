@@ -1,5 +1,5 @@
-// The receiver object behind a host's handle: it owns the driver of the family that answered,
-// traces each operation and hands it on, and carries the host's progress function to the driver.
+// The object of a receiver's handle. It owns the driver of the family that answered, writes each
+// operation to the report and passes it to the driver, and calls the host's progress function.
 #ifndef RCVLINK_RECEIVER_ABSTRACT_RECEIVER_H_
 #define RCVLINK_RECEIVER_ABSTRACT_RECEIVER_H_
 
@@ -12,7 +12,7 @@
 
 class CAbstractReceiver : public CIReceiver, public CIProtocolCallback {
  public:
-  // Raises the HRESULT of the Win32 error when its lock cannot be made.
+  // Raises the HRESULT of the Win32 error when its lock cannot be created.
   explicit CAbstractReceiver(std::unique_ptr<CIProtocol> driver);
 
   HRESULT Reserved1() override;
@@ -43,15 +43,16 @@ class CAbstractReceiver : public CIReceiver, public CIProtocolCallback {
                  HRESULT (CIProtocol::*operation)(Parameters...),
                  Arguments... arguments);
 
-  // The bracket of a transfer: the host's progress record is in place while it runs, and never
-  // after.
+  // Runs a transfer with the host's progress function, which is never called after the transfer.
   template <typename Transfer>
   HRESULT WithProgress(const CProgressCallback* progress, Transfer transfer);
 
-  CriticalSection lock_;  // guards the next two and each progress call
+  // Guards the next two members, and is held during each call of the function, so that the function
+  // is not removed while it runs.
+  CriticalSection lock_;
   ProgressFunction progress_function_ = nullptr;
   void* progress_context_ = nullptr;
-  std::unique_ptr<CIProtocol> driver_;  // goes first
+  std::unique_ptr<CIProtocol> driver_;  // declared last, destroyed first: it may report progress
 };
 
 #endif  // RCVLINK_RECEIVER_ABSTRACT_RECEIVER_H_

@@ -8,6 +8,7 @@ CFileList::~CFileList() {
 }
 
 bool CFileList::Append(UniqueBstr name, DWORD size, const SYSTEMTIME& time) {
+  // The count must fit into a host's long; so do the bytes of all records.
   constexpr size_t kMaxFiles = std::numeric_limits<int>::max() / sizeof(CFileInfo);
   if (files_.size() >= kMaxFiles) return false;
   CFileInfo file{};

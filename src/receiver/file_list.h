@@ -1,4 +1,4 @@
-// A receiver's directory as it was read: records whose names the list owns.
+// A copy of a receiver's directory. The list owns the names in its records.
 #ifndef RCVLINK_RECEIVER_FILE_LIST_H_
 #define RCVLINK_RECEIVER_FILE_LIST_H_
 
@@ -15,8 +15,8 @@ class CFileList {
   CFileList& operator=(const CFileList&) = delete;
   ~CFileList();
 
-  // Appends one file whose both times are `time`. False, with the name freed, when the list cannot
-  // grow.
+  // Appends one file. Both its times are set to `time`, since a receiver gives one time for a file.
+  // False when the list cannot grow; the name is then freed.
   bool Append(UniqueBstr name, DWORD size, const SYSTEMTIME& time);
 
   long Count() const { return static_cast<long>(files_.size()); }
@@ -26,7 +26,7 @@ class CFileList {
   const CFileInfo& At(long index) const;
 
  private:
-  std::vector<CFileInfo> files_;  // doubles its capacity when full
+  std::vector<CFileInfo> files_;
 };
 
 #endif  // RCVLINK_RECEIVER_FILE_LIST_H_

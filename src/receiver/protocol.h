@@ -1,4 +1,4 @@
-// What a receiver object asks of a protocol driver, and what a driver tells it in return.
+// The interface of a family's driver, and the one through which a driver reports progress.
 #ifndef RCVLINK_RECEIVER_PROTOCOL_H_
 #define RCVLINK_RECEIVER_PROTOCOL_H_
 
@@ -8,7 +8,7 @@
 #include "platform/win32.h"
 #include "receiver/file_list.h"
 
-// The way up: a driver's progress during long operations, in percent.
+// Gets a driver's progress during long operations, in percent.
 class CIProtocolCallback {
  public:
   virtual void OnProgress(BYTE percent) = 0;
@@ -18,7 +18,8 @@ class CIProtocolCallback {
 };
 
 // A driver of one family of receivers. Operations that a family does not offer give E_NOTIMPL.
-// The order of the operations is fixed; results are those of rcvlink.h.
+// Results are those of rcvlink.h. The order of the operations is that of CIReceiver, and is fixed
+// for the same reason (receiver.h).
 class CIProtocol {
  public:
   virtual ~CIProtocol() = default;
@@ -36,10 +37,11 @@ class CIProtocol {
   virtual HRESULT RenameFile(const wchar_t* old_name, const wchar_t* new_name) = 0;
   // The callback is not owned; null removes it.
   virtual void SetCallback(CIProtocolCallback* callback) = 0;
-  // From any thread; takes no connection lock.
+  // Any thread may call it. It does not wait for the connection lock, which the operation that it
+  // is to end holds.
   virtual void Abort() = 0;
   virtual HRESULT LockConnection(HANDLE abort_event) = 0;
-  // The release's own answer: non-zero when the calling thread held the connection.
+  // No HRESULT but the answer of ReleaseMutex: not 0 when the calling thread held the lock.
   virtual HRESULT UnlockConnection() = 0;
   virtual HRESULT DCSetRcvBaudrate(DWORD baud_rate) = 0;
   virtual HRESULT DCSetRcvRTSControl(BYTE rts) = 0;

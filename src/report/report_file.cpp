@@ -43,7 +43,7 @@ void ReportFile::Create(const wchar_t* name) {
   if (!name) return;
   std::array<wchar_t, MAX_PATH> path{};
   const DWORD folder_length = GetTempPathW(MAX_PATH, path.data());
-  // A path that does not fit, its ending zero included, is refused: reporting stays off.
+  // A path that does not fit with its ending zero is refused: a cut one would name another file.
   if (folder_length == 0 || folder_length + std::wstring_view(name).size() >= path.size()) return;
   std::ranges::copy(std::wstring_view(name), path.begin() + folder_length);
   file_ = FileHandle(CreateFileW(path.data(),
@@ -55,6 +55,7 @@ void ReportFile::Create(const wchar_t* name) {
                                  nullptr));
 }
 
+// A write that fails is ignored: an operation does not fail because it cannot be traced.
 void ReportFile::Write(const char* bytes, size_t length) {
   if (!file_) return;
   DWORD written = 0;
@@ -65,6 +66,7 @@ void ReportFile::WriteStamp() {
   const std::scoped_lock lock(lock_);
   SYSTEMTIME now;
   GetLocalTime(&now);
+  // The milliseconds have four digits: programs that read reports find the stamp by this width.
   std::array<char, 64> stamp{};
   const int length = sprintf_s(stamp.data(),
                                stamp.size(),
@@ -89,7 +91,7 @@ void ReportFile::WriteEntry(const wchar_t* format, va_list arguments) {
   WriteStamp();
   const std::wstring text = FormatArguments(format, arguments);
 
-  // Entries are short; only a longer one needs the heap for its conversion.
+  // Most entries are short and are converted on the stack.
   constexpr size_t kUsualEntry = 1024;
   std::array<char, (kUsualEntry + 1) * sizeof(wchar_t)> usual{};
   std::vector<char> longer;
@@ -106,8 +108,8 @@ void ReportFile::WriteEntry(const wchar_t* format, va_list arguments) {
                           nullptr) == 0) {
     return;
   }
-  // As many bytes as the text has characters, so that reports stay byte-identical: with multi-byte
-  // characters the tail of the line is cut.
+  // As many bytes as the text has characters: with multi-byte characters the end of the line is
+  // cut. A host that compares reports byte for byte with those of another version relies on it.
   Write(converted, text.size());
 }
 
@@ -118,6 +120,7 @@ namespace dump_hlp {
 void CreateReportFile(const wchar_t* name) { TheReport().Create(name); }
 
 void CreateReportFile(const char* name) {
+  // Enough for most names; a longer one is measured and converted again.
   constexpr int kUsualName = 128;
   std::wstring wide(kUsualName, L'\0');
   int length = MultiByteToWideChar(CP_THREAD_ACP, 0, name, -1, wide.data(), kUsualName);

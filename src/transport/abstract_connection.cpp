@@ -77,7 +77,8 @@ HRESULT CAbstractConnection::Write(const void* buffer, DWORD size, DWORD timeout
   }
 
   if (timeout_ms != 0) {
-    // Half a line would stand in front of the next command, so no watched event cuts it.
+    // No watched event ends a write: the receiver would take half a line as the beginning of the
+    // next command.
     const HRESULT result = WaitForTransfer(handle, block, timeout_ms, nullptr);
     if (result == kTimedOut) {
       Trace(L"CAbstractConnection::Write - wait timeout [0x%08X] [%s]\r\n", result, name_.get());
@@ -86,7 +87,8 @@ HRESULT CAbstractConnection::Write(const void* buffer, DWORD size, DWORD timeout
   }
   if (!calls_.GetOverlappedResult(handle, &block, &written, FALSE)) {
     const DWORD error = GetLastError();
-    // A write nobody waited for is still under way; it must not outlive the caller's buffer.
+    // A write that was not waited for may still be running. It is ended here, since the caller
+    // frees the buffer next.
     if (error == ERROR_IO_INCOMPLETE) CancelTransfer(handle, block);
     Trace(L"CAbstractConnection::Write - GetOverlappedResult is failed [%u] [%s]\r\n",
           error,
@@ -100,7 +102,8 @@ HRESULT CAbstractConnection::WaitForTransfer(HANDLE handle,
                                              OVERLAPPED& block,
                                              DWORD timeout_ms,
                                              HANDLE watched) {
-  // What ends the wait early comes first, so it wins when the transfer is done too.
+  // What ends the wait early comes first: Windows reports the first signalled handle, and an abort
+  // counts also when the transfer ends at the same moment.
   std::array<HANDLE, 3> events{};
   DWORD done = 0;
   if (!wait_rule_.shielded) events[done++] = GetAbortEvent();
@@ -121,7 +124,8 @@ HRESULT CAbstractConnection::WaitForTransfer(HANDLE handle,
 
 void CAbstractConnection::CancelTransfer(HANDLE handle, OVERLAPPED& block) {
   calls_.CancelIo(handle);
-  // Until the device has let go of it, the transfer may still write to the block and the buffer.
+  // Waits until the transfer has ended: before, the device may still write to the block and to the
+  // buffer.
   DWORD bytes = 0;
   calls_.GetOverlappedResult(handle, &block, &bytes, TRUE);
 }
@@ -154,7 +158,7 @@ WaitRule CAbstractConnection::ExchangeWaitRule(const WaitRule& rule) {
 }
 
 bool CAbstractConnection::IsCancelPending() const {
-  // Looking at an auto-reset event clears it.
+  // The test clears an auto-reset event, so it is signalled again.
   return IsSignalled(cancel_event_.get()) && SetEvent(cancel_event_.get());
 }
 

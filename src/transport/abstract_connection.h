@@ -1,5 +1,5 @@
-// What serial and USB links share: the device, its name, three events, and overlapped transfers
-// with a time-out and an abort.
+// What serial and USB links share: the device, its name, three events, and overlapped reads and
+// writes with a time-out and an abort.
 #ifndef RCVLINK_TRANSPORT_ABSTRACT_CONNECTION_H_
 #define RCVLINK_TRANSPORT_ABSTRACT_CONNECTION_H_
 
@@ -10,7 +10,7 @@
 
 class CAbstractConnection : public CIConnection {
  public:
-  // Asks on an open connection whether a receiver answers; watches the abort event.
+  // Asks on an open connection whether a receiver answers; the abort event ends the question.
   using Probe = bool (*)(CIConnection* connection, HANDLE abort_event);
 
   HRESULT Disconnect() override;
@@ -23,16 +23,18 @@ class CAbstractConnection : public CIConnection {
   void ClearCancel() override;
   WaitRule ExchangeWaitRule(const WaitRule& rule) override;
 
-  // The handles that Write writes to and Read reads from.
+  // The handle of Write and that of Read: a USB link has one for each direction.
   virtual HANDLE GetWriteHandle();
   virtual HANDLE GetReadHandle();
-  // What ends a wait early: the outside abort event, else the connection's own cancel event.
+  // What ends a wait early: the caller's abort event if there is one, else the connection's own
+  // cancel event.
   virtual HANDLE GetAbortEvent();
 
  protected:
   explicit CAbstractConnection(DeviceCalls& calls) : calls_(calls) {}
 
-  // Makes the events that do not exist yet; they outlive re-opening. S_OK or the Win32 error.
+  // Creates the events that do not exist yet. They stay when the link is opened again, so that
+  // Cancel from another thread never meets a closed handle. S_OK or the Win32 error.
   HRESULT CreateEvents();
 
   // Whether a Cancel has not ended a wait yet; it still will.
@@ -43,14 +45,14 @@ class CAbstractConnection : public CIConnection {
   UniqueBstr name_;
 
  private:
-  // Waits for a pending transfer; `watched` (may be null) ends the wait as well. Whatever ends it,
-  // the transfer is over when this returns, so its block and buffer may go. S_OK only when its own
-  // event ended the wait.
+  // Waits for a pending transfer; `watched` (may be null) ends the wait as well. Whatever ends the
+  // wait, the transfer has ended when this returns, so that its block and its buffer may be freed.
+  // S_OK only when the transfer's own event ended the wait.
   HRESULT WaitForTransfer(HANDLE handle, OVERLAPPED& block, DWORD timeout_ms, HANDLE watched);
   void CancelTransfer(HANDLE handle, OVERLAPPED& block);
 
   KernelHandle write_event_;      // auto-reset
-  KernelHandle read_event_;       // manual-reset
+  KernelHandle read_event_;       // manual-reset; Read resets it before each transfer
   KernelHandle cancel_event_;     // auto-reset: one Cancel ends one wait
   HANDLE abort_event_ = nullptr;  // the caller's
   WaitRule wait_rule_;

@@ -40,15 +40,16 @@ BOOL DeviceCalls::DeviceIoControl(HANDLE device,
                                   DWORD* returned) {
   const KernelHandle done(CreateEventW(nullptr, TRUE, FALSE, nullptr));
   if (!done) return FALSE;
-  // Devices are open for overlapped transfers, so a request is one as well.
+  // Devices are opened for overlapped transfers, so Windows wants a block for every request.
   OVERLAPPED block{};
   block.hEvent = done.get();
-  void* const in = const_cast<void*>(input);  // Win32 does not say that it only reads it
+  void* const in = const_cast<void*>(input);  // it is only read, but Win32's parameter is not const
   if (::DeviceIoControl(device, code, in, input_size, output, output_size, returned, &block)) {
     return TRUE;
   }
   if (GetLastError() != ERROR_IO_PENDING) return FALSE;
-  return ::GetOverlappedResult(device, &block, returned, TRUE);  // `done` keeps the last error
+  // Closing `done` does not change the last error.
+  return ::GetOverlappedResult(device, &block, returned, TRUE);
 }
 
 DWORD DeviceCalls::WaitForMultipleObjects(DWORD count, const HANDLE* handles, DWORD timeout_ms) {

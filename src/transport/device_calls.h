@@ -1,4 +1,5 @@
-// The Win32 calls that connections make, in one place, so that tests can answer them.
+// The Win32 calls that connections make. Tests replace them, and so show what no simulated port
+// shows: the DCB that was set, errors of the line, a read that ends empty.
 #ifndef RCVLINK_TRANSPORT_DEVICE_CALLS_H_
 #define RCVLINK_TRANSPORT_DEVICE_CALLS_H_
 
@@ -16,7 +17,8 @@ class DeviceCalls {
       HANDLE device, const void* buffer, DWORD size, DWORD* written, OVERLAPPED* block);
   virtual BOOL GetOverlappedResult(HANDLE device, OVERLAPPED* block, DWORD* bytes, BOOL wait);
   virtual BOOL CancelIo(HANDLE device);
-  // Waits until the device has answered. `*returned` is how much of the output it filled.
+  // Waits until the device has answered. `*returned` is the number of bytes that it wrote to
+  // `output`.
   virtual BOOL DeviceIoControl(HANDLE device,
                                DWORD code,
                                const void* input,
@@ -36,11 +38,11 @@ class DeviceCalls {
   virtual BOOL PurgeComm(HANDLE device, DWORD flags);
 };
 
-// The system's own, unless a test has put others in their place.
+// The system's calls, unless a test has replaced them.
 DeviceCalls& SystemCalls();
 
-// Answers for the system in a scope; for tests, on one thread. A connection keeps the calls that it
-// was made with.
+// Replaces the system's calls for a scope; for tests, on one thread. A connection keeps the calls
+// that it was made with.
 class SystemCallsOverride {
  public:
   explicit SystemCallsOverride(DeviceCalls& calls);

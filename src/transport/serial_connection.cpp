@@ -13,6 +13,9 @@ namespace {
 constexpr DWORD kEventMask = EV_RXCHAR | EV_ERR;
 constexpr DWORD kInputQueueBytes = 16384;
 constexpr DWORD kOutputQueueBytes = 1024;
+// Milliseconds, of the port's driver. A read ends when the line is silent for 1 s after a byte, or
+// after 200 ms for each byte asked for and 100 ms more; it then is a success, also of 0 bytes. The
+// time-outs of Read and Write count besides.
 constexpr COMMTIMEOUTS kTimeouts = {
     .ReadIntervalTimeout = 1000,
     .ReadTotalTimeoutMultiplier = 200,
@@ -24,7 +27,8 @@ constexpr DWORD kPurgeAll = PURGE_TXABORT | PURGE_RXABORT | PURGE_TXCLEAR | PURG
 constexpr BYTE kByteSize = 8;
 constexpr DWORD kRtsControlMask = 0x3;  // fRtsControl has two bits
 
-// How long the output queue may stand still before it is given up: at 300 bit/s a byte takes 33 ms.
+// How long the output queue may stand still before the flush stops waiting for it. It is long
+// beside the 33 ms of a byte at 300 bit/s: a queue that stands still for so long is not just slow.
 constexpr DWORD kDrainLimitMs = 3000;
 
 constexpr std::array<DWORD, 5> kSweepSpeeds = {
@@ -68,7 +72,8 @@ HRESULT CSerialConnection::Open(const wchar_t* port, const DCB* settings) {
   if (!port) return E_INVALIDARG;
   if (const HRESULT result = CreateEvents(); FAILED(result)) return result;
   if (const DWORD error = OpenDevice(port); error != ERROR_SUCCESS) {
-    // Failures say Create where the success says Open; readers of reports know both.
+    // The report's lines of failures say Create, that of success says Open: programs and people
+    // search reports for these texts.
     Trace(L"CSerialConnection::Create - CreateFile failed [%u] [%s]\r\n", error, name_.get());
     return HResultFromError(error);
   }
@@ -101,7 +106,8 @@ void CSerialConnection::Report(const wchar_t* call, BOOL succeeded) const {
   Trace(L"CSerialConnection::Create - %s failed [%u] [%s]\r\n", call, error, name_.get());
 }
 
-// Flow control by XON/XOFF and the special characters stay as the port has them.
+// Flow control by XON/XOFF and the special characters stay as the port has them: they are not among
+// the settings that a host gives (rcvlink.h).
 void CSerialConnection::MergeSettings(const DCB& settings) {
   if (settings.BaudRate != 0) settings_.BaudRate = settings.BaudRate;
   settings_.fBinary = settings.fBinary;
@@ -173,8 +179,10 @@ HRESULT CSerialConnection::Flush() {
   return HResultFromError(error);
 }
 
-// Waits, without sleeping, until everything queued has left. A queue that stands still (a peer that
-// holds the line by flow control) is given up: what is in it will be purged.
+// Waits until everything queued has been sent: a command or a control byte that the purge discarded
+// would never reach the receiver. It does not sleep: commands are short, and the sleep would make
+// each of them slower. A queue that stands still, since the receiver holds the line by flow
+// control, is left to the purge.
 void CSerialConnection::WaitUntilSent() {
   Clock& clock = CurrentClock();
   DWORD last_progress = clock.Ticks();

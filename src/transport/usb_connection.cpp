@@ -25,11 +25,12 @@ constexpr std::array<DriverError, 4> kDriverErrors = {
      {usbio::kDataToggleError, L"USBIO_ERR_DATA_TOGGLE_MISMATCH"},
      {usbio::kNotBoundError, L"USBIO_ERR_NOT_BOUND"}}};
 
-// Explains the driver's own errors in the report; others explain themselves.
+// Writes the name of a driver's own error to the report: Windows has no text for its number.
 void DumpDriveErrorDesc(HRESULT result) {
   for (const DriverError& error : kDriverErrors) {
     if (error.code != static_cast<uint32_t>(result)) continue;
-    // The number comes in lower case with "08X" behind it: reports have always had it so.
+    // "%0x08X" prints the number in lower case and "08X" after it. It is not corrected: whoever
+    // searches reports for this line searches for that text.
     Trace(L"CUSBConnection::DumpDriveErrorDesc - %s [%0x08X]\r\n", error.name, result);
   }
 }
@@ -83,7 +84,9 @@ HRESULT CUSBConnection::ReadEndpoints(BulkEndpoints* endpoints) {
   DWORD returned = 0;
   const DWORD head_error =
       Request(device_.get(), usbio::kGetDescriptor, BytesOf(request), head, &returned);
-  // The plain error number is the result; discovery then finds out that no receiver answers.
+  // The plain error number is no failing HRESULT: discovery goes on, finds that no receiver
+  // answers, and gives S_FALSE. A host so sees a device that is not there as one without a
+  // receiver.
   if (head_error != ERROR_SUCCESS) return static_cast<HRESULT>(head_error);
   if (returned != head.size()) return S_FALSE;
 
@@ -138,8 +141,8 @@ HRESULT CUSBConnection::Write(const void* buffer, DWORD size, DWORD timeout_ms) 
 
 HRESULT CUSBConnection::Flush() {
   Trace(L"CUSBConnection::Flush\r\n");
-  // These reads do not wait. A cancel is meant for the wait of the command that follows: it ends the
-  // flush, and is kept for that.
+  // These reads do not wait, so a cancel is not meant for them: it ends the flush, and stays for
+  // the wait of the command that follows.
   const WaitScope shield = WaitScope::Shielded(this);
   while (!IsCancelPending()) {
     uint8_t waiting = 0;

@@ -2,7 +2,7 @@
 
 namespace {
 
-// Offsets within descriptors.
+// Offsets within descriptors and values of their fields, from the USB 2.0 standard, chapter 9.6.
 constexpr size_t kLength = 0;  // of any descriptor: its own length
 constexpr size_t kTotalLength = 2;
 constexpr size_t kEndpointCount = 4;
@@ -49,6 +49,6 @@ std::optional<BulkEndpoints> FindBulkEndpoints(std::span<const uint8_t> descript
     (is_in ? found.in : found.out) = address;
     (is_in ? has_in : has_out) = true;
   }
-  // The defaults go together: a device with one bulk endpoint only has neither of its own.
+  // One bulk endpoint alone is no link, so its address is not mixed with a default one.
   return has_out && has_in ? found : BulkEndpoints{};
 }

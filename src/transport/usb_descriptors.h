@@ -10,10 +10,10 @@
 
 constexpr size_t kConfigurationDescriptorLength = 9;
 
-// How long a configuration descriptor is with all that belongs to it, told in its first 9 bytes.
+// The length of a configuration descriptor and all that follows it, as its first 9 bytes give it.
 size_t TotalLength(std::span<const uint8_t, kConfigurationDescriptorLength> configuration);
 
-// Endpoint addresses; these stay where a device does not tell its own.
+// Endpoint addresses. The defaults are endpoint 1 of each direction.
 struct BulkEndpoints {
   uint8_t out = 0x01;
   uint8_t in = 0x81;
@@ -21,10 +21,12 @@ struct BulkEndpoints {
   bool operator==(const BulkEndpoints&) const = default;
 };
 
-// The bulk OUT and bulk IN endpoint of a whole configuration descriptor, which is read until both
-// are there; of several of one direction ahead of the other's first, the last. Devices of these
-// receivers have one interface, and behind it its endpoints (two at least) and nothing else; any
-// other layout gives none.
+// Finds the bulk OUT and the bulk IN endpoint of a whole configuration descriptor. The endpoints
+// are read in order until there is one of each direction; when two of one direction come first, the
+// second one counts. Without both, the defaults are used.
+//
+// Receivers have one interface, and after its descriptor its endpoints (two at least) and nothing
+// else. Any other layout gives none, so that no pipe of another kind of device is bound.
 std::optional<BulkEndpoints> FindBulkEndpoints(std::span<const uint8_t> descriptors);
 
 #endif  // RCVLINK_TRANSPORT_USB_DESCRIPTORS_H_

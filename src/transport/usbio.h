@@ -1,5 +1,5 @@
-// What is used of the USBIO kernel driver's interface: control codes for DeviceIoControl and the
-// records that go with them. All numbers are little-endian, as on the wire.
+// The part of the USBIO kernel driver's interface that the library uses: control codes for
+// DeviceIoControl and their records. All numbers are little-endian, as x64 stores them.
 #ifndef RCVLINK_TRANSPORT_USBIO_H_
 #define RCVLINK_TRANSPORT_USBIO_H_
 
@@ -8,7 +8,8 @@
 
 namespace usbio {
 
-// Device type 0x8094. Function and buffer method are in the lower bits.
+// USBIO control codes, made as by Windows' CTL_CODE: the device type 0x8094 in the upper 16 bits,
+// function and buffer method in the lower ones.
 constexpr uint32_t kGetDescriptor = 0x80942006;     // in: DescriptorRequest, out: the descriptor
 constexpr uint32_t kSetConfiguration = 0x80942024;  // in: ConfigurationRequest
 constexpr uint32_t kBindPipe = 0x80942078;          // in: an endpoint address, one byte
@@ -39,8 +40,8 @@ struct ConfigurationRequest {
 };
 static_assert(sizeof(ConfigurationRequest) == 260);
 
-// The driver's own errors. They come as the Win32 last error and are results as they are, being
-// negative.
+// The driver's own errors. They come as the Win32 last error. Being negative they are failing
+// HRESULTs, and reach the host unchanged.
 constexpr uint32_t kCrcError = 0xE0000001;
 constexpr uint32_t kBitStuffError = 0xE0000002;
 constexpr uint32_t kDataToggleError = 0xE0000003;

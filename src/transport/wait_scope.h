@@ -1,4 +1,4 @@
-// A scope in which other things end the waits of a connection than usual.
+// Changes for a scope what ends the waits of a connection early.
 #ifndef RCVLINK_TRANSPORT_WAIT_SCOPE_H_
 #define RCVLINK_TRANSPORT_WAIT_SCOPE_H_
 
@@ -9,15 +9,15 @@
 
 class WaitScope {
  public:
-  // Nothing ends a wait early: for bytes that the receiver must get whole. A Cancel that comes
-  // meanwhile ends the first wait after the scope.
+  // Neither Cancel nor the abort event ends a wait: for bytes that the receiver must get whole. A
+  // Cancel that comes meanwhile ends the first wait after the scope.
   static WaitScope Shielded(CIConnection* connection) {
     return WaitScope(connection, {.shielded = true});
   }
 
-  // The host's event ends a Read too. A null event, or a handle that is none, ends nothing.
+  // The host's event ends a Read as well. A null event, or an invalid handle, ends nothing.
   static WaitScope Watching(CIConnection* connection, HANDLE event) {
-    // A handle of our own, as the host may close its own meanwhile.
+    // A second handle of the event, since the host may close its own during the wait.
     HANDLE copy = nullptr;
     const HANDLE process = GetCurrentProcess();
     if (event) DuplicateHandle(process, event, process, &copy, SYNCHRONIZE, FALSE, 0);

@@ -12,9 +12,11 @@ namespace VelmarCommands {
 namespace {
 
 constexpr uint32_t kPlain = 0;
+// Shorter than that of other commands: a search of a silent port waits for it at 18 settings.
 constexpr uint32_t kUnlogReadTimeoutMs = 8000;
 
-// This family's numbering: 1 is even. The other family's is the other way round.
+// The numbers are this family's, in which 1 is even; Quorin receivers have 1 for odd. Hosts give
+// each family its own number, so the two are not made equal.
 const char* ParityWord(uint8_t parity) {
   constexpr uint8_t kEven = 1;
   constexpr uint8_t kOdd = 2;
@@ -106,8 +108,8 @@ HRESULT CReadFileCmd::ParseReply(const char* bytes,
                                  bool* done,
                                  uint32_t* consumed) {
   has_begun_ = !std::string_view(bytes, length).starts_with(kRefusal);
-  // The prompt is consumed with the first byte behind it: a first log that comes in pieces stands
-  // alone from its second piece on.
+  // The prompt is consumed as soon as a byte has come after it. A first log that comes in pieces so
+  // stands without its prompt from the second piece on, and is recognised by its first byte.
   const bool at_log = length != 0 && static_cast<uint8_t>(bytes[0]) == BinaryHeader::kSync;
   const bool acknowledged = Response() == RESPONSE_OK && at_log;
   if (!chunk_ && !acknowledged) return CLogCommand::ParseReply(bytes, length, done, consumed);
@@ -120,7 +122,9 @@ HRESULT CReadFileCmd::ParseLogBody(const char* bytes,
                                    uint32_t length,
                                    bool* done,
                                    uint32_t* consumed) {
-  constexpr uint32_t kBodyBeforeData = 8;  // passed over; the binary header holds it
+  // The binary header holds these bytes: the chunk's offset in the file and its length. They are
+  // not needed, as the chunks come in order.
+  constexpr uint32_t kBodyBeforeData = 8;
   constexpr uint32_t kUsualChunk = 1024;
   *done = false;
   if (length < kBodyBeforeData) return S_FALSE;

@@ -1,5 +1,5 @@
-// The commands of the Velmar language (NovAtel's OEM commands and logs). Each is built, executed
-// once over a connection, asked for its results and thrown away.
+// The commands of the Velmar protocol (NovAtel's OEM commands and logs). Each is constructed,
+// executed once over a connection, asked for its results and destroyed.
 #ifndef RCVLINK_VELMAR_COMMANDS_H_
 #define RCVLINK_VELMAR_COMMANDS_H_
 
@@ -14,14 +14,14 @@
 
 namespace VelmarCommands {
 
-// A command that waits for a log behind the acknowledgement.
+// A command that waits for a log after the acknowledgement.
 class CLogCommand : public CVelmarCommand {
  public:
   using CVelmarCommand::CVelmarCommand;
   HRESULT ParseReply(const char* bytes, uint32_t length, bool* done, uint32_t* consumed) override;
 
  protected:
-  // Takes over what a decoder of logs.h found.
+  // Sets response type, `done` and result from what a decoder of logs.h found.
   HRESULT Conclude(Progress progress, bool* done);
 };
 
@@ -38,7 +38,7 @@ class CGetReceiverInfoCmd : public CLogCommand {
 class CGetFileListCmd : public CLogCommand {
  public:
   CGetFileListCmd();
-  // Reads all logs of the reply so far, from the first.
+  // Reads all logs of the reply so far, beginning with the first one each time.
   HRESULT ParseAsciiLog(const char* bytes,
                         uint32_t length,
                         bool* done,
@@ -60,7 +60,7 @@ class CGetFileHeaderCmd : public CLogCommand {
   FileHeaderLog file_header_;
 };
 
-// The settings of the port that the receiver is talking on.
+// The settings of the port that the receiver uses for this link.
 class CLogConfigCommand : public CLogCommand {
  public:
   CLogConfigCommand();
@@ -71,7 +71,7 @@ class CLogConfigCommand : public CLogCommand {
   PortConfigLog config_;
 };
 
-// Told of each chunk of a file; the chunk is the command's, until the next.
+// Called for each chunk of a file. The command owns the chunk and keeps it until the next one.
 class CReadFileCmdCallback {
  public:
   // A failure ends the transfer.
@@ -87,7 +87,7 @@ class CReadFileCmd : public CLogCommand {
   CReadFileCmd(CReadFileCmdCallback* callback, void* context);
   HRESULT ParseReply(const char* bytes, uint32_t length, bool* done, uint32_t* consumed) override;
   HRESULT ParseLogBody(const char* bytes, uint32_t length, bool* done, uint32_t* consumed) override;
-  // Whether the receiver may have begun to send the file: it answered, and did not refuse.
+  // Whether the receiver may have begun to send the file: it has answered, and not refused.
   bool HasBegun() const { return has_begun_; }
   const uint8_t* GetData() const { return chunk_.get(); }  // null before the first
   uint32_t GetDataSize() const { return chunk_length_; }
@@ -100,14 +100,15 @@ class CReadFileCmd : public CLogCommand {
   uint32_t chunk_length_ = 0;
 };
 
-// Makes a file current; a null name makes none.
+// Makes a file the current one, which the commands for header and transfer then mean. A null name
+// leaves no file current.
 class CSetCurrentFileCmd : public CVelmarCommand {
  public:
   explicit CSetCurrentFileCmd(const char* name);
   HRESULT ParseReply(const char* bytes, uint32_t length, bool* done, uint32_t* consumed) override;
 };
 
-// Names are put into the commands as they are.
+// Names are put into the commands unchanged, as the file list gave them.
 class CDeleteFileCmd : public CVelmarCommand {
  public:
   explicit CDeleteFileCmd(const char* name);
@@ -118,8 +119,8 @@ class CRenameFileCmd : public CVelmarCommand {
   CRenameFileCmd(const char* old_name, const char* new_name);
 };
 
-// Sets the port that the receiver is talking on: the command names none, whatever `port` says.
-// Parity 1 even, 2 odd, else none; handshake 1 XON, 2 CTS, else none.
+// Sets the port that the receiver uses for this link: a command that names no port means that one,
+// so `port` is not sent. Parity 1 even, 2 odd, else none; handshake 1 XON, 2 CTS, else none.
 class CSetPortParamsCmd : public CVelmarCommand {
  public:
   CSetPortParamsCmd(const char* port,
@@ -131,13 +132,13 @@ class CSetPortParamsCmd : public CVelmarCommand {
   explicit CSetPortParamsCmd(const PortConfigLog& settings);
 };
 
-// Makes the port speak this language both ways.
+// Makes the receiver take and give this protocol on the port.
 class CSetInterfacemodeCommand : public CVelmarCommand {
  public:
   CSetInterfacemodeCommand();
 };
 
-// Stops all logs on the port.
+// Stops all logs on the port: they would stand before the next answer.
 class CUnlogAllCommand : public CVelmarCommand {
  public:
   CUnlogAllCommand();

@@ -1,5 +1,5 @@
-// The download of CVelmarProtocol: the link is raised to full speed, the file made current on the
-// receiver, its size asked for, its chunks taken (file_download.h), and the speed put back.
+// The download of CVelmarProtocol: raises the speed of a serial link, makes the file current on the
+// receiver, asks for its size, runs the transfer (file_download.h), and sets the old speed again.
 #include <algorithm>
 #include <cstdint>
 
@@ -13,9 +13,9 @@ using namespace VelmarCommands;
 
 namespace {
 
-// Whether the receiver refused, with an error text or without: the response type tells only the
-// second. A reply that came in pieces is kept with its beginning repeated, and stands whole at its
-// end.
+// Whether the receiver refused, with an error text or without; the response type is RESPONSE_ERROR
+// only without one. A reply that came in pieces is kept with its beginning repeated, and its last
+// part is the whole reply, so the refusal is searched for everywhere.
 bool IsRefusal(const CVelmarCommand& command) {
   const uint8_t* const reply = command.GetReply();
   if (!reply) return false;
@@ -33,8 +33,8 @@ HRESULT CVelmarProtocol::DownloadFile(const wchar_t* name, IStream* stream, CPro
           connection_lock_.handle());
     ReportProgress(0);
     const HRESULT result = CatchResult([&] { return DownloadLocked(name, stream); });
-    // An abort that came during the download ends no wait after it. Its flag stays for the next
-    // operation that looks for it.
+    // The download has ended, so the abort ends no wait after it. Its flag stays: the abort may be
+    // meant for an operation of another thread that waits for the lock.
     abort_.ClearCancel();
     return result;
   });
@@ -53,8 +53,9 @@ HRESULT CVelmarProtocol::DownloadLocked(const wchar_t* name, IStream* stream) {
   bool is_sending = false;
   const HRESULT result = CatchResult([&] { return Transfer(name, stream, &is_sending); });
 
-  // The abort that ended the transfer does not disturb what puts the link in order. One that comes
-  // while that waits ends all its waits; what has to be sent is sent all the same.
+  // The abort that ended the transfer does not end the waits of the steps that follow, which stop
+  // the receiver and set its old speed. A further abort ends them; the commands are sent all the
+  // same, or the link would stay cut.
   abort_.ClearCancel();
   bool is_aborted = false;
   if (is_sending) {
@@ -62,7 +63,9 @@ HRESULT CVelmarProtocol::DownloadLocked(const wchar_t* name, IStream* stream) {
     is_aborted = ExecuteForCertain(stop_sending) == S_FALSE;
   }
   if (saved_speed == 0 || saved_speed >= kTransferSpeed) return result;
-  // What the put-back gives replaces what the transfer gave.
+  // The result is that of setting the old speed, not that of the transfer: a link that is cut
+  // matters more to what the host does next, and the host can compare the byte count with the size
+  // listed.
   return RestoreSpeed(saved_speed, is_aborted);
 }
 
@@ -83,8 +86,8 @@ HRESULT CVelmarProtocol::Transfer(const wchar_t* name, IStream* stream, bool* is
       ThrowIfFailed(result);
     }
   }
-  // Also for a file that the receiver does not know: the stream stays empty, and that is no
-  // failure.
+  // Also for a file that the receiver refused: it has answered, which is what the result says. The
+  // stream is empty then.
   ReportProgress(100);
   return result;
 }
@@ -99,14 +102,16 @@ HRESULT CVelmarProtocol::RaiseReceiver(DWORD speed) {
   if (question_result == S_FALSE) throw HResultError(S_FALSE);
   if (FAILED(question_result)) return question_result;
   raised_port_ = get_config.Config();
-  // A receiver that did not tell its port is not raised: raising the host alone would cut the link.
+  // A receiver that does not name its port cannot be raised, and raising the host alone would cut
+  // the link.
   if (raised_port_.port_name.empty()) return S_FALSE;
   PortConfigLog settings = raised_port_;
   settings.baud = static_cast<int>(speed);
   CSetPortParamsCmd set_port(settings);
   const HRESULT result = ExecuteForCertain(set_port);
   if (result == S_FALSE) {
-    // Nobody knows whether it has changed its speed: it is told the old one at the new one.
+    // It may have changed its speed already, or may do so now. So the old speed is set at the new
+    // one.
     DWORD old_speed = 0;
     ThrowIfFailed(connection()->GetSpeed(&old_speed));
     ThrowIfFailed(connection()->SetSpeed(speed));
@@ -126,8 +131,9 @@ HRESULT CVelmarProtocol::RestoreSpeed(DWORD speed, bool is_aborted) {
   return FAILED(result) ? result : connection()->SetSpeed(speed);
 }
 
-// Sends the receiver its port's settings with this speed. After an abort it is not asked what they
-// are (they are those of before), and its answer is not waited for.
+// Sends the receiver its port's settings with this speed. After an abort neither is it asked for
+// the settings (those from before are sent) nor is its answer waited for: the host wants no more
+// waits.
 HRESULT CVelmarProtocol::TellSpeed(DWORD speed, bool is_aborted) {
   PortConfigLog settings = raised_port_;
   if (!is_aborted) {
@@ -143,7 +149,8 @@ HRESULT CVelmarProtocol::TellSpeed(DWORD speed, bool is_aborted) {
   if (is_aborted) set_port.SetFlags(kSendOnly);
   const HRESULT result = ExecuteForCertain(set_port);
   if (is_aborted || result == S_FALSE) {
-    // The line must have left before the host changes its own speed; an answer would have shown that.
+    // The whole line must have been sent before the host changes its own speed. There is no answer
+    // that shows it, so the flush waits for the output queue.
     connection()->Flush();
     NoteCutOff();
   }

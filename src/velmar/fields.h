@@ -8,8 +8,9 @@
 
 namespace VelmarCommands {
 
-// Splits at the commas outside double quotes; quotes stay part of their field. The end of the text
-// ends the last field, which is kept even when empty; a text that ends inside quotes loses it.
+// Splits at the commas outside double quotes; quotes stay part of their field. The last field may
+// be empty. When the text ends inside quotes the last field is left out: the rest of it has not
+// come yet.
 std::vector<std::wstring> SplitFields(std::string_view text);
 
 // The text without double quotes at either end.

@@ -13,8 +13,9 @@ IStream* AddReference(IStream* stream) {
   return stream;
 }
 
-// In 32-bit arithmetic, as hosts have always seen it: it wraps for files beyond 42949672 bytes. A
-// file that was said to be empty is complete with whatever comes of it.
+// In 32-bit arithmetic: the percent wraps in files beyond 42949672 bytes. It decides nothing; a
+// host that compares the reports of a transfer with recorded ones would see others if it did not. A
+// size of 0 gives 100, as there is nothing to divide by.
 uint8_t Percent(uint32_t total, uint32_t remaining) {
   constexpr uint32_t kComplete = 100;
   if (total == 0) return kComplete;
@@ -36,7 +37,8 @@ FileDownload::FileDownload(CVelmarProtocol& driver,
 
 HRESULT FileDownload::Run() {
   const HRESULT result = driver_.ExecuteCommand(read_file_);
-  // An aborted command went out whole, and the file comes although nothing has come yet.
+  // The line of an aborted command was sent whole: the receiver sends the file, although nothing
+  // has come yet.
   const bool has_begun = read_file_.HasBegun() || result == S_FALSE;
   is_sending_ = has_begun && read_file_.Response() != RESPONSE_DATA;
   return result;

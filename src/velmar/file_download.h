@@ -1,5 +1,5 @@
-// The transfer of a Velmar download: takes the log of the current file chunk by chunk into the host's
-// stream.
+// The transfer of a Velmar download: writes the log of the current file to the host's stream, chunk
+// by chunk.
 #ifndef RCVLINK_VELMAR_FILE_DOWNLOAD_H_
 #define RCVLINK_VELMAR_FILE_DOWNLOAD_H_
 
@@ -17,8 +17,9 @@ class FileDownload {
  public:
   using ProgressFunction = std::function<void(uint8_t percent)>;
 
-  // The driver executes the command, and calls TakeChunk for each chunk that it is told of. `size` is
-  // what the receiver said, and serves the progress only.
+  // The driver executes the command, and calls TakeChunk for each chunk. `size` is the file's size
+  // as the receiver gave it. It is used for the progress only: a file that is still being recorded
+  // may have grown.
   FileDownload(CVelmarProtocol& driver,
                ProgressFunction tell_progress,
                IStream* stream,
@@ -39,11 +40,12 @@ class FileDownload {
 
   CVelmarProtocol& driver_;
   ProgressFunction tell_progress_;
-  std::unique_ptr<IStream, StreamDeleter> stream_;  // a counted reference
+  // A counted reference, so that a host may release its own during the transfer.
+  std::unique_ptr<IStream, StreamDeleter> stream_;
   VelmarCommands::CReadFileCmd read_file_;
   uint32_t total_;
   uint32_t remaining_;
-  uint8_t percent_ = 0;  // the last that was told
+  uint8_t percent_ = 0;  // the last that was reported
   bool is_sending_ = false;
 };
 

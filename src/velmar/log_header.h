@@ -10,20 +10,20 @@
 
 namespace VelmarCommands {
 
-// The fields that are read of the ten ahead of the ";" of an ASCII log.
+// The fields of an ASCII log's header that are read. There are ten of them before the ";".
 struct AsciiHeader {
   std::wstring message_name;  // "#VERSIONA"
   std::wstring port;
-  int sequence = 0;  // how many logs still follow
+  int sequence = 0;  // the number of logs that still follow
   int gps_week = 0;
   double gps_seconds = 0;
 };
 
-// None with fewer than ten fields.
+// None when there are fewer than ten fields.
 std::optional<AsciiHeader> ParseHeaderFields(std::string_view text);
 
-// The first 36 bytes of a binary log: its header of 28 bytes and the first 8 of its body. All
-// numbers are little-endian.
+// The first 36 bytes of a binary log: its header of 28 bytes and the first 8 bytes of its body.
+// Before all of them have come the log's length is not used. All numbers are little-endian.
 class BinaryHeader {
  public:
   static constexpr size_t kLength = 36;

@@ -9,13 +9,13 @@
 namespace VelmarCommands {
 namespace {
 
-// Whether a body that counts its items in field 0 has all their fields. Receivers may claim any
-// count.
+// Whether a body whose field 0 counts its items has all their fields. In 64 bits, since a damaged
+// log may give any count.
 bool HasAllItems(const std::vector<std::wstring>& fields, int count, int64_t fields_an_item) {
   return static_cast<int64_t>(fields.size()) >= count * fields_an_item + 1;
 }
 
-// yyyymmdd and hhmmss are three numbers each.
+// Dates (yyyymmdd) and times of day (hhmmss) are three numbers in one.
 struct Triple {
   WORD high;
   WORD middle;
@@ -40,7 +40,7 @@ SYSTEMTIME TimeOf(int date, int time) {
                     .wMilliseconds = 0};
 }
 
-// Line ends, ";" and "*" separate as commas do.
+// Makes commas of line ends, ";" and "*", so that all logs of a directory are one row of fields.
 std::string WithCommasOnly(std::string_view text) {
   std::string plain;
   plain.reserve(text.size());
@@ -57,7 +57,7 @@ std::string WithCommasOnly(std::string_view text) {
   return plain;
 }
 
-// The number of a word in a list; none for another word.
+// The position of a word in a list; none for a word that is not in it.
 template <size_t N>
 std::optional<uint8_t> NumberOf(const std::wstring& word,
                                 const std::array<std::wstring_view, N>& words) {

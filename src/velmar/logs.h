@@ -1,6 +1,5 @@
-// What the bodies of Velmar's logs say. Each function reads one body (or, for the directory, all
-// its logs) and does no more; what a body cannot say yet, because it is not whole, is
-// Progress::kMore.
+// Decoders of Velmar's logs. Each function reads one body (for the directory, all logs), without
+// any access to the link. A body that is not whole yet gives Progress::kMore.
 #ifndef RCVLINK_VELMAR_LOGS_H_
 #define RCVLINK_VELMAR_LOGS_H_
 
@@ -14,11 +13,11 @@
 namespace VelmarCommands {
 
 enum class Progress {
-  kNothing,   // not a field has come
+  kNothing,   // no field has come
   kMore,      // fields are missing
   kMoreLogs,  // all logs so far are whole, and more of them follow
   kComplete,
-  kContradiction,  // the logs do not follow each other
+  kContradiction,  // a log is missing between two others
   kNoMemory
 };
 
@@ -31,19 +30,19 @@ struct VersionLog {
 };
 Progress DecodeVersion(std::string_view body, VersionLog& log);
 
-// DIRENT: one log a file, counting down to 0. The entries are those of the complete logs from
-// the first on, up to number 0 or to the one behind a gap, also when more are to come.
+// DIRENT: one log for each file. Their sequence numbers count down to 0. The entries are those of
+// the whole logs, from the first one to number 0, or to the first one after a gap, which is
+// included. They are set also when more logs are to come.
 Progress DecodeDirectory(std::string_view text, std::vector<FileEntry>& entries);
 
 // FILEHDR: the file that is current.
 struct FileHeaderLog {
-  std::wstring file_name;  // with the quotes it came in
+  std::wstring file_name;  // with its quotes
   int file_size = 0;
 };
 Progress DecodeFileHeader(std::string_view body, FileHeaderLog& log);
 
-// COMCONFIG: the settings of the port of that name. A word that is none of the known ones leaves
-// what was there.
+// COMCONFIG: the settings of the port of that name. An unknown word leaves its field at 0, none.
 struct PortConfigLog {
   std::wstring port_name;
   int baud = 0;

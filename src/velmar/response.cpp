@@ -5,10 +5,11 @@ namespace {
 
 constexpr std::string_view kOpening = "\r\n<";
 constexpr std::string_view kOk = "\r\n<OK\r\n";
+// The acknowledgement, or the beginning of a refusal, and one byte of what follows.
 constexpr size_t kEnoughForOk = 8;
 constexpr size_t kEnoughForError = 10;
 
-// The rest of a reply behind its acknowledgement.
+// Evaluates the reply after its acknowledgement.
 Response WithPrompt(std::string_view bytes, ResponseType acknowledgement, size_t cursor) {
   const auto byte_at = [&](size_t i) { return i < bytes.size() ? bytes[i] : '\0'; };
   if (byte_at(cursor) == '\0') return {RESPONSE_INCOMPLETE};

@@ -1,5 +1,5 @@
-// How a Velmar receiver opens its reply: an acknowledgement, the prompt of the port, then the log
-// that was asked for, if any.
+// The beginning of a Velmar receiver's reply: an acknowledgement, the prompt of the port, then the
+// log that was asked for, if any.
 //
 //   "\r\n<OK\r\n" "[COM1]" "#VERSIONA,COM1,0,..."
 //   "\r\n<ERROR:" "[COM1]"
@@ -20,17 +20,18 @@ enum ResponseType : int32_t {
   RESPONSE_UNKNOWN = 4
 };
 
-// How a refusal begins.
+// The beginning of a refusal.
 inline constexpr std::string_view kRefusal = "\r\n<ERROR:";
 
 struct Response {
   ResponseType type = RESPONSE_UNKNOWN;
-  // Where the prompt ends; 0 while it has not ended (or never will, by the type).
+  // The position after the prompt; 0 when the prompt is not whole yet or the type is unknown.
   size_t prompt_end = 0;
 };
 
-// Recognises acknowledgement and prompt at the start of the bytes. An error text ahead of the
-// prompt makes a reply unknown; a 0 byte stands for an end that is not there yet.
+// Recognises acknowledgement and prompt at the start of the bytes. An error text before the prompt
+// makes a reply unknown: the command then ends at once and does not wait for a log. A 0 byte counts
+// as the end of what has come.
 Response RecogniseResponse(std::string_view bytes);
 
 }  // namespace VelmarCommands

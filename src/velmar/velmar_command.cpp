@@ -13,8 +13,9 @@
 namespace VelmarCommands {
 namespace {
 
+// Holds a whole reply. A longer one ends the exchange with what has come of it.
 constexpr uint32_t kBufferLength = 8192;
-// Receivers need a moment after a reply before they hear the next command.
+// Receivers need a moment after a reply before they take the next command.
 constexpr DWORD kPauseMs = 500;
 
 constexpr std::string_view kLineEnd = "\r\n";
@@ -23,8 +24,8 @@ constexpr std::string_view kLineEnd = "\r\n";
 
 CVelmarCommand::CVelmarCommand(const char* text, uint32_t flags)
     : CReceiverCmd(text, flags, kWriteTimeoutMs, kReadTimeoutMs) {
-  // These receivers act on a command although an abort came before it, and half a line would stand
-  // in front of the next command.
+  // An abort that comes before a command or during it ends only the wait for the answer: the
+  // receiver would take half a line as the beginning of the next command.
   SendWhole();
 }
 
@@ -49,7 +50,7 @@ HRESULT CVelmarCommand::Execute(CIConnection* connection, HANDLE abort_event) {
   return ReceiveReply(connection, abort_event);
 }
 
-// What has come and is not consumed yet, zeros behind it; and the reply that is kept.
+// The bytes that were received and not consumed, with zeros after them, and the reply that is kept.
 class CVelmarCommand::Receiving {
  public:
   const char* bytes() const { return buffer_.data(); }
@@ -59,7 +60,8 @@ class CVelmarCommand::Receiving {
   HRESULT Read(CIConnection* connection, DWORD timeout_ms, DWORD* count) {
     return connection->Read(buffer_.data() + held_, kBufferLength - held_, count, timeout_ms);
   }
-  // All that is held and the new bytes: what was there before is kept once more, as it always was.
+  // Keeps all that is held and the new bytes, so bytes that were held before are kept again. The
+  // last part is then the whole reply, in which a refusal is found (download.cpp).
   bool Keep(DWORD count) {
     try {
       kept_.append(buffer_.data(), held_ + count);
@@ -95,7 +97,7 @@ HRESULT CVelmarCommand::ReceiveReply(CIConnection* connection, HANDLE abort_even
         Trace(L"CVelmarCommand::Execute - read failed [0x%08X]\r\n", read_result);
         if (read_result != kTimedOut) return read_result;
       }
-      // An abort that came before this command ends its wait too.
+      // An abort that came before this command ends its wait as well.
       if (read_result == S_FALSE || IsCancelled(abort_event)) return S_FALSE;
       if (count == 0) break;
       if (keep_reply && !receiving.Keep(count)) return E_OUTOFMEMORY;
@@ -114,7 +116,7 @@ HRESULT CVelmarCommand::ReceiveReply(CIConnection* connection, HANDLE abort_even
     if (need_data && receiving.IsFull()) break;
   }
   if (keep_reply) {
-    SetReply("");  // so that a reply of nothing has the length 0
+    SetReply("");  // an empty reply is kept too: GetReply is not null
     const std::string& kept = receiving.kept();
     const HRESULT result = AppendReply(kept.data(), static_cast<uint32_t>(kept.size()));
     if (FAILED(result)) return result;
@@ -227,7 +229,8 @@ HRESULT CVelmarCommand::ParseBinaryLog(const char* bytes,
   if (length < BinaryHeader::kLength) return S_FALSE;
   binary_header_.Assign({bytes, length});
   if (length < binary_header_.LogLength()) return S_FALSE;
-  // The body is taken from here whatever the header says of its own length.
+  // The headers of all logs that commands ask for have 28 bytes, so the body is not looked for by
+  // the length that the header gives.
   constexpr uint32_t kBody = BinaryHeader::kLength;
   return ParseLogBody(bytes + kBody, length - kBody, done, consumed);
 }

@@ -1,6 +1,6 @@
-// The base of the Velmar commands: writes one command and hands what comes back to parse
-// operations, which recognise acknowledgement, prompt and log. Concrete commands override the parse
-// operations.
+// The base of the Velmar commands: writes one command and passes what comes back to parse
+// operations, which recognise acknowledgement, prompt and log. Each command overrides those of its
+// own log.
 #ifndef RCVLINK_VELMAR_VELMAR_COMMAND_H_
 #define RCVLINK_VELMAR_VELMAR_COMMAND_H_
 
@@ -14,10 +14,11 @@
 
 namespace VelmarCommands {
 
-// Flags of a command: no reply is read; the command's CRC-32 follows it; the reply is streamed (its
-// bytes are not kept, and the parsers say how many they consumed).
-constexpr uint32_t kSendOnly = 0x0001;
-constexpr uint32_t kAppendCrc = 0x0002;
+// Flags of a command.
+constexpr uint32_t kSendOnly = 0x0001;   // no reply is read
+constexpr uint32_t kAppendCrc = 0x0002;  // the command's CRC-32 is sent after it
+// The reply is not kept, and the parse operations discard the logs that they have read: a file is
+// larger than the buffer.
 constexpr uint32_t kStreamed = 0x1000;
 
 constexpr uint32_t kWriteTimeoutMs = 500;
@@ -27,17 +28,18 @@ class CVelmarCommand : public CReceiverCmd {
  public:
   CVelmarCommand(const char* text, uint32_t flags);
 
-  // S_OK: the exchange ran; the response type tells its outcome, also after a time-out. S_FALSE:
-  // cancelled. E_INVALIDARG: no connection. Else what ended it.
+  // S_OK: the exchange ran, also when it ended by a time-out; Response() says how. S_FALSE:
+  // cancelled. E_INVALIDARG: no connection. Else the failure that ended it.
   HRESULT Execute(CIConnection* connection, HANDLE abort_event) override;
 
-  // The parse operations take the bytes received and not consumed so far. `done` ends the exchange;
-  // `consumed` is how many bytes at the front are dealt with. S_FALSE: not handled, or not enough.
+  // The parse operations get the bytes that were received and not consumed. `done` ends the
+  // exchange. The first `consumed` bytes are discarded after the call. S_FALSE: not recognised, or
+  // more bytes are needed.
   virtual HRESULT ParseReply(const char* bytes, uint32_t length, bool* done, uint32_t* consumed);
   virtual HRESULT ParseResponse(const char* bytes, uint32_t length, bool* done, uint32_t* consumed);
   virtual HRESULT ParseReserved(const char* bytes, uint32_t length, bool* done, uint32_t* consumed);
   virtual HRESULT ParseAsciiMessage(const char* text, bool* done);
-  // A log behind the prompt that opens with "<"; no family member reads it.
+  // A log that begins with "<" after the prompt. No command asks for one: E_NOTIMPL.
   virtual HRESULT ParseAbbreviatedLog(const char* bytes,
                                       uint32_t length,
                                       bool* done,
@@ -50,8 +52,9 @@ class CVelmarCommand : public CReceiverCmd {
   virtual HRESULT ParseLogBody(const char* bytes, uint32_t length, bool* done, uint32_t* consumed);
   virtual HRESULT ParseAsciiHeader(const char* text, uint32_t length);
   virtual HRESULT ParseMessageBody(const char* text, uint32_t length, bool* done);
-  // Sorts a whole reply, a text that ends in 0, by its acknowledgement. 0 when it is no end
-  // (nothing has come, or something follows the OK, which is kept as ErrorText); else 1.
+  // Sets the response type by the acknowledgement of a whole reply, a text that ends in 0. Gives 1
+  // when the exchange has ended with it, 0 when nothing has come or a text follows the OK;
+  // ErrorText() then gives that text.
   virtual int ParseAcknowledgement(const char* text);
 
   ResponseType Response() const { return response_; }
@@ -63,7 +66,8 @@ class CVelmarCommand : public CReceiverCmd {
   void SetResponse(ResponseType response) { response_ = response; }
   const BinaryHeader& Binary() const { return binary_header_; }
 
-  // What commands that wait for a log do with a reply: an acknowledgement alone does not end it.
+  // ParseReply of the commands that wait for a log: an acknowledgement alone does not end the
+  // exchange.
   HRESULT ParseAcknowledgedReply(const char* bytes,
                                  uint32_t length,
                                  bool* done,

@@ -15,6 +15,7 @@ using namespace VelmarCommands;
 
 namespace {
 
+// What CReceiverInfo has for this family (rcvlink.h).
 constexpr DWORD kFeatures = 13;
 constexpr DWORD kVariant = 2;
 
@@ -41,7 +42,8 @@ HRESULT CVelmarProtocol::ExecuteCommand(CVelmarCommand& command) {
   return Conclude(ExecuteAsCurrent(command), command);
 }
 
-// An abort marks the current command, and a marked one is not sent. This one is not the current one.
+// An abort marks the current command, and a marked command is not sent. So this one is not made the
+// current one.
 HRESULT CVelmarProtocol::ExecuteForCertain(CVelmarCommand& command) {
   AwaitLateAnswer();
   return Conclude(command.Execute(connection(), nullptr), command);
@@ -97,7 +99,8 @@ HRESULT CVelmarProtocol::GetReceiverInfo(HANDLE abort_event, CReceiverInfo* info
     ReadIdentity(abort_event, info);
     return S_OK;
   });
-  // Unlocked whether or not it was locked: reports of this family have always shown it so.
+  // Also when the lock was not taken: the report then has this line for every call, whatever came
+  // of it. Windows refuses the release of a mutex that the thread does not hold.
   UnlockConnection();
   if (result != S_OK) return result;
   ReportProgress(100);
@@ -131,7 +134,6 @@ HRESULT CVelmarProtocol::GetFiles(CFileList* files) {
     CGetFileListCmd get_list;
     ThrowIfFailed(ExecuteCommand(get_list));
     ThrowIfAborted();
-    // The last report is that of the last entry: there is none of 100.
     AppendEntries(get_list.Entries(), *files);
     return S_OK;
   });
@@ -146,7 +148,7 @@ HRESULT CVelmarProtocol::ChangeFile(MakeCommand make_command) {
     auto command = make_command();
     ThrowIfFailed(ExecuteCommand(command));
     ThrowIfAborted();
-    // A receiver that refused has answered too: that counts as done.
+    // A refusal is an answer as well, and only the exchange counts: hosts read the directory again.
     ReportProgress(100);
     return S_OK;
   });

@@ -13,7 +13,7 @@ class CVelmarProtocol : public CAbstractProtocol, public VelmarCommands::CReadFi
  public:
   explicit CVelmarProtocol(std::unique_ptr<CIConnection> connection);
 
-  // Whether a Velmar receiver answers on the connection. The abort event (may be null) is looked at
+  // Whether a Velmar receiver answers on the connection. The abort event (may be null) is tested
   // between the steps and ends the wait for an answer, as Cancel does.
   static bool Probe(CIConnection* connection, HANDLE abort_event);
 
@@ -26,7 +26,7 @@ class CVelmarProtocol : public CAbstractProtocol, public VelmarCommands::CReadFi
   HRESULT DCSetRcvParity(BYTE parity) override;
   HRESULT DCSetRcvStopbits(BYTE stop_bits) override;
 
-  // Runs one command as the current one.
+  // Executes one command as the current one.
   virtual HRESULT ExecuteCommand(VelmarCommands::CVelmarCommand& command);
 
   // The context is the FileDownload that is running.
@@ -35,31 +35,31 @@ class CVelmarProtocol : public CAbstractProtocol, public VelmarCommands::CReadFi
  private:
   bool IsAnswering(HANDLE abort_event) override;
 
-  // Runs a command whose line goes out whatever comes: an abort ends only the wait for its answer.
+  // Executes a command whose line is sent whatever comes: an abort ends only the wait for the
+  // answer.
   HRESULT ExecuteForCertain(VelmarCommands::CVelmarCommand& command);
 
-  // Notes whether the command was cut off, and writes a failure to the report.
+  // What follows each command: notes when an abort ended it, and writes a failure to the report.
   HRESULT Conclude(HRESULT result, const VelmarCommands::CVelmarCommand& command);
 
-  // Lets the answer come of a command that was cut off: answers do not tell to which command they
-  // belong, and the next command would take it for its own.
+  // Waits for the answer to a command whose wait an abort ended: answers do not say to which
+  // command they belong, so the next command would take it for its own.
   void AwaitLateAnswer();
   void NoteCutOff();
 
   void ReadIdentity(HANDLE abort_event, CReceiverInfo* info);
-  // The pattern of deleting and renaming: one command under the lock, whose answer is not looked
-  // at.
+  // Deletes or renames: executes one command under the lock, and does not evaluate its answer.
   template <typename MakeCommand>
   HRESULT ChangeFile(MakeCommand make_command);
 
-  // Reads the port's settings and sends them back with one of them changed. S_OK also when the
-  // receiver did not say on which port it is.
+  // Reads the port's settings and sends them back with one of them changed: the command sets all of
+  // them at once. S_OK also when the receiver did not name its port; nothing is sent then.
   template <typename Change>
   HRESULT ChangePort(Change change);
 
   // A download and its parts.
   HRESULT DownloadLocked(const wchar_t* name, IStream* stream);
-  // `*is_sending` tells whether the receiver may still be sending the file.
+  // Sets `*is_sending` when the receiver may still be sending the file.
   HRESULT Transfer(const wchar_t* name, IStream* stream, bool* is_sending);
   HRESULT RaiseReceiver(DWORD speed) override;
   void SetReceiverBack(DWORD speed) override;
