@@ -21,11 +21,12 @@ void TraceModule(HMODULE module) {
   DWORD ignored = 0;
   const DWORD size = GetFileVersionInfoSizeW(path.data(), &ignored);
   if (size == 0) return;
-  std::vector<std::byte> block(size);
-  if (!GetFileVersionInfoW(path.data(), 0, size, block.data())) return;
+  std::vector<std::byte> version_data(size);
+  if (!GetFileVersionInfoW(path.data(), 0, size, version_data.data())) return;
   VS_FIXEDFILEINFO* version = nullptr;
   UINT version_size = 0;
-  if (!VerQueryValueW(block.data(), L"\\", reinterpret_cast<void**>(&version), &version_size)) {
+  if (!VerQueryValueW(
+          version_data.data(), L"\\", reinterpret_cast<void**>(&version), &version_size)) {
     return;
   }
   Trace(L"Module is loaded [%s] [%u.%u.%u.%u]\r\n",

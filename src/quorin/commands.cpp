@@ -8,7 +8,7 @@
 
 #include "platform/hresult.h"
 #include "platform/text.h"
-#include "quorin/file_entry.h"
+#include "quorin/directory_message.h"
 #include "report/report_file.h"
 
 namespace QuorinCommands {
@@ -109,13 +109,13 @@ HRESULT CGetFileListCmd::ParseReply(const char* body, uint32_t length, ReplyKind
   const HRESULT result = CQuorinCommand::ParseReply(body, length, kind, done);
   if (kind != ReplyKind::kReply || FAILED(result)) return result;
 
-  ListMessage message = ParseListMessage(text);
+  DirectoryMessage message = ParseDirectoryMessage(text);
   switch (message.kind) {
-    case ListMessage::Kind::kNothing:
+    case DirectoryMessage::Kind::kNothing:
       return S_FALSE;
-    case ListMessage::Kind::kEnd:
+    case DirectoryMessage::Kind::kEnd:
       return S_OK;
-    case ListMessage::Kind::kEntry:
+    case DirectoryMessage::Kind::kEntry:
       break;
   }
   if (!Append(std::move(message.entry))) return E_OUTOFMEMORY;

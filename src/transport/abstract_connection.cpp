@@ -39,20 +39,20 @@ HRESULT CAbstractConnection::Read(void* buffer, DWORD size, DWORD* bytes_read, D
   if (!ResetEvent(read_event_.get())) return HResultFromError(GetLastError());
 
   const HANDLE handle = GetReadHandle();
-  OVERLAPPED block{};
-  block.hEvent = read_event_.get();
-  if (calls_.ReadFile(handle, buffer, size, bytes_read, &block)) return S_OK;
+  OVERLAPPED overlapped{};
+  overlapped.hEvent = read_event_.get();
+  if (calls_.ReadFile(handle, buffer, size, bytes_read, &overlapped)) return S_OK;
   if (const DWORD error = GetLastError(); error != ERROR_IO_PENDING) {
     Trace(L"CAbstractConnection::Read - read failed [%u] [%s]\r\n", error, name_.get());
     return HResultFromError(error);
   }
 
-  const HRESULT result = WaitForTransfer(handle, block, timeout_ms, wait_rule_.watched);
+  const HRESULT result = WaitForTransfer(handle, overlapped, timeout_ms, wait_rule_.watched);
   if (result == kTimedOut) {
     Trace(L"CAbstractConnection::Read - wait timeout [%s]\r\n", name_.get());
   }
   if (result != S_OK) return result;
-  if (!calls_.GetOverlappedResult(handle, &block, bytes_read, FALSE)) {
+  if (!calls_.GetOverlappedResult(handle, &overlapped, bytes_read, FALSE)) {
     const DWORD error = GetLastError();
     Trace(L"CAbstractConnection::Read - GetOverlappedResult is failed [%u] [%s]\r\n",
           error,
@@ -67,10 +67,10 @@ HRESULT CAbstractConnection::Write(const void* buffer, DWORD size, DWORD timeout
   if (!ResetEvent(write_event_.get())) return HResultFromError(GetLastError());
 
   const HANDLE handle = GetWriteHandle();
-  OVERLAPPED block{};
-  block.hEvent = write_event_.get();
+  OVERLAPPED overlapped{};
+  overlapped.hEvent = write_event_.get();
   DWORD written = 0;
-  if (calls_.WriteFile(handle, buffer, size, &written, &block)) return S_OK;
+  if (calls_.WriteFile(handle, buffer, size, &written, &overlapped)) return S_OK;
   if (const DWORD error = GetLastError(); error != ERROR_IO_PENDING) {
     Trace(L"CAbstractConnection::Write - write failed [%u] [%s]\r\n", error, name_.get());
     return HResultFromError(error);
@@ -79,17 +79,17 @@ HRESULT CAbstractConnection::Write(const void* buffer, DWORD size, DWORD timeout
   if (timeout_ms != 0) {
     // No watched event ends a write: the receiver would take half a line as the beginning of the
     // next command.
-    const HRESULT result = WaitForTransfer(handle, block, timeout_ms, nullptr);
+    const HRESULT result = WaitForTransfer(handle, overlapped, timeout_ms, nullptr);
     if (result == kTimedOut) {
       Trace(L"CAbstractConnection::Write - wait timeout [0x%08X] [%s]\r\n", result, name_.get());
     }
     if (result != S_OK) return result;
   }
-  if (!calls_.GetOverlappedResult(handle, &block, &written, FALSE)) {
+  if (!calls_.GetOverlappedResult(handle, &overlapped, &written, FALSE)) {
     const DWORD error = GetLastError();
     // A write that was not waited for may still be running. It is ended here, since the caller
     // frees the buffer next.
-    if (error == ERROR_IO_INCOMPLETE) CancelTransfer(handle, block);
+    if (error == ERROR_IO_INCOMPLETE) CancelTransfer(handle, overlapped);
     Trace(L"CAbstractConnection::Write - GetOverlappedResult is failed [%u] [%s]\r\n",
           error,
           name_.get());
@@ -99,7 +99,7 @@ HRESULT CAbstractConnection::Write(const void* buffer, DWORD size, DWORD timeout
 }
 
 HRESULT CAbstractConnection::WaitForTransfer(HANDLE handle,
-                                             OVERLAPPED& block,
+                                             OVERLAPPED& overlapped,
                                              DWORD timeout_ms,
                                              HANDLE watched) {
   // What ends the wait early comes first: Windows reports the first signalled handle, and an abort
@@ -108,7 +108,7 @@ HRESULT CAbstractConnection::WaitForTransfer(HANDLE handle,
   DWORD done = 0;
   if (!wait_rule_.shielded) events[done++] = GetAbortEvent();
   if (watched) events[done++] = watched;
-  events[done] = block.hEvent;
+  events[done] = overlapped.hEvent;
   const DWORD ended = calls_.WaitForMultipleObjects(done + 1, events.data(), timeout_ms);
   if (ended == WAIT_OBJECT_0 + done) return S_OK;
 
@@ -118,16 +118,16 @@ HRESULT CAbstractConnection::WaitForTransfer(HANDLE handle,
   } else if (ended > WAIT_OBJECT_0 + done) {
     result = HResultFromError(GetLastError());
   }
-  CancelTransfer(handle, block);
+  CancelTransfer(handle, overlapped);
   return result;
 }
 
-void CAbstractConnection::CancelTransfer(HANDLE handle, OVERLAPPED& block) {
+void CAbstractConnection::CancelTransfer(HANDLE handle, OVERLAPPED& overlapped) {
   calls_.CancelIo(handle);
-  // Waits until the transfer has ended: before, the device may still write to the block and to the
+  // Waits until the transfer has ended: before, the device may still write to the record and to the
   // buffer.
   DWORD bytes = 0;
-  calls_.GetOverlappedResult(handle, &block, &bytes, TRUE);
+  calls_.GetOverlappedResult(handle, &overlapped, &bytes, TRUE);
 }
 
 HRESULT CAbstractConnection::Flush() { return S_FALSE; }

@@ -46,10 +46,10 @@ class CAbstractConnection : public CIConnection {
 
  private:
   // Waits for a pending transfer; `watched` (may be null) ends the wait as well. Whatever ends the
-  // wait, the transfer has ended when this returns, so that its block and its buffer may be freed.
+  // wait, the transfer has ended when this returns, so that its record and its buffer may be freed.
   // S_OK only when the transfer's own event ended the wait.
-  HRESULT WaitForTransfer(HANDLE handle, OVERLAPPED& block, DWORD timeout_ms, HANDLE watched);
-  void CancelTransfer(HANDLE handle, OVERLAPPED& block);
+  HRESULT WaitForTransfer(HANDLE handle, OVERLAPPED& overlapped, DWORD timeout_ms, HANDLE watched);
+  void CancelTransfer(HANDLE handle, OVERLAPPED& overlapped);
 
   KernelHandle write_event_;      // auto-reset
   KernelHandle read_event_;       // manual-reset; Read resets it before each transfer

@@ -16,17 +16,20 @@ HANDLE DeviceCalls::CreateFile(const wchar_t* path, DWORD access, DWORD share, D
 }
 
 BOOL DeviceCalls::ReadFile(
-    HANDLE device, void* buffer, DWORD size, DWORD* read, OVERLAPPED* block) {
-  return ::ReadFile(device, buffer, size, read, block);
+    HANDLE device, void* buffer, DWORD size, DWORD* read, OVERLAPPED* overlapped) {
+  return ::ReadFile(device, buffer, size, read, overlapped);
 }
 
 BOOL DeviceCalls::WriteFile(
-    HANDLE device, const void* buffer, DWORD size, DWORD* written, OVERLAPPED* block) {
-  return ::WriteFile(device, buffer, size, written, block);
+    HANDLE device, const void* buffer, DWORD size, DWORD* written, OVERLAPPED* overlapped) {
+  return ::WriteFile(device, buffer, size, written, overlapped);
 }
 
-BOOL DeviceCalls::GetOverlappedResult(HANDLE device, OVERLAPPED* block, DWORD* bytes, BOOL wait) {
-  return ::GetOverlappedResult(device, block, bytes, wait);
+BOOL DeviceCalls::GetOverlappedResult(HANDLE device,
+                                      OVERLAPPED* overlapped,
+                                      DWORD* bytes,
+                                      BOOL wait) {
+  return ::GetOverlappedResult(device, overlapped, bytes, wait);
 }
 
 BOOL DeviceCalls::CancelIo(HANDLE device) { return ::CancelIo(device); }
@@ -41,15 +44,15 @@ BOOL DeviceCalls::DeviceIoControl(HANDLE device,
   const KernelHandle done(CreateEventW(nullptr, TRUE, FALSE, nullptr));
   if (!done) return FALSE;
   // Devices are opened for overlapped transfers, so Windows wants a block for every request.
-  OVERLAPPED block{};
-  block.hEvent = done.get();
+  OVERLAPPED overlapped{};
+  overlapped.hEvent = done.get();
   void* const in = const_cast<void*>(input);  // it is only read, but Win32's parameter is not const
-  if (::DeviceIoControl(device, code, in, input_size, output, output_size, returned, &block)) {
+  if (::DeviceIoControl(device, code, in, input_size, output, output_size, returned, &overlapped)) {
     return TRUE;
   }
   if (GetLastError() != ERROR_IO_PENDING) return FALSE;
   // Closing `done` does not change the last error.
-  return ::GetOverlappedResult(device, &block, returned, TRUE);
+  return ::GetOverlappedResult(device, &overlapped, returned, TRUE);
 }
 
 DWORD DeviceCalls::WaitForMultipleObjects(DWORD count, const HANDLE* handles, DWORD timeout_ms) {
@@ -62,9 +65,13 @@ BOOL DeviceCalls::SetupComm(HANDLE device, DWORD input_queue, DWORD output_queue
   return ::SetupComm(device, input_queue, output_queue);
 }
 
-BOOL DeviceCalls::GetCommState(HANDLE device, DCB* block) { return ::GetCommState(device, block); }
+BOOL DeviceCalls::GetCommState(HANDLE device, DCB* settings) {
+  return ::GetCommState(device, settings);
+}
 
-BOOL DeviceCalls::SetCommState(HANDLE device, DCB* block) { return ::SetCommState(device, block); }
+BOOL DeviceCalls::SetCommState(HANDLE device, DCB* settings) {
+  return ::SetCommState(device, settings);
+}
 
 BOOL DeviceCalls::SetCommTimeouts(HANDLE device, COMMTIMEOUTS* timeouts) {
   return ::SetCommTimeouts(device, timeouts);

@@ -12,10 +12,11 @@ class DeviceCalls {
   virtual ~DeviceCalls() = default;
 
   virtual HANDLE CreateFile(const wchar_t* path, DWORD access, DWORD share, DWORD flags);
-  virtual BOOL ReadFile(HANDLE device, void* buffer, DWORD size, DWORD* read, OVERLAPPED* block);
+  virtual BOOL ReadFile(
+      HANDLE device, void* buffer, DWORD size, DWORD* read, OVERLAPPED* overlapped);
   virtual BOOL WriteFile(
-      HANDLE device, const void* buffer, DWORD size, DWORD* written, OVERLAPPED* block);
-  virtual BOOL GetOverlappedResult(HANDLE device, OVERLAPPED* block, DWORD* bytes, BOOL wait);
+      HANDLE device, const void* buffer, DWORD size, DWORD* written, OVERLAPPED* overlapped);
+  virtual BOOL GetOverlappedResult(HANDLE device, OVERLAPPED* overlapped, DWORD* bytes, BOOL wait);
   virtual BOOL CancelIo(HANDLE device);
   // Waits until the device has answered. `*returned` is the number of bytes that it wrote to
   // `output`.
@@ -31,8 +32,8 @@ class DeviceCalls {
 
   virtual BOOL SetCommMask(HANDLE device, DWORD mask);
   virtual BOOL SetupComm(HANDLE device, DWORD input_queue, DWORD output_queue);
-  virtual BOOL GetCommState(HANDLE device, DCB* block);
-  virtual BOOL SetCommState(HANDLE device, DCB* block);
+  virtual BOOL GetCommState(HANDLE device, DCB* settings);
+  virtual BOOL SetCommState(HANDLE device, DCB* settings);
   virtual BOOL SetCommTimeouts(HANDLE device, COMMTIMEOUTS* timeouts);
   virtual BOOL ClearCommError(HANDLE device, DWORD* errors, COMSTAT* status);
   virtual BOOL PurgeComm(HANDLE device, DWORD flags);

@@ -6,7 +6,7 @@
 #include <vector>
 
 #include "platform/hresult.h"
-#include "quorin/file_entry.h"
+#include "quorin/directory_message.h"
 #include "tests/quorin/quorin_driver.h"
 #include "tests/support/report_capture.h"
 

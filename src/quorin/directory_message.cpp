@@ -1,4 +1,4 @@
-#include "quorin/file_entry.h"
+#include "quorin/directory_message.h"
 
 #include <algorithm>
 #include <cstdlib>
@@ -46,18 +46,18 @@ std::optional<SYSTEMTIME> TimeFromReceiver(int64_t seconds) {
                     .wMilliseconds = 0};
 }
 
-ListMessage ParseListMessage(std::string_view text) {
-  ListMessage message;
+DirectoryMessage ParseDirectoryMessage(std::string_view text) {
+  DirectoryMessage message;
   text = text.substr(0, text.find('\0'));
   const size_t start = text.find_first_not_of("{ ");
   if (start == std::string_view::npos) return message;
   text.remove_prefix(start);
   if (text.front() == '}') {
-    message.kind = ListMessage::Kind::kEnd;
+    message.kind = DirectoryMessage::Kind::kEnd;
     return message;
   }
 
-  message.kind = ListMessage::Kind::kEntry;
+  message.kind = DirectoryMessage::Kind::kEntry;
   const std::string_view name = text.substr(0, text.find(','));
   message.entry.name = ToWide(name.substr(0, kMaxNameBytes));
   text.remove_prefix(std::min(name.size() + 1, text.size()));

@@ -1,4 +1,4 @@
-#include "quorin/file_entry.h"
+#include "quorin/directory_message.h"
 
 #include <gtest/gtest.h>
 
@@ -11,7 +11,7 @@
 #include "tests/support/guarded_bytes.h"
 
 using namespace QuorinCommands;
-using Kind = QuorinCommands::ListMessage::Kind;
+using Kind = QuorinCommands::DirectoryMessage::Kind;
 
 namespace {
 
@@ -19,9 +19,9 @@ constexpr int64_t kMinute = 60;
 constexpr int64_t kHour = 60 * kMinute;
 constexpr int64_t kDay = 24 * kHour;
 
-ListMessage Parse(std::string_view text) {
+DirectoryMessage Parse(std::string_view text) {
   const GuardedBytes guarded(text);
-  return ParseListMessage(guarded.View());
+  return ParseDirectoryMessage(guarded.View());
 }
 
 // Year, month, day, weekday, hour, minute, second, milliseconds.
@@ -43,20 +43,20 @@ std::string Text(const SYSTEMTIME& time) {
 constexpr char kNoTime[] = "0 0 0 0 0 0 0 0 ";
 constexpr char kZeroTime[] = "1988 1 1 5 0 0 0 0 ";
 
-TEST(QuorinListMessage, IsNothingWhenItEndsAmongBracesAndBlanks) {
+TEST(QuorinDirectoryMessage, IsNothingWhenItEndsAmongBracesAndBlanks) {
   for (const std::string_view text : {"", " ", "{", "{{", "{ { "}) {
     EXPECT_EQ(Parse(text).kind, Kind::kNothing) << text;
   }
 }
 
-TEST(QuorinListMessage, IsTheEndWhenABraceCloses) {
+TEST(QuorinDirectoryMessage, IsTheEndWhenABraceCloses) {
   for (const std::string_view text : {"}", "{}", "{{}}", " { }", "}name,1,2}", "{}}name,1,2"}) {
     EXPECT_EQ(Parse(text).kind, Kind::kEnd) << text;
   }
 }
 
-TEST(QuorinListMessage, HoldsAnEntry) {
-  const ListMessage message = Parse("{A0101.log,1234,86400}");
+TEST(QuorinDirectoryMessage, HoldsAnEntry) {
+  const DirectoryMessage message = Parse("{A0101.log,1234,86400}");
   EXPECT_EQ(message.kind, Kind::kEntry);
   EXPECT_EQ(message.entry.name, L"A0101.log");
   EXPECT_EQ(message.entry.size, 1234U);
@@ -64,14 +64,14 @@ TEST(QuorinListMessage, HoldsAnEntry) {
   EXPECT_FALSE(message.last);
 }
 
-TEST(QuorinListMessage, OpensWithAnyRunOfBracesAndBlanks) {
+TEST(QuorinDirectoryMessage, OpensWithAnyRunOfBracesAndBlanks) {
   for (const std::string_view text : {"n,1,2}", "{n,1,2}", "{{n,1,2}", " { {  n,1,2}"}) {
     EXPECT_EQ(Parse(text).entry.name, L"n") << text;
     EXPECT_EQ(Parse(text).entry.size, 1U) << text;
   }
 }
 
-TEST(QuorinListMessage, IsTheLastWithTwoClosingBraces) {
+TEST(QuorinDirectoryMessage, IsTheLastWithTwoClosingBraces) {
   EXPECT_TRUE(Parse("{{n,1,2}}").last);
   EXPECT_TRUE(Parse("{n,1,2 }}\r\n").last);
   EXPECT_TRUE(Parse("{n,}}").last);
@@ -80,37 +80,37 @@ TEST(QuorinListMessage, IsTheLastWithTwoClosingBraces) {
   EXPECT_FALSE(Parse("{{n,1,2").last);
 }
 
-TEST(QuorinListMessage, IsNotTheLastForBracesInTheName) {
-  const ListMessage message = Parse("{a}}b,1,2}");
+TEST(QuorinDirectoryMessage, IsNotTheLastForBracesInTheName) {
+  const DirectoryMessage message = Parse("{a}}b,1,2}");
   EXPECT_EQ(message.entry.name, L"a}}b");
   EXPECT_FALSE(message.last);
 }
 
-TEST(QuorinListMessage, KeepsANameAsItIs) {
+TEST(QuorinDirectoryMessage, KeepsANameAsItIs) {
   EXPECT_EQ(Parse("{ a b {c} ,1,2}").entry.name, L"a b {c} ");
   EXPECT_EQ(Parse("{,1,2}").entry.name, L"");
   EXPECT_EQ(Parse("{,1,2}").entry.size, 1U);
 }
 
-TEST(QuorinListMessage, KeepsThirtyTwoBytesOfTheName) {
+TEST(QuorinDirectoryMessage, KeepsThirtyTwoBytesOfTheName) {
   const std::string exact(32, 'n');
   EXPECT_EQ(Parse("{" + exact + ",7,0}").entry.name, std::wstring(32, L'n'));
-  const ListMessage cut = Parse("{" + exact + "x,7,86400}}");
+  const DirectoryMessage cut = Parse("{" + exact + "x,7,86400}}");
   EXPECT_EQ(cut.entry.name, std::wstring(32, L'n'));
   EXPECT_EQ(cut.entry.size, 7U);
   EXPECT_EQ(Text(cut.entry.time), "1988 1 2 6 0 0 0 0 ");
   EXPECT_TRUE(cut.last);
 }
 
-TEST(QuorinListMessage, ReadsTheNameInTheCodePageOfTheThread) {
+TEST(QuorinDirectoryMessage, ReadsTheNameInTheCodePageOfTheThread) {
   const std::string name = "\xC4\xE9.log";
   wchar_t expected[16] = {};
   MultiByteToWideChar(CP_THREAD_ACP, 0, name.c_str(), -1, expected, 16);
   EXPECT_EQ(Parse(name + ",1,2}").entry.name, expected);
 }
 
-TEST(QuorinListMessage, WithoutACommaIsANameAlone) {
-  const ListMessage message = Parse("{name}");
+TEST(QuorinDirectoryMessage, WithoutACommaIsANameAlone) {
+  const DirectoryMessage message = Parse("{name}");
   EXPECT_EQ(message.kind, Kind::kEntry);
   EXPECT_EQ(message.entry.name, L"name}");
   EXPECT_EQ(message.entry.size, 0U);
@@ -118,53 +118,53 @@ TEST(QuorinListMessage, WithoutACommaIsANameAlone) {
   EXPECT_FALSE(Parse("{name}}").last);
 }
 
-TEST(QuorinListMessage, WithoutASizeHasNone) {
+TEST(QuorinDirectoryMessage, WithoutASizeHasNone) {
   EXPECT_EQ(Parse("{n,").entry.size, 0U);
   EXPECT_EQ(Parse("{n,,86400}").entry.size, 0U);
   EXPECT_EQ(Text(Parse("{n,,86400}").entry.time), "1988 1 2 6 0 0 0 0 ");
 }
 
-TEST(QuorinListMessage, WithoutATimeIsOfTheReceiversZero) {
+TEST(QuorinDirectoryMessage, WithoutATimeIsOfTheReceiversZero) {
   for (const std::string_view text : {"{n", "{n,", "{n,12", "{n,12,", "{n,12}", "{n,12,}}"}) {
     EXPECT_EQ(Text(Parse(text).entry.time), kZeroTime) << text;
   }
 }
 
-TEST(QuorinListMessage, HasItsTimeOneCharacterBehindTheSize) {
+TEST(QuorinDirectoryMessage, HasItsTimeOneCharacterBehindTheSize) {
   EXPECT_EQ(Text(Parse("{n,12;86400}").entry.time), "1988 1 2 6 0 0 0 0 ");
   EXPECT_EQ(Text(Parse("{n,12, 86400}").entry.time), "1988 1 2 6 0 0 0 0 ");
   EXPECT_EQ(Text(Parse("{n,12;;86400}").entry.time), kZeroTime);
 }
 
-TEST(QuorinListMessage, HoldsSizesUpToFourGigabytes) {
+TEST(QuorinDirectoryMessage, HoldsSizesUpToFourGigabytes) {
   EXPECT_EQ(Parse("{n,4294967295,0}").entry.size, 4294967295U);
   EXPECT_EQ(Parse("{n,2147483648,0}").entry.size, 2147483648U);
 }
 
-TEST(QuorinListMessage, WithTooLargeASizeKeepsNameAndTime) {
-  const ListMessage message = Parse("{n,99999999999999999999999,86400}}");
+TEST(QuorinDirectoryMessage, WithTooLargeASizeKeepsNameAndTime) {
+  const DirectoryMessage message = Parse("{n,99999999999999999999999,86400}}");
   EXPECT_EQ(message.entry.name, L"n");
   EXPECT_EQ(message.entry.size, 4294967295U);
   EXPECT_EQ(Text(message.entry.time), "1988 1 2 6 0 0 0 0 ");
   EXPECT_TRUE(message.last);
 }
 
-TEST(QuorinListMessage, EndsAtAZeroByte) {
-  const ListMessage message = Parse(std::string_view("{n,1,2\0}}", 9));
+TEST(QuorinDirectoryMessage, EndsAtAZeroByte) {
+  const DirectoryMessage message = Parse(std::string_view("{n,1,2\0}}", 9));
   EXPECT_EQ(message.entry.size, 1U);
   EXPECT_FALSE(message.last);
 }
 
-TEST(QuorinListMessage, WithATimeThatCannotBeSaidHasNone) {
+TEST(QuorinDirectoryMessage, WithATimeThatCannotBeSaidHasNone) {
   for (const char* const time : {"-9000000000", "99999999999999", "9223372036854775807"}) {
-    const ListMessage message = Parse("{n,5," + std::string(time) + "}");
+    const DirectoryMessage message = Parse("{n,5," + std::string(time) + "}");
     EXPECT_EQ(message.kind, Kind::kEntry) << time;
     EXPECT_EQ(message.entry.size, 5U) << time;
     EXPECT_EQ(Text(message.entry.time), kNoTime) << time;
   }
 }
 
-TEST(QuorinListMessage, IsNeverReadBeyondItsEnd) {
+TEST(QuorinDirectoryMessage, IsNeverReadBeyondItsEnd) {
   const std::string text = "{ {name,123,456}}";
   for (size_t length = 0; length <= text.size(); ++length) {
     EXPECT_NO_THROW(Parse(std::string_view(text).substr(0, length)));

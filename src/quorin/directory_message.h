@@ -1,7 +1,7 @@
 // One message of a Quorin directory listing: "{{name,size,time}", "{name,size,time}", ...,
 // "{name,size,time}}", or "{}" for an empty directory.
-#ifndef RCVLINK_QUORIN_FILE_ENTRY_H_
-#define RCVLINK_QUORIN_FILE_ENTRY_H_
+#ifndef RCVLINK_QUORIN_DIRECTORY_MESSAGE_H_
+#define RCVLINK_QUORIN_DIRECTORY_MESSAGE_H_
 
 #include <optional>
 #include <string_view>
@@ -10,7 +10,7 @@
 
 namespace QuorinCommands {
 
-struct ListMessage {
+struct DirectoryMessage {
   enum class Kind {
     kNothing,  // only opening braces and blanks
     kEnd,      // a closing brace and no entry: the list is empty
@@ -22,7 +22,7 @@ struct ListMessage {
 };
 
 // Reads one message. Raises E_INVALIDARG when the runtime library cannot compute the year 1988.
-ListMessage ParseListMessage(std::string_view text);
+DirectoryMessage ParseDirectoryMessage(std::string_view text);
 
 // The local time at `seconds` after 1988-01-01 00:00:00 local time, from which receivers count.
 // None when it is out of the runtime library's range.
@@ -30,4 +30,4 @@ std::optional<SYSTEMTIME> TimeFromReceiver(int64_t seconds);
 
 }  // namespace QuorinCommands
 
-#endif  // RCVLINK_QUORIN_FILE_ENTRY_H_
+#endif  // RCVLINK_QUORIN_DIRECTORY_MESSAGE_H_
