@@ -161,7 +161,7 @@ class Reader {
     const ExchangeEnd end = EndBy(next, read);
     const std::uint64_t begin_ms = At(read).elapsed_ms;
     if (next.kind == TraceKind::kRead) {
-      PushEnd(end, next, begin_ms, "a part of a reply, or somebody else's,");
+      PushEnd(end, next, begin_ms, "part of a reply, or a reply to another command,");
       return;
     }
     PushEnd(end, next, begin_ms, "a reply");
@@ -189,7 +189,7 @@ class Reader {
         thread.family == TraceFamily::kVelmar && next.elapsed_ms - sent_ms >= kRestMs;
     ExchangeEnd end = EndBy(next, *thread.command);
     if (end == ExchangeEnd::kReply && !is_answered) end = ExchangeEnd::kUntold;
-    PushEnd(end, next, sent_ms, "a reply, and a rest of 500 ms,");
+    PushEnd(end, next, sent_ms, "a reply, and a pause of 500 ms,");
     FinishCommand(thread, next, end);
   }
 
@@ -214,16 +214,16 @@ class Reader {
   void TakeSend(ThreadState& thread, ExchangeEntry& entry) {
     if (thread.blocks) {
       entry.kind = TraceKind::kRetry;
-      entry.meaning = "the block is asked for again";
+      entry.meaning = "the block is requested again";
     } else if (thread.blocks_follow) {
       entry.kind = TraceKind::kBlocks;
-      entry.meaning = "the first block is asked for";
+      entry.meaning = "the first block is requested";
       thread.blocks = exchange_.entries.size();
     } else if (thread.opening) {
       entry.kind = TraceKind::kLink;
     } else if (!thread.command && thread.last_class == "CSetPortParamsCmd") {
       entry.kind = TraceKind::kLink;
-      entry.meaning = "waits until the command has left";
+      entry.meaning = "waits until the command is sent";
     } else if (!thread.command) {
       entry.kind = TraceKind::kCommand;
       entry.meaning = UnnamedCommand(thread) + " (not named)";
@@ -237,12 +237,12 @@ class Reader {
   /// Which command it is that has no line of its own, by the one before it.
   static std::string UnnamedCommand(ThreadState& thread) {
     const std::string before = std::exchange(thread.last_class, "");
-    if (before == "CEchoOffCmd") return "stop your output: dm";
+    if (before == "CEchoOffCmd") return "stop all output: dm";
     if (before == "CGetPortCmd") return "set the port: set,/par/dev/...";
     if (before == "CSetInterfacemodeCommand" || before == "CReadFileCmd") {
-      return "stop your logs: unlogall thisport";
+      return "stop all logs: unlogall thisport";
     }
-    if (thread.family == TraceFamily::kQuorin) return "the end of half a line";
+    if (thread.family == TraceFamily::kQuorin) return "end an unfinished line";
     if (thread.family == TraceFamily::kVelmar) return "choose the file: currentfile NAME all";
     return "a command";
   }
@@ -273,19 +273,19 @@ class Reader {
     }
     if (trace.bytes_before != 0) {
       remarks.push_back("The first " + std::to_string(trace.bytes_before) +
-                        " bytes are no line of a report.");
+                        " bytes are not part of a report.");
     }
     if (trace.lines.empty()) return;
     // Reports lose line ends behind such characters, which is no sign of a cut.
     const TraceLine& last = trace.lines.back();
     if (!last.has_end && !IsBeyondAscii(last.bytes)) {
-      remarks.push_back("The report breaks off in its last line.");
+      remarks.push_back("The report ends in the middle of its last line.");
     }
     if (!decoder_.all_utf8()) {
       remarks.push_back(
-          "Text that is not UTF-8 is shown as this computer's code page has it, and may be wrong.");
+          "Text that is not UTF-8 is shown in this computer's code page and may be wrong.");
     }
-    if (clock_was_set_) remarks.push_back("The clock was set back meanwhile.");
+    if (clock_was_set_) remarks.push_back("The clock was set back during the report.");
   }
 
   Decoder decoder_;

@@ -19,7 +19,7 @@ bool IsTrouble(TraceKind kind);
 /// "+15 ms", "+2.5 s"; empty for no time.
 std::string Gap(std::uint64_t ms);
 
-/// "5 s, 14 commands, 2 retries, 1 silence, no failures"
+/// "5.0 s, 14 commands, 2 retries, 1 time-out, no failures"
 std::string Summary(const Exchange& exchange);
 
 /// Every entry, the summary, and the result codes with their meaning.

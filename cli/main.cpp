@@ -85,7 +85,8 @@ ExitCode Run(Output& out, Output& err) {
   } catch (const Failure& failure) {
     return Tell(failure, json, L"", out, err);
   } catch (const std::exception& error) {
-    return Tell({.tried = "go on", .code = E_FAIL, .meaning = error.what()}, json, L"", out, err);
+    return Tell(
+        {.tried = "continue", .code = E_FAIL, .meaning = error.what()}, json, L"", out, err);
   }
 }
 

@@ -35,7 +35,7 @@ struct MirrorState {
   std::uint64_t elapsed_ms = 0;
 };
 
-/// "File 3 of 300: A.JPS, 1.2 MB, 5 min 10 s left over all"
+/// "File 3 of 300: A.JPS, 1.2 MB, 5 min 10 s left in total"
 std::string InWords(const MirrorState& state, const std::wstring& name, std::uint64_t size);
 
 }  // namespace cli

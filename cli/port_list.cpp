@@ -93,7 +93,7 @@ std::string PortsInWords(const std::vector<Port>& ports, EInstanceType link) {
     words.push_back(friendly_name.empty() ? name : name + " (" + friendly_name + ")");
   }
   if (words.empty()) {
-    return link == eInstanceUSB ? "No device of the USBIO driver is plugged into this computer."
+    return link == eInstanceUSB ? "This computer has no USB device with the USBIO driver."
                                 : "This computer has no COM ports.";
   }
   std::string text = "This computer has ";

@@ -8,7 +8,7 @@ Progress::Progress(Context& context, const TransferState& start)
     : context_(context), mode_(ProgressModeOf(context)) {
   // Until the first byte arrives the two sides agree on the speed of the line.
   const std::string line = "Downloading " + Printable(start.name) + ", " + FormatBytes(start.total);
-  if (mode_ == ProgressMode::kBar) Draw(line + ": getting ready ...");
+  if (mode_ == ProgressMode::kBar) Draw(line + ": preparing ...");
   if (mode_ == ProgressMode::kLines) context_.err.Write(line + "\n");
   if (mode_ == ProgressMode::kJson) context_.err.Write(ProgressJson(start) + "\n");
 }

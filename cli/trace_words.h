@@ -20,7 +20,7 @@ enum class TraceKind {
   kReply,    ///< it came
   kBlocks,   ///< the blocks of a file
   kRetry,    ///< a block is asked for again
-  kTimeout,  ///< silence
+  kTimeout,  ///< no data came in time
   kFailure,
   kCancel,
   kDone,

@@ -75,8 +75,8 @@ class Completion : public Command {
 std::unique_ptr<Command> MakeCompletion() {
   return std::make_unique<Completion>(
       Command::Text{"completion",
-                    "Print the script that completes commands in PowerShell",
-                    "Example, for the file that $PROFILE names:\n"
+                    "Print a script that completes commands in PowerShell",
+                    "Example, a line for the file named by $PROFILE:\n"
                     "  rcvlink-cli completion | Out-String | Invoke-Expression"});
 }
 

@@ -230,7 +230,7 @@ TEST(CommandLineTest, TheHelpOfACommandHasTheOptionsOfAll) {
 TEST(CommandLineTest, AMistypedCommandGetsASuggestion) {
   EXPECT_NE(Refusal({"fnid", "COM7"}).meaning.find("did you mean find?"), std::string::npos);
   EXPECT_NE(Refusal({"PORTS"}).meaning.find("did you mean ports?"), std::string::npos);
-  EXPECT_NE(Refusal({"dance", "COM7"}).meaning.find("there is ports, "), std::string::npos);
+  EXPECT_NE(Refusal({"dance", "COM7"}).meaning.find("the commands are ports, "), std::string::npos);
   EXPECT_EQ(Refusal({"info", "COM7", "fnid"}).meaning.find("did you mean"), std::string::npos);
 }
 
@@ -316,7 +316,7 @@ TEST(CommandLineTest, TellsItsWords) {
   const auto get = std::find_if(
       words.begin(), words.end(), [](const auto& entry) { return entry.command.word == "get"; });
   ASSERT_NE(get, words.end());
-  EXPECT_EQ(get->command.description, "Download files, or all of them");
+  EXPECT_EQ(get->command.description, "Download files");
   EXPECT_TRUE(has(*get, "--all"));
   EXPECT_TRUE(has(*get, "-o"));
   EXPECT_FALSE(has(*get, "PORT"));

@@ -44,13 +44,13 @@ TEST(ExchangeTest, ADownloadOfAQuorinReceiverShowsItsRetries) {
   EXPECT_EQ(exchange.DurationMs(), 10'334U);
   EXPECT_EQ(exchange.Codes(), std::vector{ResultOfWin32(ERROR_TIMEOUT)});
 
-  const ExchangeEntry size = Only(exchange, "how large is the file?");
+  const ExchangeEntry size = Only(exchange, "read the file size");
   EXPECT_EQ(size.end, ExchangeEnd::kReply);
   EXPECT_EQ(size.until_ms, size.elapsed_ms + 1003);
   EXPECT_EQ(Only(exchange, "set the port: set,").end, ExchangeEnd::kUntold);
-  EXPECT_EQ(Only(exchange, "stop your output: dm").kind, TraceKind::kCommand);
+  EXPECT_EQ(Only(exchange, "stop all output: dm").kind, TraceKind::kCommand);
 
-  const ExchangeEntry blocks = Only(exchange, "the first block is asked for");
+  const ExchangeEntry blocks = Only(exchange, "the first block is requested");
   EXPECT_EQ(blocks.end, ExchangeEnd::kReply);
   EXPECT_EQ(blocks.until_ms, blocks.elapsed_ms + 2170);
   const ExchangeEntry reply = Only(exchange, "the blocks ended within 2170 ms");
@@ -61,7 +61,7 @@ TEST(ExchangeTest, ADownloadOfAQuorinReceiverShowsItsRetries) {
 
 TEST(ExchangeTest, ARefusalIsAFailureWithItsCodeAndTheReceiversText) {
   const Exchange exchange = Parse(Recorded("quorin-refused.txt"));
-  const ExchangeEntry refusal = Only(exchange, "The receiver said: {refused}");
+  const ExchangeEntry refusal = Only(exchange, "The receiver sent: {refused}");
   EXPECT_EQ(refusal.kind, TraceKind::kFailure);
   EXPECT_EQ(refusal.code, ResultOfWin32(ERROR_DEVICE_NOT_CONNECTED));
   EXPECT_EQ(Only(exchange, "remove,NAME").end, ExchangeEnd::kFailure);
@@ -74,12 +74,12 @@ TEST(ExchangeTest, ARefusalIsAFailureWithItsCodeAndTheReceiversText) {
 TEST(ExchangeTest, ADownloadOfASilentVelmarReceiverIsCancelled) {
   const Exchange exchange = Parse(Recorded("velmar-silent.txt"));
   EXPECT_EQ(exchange.Count(TraceKind::kCommand), 10U);
-  EXPECT_EQ(Only(exchange, "talk this language").end, ExchangeEnd::kUntold);
+  EXPECT_EQ(Only(exchange, "set the language of the port").end, ExchangeEnd::kUntold);
   EXPECT_EQ(Only(exchange, "log filehdra").end, ExchangeEnd::kReply);
   EXPECT_EQ(Only(exchange, "log filetransferb").end, ExchangeEnd::kCancelled);
   EXPECT_EQ(Only(exchange, "currentfile NAME all").end, ExchangeEnd::kReply);
   EXPECT_EQ(Only(exchange, "the wait was cancelled after 24299 ms").thread, 36U);
-  EXPECT_EQ(Only(exchange, "waits until the command has left").kind, TraceKind::kLink);
+  EXPECT_EQ(Only(exchange, "waits until the command is sent").kind, TraceKind::kLink);
   EXPECT_NE(ToText(exchange, false).find("  204    cancel"), std::string::npos);
 }
 
@@ -92,7 +92,7 @@ TEST(ExchangeTest, AReportThatBreaksOffIsReadAsFarAsItGoes) {
   }
   const Exchange cut = Parse(whole.substr(0, whole.size() - 5));
   ASSERT_EQ(cut.remarks.size(), 1U);
-  EXPECT_EQ(cut.remarks[0], "The report breaks off in its last line.");
+  EXPECT_EQ(cut.remarks[0], "The report ends in the middle of its last line.");
 }
 
 TEST(ExchangeTest, WhatStandsInFrontIsRemarkedAndNotLost) {
@@ -100,7 +100,7 @@ TEST(ExchangeTest, WhatStandsInFrontIsRemarkedAndNotLost) {
   ASSERT_EQ(exchange.entries.size(), 1U);
   EXPECT_EQ(exchange.entries[0].meaning, "the library is unloaded");
   ASSERT_EQ(exchange.remarks.size(), 1U);
-  EXPECT_EQ(exchange.remarks[0], "The first 13 bytes are no line of a report.");
+  EXPECT_EQ(exchange.remarks[0], "The first 13 bytes are not part of a report.");
 }
 
 TEST(ExchangeTest, WhatIsNoReportHasNoEntries) {
@@ -122,7 +122,7 @@ TEST(ExchangeTest, AReplyMayHaveLineEndsInIt) {
       "[COM7]\r\n12:00:00.0001     36 Bye!\r\n");
   ASSERT_EQ(exchange.entries.size(), 2U);
   EXPECT_EQ(exchange.entries[0].meaning,
-            "refused, or not complete. The receiver said: \\x0D\\x0A<ERROR:a");
+            "refused or incomplete. The receiver sent: \\x0D\\x0A<ERROR:a");
 }
 
 TEST(ExchangeTest, MidnightPassesAndClocksAreSetBack) {
@@ -133,7 +133,7 @@ TEST(ExchangeTest, MidnightPassesAndClocksAreSetBack) {
 
   const Exchange set = Parse("12:00:00.0000      7 a\r\n11:59:00.0000      7 b\r\n");
   EXPECT_EQ(set.entries[1].since_ms, 0U);
-  EXPECT_EQ(set.remarks, std::vector<std::string>{"The clock was set back meanwhile."});
+  EXPECT_EQ(set.remarks, std::vector<std::string>{"The clock was set back during the report."});
 }
 
 // A line with characters of several bytes loses as many at its end, the line end with them.
@@ -280,7 +280,7 @@ TEST(ExchangePageTest, NeedsNothingButItself) {
   EXPECT_NE(page.find("prefers-color-scheme: dark"), std::string::npos);
   EXPECT_NE(page.find("<tr class=\"retry\">"), std::string::npos);
   EXPECT_NE(page.find("<rect class=\"fill-retry\""), std::string::npos);
-  EXPECT_NE(page.find("0x800705B4 silence"), std::string::npos);
+  EXPECT_NE(page.find("0x800705B4 no answer in time"), std::string::npos);
 }
 
 TEST(ExchangePageTest, ALongReportIsCutAndThatIsSaid) {

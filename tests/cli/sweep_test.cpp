@@ -61,7 +61,7 @@ TEST(SweepTest, AKnownReceiverOfAnotherFamilyThanAskedForDoesNotCount) {
 
 TEST(SweepTest, SaysATryInWords) {
   EXPECT_EQ(InWords({57600, RtsMode::kOn}), "57600 bit/s, RTS on");
-  EXPECT_EQ(InWords({0, RtsMode::kHandshake}), "the port's own speed, RTS handshake");
+  EXPECT_EQ(InWords({0, RtsMode::kHandshake}), "the port's current speed, RTS handshake");
 }
 
 /// A port on which a receiver of one family answers at one setting.

@@ -30,7 +30,7 @@ TEST_F(Cli, MoveIsRefusedWithASentence) {
   const bed::SimulatedPort receiver({"quorin"}, {{"a.jps", "a"}});
   const auto result = RunOn(receiver, {"mv", "a.jps", "b.jps"});
   EXPECT_EQ(result.status, kFailed);
-  EXPECT_THAT(result.errors, HasSubstr("does not offer renaming"));
+  EXPECT_THAT(result.errors, HasSubstr("cannot rename files"));
 }
 
 TEST_F(Cli, SettingsReachTheReceiverInItsOwnWords) {
@@ -60,14 +60,14 @@ TEST_F(Cli, AnRtsLineIsNotConfirmedAndSaidToBeSo) {
   const auto result = RunOn(receiver, {"set", "rts", "off", "--json"});
   EXPECT_EQ(result.status, kDone);
   EXPECT_EQ(nlohmann::json::parse(result.output).at("confirmed"), false);
-  EXPECT_THAT(RunOn(receiver, {"set", "rts", "on"}).output, HasSubstr("does not confirm"));
+  EXPECT_THAT(RunOn(receiver, {"set", "rts", "on"}).output, HasSubstr("could not be confirmed"));
 }
 
 TEST_F(Cli, ANewSpeedIsTried) {
   const bed::SimulatedPort receiver({"quorin"}, {{"a.jps", "a"}});
   const auto result = RunOn(receiver, {"set", "baud", "57600"});
   EXPECT_EQ(result.status, kDone) << result.errors;
-  EXPECT_THAT(result.output, HasSubstr("it answers there"));
+  EXPECT_THAT(result.output, HasSubstr("it answers with that setting"));
   EXPECT_THAT(result.output, HasSubstr("--speed 57600"));
   // Asked there: the ping came after the change.
   const std::string transcript = receiver.Transcript();
@@ -171,7 +171,8 @@ TEST_F(SetMemory, ALostReceiverIsSaidToBeAndForgotten) {
   const auto error = nlohmann::json::parse(result.output).at("error");
   EXPECT_EQ(error.at("exit"), kNoReceiver);
   EXPECT_EQ(error.at("tried"), "set the receiver's baud rate to 57600");
-  EXPECT_THAT(error.at("meaning"), HasSubstr("answers neither as asked nor as before"));
+  EXPECT_THAT(error.at("meaning"),
+              HasSubstr("answers neither with the new setting nor with the old one"));
   EXPECT_THAT(error.at("hint"), HasSubstr("rcvlink-cli find"));
   EXPECT_THAT(FirstTry(receiver), HasSubstr(": 115200 bit/s, RTS on"));
 }

@@ -143,7 +143,7 @@ TEST_F(Cli, FilesThatAreHereCanBeSkipped) {
   EXPECT_EQ(files[1].at("bytes"), 4);
   EXPECT_FALSE(files[2].contains("skipped"));
   // A quiet user hears of the file that is not the receiver's, and of that alone.
-  EXPECT_EQ(result.errors, "b.jps: is here already, with 4 bytes; the receiver lists 40\n");
+  EXPECT_EQ(result.errors, "b.jps: already exists, with 4 bytes; the receiver lists 40\n");
 }
 
 // "A.JPS" and "a.jps" are two files on a receiver.
@@ -152,7 +152,7 @@ TEST_F(Cli, AFileThatDiffersInCaseAloneIsNotSkippedInSilence) {
   const bed::SimulatedPort receiver({"quorin"}, {{"A.JPS", Content(30)}, {"a.jps", Content(40)}});
   const auto result = RunOn(receiver, {"get", "--all", "--skip-existing"});
   EXPECT_EQ(result.status, kLocalFile);
-  EXPECT_THAT(result.errors, HasSubstr("place of another file"));
+  EXPECT_THAT(result.errors, HasSubstr("already used for another file"));
 }
 
 // A stale part, a file that is here, and two names that are one on this computer.
@@ -169,9 +169,9 @@ TEST_F(Cli, WhatCannotBeKeptStopsNoOtherFile) {
            {"get", "a.jps", "b.jps", "c.jps", "d.jps", "D.jps"}, {"get", "*.jps"}}) {
     const auto result = RunOn(receiver, line);
     EXPECT_EQ(result.status, kLocalFile);
-    EXPECT_THAT(result.errors, HasSubstr("a.jps.part exists already"));
-    EXPECT_THAT(result.errors, HasSubstr("b.jps exists already"));
-    EXPECT_THAT(result.errors, HasSubstr("place of another file"));
+    EXPECT_THAT(result.errors, HasSubstr("a.jps.part already exists"));
+    EXPECT_THAT(result.errors, HasSubstr("b.jps already exists"));
+    EXPECT_THAT(result.errors, HasSubstr("already used for another file"));
     EXPECT_EQ(folder.Read("c.jps"), Content(50));
     EXPECT_EQ(folder.Read("b.jps"), "mine");
     std::filesystem::remove(folder / "c.jps");
@@ -241,7 +241,7 @@ TEST_F(Cli, FilesThatTheDiskHasNoRoomForAreRefusedAtOnce) {
   const bed::SimulatedPort receiver(simulator, files);
   const auto result = RunOn(receiver, {"get", "--all", "--protocol", "velmar"});
   EXPECT_EQ(result.status, kLocalFile);
-  EXPECT_THAT(result.errors, HasSubstr("there is room for"));
+  EXPECT_THAT(result.errors, HasSubstr("the disk has room for"));
   EXPECT_THAT(receiver.Transcript(), testing::Not(HasSubstr("filetransfer")));
   EXPECT_THAT(LocalFiles(), IsEmpty());
 }
@@ -295,7 +295,7 @@ TEST_F(Cli, ASilentTransferIsEndedAfterTheStallTimeOut) {
                                     {{"a.jps", Content(5000)}});
   const auto result = RunOn(receiver, {"get", "a.jps", "--stall-timeout", "2"});
   EXPECT_EQ(result.status, kFailed);
-  EXPECT_THAT(result.errors, HasSubstr("nothing new"));
+  EXPECT_THAT(result.errors, HasSubstr("no new data"));
   EXPECT_THAT(LocalFiles(), IsEmpty());
 }
 
@@ -363,7 +363,7 @@ TEST_F(Cli, ATerminalShowsWhatIsWaitedFor) {
   bed::Program program(
       kProgram, On(receiver, {"get", "a.jps"}), bed::Output::kTerminal, folder.unix_path());
   program.Expect("Reading the list of files ... ");
-  program.Expect("getting ready");
+  program.Expect("preparing");
   EXPECT_EQ(program.Finish().status, kDone);
 }
 

@@ -111,7 +111,7 @@ TEST_F(Find, NothingIsLeftOfATryThatWasInVain) {
                    folder.unix_path())
           .Finish();
   EXPECT_EQ(result.status, kNoReceiver) << result.output;
-  EXPECT_THAT(result.history, testing::Contains(HasSubstr("(Ctrl-C ends it)")));
+  EXPECT_THAT(result.history, testing::Contains(HasSubstr("(Ctrl-C stops it)")));
   EXPECT_THAT(result.output, Not(HasSubstr("Ctrl-C")));
 }
 

@@ -183,7 +183,7 @@ TEST_F(Cli, ACodeIsExplained) {
   EXPECT_EQ(result.status, kDone);
   EXPECT_THAT(result.output, HasSubstr("0x8007048F"));
   EXPECT_THAT(result.output, HasSubstr("check the cable"));
-  EXPECT_THAT(Run({"explain"}).output, HasSubstr("0x800705B4  silence"));
+  EXPECT_THAT(Run({"explain"}).output, HasSubstr("0x800705B4  no answer in time"));
   EXPECT_THAT(Run({"explain", "0x800700C1"}).output, HasSubstr("no entry"));
 }
 
@@ -220,7 +220,7 @@ TEST_F(ReportCli, IsNeverReplacedUnlessForced) {
   std::ofstream(path) << "an earlier report";
   const auto refused = Run({"find", "COM99", "--report", name});
   EXPECT_EQ(refused.status, kLocalFile);
-  EXPECT_THAT(refused.errors, HasSubstr("exists already"));
+  EXPECT_THAT(refused.errors, HasSubstr("already exists"));
   EXPECT_EQ(Report(), "an earlier report");
   EXPECT_EQ(Run({"find", "COM99", "--report", name, "--force"}).status, kNoReceiver);
   EXPECT_THAT(Report(), HasSubstr("command line: "));

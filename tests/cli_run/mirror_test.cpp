@@ -63,9 +63,9 @@ TEST_F(Mirror, BringsWhatIsMissingOrHasGrown) {
   EXPECT_EQ(Mirrored(), (Names{"a.jps", "b.jps", "c.jps"}));
   EXPECT_THAT(result.errors,
               AllOf(HasSubstr("File 1 of 2: b.jps"), HasSubstr("File 2 of 2: c.jps")));
-  EXPECT_THAT(result.output, HasSubstr("2 downloaded, 1 here already, 0 failed"));
+  EXPECT_THAT(result.output, HasSubstr("2 downloaded, 1 already here, 0 failed"));
 
-  EXPECT_THAT(RunMirror(receiver).output, HasSubstr("0 downloaded, 3 here already, 0 failed"));
+  EXPECT_THAT(RunMirror(receiver).output, HasSubstr("0 downloaded, 3 already here, 0 failed"));
 }
 
 TEST_F(Mirror, TakesOnlyNamesThatFitAPattern) {
@@ -87,7 +87,7 @@ TEST_F(Mirror, AnotherFileOfTheSameNameStays) {
   const bed::SimulatedPort receiver({"quorin"}, {{"a.jps", Content(300)}, {"b.jps", Content(30)}});
   const auto result = RunMirror(receiver);
   EXPECT_EQ(result.status, kFailed);
-  EXPECT_THAT(result.errors, HasSubstr("is another one, not its beginning"));
+  EXPECT_THAT(result.errors, HasSubstr("is not the beginning of the receiver's file"));
   EXPECT_EQ(folder.Read("out/a.jps"), "yesterday's log");
   EXPECT_EQ(folder.Read("out/b.jps"), Content(30));
   EXPECT_EQ(Mirrored(), (Names{"a.jps", "b.jps"}));
@@ -162,7 +162,7 @@ TEST_F(Mirror, AnEmptyFileReplacesAnotherOnlyWhenForced) {
   const bed::SimulatedPort receiver({"quorin"}, {{"a.jps", ""}});
   const auto result = RunMirror(receiver);
   EXPECT_EQ(result.status, kFailed);
-  EXPECT_THAT(result.errors, HasSubstr("it has no bytes, but the file of that name"));
+  EXPECT_THAT(result.errors, HasSubstr("the receiver's file is empty, but the file of that name"));
   EXPECT_EQ(folder.Read("out/a.jps"), "mine");
   EXPECT_EQ(RunMirror(receiver, {"--force"}).status, kDone);
   EXPECT_EQ(folder.Read("out/a.jps"), "");
@@ -205,7 +205,8 @@ TEST_F(Mirror, DeletesOnlyWhatASecondDownloadVerified) {
   const json document = json::parse(result.output);
   EXPECT_EQ(FileOf(document, "new.jps").at("deleted"), true);
   EXPECT_EQ(FileOf(document, "same.jps").at("deleted"), true);
-  EXPECT_THAT(FileOf(document, "other.jps").at("error").at("meaning"), HasSubstr("other bytes"));
+  EXPECT_THAT(FileOf(document, "other.jps").at("error").at("meaning"),
+              HasSubstr("different bytes"));
   // Twice the one that was missing, once those that were there.
   size_t downloads = 0;
   const std::string transcript = receiver.Transcript();
@@ -219,7 +220,7 @@ TEST_F(Mirror, SaysAtWhichFileItIsAndHowLongAllTake) {
   const auto result = RunMirror(receiver, {});
   EXPECT_EQ(result.status, kDone) << result.errors;
   EXPECT_THAT(result.errors, HasSubstr("File 1 of 2: a.jps, 30.0 kB\n"));
-  EXPECT_THAT(result.errors, HasSubstr("File 2 of 2: b.jps, 40 B, 1 s left over all\n"));
+  EXPECT_THAT(result.errors, HasSubstr("File 2 of 2: b.jps, 40 B, 1 s left in total\n"));
 }
 
 TEST_F(Mirror, WithoutThenDeleteNothingIsDeleted) {
@@ -253,7 +254,7 @@ TEST_F(VelmarMirror, WhatASecondDownloadDoesNotVerifyIsNeitherKeptNorDeleted) {
   const bed::SimulatedPort receiver({"velmar", "--flipped-bit", "0@1"}, {{"a.log", Content(30)}});
   const auto result = RunMirror(receiver, {"--then-delete"});
   EXPECT_EQ(result.status, kFailed);
-  EXPECT_THAT(result.errors, HasSubstr("other bytes"));
+  EXPECT_THAT(result.errors, HasSubstr("differs from the first"));
   EXPECT_EQ(Mirrored(), Names{});
   EXPECT_EQ(NamesOn(receiver), Names{"a.log"});
 
@@ -299,7 +300,7 @@ TEST_F(VelmarMirror, FilesThatTheDiskHasNoRoomForAreRefusedAtOnce) {
   const bed::SimulatedPort receiver(simulator, files);
   const auto result = RunMirror(receiver, {});
   EXPECT_EQ(result.status, kLocalFile);
-  EXPECT_THAT(result.errors, HasSubstr("there is room for"));
+  EXPECT_THAT(result.errors, HasSubstr("the disk has room for"));
   EXPECT_EQ(Mirrored(), Names{});
 }
 

@@ -106,7 +106,7 @@ TEST_F(VelmarCli, VerifyFindsADamagedByte) {
   EXPECT_NE(folder.Read("a.log"), Content(3000));
   const auto verified = RunOn(receiver, {"get", "a.log", "-o", "b.log", "--verify"});
   EXPECT_EQ(verified.status, kFailed);
-  EXPECT_THAT(verified.errors, HasSubstr("other bytes"));
+  EXPECT_THAT(verified.errors, HasSubstr("differs from the first"));
   EXPECT_THAT(LocalFiles(), ElementsAre("a.log"));
   const auto sound = RunOn(receiver, {"get", "a.log", "-o", "c.log", "--verify", "--json"});
   EXPECT_EQ(sound.status, kDone);
@@ -192,7 +192,7 @@ TEST_F(VelmarCli, ARefusedMoveIsNoticed) {
   const bed::SimulatedPort receiver({"velmar", "--refuse", "rename"}, {{"a.log", "a"}});
   const auto result = RunOn(receiver, {"mv", "a.log", "c.log"});
   EXPECT_EQ(result.status, kFailed);
-  EXPECT_THAT(result.errors, HasSubstr("its directory does not show it"));
+  EXPECT_THAT(result.errors, HasSubstr("file list does not show the change"));
 }
 
 TEST_F(VelmarCli, RemoveDeletesTheFile) {
@@ -223,7 +223,7 @@ TEST_F(VelmarCli, TheRtsLineIsRefusedWithASentence) {
   const bed::SimulatedPort receiver({"velmar"});
   const auto result = RunOn(receiver, {"set", "rts", "off"});
   EXPECT_EQ(result.status, kFailed);
-  EXPECT_THAT(result.errors, HasSubstr("a Velmar receiver does not offer to control its RTS line"));
+  EXPECT_THAT(result.errors, HasSubstr("a Velmar receiver cannot change its RTS line"));
 }
 
 }  // namespace
