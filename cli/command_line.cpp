@@ -34,13 +34,13 @@ class HelpFormatter : public CLI::Formatter {
     const auto is_common = [all](const CLI::Option* option) {
       return option != all->get_help_ptr() && option != all->get_version_ptr();
     };
-    // The group begins with a line end, and so does what stands before it.
+    // Both the group and the text before it supply a line end.
     return make_group("Options of all commands", false, all->get_options(is_common)).substr(1) +
            "\n" + Formatter::make_footer(app);
   }
 };
 
-/// The word of a command that looks most like another one; empty when none does.
+/// The command that is most similar to a word; empty when none is.
 std::string MostLike(const std::string& word, const Commands& commands) {
   constexpr std::size_t kMostChanges = 2;
   std::string best;
@@ -55,7 +55,7 @@ std::string MostLike(const std::string& word, const Commands& commands) {
   return best;
 }
 
-/// `help`, `help get` and `/?` as the parser knows them.
+/// Turns `help`, `help get` and `/?` into --help.
 std::vector<std::string> WithHelp(std::vector<std::string> words) {
   const auto end = std::find(words.begin(), words.end(), "--");
   std::replace(words.begin(), end, std::string("/?"), std::string("--help"));
@@ -125,7 +125,7 @@ void AddLinkOptions(CLI::App& app, Arguments& arguments) {
       app, "--no-memory", "Neither use nor save the setting found last time", arguments.no_memory);
 }
 
-/// Where a user's own options are read from, when the file is there.
+/// The file with the user's own options; it need not exist.
 std::string DefaultConfig() {
   const char* const folder = std::getenv("APPDATA");
   return folder == nullptr ? "" : std::string(folder) + "\\rcvlink\\rcvlink-cli.ini";
@@ -184,7 +184,7 @@ std::string Words(const Commands& commands) {
   return words;
 }
 
-/// Why the parser did not take the words.
+/// Why the parser refused the words.
 Failure ParseFailure(const CLI::App& app, const CLI::ParseError& error, const Commands& commands) {
   const std::vector<std::string> rest = app.remaining();
   if (!app.get_subcommands().empty() || rest.empty() || rest.front().starts_with('-')) {
@@ -218,7 +218,7 @@ void CheckArguments(const Arguments& arguments, bool needs_port) {
   }
 }
 
-/// Reads the words and checks them, as far as the parser's own checks do not do that.
+/// Checks what the parser itself does not check.
 CommandLine Checked(CLI::App& app, Arguments& arguments, Commands commands) {
   std::unique_ptr<Command> command = TakeChosen(app, commands);
   arguments.port = PlainPortName(arguments.port);
@@ -267,7 +267,7 @@ std::variant<CommandLine, HelpText> ParseCommandLine(const std::vector<std::stri
   app.get_formatter()->column_width(kHelpColumn);
   app.allow_windows_style_options(false);  // a file's name may begin with a slash
   app.fallthrough();
-  app.require_subcommand(0, 1);  // none: `TakeChosen` says it better
+  app.require_subcommand(0, 1);  // none: `TakeChosen` has the better message
   app.set_version_flag("--version", "rcvlink-cli " RCVLINK_VERSION);
   Arguments arguments;
   AddOptions(app, arguments);

@@ -17,11 +17,11 @@ namespace cli {
 namespace {
 
 constexpr DWORD kShareAll = FILE_SHARE_READ | FILE_SHARE_WRITE;
-// In front of the name of a port, as `CreateFileW` takes it.
+// The prefix of a port's name for `CreateFileW`.
 const std::wstring kDevices = L"\\\\.\\";
 
-/// Why a device cannot be opened, as far as asking for nothing of it tells; S_OK when it can. A
-/// search on USB that cannot open its device finds no receiver, no more.
+/// Why a device cannot be opened; S_OK when it can. A search on USB does not report that: it just
+/// finds no receiver.
 long WhyNotOpened(const std::wstring& device) {
   const UniqueHandle handle(
       CreateFileW(device.c_str(), 0, kShareAll, nullptr, OPEN_EXISTING, 0, nullptr));
@@ -46,7 +46,7 @@ class SearchedPort : public SweepPort {
   }
 
   void Begin(std::size_t number, std::size_t count, const LineSetting& line) override {
-    // Of a port that is not there no try is worth a line: its first one ends the search.
+    // No line for a port that does not exist: the first try ends the search.
     if (there_) display_.Begin(port_, number, count, line);
   }
 
@@ -72,7 +72,7 @@ std::vector<Try> TriesOn(const std::wstring& port,
   return {{line, FamiliesOf(arguments.protocol)}};
 }
 
-/// What came of a search on one kind of link.
+/// The result of a search on one link.
 struct SearchResult {
   long code = S_FALSE;
   FoundReceiver found{};
@@ -86,7 +86,7 @@ SearchResult SearchSerial(const Context& context,
   SearchedPort searched(context, port, display);
   const SweepResult result = RunSweep(TriesOn(port, arguments, memory), searched);
   if (result.receiver == nullptr) return {.code = result.code};
-  // A speed of 0 would say nothing the next time.
+  // A speed of 0 would not help the next search.
   if (result.setting.line.speed != 0 && !memory.Remember(port, result.setting) &&
       arguments.verbose) {
     display.PrintStatus(UnwrittenMemory(port));
@@ -111,7 +111,7 @@ std::string SilenceHint(const Arguments& arguments, EInstanceType link) {
          "the ports.";
 }
 
-/// A port that is a file of this computer would have its beginning overwritten.
+/// Refuses a file of this computer as a port: commands would be written into it.
 /// @throws Failure
 void RefuseFile(const std::wstring& port) {
   for (const std::wstring& path : {port, kDevices + port}) {

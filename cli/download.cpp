@@ -12,8 +12,8 @@ namespace {
 
 constexpr std::uint64_t kMsPerSecond = 1000;
 
-/// Looks after a running transfer from a thread of its own: shows how far it is, and ends it when
-/// nothing new arrives or what arrives cannot be kept.
+/// Watches a transfer on a thread of its own: shows the progress, and aborts the transfer when no
+/// new data arrives or the data cannot be written.
 class TransferWatch {
  public:
   TransferWatch(Context& context,
@@ -52,7 +52,7 @@ class TransferWatch {
   Ticker ticker_;  // ends before all that it uses
 };
 
-/// What became of one transfer.
+/// The result of one transfer.
 struct Transfer {
   long code = S_OK;
   bool stalled = false;
@@ -107,7 +107,7 @@ std::string MeaningOf(const Context& context, const Transfer& transfer, const Re
   return "";
 }
 
-/// Why a transfer is not complete; what came of it is kept where that makes sense.
+/// Why a transfer is not complete. Keeps its data where that is useful.
 Failure WhyIncomplete(const Context& context,
                       const Receiver& receiver,
                       const Transfer& transfer,

@@ -42,7 +42,8 @@ class Decoder {
   std::string Decode(const std::string& bytes) {
     if (const auto text = Decoded(bytes, CP_UTF8, MB_ERR_INVALID_CHARS)) return Printable(*text);
     all_utf8_ = false;
-    // A character that was cut at the line's end is shown as the code page's own mark for it.
+    // A character that was cut at the end of the line becomes the code page's replacement
+    // character.
     const auto text = Decoded(bytes, code_page_, 0);
     return text ? Printable(*text) : std::to_string(bytes.size()) + " bytes that cannot be read";
   }
@@ -54,13 +55,13 @@ class Decoder {
   bool all_utf8_ = true;
 };
 
-/// What a thread is doing, as far as its lines have told it.
+/// What a thread is doing, according to its lines so far.
 struct ThreadState {
   TraceFamily family = TraceFamily::kUnknown;
   std::optional<std::size_t> command{};    ///< the entry of the command that is not ended
   std::optional<std::size_t> read{};       ///< the entry of the read that is not ended
   std::optional<std::size_t> blocks{};     ///< the entry of the transfer that is not ended
-  std::optional<std::uint64_t> sent_ms{};  ///< when the command left
+  std::optional<std::uint64_t> sent_ms{};  ///< when the command was sent
   bool blocks_follow = false;              ///< the receiver has agreed to send blocks
   bool opening = false;                    ///< a port is being opened
   std::string last_class{};                ///< of the last command that the report names
@@ -104,7 +105,7 @@ class Reader {
     Push(std::move(entry));
   }
 
-  /// Gives the entry its time; midnight may have passed, and clocks are set.
+  /// Gives the entry its time. Midnight may have passed, or the clock may have been set.
   void Advance(ExchangeEntry& entry) {
     if (!exchange_.entries.empty()) {
       const std::uint32_t before = last_ms_of_day_;
@@ -134,8 +135,8 @@ class Reader {
     return ExchangeEnd::kReply;
   }
 
-  /// Adds what the report has no line for: a reply that came before the thread's next line, or that
-  /// a wait was cancelled.
+  /// Adds an entry for what has no line in the report: a reply before the thread's next line, or a
+  /// cancelled wait.
   void PushEnd(ExchangeEnd end,
                const ExchangeEntry& next,
                std::uint64_t begin_ms,
@@ -177,12 +178,12 @@ class Reader {
     thread.blocks_follow = end == ExchangeEnd::kReply && thread.last_class == "CGetFileCmd";
   }
 
-  /// Commands whose reads the report does not tell end with the thread's next line.
+  /// A command whose reads are not in the report ends with the thread's next line.
   void EndCommand(ThreadState& thread, const ExchangeEntry& next) {
     if (!thread.command) return;
     const bool is_failure = next.kind == TraceKind::kFailure || next.kind == TraceKind::kTimeout;
     if (!is_failure && (!thread.sent_ms || next.kind == TraceKind::kRead)) return;
-    // After a reply of this family the library rests for 500 ms; timers may be a little early.
+    // After a reply of this family the library pauses for 500 ms; timers may be a little early.
     constexpr std::uint64_t kRestMs = 450;
     const std::uint64_t sent_ms = thread.sent_ms.value_or(next.elapsed_ms);
     const bool is_answered =
@@ -210,7 +211,7 @@ class Reader {
     At(index).end = end;
   }
 
-  /// "Flush" stands in front of every command and of every block that is asked for again.
+  /// "Flush" comes before every command and before every block that is requested again.
   void TakeSend(ThreadState& thread, ExchangeEntry& entry) {
     if (thread.blocks) {
       entry.kind = TraceKind::kRetry;
@@ -234,7 +235,7 @@ class Reader {
     }
   }
 
-  /// Which command it is that has no line of its own, by the one before it.
+  /// Guesses a command that has no line of its own from the one before it.
   static std::string UnnamedCommand(ThreadState& thread) {
     const std::string before = std::exchange(thread.last_class, "");
     if (before == "CEchoOffCmd") return "stop all output: dm";
@@ -258,7 +259,7 @@ class Reader {
       thread.sent_ms.reset();
     } else if (entry.kind == TraceKind::kHost) {
       thread.last_class.clear();
-      thread.command.reset();  // one that was made and never sent
+      thread.command.reset();  // it was made and never sent
       thread.opening = entry.text.find(" - opening ") != std::string::npos;
     } else if (entry.kind == TraceKind::kLink) {
       thread.last_class.clear();
@@ -276,7 +277,7 @@ class Reader {
                         " bytes are not part of a report.");
     }
     if (trace.lines.empty()) return;
-    // Reports lose line ends behind such characters, which is no sign of a cut.
+    // Reports lose line ends after such characters, so that a missing one is no sign of a cut.
     const TraceLine& last = trace.lines.back();
     if (!last.has_end && !IsBeyondAscii(last.bytes)) {
       remarks.push_back("The report ends in the middle of its last line.");

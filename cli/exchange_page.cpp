@@ -219,7 +219,7 @@ class Drawing {
   std::string svg_;
 };
 
-/// What stands before the meaning: the arrow, or a word for trouble.
+/// The sign before the meaning: an arrow, or a word for a failure.
 std::string_view SignOf(TraceKind kind) {
   switch (kind) {
     case TraceKind::kHost:
@@ -241,7 +241,7 @@ std::string_view SignOf(TraceKind kind) {
   }
 }
 
-/// Whether it is between the host and the library, rather than between that and the receiver.
+/// Whether it is between the host and the library, not between the library and the receiver.
 bool IsOfHost(TraceKind kind) {
   return kind == TraceKind::kHost || kind == TraceKind::kCancel || kind == TraceKind::kDone ||
          kind == TraceKind::kNote || kind == TraceKind::kLock;

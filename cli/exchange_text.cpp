@@ -21,7 +21,7 @@ std::string Counted(std::size_t count, const std::string& one, const std::string
   return std::to_string(count) + " " + (count == 1 ? one : many);
 }
 
-/// What is in front of a line: trouble is seen at once.
+/// The mark before a line; failures stand out in capitals.
 std::string MarkOf(TraceKind kind) {
   switch (kind) {
     case TraceKind::kRetry:

@@ -10,10 +10,10 @@
 
 namespace cli {
 
-/// "host -> library": who says it to whom; empty for what nobody says.
+/// "host -> library": from whom to whom; empty for entries that are no message.
 std::string PartiesOf(TraceKind kind);
 
-/// Whether a reader looks for it: retries, silences and failures.
+/// Whether it is a retry, a time-out or a failure.
 bool IsTrouble(TraceKind kind);
 
 /// "+15 ms", "+2.5 s"; empty for no time.

@@ -19,7 +19,7 @@ Failure Difference(const MirrorJob& job, std::string meaning, std::string hint) 
           .hint = std::move(hint)};
 }
 
-/// The place of a download until it may take its name; it vanishes unless it does.
+/// The temporary file of a download; deleted unless it is renamed.
 class NewFile {
  public:
   /// @throws Failure when there is a file of that name

@@ -14,7 +14,7 @@ namespace cli {
 namespace {
 
 // The parser would split a word like [a,b] into a list, take {} for an empty one, and would not
-// take "--" before the last names. A mark in front of such words hides them from it.
+// take "--" before the last names. A mark before such words hides them from it.
 constexpr char kLiteralMark = '\x01';
 constexpr std::string_view kMarked = "[{%\x01";
 
@@ -53,7 +53,7 @@ std::string Unmarked(const std::string& word) {
 }
 
 void AddPort(CLI::App& app, Arguments& arguments, Need need) {
-  // The parser's own means would let the environment win over a positional.
+  // The parser's own `envname` would let the environment override a positional argument.
   const char* const usual = std::getenv("RCVLINK_PORT");
   if (usual != nullptr) {
     arguments.port = ToUtf16(usual);

@@ -36,7 +36,7 @@ PartFile::PartFile(std::filesystem::path target, bool overwrite)
 PartFile::~PartFile() {
   if (kept_) return;
   file_.reset();
-  DeleteFileW(part_.c_str());  // for file systems that do not know of vanishing files
+  DeleteFileW(part_.c_str());  // for file systems that cannot delete on close
 }
 
 bool PartFile::SetVanishing(bool vanishing) {

@@ -26,7 +26,7 @@ struct StringFreer {
   void operator()(wchar_t* string) const { SysFreeString(string); }
 };
 
-/// Takes over a string of the library.
+/// Takes ownership of a string of the library.
 std::wstring Take(wchar_t* string) {
   const std::unique_ptr<wchar_t, StringFreer> owner(string);
   return {string, SysStringLen(string)};
@@ -41,8 +41,8 @@ long ReadEntry(void* list, long index, RemoteFile& file) {
   return S_OK;
 }
 
-/// Whether so many files may have filled the library's buffer for a Velmar directory, so that more
-/// of them got lost: from the lengths of their lines at the longest.
+/// Whether these files may have filled the library's buffer for a Velmar directory, so that others
+/// are missing. Assumes that each line has its longest form.
 bool MayBeCut(const std::vector<RemoteFile>& files) {
   constexpr std::size_t kBuffer = 8192;
   constexpr std::size_t kLongestLineBesidesName = 125;
@@ -124,8 +124,8 @@ std::vector<RemoteFile> Receiver::ReadDirectory() {
   return files;
 }
 
-/// Of Velmar receivers only, which are on serial ports: an empty list is read once more, as the
-/// library does not tell a refused or lost question from an empty directory.
+/// Only for Velmar receivers, which are on serial ports. An empty list is read again: the library
+/// reports a refused or lost command as an empty directory.
 std::string Receiver::DoubtAbout(std::vector<RemoteFile>& files) {
   if (!setting_ || setting_->family != eProtocolVelmar) return {};
   if (MayBeCut(files)) AwaitAnswer(kList);
@@ -145,7 +145,7 @@ bool Receiver::Answers() {
   return code == S_OK && answer != VARIANT_FALSE;
 }
 
-/// The rest of a list that did not fit is still on its way: it would spoil the next exchange.
+/// The rest of a list that did not fit is still arriving and would disturb the next exchange.
 void Receiver::AwaitAnswer(const std::string& tried) {
   constexpr std::uint64_t kLongestRestMs = 120'000;
   const Busy busy(context_, "Waiting for the end of the list");

@@ -89,7 +89,7 @@ std::string HintOf(const Failure& failure) {
 
 std::string Describe(const Failure& failure) {
   const bool cancelled = failure.exit == ExitCode::kCancelled;
-  // A code that reads as a success is no help to a person; the meaning says what is the matter.
+  // A success code does not help the user; the meaning says what failed.
   const bool has_code = failure.code < 0;
   std::string text = "rcvlink-cli: ";
   if (!failure.port.empty()) text += failure.port + ": ";

@@ -66,7 +66,7 @@ void SearchDisplay::PrintFailure(const Failure& failure) {
 void SearchDisplay::Draw() {
   constexpr std::uint64_t kMsPerSecond = 1000;
   const std::string seconds = FormatDuration((GetTickCount64() - start_ms_) / kMsPerSecond);
-  // The last column stays free: a full line would wrap.
+  // The last column stays free, because a full line would wrap.
   const std::size_t width = context_.err.Width() - 1;
   const std::string line = (doing_ + ", " + seconds + " (Ctrl-C stops it)").substr(0, width);
   context_.err.Write(Redrawn(line, drawn_width_));

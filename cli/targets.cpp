@@ -82,7 +82,7 @@ void Targets::CheckRoom(std::uint64_t bytes) const {
                 .hint = "Free some space, choose another disk with -o, or download fewer files."};
 }
 
-/// The folder of the targets, or the nearest one above that is there already.
+/// The folder of the targets, or the nearest parent that exists.
 std::filesystem::path Targets::ExistingFolder() const {
   std::filesystem::path folder = file_.empty() ? folder_ : file_.parent_path();
   folder = std::filesystem::absolute(folder.empty() ? L"." : folder);

@@ -17,7 +17,7 @@ struct Pattern {
   std::string_view meaning;  ///< %1 is the text of the first *
 };
 
-// The first that fits counts.
+// The first one that matches counts.
 constexpr std::array kPatterns = {
     Pattern{"rcvlink-cli *, rcvlink.dll *", TraceKind::kNote, "rcvlink-cli %1, rcvlink.dll %2"},
     Pattern{"command line: *", TraceKind::kNote, "command line: %1"},
@@ -218,7 +218,7 @@ constexpr std::array kCommands = {
                 "set the language of the port: interfacemode"},
 };
 
-/// The texts that stand for the stars; nothing when the pattern does not fit. The last bracket may be
+/// The texts that the stars match; nothing when the pattern does not match. The last bracket may be
 /// open: a line with bytes beyond ASCII loses its end.
 std::optional<std::vector<std::string_view>> Match(std::string_view pattern,
                                                    std::string_view line) {
@@ -274,7 +274,7 @@ std::string Filled(std::string_view meaning, const std::vector<std::string_view>
   return filled;
 }
 
-/// The number in the brackets that open at `open`; what Windows gives is told in decimal.
+/// The code in the brackets that open at `open`. Windows errors are decimal.
 std::optional<long> CodeIn(std::string_view line, std::size_t open) {
   constexpr std::size_t kHexLength = 10;  // 0x8007048F
   constexpr std::size_t kLongestError = 5;
@@ -289,8 +289,8 @@ std::optional<long> CodeIn(std::string_view line, std::size_t open) {
   return code && is_error ? ResultOfWin32(static_cast<unsigned long>(*code)) : code;
 }
 
-/// The result code of a line that tells a failure. It comes first where a receiver's text follows,
-/// otherwise last or before the port's name.
+/// The result code of a line that reports a failure. It comes first where a receiver's text
+/// follows, otherwise last or before the port's name.
 std::optional<long> CodeOf(std::string_view line) {
   constexpr std::string_view kResponse = "::DumpInvalidResponse - [";
   const std::size_t response = line.find(kResponse);

@@ -21,13 +21,13 @@ std::string InWords(const std::wstring& port, const Receiver& receiver, const Id
          " receiver, model " + Printable(identity.model) + ", id " + Printable(identity.id) + "\n";
 }
 
-/// What became of the search on one of several ports.
+/// The result of the search on one of several ports.
 struct Answer {
   Json receiver{};  ///< null when there is none
   std::optional<Failure> failure{};
 };
 
-/// Searches one of several ports, on a thread of its own, and says at once what came of it.
+/// Searches one of several ports, on a thread of its own, and prints the result at once.
 Answer Ask(Context& context, const SearchPlace& place, SearchDisplay& display) {
   Failure failure;
   try {
@@ -120,7 +120,7 @@ class Find : public Command {
     return places;
   }
 
-  /// A COM port is on a serial line whatever --link says, so that both links can be named together.
+  /// A COM port is serial whatever --link says, so that ports of both links can be named together.
   std::vector<SearchPlace> NamedPlaces(const Arguments& arguments) const {
     std::vector<std::wstring> names = {arguments.port};
     std::transform(more_.begin(), more_.end(), std::back_inserter(names), PlainPortName);

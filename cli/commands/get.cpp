@@ -48,7 +48,7 @@ struct Job {
   std::filesystem::path target;
 };
 
-/// One execution of `get`. A file that cannot be had or kept stops no other.
+/// One execution of `get`. A file that cannot be downloaded or saved does not stop the others.
 class GetRun {
  public:
   GetRun(Context& context, const GetOptions& options)
@@ -60,7 +60,7 @@ class GetRun {
         report_(context) {}
 
   Outcome Run() {
-    // What is wrong on this computer is told before a search that may take minutes.
+    // Errors on this computer are reported before a search that may take minutes.
     if (!options_.IsStream()) targets_.CheckFolder();
     const std::vector<std::wstring> wishes = Wishes();
     if (!options_.all && wishes.empty()) return std::move(report_).Finish();
@@ -78,7 +78,7 @@ class GetRun {
   }
 
  private:
-  /// The names and patterns of the command line, without names that no file here can have.
+  /// The names and patterns of the command line, without names that cannot be saved here.
   std::vector<std::wstring> Wishes() {
     std::vector<std::wstring> wishes;
     for (const std::wstring& name : options_.names) {
@@ -130,7 +130,7 @@ class GetRun {
     return wanted;
   }
 
-  /// What is to be transferred. What cannot be had or kept is left out and reported.
+  /// The files to transfer. Those that cannot be transferred or saved are reported instead.
   std::vector<Job> Plan(Receiver& receiver, const std::vector<RemoteFile>& files) {
     std::vector<Job> jobs;
     for (const RemoteFile& file : files) {
@@ -155,7 +155,7 @@ class GetRun {
     return jobs;
   }
 
-  /// A file that is here stays as it is; that it has another size is not kept quiet.
+  /// Keeps an existing file as it is. Warns when it has another size.
   void Skip(const RemoteFile& file, const std::filesystem::path& target) {
     const std::uint64_t here = SizeOf(target).value_or(0);
     report_.AddDone(file.name,

@@ -27,8 +27,8 @@ struct MirrorOptions {
   bool deletes = false;
 };
 
-/// The places of a mirror's files. What is there already may be replaced, by the rules of `Mirror`.
-/// @throws Failure when there can be none, before a search that may take minutes
+/// The local files of a mirror. Existing ones may be replaced, by the rules of `Mirror`.
+/// @throws Failure when the folder cannot be used: checked before a search that may take minutes
 Targets TargetsIn(const std::wstring& folder) {
   Targets targets({.output = folder, .many = true, .force = true});
   targets.CheckFolder();
@@ -167,7 +167,7 @@ class MirrorRun {
     asked_to_delete_.push_back(name);
   }
 
-  /// A receiver may refuse and the library not know it: the directory tells.
+  /// The library may not notice a refusal, so the directory is read again.
   void CheckDeleted(std::size_t listed_before) {
     std::vector<RemoteFile> files;
     std::optional<Failure> unread;

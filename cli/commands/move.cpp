@@ -15,7 +15,7 @@ void Rename(Receiver& receiver,
   receiver.ThrowIfCancelled(tried);
   const long code = devapi::RenameFile(receiver.handle(), from.data(), to.data());
   if (code != S_OK) throw receiver.FailureOf(tried, code);
-  // The receiver may refuse and the library not know it: its directory tells.
+  // The library may not notice a refusal, so the directory is read again.
   const std::vector<RemoteFile> files = receiver.ListFiles().files;
   if (!HasFile(files, new_name) || HasFile(files, old_name)) {
     throw receiver.FailureOf(

@@ -12,7 +12,7 @@ namespace {
 
 std::string Tried(const std::wstring& name) { return "delete " + Printable(name); }
 
-/// The receiver may refuse and the library not know it: its directory tells.
+/// The library may not notice a refusal, so the directory is read again.
 std::optional<Failure> WhyStillThere(const std::vector<RemoteFile>& files,
                                      const std::wstring& name) {
   if (!HasFile(files, name)) return std::nullopt;
@@ -57,7 +57,7 @@ void Verify(Context& context,
   try {
     files = receiver.ListFiles().files;
     if (files.empty() && listed_before > removed.size()) {
-      // It was not answered: without the files that were not removed it tells nothing.
+      // An empty list is no answer: the files that were not deleted are missing too.
       unread = Failure{.code = ResultOfWin32(ERROR_TIMEOUT),
                        .meaning = "the receiver did not list its files again"};
     }

@@ -16,7 +16,7 @@
 namespace cli {
 namespace {
 
-/// Reports of long sessions have some 100 kB; nobody reads more than this.
+/// Reports of long sessions have some 100 kB; a larger part would be of no use.
 constexpr std::size_t kMostBytes = 16'777'216;
 
 struct Content {

@@ -9,10 +9,10 @@
 namespace cli {
 namespace {
 
-/// Keeps the receiver for this thread.
+/// Locks the receiver for this thread.
 class ReceiverLock {
  public:
-  /// @throws Failure when it cannot be had
+  /// @throws Failure when it cannot be locked
   ReceiverLock(const Context& context, Receiver& receiver, const std::string& tried)
       : receiver_(receiver.handle()) {
     const long code = devapi::LockConnection(receiver_, context.interrupt.event());
@@ -70,7 +70,7 @@ bool AnswersAt(const Context& context, EProtocol family, const DCB& settings) {
   return true;
 }
 
-/// Lets the next command begin with this setting; with none that is known when it is nothing.
+/// Saves this setting for the next command. Nothing deletes the saved one.
 void Remember(Context& context, const std::optional<KnownSetting>& setting) {
   const Arguments& arguments = context.arguments;
   const PortMemory memory = MemoryOf(arguments);
@@ -94,8 +94,8 @@ std::string Advice(const SettingChange& change) {
   return "  This program cannot find the receiver again: it uses no parity and one stop bit.\n";
 }
 
-/// What the words ask for.
-/// @throws Failure when they make no sense
+/// Parses setting and value.
+/// @throws Failure when they are invalid
 SettingChange CheckedChange(const std::wstring& setting, const std::wstring& value) {
   const auto change = ParseSetting(Lowered(ToUtf8(setting)), Lowered(ToUtf8(value)));
   if (!change) {
@@ -136,7 +136,7 @@ class Set : public Command {
     const std::string name = SettingName(change.setting);
     const std::string tried = "set the receiver's " + name + " to " + ValueWord(change);
     std::optional<KnownSetting> found = Change(context, change, tried);
-    // What the RTS line does cannot be seen from here, nor what a receiver's port does over USB.
+    // The RTS line cannot be checked from here, nor can the receiver's port over USB.
     const bool confirmed = found && change.setting != Setting::kRts;
     if (confirmed) {
       Confirm(context, found->family, change, tried);
@@ -157,7 +157,7 @@ class Set : public Command {
   }
 
  private:
-  /// Sends the change, and lets go of the receiver.
+  /// Sends the change and closes the receiver.
   /// @return where it was found, on a serial port
   /// @throws Failure
   static std::optional<KnownSetting> Change(Context& context,
