@@ -1,16 +1,16 @@
 #!/bin/bash
-# Makes the build folder's own Wine prefix (once), the serial ports in it, and build/bed/tcflush.so
+# Makes the Wine prefix of the build folder (once), the serial ports in it, and build/bed/tcflush.so
 # for the programs that open them.
 #
-# COM7 and COM10 to COM33 are links in the prefix's folder of devices that lead to build/ports/com7
-# and so on. Whoever wants a receiver on a port puts a link to its pseudo-terminal there; no link, no
-# port: opening it then fails with ERROR_FILE_NOT_FOUND. (A port named in Wine's registry instead
-# would open although nothing is there.)
+# COM7 and COM10 to COM33 are links in the prefix's dosdevices folder; they point to build/ports/com7
+# and so on. A simulated receiver on a port makes that path a link to its pseudo-terminal. Without it
+# the port does not exist: opening it fails with ERROR_FILE_NOT_FOUND. (A port that is named in Wine's
+# registry would open even without a receiver.)
 set -euo pipefail
 
 root="$(cd "$(dirname "${BASH_SOURCE[0]}")/.." && pwd)"
 export WINEPREFIX="$root/build/wine" WINEDEBUG=-all
-# No menus in the user's home folder, no offers to install browsers and runtimes.
+# Wine must not add menus to the user's home folder or offer to install browsers and runtimes.
 export WINEDLLOVERRIDES="winemenubuilder.exe,mscoree,mshtml="
 unset DISPLAY
 
@@ -26,7 +26,7 @@ if [ "$(cat "$marker" 2>/dev/null)" != "$made_for" ]; then
     echo "Wine could not make its prefix $WINEPREFIX" >&2
     exit 1
   fi
-  # The registry is on the disk only when the server is gone.
+  # The registry is written to disk only when the server has ended.
   wineserver -w
   echo "$made_for" >"$marker"
 fi
