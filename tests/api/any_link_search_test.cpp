@@ -94,7 +94,7 @@ TEST_F(AnyLinkSearch, ASweepThatFindsNobodyIsNoFailure) {
   EXPECT_THAT(LinesWith("CreateReceiverOnUSB"), ElementsAre(kOpeningUsb, kAskingUsb));
 }
 
-TEST_F(AnyLinkSearch, AFailureOfUsbAloneIsTold) {
+TEST_F(AnyLinkSearch, AFailureOfUsbAloneIsReported) {
   port_.usb_error = 0xE0001009;
   EXPECT_EQ(Search(), static_cast<HRESULT>(0xE0001009));
   EXPECT_EQ(handle_, nullptr);
@@ -103,7 +103,7 @@ TEST_F(AnyLinkSearch, AFailureOfUsbAloneIsTold) {
               ElementsAre("SearchReceiver - CreateReceiverOnUSB failed[COM7] [0xE0001009]"));
 }
 
-TEST_F(AnyLinkSearch, AFailureOfTheSerialPortAloneIsTold) {
+TEST_F(AnyLinkSearch, AFailureOfTheSerialPortAloneIsReported) {
   port_.path = L"none";
   EXPECT_EQ(Search(), S_FALSE);
   EXPECT_THAT(OwnLines(),
@@ -199,7 +199,7 @@ TEST_F(AnyLinkSearch, AStaleHandleGivesWayToAReceiver) {
 }
 
 // The one that does not look at it.
-TEST_F(AnyLinkSearch, AStaleHandleIsNothingToASearchOfUsb) {
+TEST_F(AnyLinkSearch, AStaleHandleDoesNotAffectASearchOfUsb) {
   handle_ = Stale();
   EXPECT_EQ(Search(eInstanceUSB), S_FALSE);
   EXPECT_EQ(handle_, Stale());

@@ -87,7 +87,7 @@ TEST(Registry, OpenInAnEmptyRegistryFindsNothing) {
   EXPECT_EQ(devapi::OpenReceiver(Name(L"COM7"), &handle), S_FALSE);
 }
 
-TEST(Registry, CloseDropsOneUserAndRemovesWithTheLast) {
+TEST(Registry, CloseRemovesOneUserAndTheReceiverWithTheLast) {
   const ReportCapture report;
   const Registered one(L"COM7");
   void* handle = nullptr;
@@ -122,7 +122,7 @@ TEST(Registry, CloseOfAnUnknownHandleIsReported) {
               ElementsAre("CloseReceiver - receiver not found [0x0000000000001234]"));
 }
 
-TEST(Registry, DestroyDropsOneUserEachAndSaysSoOnlyOfTheRemoved) {
+TEST(Registry, DestroyRemovesOneUserEachAndReportsOnlyRemovedReceivers) {
   const ReportCapture report;
   const Registered one(L"COM7");
   void* handle = nullptr;
@@ -167,7 +167,7 @@ TEST(Registry, TwoReceiversMayShareAName) {
   EXPECT_TRUE(one.destroyed && other.destroyed);
 }
 
-TEST(Registry, DestroyLowersEachThatItPasses) {
+TEST(Registry, DestroyRemovesAUserOfEachReceiverThatItPasses) {
   const Registered one(L"COM7");
   const Registered other(L"COM7");
   // A second user for the one that is met first; the other has one and goes on the first walk.

@@ -35,7 +35,7 @@ Failure Refusal(const Words& words) {
   return {};
 }
 
-TEST(CommandLineTest, Defaults) {
+TEST(CommandLineTest, HasDefaults) {
   const CommandLine line = Parse({"find", "COM7"});
   EXPECT_STREQ(line.command->text().word, "find");
   const Arguments& arguments = line.arguments;
@@ -49,7 +49,7 @@ TEST(CommandLineTest, Defaults) {
   EXPECT_EQ(arguments.stall_timeout_s, 30U);
 }
 
-TEST(CommandLineTest, Commands) {
+TEST(CommandLineTest, AcceptsEachCommand) {
   for (const Words& words : {Words{"ports"},
                              Words{"info", "COM7"},
                              Words{"ls", "COM7"},
@@ -173,7 +173,7 @@ TEST(CommandLineTest, NamesThatMustNotBeSentAreRefused) {
   EXPECT_EQ(Refusal({"mv", "COM7", "a", "b\"c"}).exit, ExitCode::kUsage);
 }
 
-TEST(CommandLineTest, SenselessLinesAreRefused) {
+TEST(CommandLineTest, InvalidLinesAreRefused) {
   for (const Words& words : {Words{},
                              Words{"bogus"},
                              Words{"find"},
@@ -193,7 +193,7 @@ TEST(CommandLineTest, SenselessLinesAreRefused) {
   }
 }
 
-TEST(CommandLineTest, HelpTellsCommandsExitCodesAndExamples) {
+TEST(CommandLineTest, HelpShowsCommandsExitCodesAndExamples) {
   const std::string help = Help({"--help"});
   for (const char* text : {"ports", "--stall-timeout", "Exit codes", "rcvlink-cli get COM7"}) {
     EXPECT_NE(help.find(text), std::string::npos) << text;
@@ -210,7 +210,7 @@ TEST(CommandLineTest, HelpFitsATerminal) {
   }
 }
 
-TEST(CommandLineTest, HelpIsHadInSeveralWays) {
+TEST(CommandLineTest, HelpWorksInSeveralWays) {
   EXPECT_EQ(Help({"help"}), Help({"--help"}));
   EXPECT_EQ(Help({"/?"}), Help({"--help"}));
   EXPECT_EQ(Help({"help", "get"}), Help({"get", "--help"}));
@@ -253,7 +253,7 @@ class Variable {
   std::string name_;
 };
 
-TEST(CommandLineTest, TheEnvironmentIsAsked) {
+TEST(CommandLineTest, TheEnvironmentIsRead) {
   const Variable port("RCVLINK_PORT", "com7:");
   const Variable link("RCVLINK_LINK", "any");
   const Variable protocol("RCVLINK_PROTOCOL", "velmar");
@@ -285,7 +285,7 @@ TEST(CommandLineTest, SkippingNeedsFilesThatCanBeHere) {
   EXPECT_EQ(Refusal({"get", "COM7", "*.jps", "-o", "-"}).exit, ExitCode::kUsage);
 }
 
-TEST(CommandLineTest, AFileHasOptionsToo) {
+TEST(CommandLineTest, OptionsAreReadFromAFileToo) {
   const TemporaryFolder folder;
   folder.Write(L"my.ini", "speed = 57600\njson = true\nprogress = none\n");
   const std::string path = (folder.path() / L"my.ini").string();
@@ -303,7 +303,7 @@ TEST(CommandLineTest, CodesToExplainAreNumbers) {
   EXPECT_EQ(Refusal({"explain", "all"}).exit, ExitCode::kUsage);
 }
 
-TEST(CommandLineTest, TellsItsWords) {
+TEST(CommandLineTest, ListsItsWords) {
   const std::vector<CommandWords> words = WordsOf(MakeCommands());
   ASSERT_EQ(words.size(), MakeCommands().size() + 1);
   const auto has = [](const CommandWords& command, const std::string& option) {
@@ -323,7 +323,7 @@ TEST(CommandLineTest, TellsItsWords) {
   EXPECT_FALSE(has(*get, "--json"));
 }
 
-TEST(CommandLineTest, TellsItsVersion) { EXPECT_EQ(Help({"--version"}).find("rcvlink-cli "), 0U); }
+TEST(CommandLineTest, PrintsItsVersion) { EXPECT_EQ(Help({"--version"}).find("rcvlink-cli "), 0U); }
 
 }  // namespace
 }  // namespace cli

@@ -84,7 +84,7 @@ TEST(ExchangeTest, ADownloadOfASilentVelmarReceiverIsCancelled) {
 }
 
 // What is left after any cut is read, and nothing but the last entries differ.
-TEST(ExchangeTest, AReportThatBreaksOffIsReadAsFarAsItGoes) {
+TEST(ExchangeTest, ATruncatedReportIsReadUpToItsEnd) {
   const std::string whole = Recorded("quorin-retries.txt");
   for (std::size_t length = 0; length < whole.size(); length += 7) {
     const Exchange exchange = Parse(whole.substr(0, length));
@@ -95,7 +95,7 @@ TEST(ExchangeTest, AReportThatBreaksOffIsReadAsFarAsItGoes) {
   EXPECT_EQ(cut.remarks[0], "The report ends in the middle of its last line.");
 }
 
-TEST(ExchangeTest, WhatStandsInFrontIsRemarkedAndNotLost) {
+TEST(ExchangeTest, TextBeforeTheFirstStampGetsARemark) {
   const Exchange exchange = Parse("half a line\r\n00:00:01.0000      7 Bye!\r\n");
   ASSERT_EQ(exchange.entries.size(), 1U);
   EXPECT_EQ(exchange.entries[0].meaning, "the library is unloaded");
@@ -103,7 +103,7 @@ TEST(ExchangeTest, WhatStandsInFrontIsRemarkedAndNotLost) {
   EXPECT_EQ(exchange.remarks[0], "The first 13 bytes are not part of a report.");
 }
 
-TEST(ExchangeTest, WhatIsNoReportHasNoEntries) {
+TEST(ExchangeTest, ATextThatIsNoReportHasNoEntries) {
   for (const char* text : {"",
                            "hello\r\n",
                            "12:00:00 36 Bye!\r\n",
@@ -198,7 +198,7 @@ TEST(ExchangeTest, ACodeIsExplainedOnce) {
   EXPECT_EQ(Parse(refusal + refusal).Codes().size(), 1U);
 }
 
-TEST(ExchangeTest, AnEditorsUtf16IsRemarked) {
+TEST(ExchangeTest, AUtf16FileGetsARemark) {
   for (const char* mark : {"\xFF\xFE", "\xFE\xFF"}) {
     EXPECT_EQ(Parse(mark).remarks.size(), 2U) << "the marks are no line either";
   }
@@ -220,7 +220,7 @@ TEST(ExchangeTest, TheTextHasALineForEachStep) {
   EXPECT_NE(ToText(exchange, true).find("    | CSerialConnection::Flush\n"), std::string::npos);
 }
 
-TEST(ExchangeTest, TellsAGapInTheUnitThatFits) {
+TEST(ExchangeTest, ShowsAGapInTheUnitThatFits) {
   EXPECT_EQ(Gap(0), "");
   EXPECT_EQ(Gap(999), "+999 ms");
   EXPECT_EQ(Gap(1000), "+1.0 s");
@@ -283,7 +283,7 @@ TEST(ExchangePageTest, NeedsNothingButItself) {
   EXPECT_NE(page.find("0x800705B4 no answer in time"), std::string::npos);
 }
 
-TEST(ExchangePageTest, ALongReportIsCutAndThatIsSaid) {
+TEST(ExchangePageTest, ALongReportIsCutWithARemark) {
   Exchange exchange;
   exchange.entries.resize(kMostPageEntries + 1);
   EXPECT_NE(ToPage(exchange, "a").find("shows the first 20000 of 20001 entries"),

@@ -54,7 +54,7 @@ TEST(PortListTest, DevicesOfTheDriverFollowWithTheirIds) {
   EXPECT_EQ(device.product, "5678");
 }
 
-TEST(PortListTest, OtherDriversAreNoneOfOurs) {
+TEST(PortListTest, DevicesOfOtherDriversAreNotListed) {
   FakeSource source;
   source.usb = {{kDevice, L"HidUsb", L"Mouse"}, {LR"(\\?\usb#other#{1})", L"", L""}};
   EXPECT_TRUE(ListPorts(source).empty());

@@ -8,7 +8,7 @@
 namespace cli {
 namespace {
 
-TEST(ResultsTest, EveryCodeOfTheLibraryHasItsOwnWords) {
+TEST(ResultsTest, EveryCodeOfTheLibraryHasItsOwnText) {
   EXPECT_EQ(MeaningOf(S_OK), "done");
   EXPECT_EQ(MeaningOf(S_FALSE), "no result: nothing found, aborted, or ended by the receiver");
   EXPECT_EQ(MeaningOf(E_INVALIDARG), "invalid argument");
@@ -23,7 +23,7 @@ TEST(ResultsTest, EveryCodeOfTheLibraryHasItsOwnWords) {
   EXPECT_EQ(MeaningOf(static_cast<long>(0x80070005)), "access denied: in use, or not allowed");
 }
 
-TEST(ResultsTest, WindowsHasWordsForTheOthers) {
+TEST(ResultsTest, OtherCodesHaveTheTextOfWindows) {
   const std::string text = MeaningOf(ResultOfWin32(ERROR_DISK_FULL));
   EXPECT_FALSE(text.empty());
   EXPECT_EQ(text.find_first_of("\r\n"), std::string::npos);
@@ -42,7 +42,7 @@ TEST(ResultsTest, ExitCodesDiffer) {
   }
 }
 
-TEST(ResultsTest, AFailureTellsWhatWhereCodeAndMeaning) {
+TEST(ResultsTest, AFailureShowsWhatWhereCodeAndMeaning) {
   const Failure failure{.tried = "download A.DAT",
                         .port = "COM7",
                         .code = ResultOfWin32(ERROR_TIMEOUT),
@@ -68,7 +68,7 @@ TEST(ResultsTest, ACodeThatReadsAsASuccessIsNotShown) {
   }
 }
 
-TEST(ResultsTest, WhatIsKeptIsTold) {
+TEST(ResultsTest, TheKeptFileIsShown) {
   const Failure failure{.tried = "download A.DAT", .code = S_OK, .hint = "x", .kept = "A.DAT.part"};
   EXPECT_NE(Describe(failure).find("kept in A.DAT.part\n"), std::string::npos);
   EXPECT_EQ(ToJson(failure).at("kept"), "A.DAT.part");

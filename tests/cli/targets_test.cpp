@@ -82,7 +82,7 @@ TEST_F(TargetsTest, WhatAnEarlierDownloadLeftIsKeptUnlessForced) {
   EXPECT_EQ(forced.Choose(L"a"), folder_.path() / L"a");
 }
 
-TEST_F(TargetsTest, FoldersThatCanBeMadeWillDo) {
+TEST_F(TargetsTest, FoldersThatCanBeMadeAreAccepted) {
   EXPECT_NO_THROW(Targets(Into()).CheckFolder());
   EXPECT_NO_THROW(Targets(Into(L"new\\deep\\")).CheckFolder());
   EXPECT_NO_THROW(Targets(Into(L"a.dat")).CheckFolder());

@@ -26,7 +26,7 @@ TEST_F(Cli, RemoveThatIsRefusedFailsInHexAndWords) {
   EXPECT_THAT(result.errors, HasSubstr("0x8007048F"));
 }
 
-TEST_F(Cli, MoveIsRefusedWithASentence) {
+TEST_F(Cli, MoveIsRefusedWithAMessage) {
   const bed::SimulatedPort receiver({"quorin"}, {{"a.jps", "a"}});
   const auto result = RunOn(receiver, {"mv", "a.jps", "b.jps"});
   EXPECT_EQ(result.status, kFailed);
@@ -55,7 +55,7 @@ TEST_F(Cli, SettingsReachTheReceiverInItsOwnWords) {
 }
 
 // What the RTS line does is not seen from here.
-TEST_F(Cli, AnRtsLineIsNotConfirmedAndSaidToBeSo) {
+TEST_F(Cli, AnRtsLineIsReportedAsNotConfirmed) {
   const bed::SimulatedPort receiver({"quorin"});
   const auto result = RunOn(receiver, {"set", "rts", "off", "--json"});
   EXPECT_EQ(result.status, kDone);
@@ -74,7 +74,7 @@ TEST_F(Cli, ANewSpeedIsTried) {
   EXPECT_NE(transcript.find("> dm", transcript.find("= speed 57600")), std::string::npos);
 }
 
-TEST_F(Cli, ARefusedSpeedIsSaidToBeRefused) {
+TEST_F(Cli, ARefusedSpeedIsReportedAsRefused) {
   for (const char* family : {"quorin", "velmar"}) {
     const bed::SimulatedPort receiver({family}, {{"a.jps", "a"}});
     const auto result = RunOn(receiver, {"set", "baud", "12345", "--protocol", family});
@@ -96,7 +96,7 @@ TEST_F(Cli, ANewSpeedIsConfirmedByTheFamilyThatWasFound) {
 }
 
 // A question that nobody needs is time at the cable. Two questions of each are the greeting's.
-TEST_F(Cli, CommandsAskOnlyWhatTheyNeed) {
+TEST_F(Cli, CommandsSendOnlyWhatTheyNeed) {
   const bed::SimulatedPort receiver({"quorin"}, {{"a.jps", "a"}, {"b.jps", "b"}});
   const auto questions = [&receiver] {
     const std::string transcript = receiver.Transcript();
@@ -164,7 +164,7 @@ TEST_F(SetMemory, WithoutMemoryANewSpeedIsNotRemembered) {
   EXPECT_THAT(FirstTry(receiver), HasSubstr(": 9600 bit/s, RTS off"));
 }
 
-TEST_F(SetMemory, ALostReceiverIsSaidToBeAndForgotten) {
+TEST_F(SetMemory, ALostReceiverIsReportedAndForgotten) {
   const bed::SimulatedPort receiver({"quorin", "--stray-speed", "19200"});
   const auto result = SetBaud(receiver, kOtherSpeed, "--json");
   EXPECT_EQ(result.status, kNoReceiver);
@@ -177,7 +177,7 @@ TEST_F(SetMemory, ALostReceiverIsSaidToBeAndForgotten) {
   EXPECT_THAT(FirstTry(receiver), HasSubstr(": 115200 bit/s, RTS on"));
 }
 
-TEST_F(Cli, ASettingThatLosesTheReceiverNeedsAYes) {
+TEST_F(Cli, ASettingThatLosesTheReceiverNeedsTheYesOption) {
   const bed::SimulatedPort receiver({"quorin"});
   for (const std::vector<std::string>& change :
        std::vector<std::vector<std::string>>{{"set", "parity", "odd"}, {"set", "stopbits", "2"}}) {

@@ -22,7 +22,7 @@ TEST_F(Cli, GetBringsTheFile) {
   EXPECT_THAT(result.output, HasSubstr("3000 bytes"));
 }
 
-TEST_F(Cli, GetSpeaksLittleWhenQuiet) {
+TEST_F(Cli, GetPrintsNothingWhenQuiet) {
   const bed::SimulatedPort receiver({"quorin"}, {{"a.jps", Content(30)}});
   const auto result = RunOn(receiver, {"get", "a.jps", "--quiet"});
   EXPECT_EQ(result.status, kDone);
@@ -103,7 +103,7 @@ TEST_F(Cli, ACompleteDownloadSurvivesARenameThatFails) {
   EXPECT_EQ(folder.Read("a.jps"), "mine");
 }
 
-TEST_F(Cli, WhatCameOfAFailedDownloadIsKeptWhenAskedFor) {
+TEST_F(Cli, TheDataOfAFailedDownloadIsKeptWhenAskedFor) {
   const bed::SimulatedPort receiver({"quorin", "--end-block", "2"}, {{"a.jps", Content(3000)}});
   const auto result = RunOn(receiver, {"get", "a.jps", "--keep-partial"});
   EXPECT_EQ(result.status, kFailed);
@@ -128,7 +128,7 @@ TEST_F(Cli, APatternThatFitsNothingTransfersNothing) {
   EXPECT_THAT(LocalFiles(), IsEmpty());
 }
 
-TEST_F(Cli, FilesThatAreHereCanBeSkipped) {
+TEST_F(Cli, ExistingFilesCanBeSkipped) {
   folder.Write("a.jps", Content(30));
   folder.Write("b.jps", "mine");
   const bed::SimulatedPort receiver(
@@ -199,7 +199,7 @@ TEST_F(Cli, AFileThatCannotGetItsNameStopsNoOther) {
 }
 
 // Each of them is told although no receiver is there: the search comes after.
-TEST_F(Cli, WhatIsWrongOnThisComputerIsToldBeforeTheSearch) {
+TEST_F(Cli, LocalErrorsAreReportedBeforeTheSearch) {
   folder.Write("taken", "a file");
   folder.Write("b.jps.part", "what came of an earlier download");
   for (const std::vector<std::string>& line :
@@ -246,7 +246,7 @@ TEST_F(Cli, FilesThatTheDiskHasNoRoomForAreRefusedAtOnce) {
   EXPECT_THAT(LocalFiles(), IsEmpty());
 }
 
-TEST_F(Cli, AHashOfTheFileIsTold) {
+TEST_F(Cli, TheHashOfTheFileIsShown) {
   constexpr char kHashOfAbc[] = "ba7816bf8f01cfea414140de5dae2223b00361a396177a9cb410ff61f20015ad";
   const bed::SimulatedPort receiver({"quorin"}, {{"a.jps", "abc"}});
   const auto document =
@@ -334,7 +334,7 @@ TEST_F(Cli, AFileGoesToTheStandardOutput) {
   EXPECT_THAT(LocalFiles(), IsEmpty());
 }
 
-TEST_F(Cli, AFileGoesNowhere) {
+TEST_F(Cli, AFileGoesToTheNullDevice) {
   const bed::SimulatedPort receiver({"quorin"}, {{"a.jps", Content(3000)}});
   const auto result = RunOn(receiver, {"get", "a.jps", "-o", "NUL"});
   EXPECT_EQ(result.status, kDone) << result.errors;
@@ -357,7 +357,7 @@ TEST_F(Cli, ProgressIsShownAsAskedFor) {
 }
 
 // The set-up of a download and the reading of a list are shown as well.
-TEST_F(Cli, ATerminalShowsWhatIsWaitedFor) {
+TEST_F(Cli, ATerminalShowsWhatTheProgramWaitsFor) {
   const bed::SimulatedPort receiver({"quorin", "--reply-silence", "3:print,/log/@1"},
                                     {{"a.jps", Content(3000)}});
   bed::Program program(

@@ -31,7 +31,7 @@ class Find : public Cli {
   }
 };
 
-TEST_F(Find, TellsTheSettingThatAnswered) {
+TEST_F(Find, ShowsTheSettingThatAnswered) {
   const bed::SimulatedPort receiver({"quorin"});
   const auto text = RunOn(receiver, {"find"});
   EXPECT_EQ(text.status, kDone) << text.errors;
@@ -43,7 +43,7 @@ TEST_F(Find, TellsTheSettingThatAnswered) {
   EXPECT_EQ(found.at("rts"), "off");
 }
 
-TEST_F(Find, SaysEachTryToo) {
+TEST_F(Find, ShowsEachTryToo) {
   const bed::SimulatedPort receiver({"quorin", "--speed", "9600"});
   const auto result = Sweep(receiver, {"find", "--no-memory"});
   EXPECT_EQ(result.status, kDone) << result.errors;
@@ -88,7 +88,7 @@ TEST_F(Find, ASingleTryHasNoLine) {
   EXPECT_EQ(RunOn(receiver, {"find", "--protocol", "quorin", "--progress", "lines"}).errors, "");
 }
 
-TEST_F(Find, ATerminalShowsTheTryAndTakesItAway) {
+TEST_F(Find, ATerminalShowsTheTryAndErasesIt) {
   const bed::SimulatedPort receiver({"quorin", "--speed", "115200"});
   bed::Program program(kProgram,
                        {"find", NameOf(receiver), "--protocol", "quorin", "--no-memory"},
@@ -102,7 +102,7 @@ TEST_F(Find, ATerminalShowsTheTryAndTakesItAway) {
 }
 
 // Nothing else is shown after the try, which would cover it.
-TEST_F(Find, NothingIsLeftOfATryThatWasInVain) {
+TEST_F(Find, AFailedTryIsErased) {
   const bed::SimulatedPort silent({"quorin", "--mute", "*"});
   const auto result =
       bed::Program(kProgram,
@@ -167,7 +167,7 @@ TEST_F(Find, SeveralPortsAreSearchedSideBySide) {
 
 // The silent port comes first and takes long: whoever asks one after the other would have come to
 // the end before the second answers.
-TEST_F(Find, APortThatAnswersIsToldBeforeTheSilentOnesEnd) {
+TEST_F(Find, APortThatAnswersIsShownBeforeTheSilentOnesEnd) {
   const bed::SimulatedPort silent({"quorin", "--mute", "*"});
   const bed::SimulatedPort answering({"quorin", "--id", "QR2"});
   bed::Program program(
@@ -196,7 +196,7 @@ TEST_F(Find, AComPortIsSerialAmongUsbDevices) {
   ASSERT_EQ(found.at("failures").size(), 1U);
 }
 
-TEST_F(Find, WithoutASpeedThatOfThePortIsTold) {
+TEST_F(Find, WithoutASpeedTheSpeedOfThePortIsReported) {
   const bed::SimulatedPort receiver({"quorin"});
   ASSERT_EQ(RunOn(receiver, {"find"}).status, kDone);
   const auto result = Sweep(receiver, {"find", "--rts", "on", "--json"});
@@ -267,7 +267,7 @@ TEST_F(Find, ListedPortsAreNamedAndAllAreAsked) {
   EXPECT_THAT(found.output, StartsWith(name + " (serial, 9600 bit/s, RTS on): Quorin receiver"));
 }
 
-TEST_F(Find, AComPortOnUsbIsSaidToBeSerial) {
+TEST_F(Find, AComPortOnUsbGivesAHint) {
   const auto usb = Run({"ls", "COM99", "--link", "usb"});
   EXPECT_THAT(usb.errors, HasSubstr("COM ports are for --link serial"));
 }

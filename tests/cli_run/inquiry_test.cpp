@@ -49,7 +49,7 @@ TEST_F(Cli, ListShowsNamesSizesAndTotal) {
   EXPECT_THAT(result.output, HasSubstr("2 files, 730 bytes"));
 }
 
-TEST_F(Cli, ListAsJsonTellsFilesAndTotal) {
+TEST_F(Cli, ListAsJsonHasFilesAndTotal) {
   const bed::SimulatedPort receiver({"quorin"}, {{"a.jps", Content(700)}});
   const auto result = RunOn(receiver, {"ls", "--json"});
   ASSERT_EQ(result.status, kDone) << result.errors;
@@ -65,7 +65,7 @@ TEST_F(Cli, ListAsJsonTellsFilesAndTotal) {
   EXPECT_EQ(json::parse(RunOn(empty, {"ls", "--json"}).output).at("files"), json::array());
 }
 
-TEST_F(Cli, CheckTellsThatTheReceiverAnswers) {
+TEST_F(Cli, CheckReportsThatTheReceiverAnswers) {
   const bed::SimulatedPort receiver({"quorin"});
   EXPECT_EQ(RunOn(receiver, {"check"}).status, kDone);
 }
@@ -88,7 +88,7 @@ TEST_F(Cli, AMissingPortIsNoReceiver) {
   EXPECT_THAT(result.errors, HasSubstr("does not exist"));
 }
 
-TEST_F(Cli, ErrorsAsJsonTellAll) {
+TEST_F(Cli, ErrorsAsJsonHaveAllFields) {
   const auto result = Run({"ls", "COM99", "--json"});
   EXPECT_EQ(result.status, kNoReceiver);
   const json error = json::parse(result.output).at("error");
@@ -99,7 +99,7 @@ TEST_F(Cli, ErrorsAsJsonTellAll) {
   EXPECT_FALSE(error.at("meaning").get<std::string>().empty());
 }
 
-TEST_F(Cli, UsbIsRefusedWithASentence) {
+TEST_F(Cli, UsbIsRefusedWithAMessage) {
   const auto result = Run({"find", "COM99", "--link", "usb"});
   EXPECT_NE(result.status, kDone);
   EXPECT_THAT(result.errors, HasSubstr("USB"));
@@ -128,7 +128,7 @@ TEST_F(Cli, WrongCommandLinesAreUsageErrors) {
   }
 }
 
-TEST_F(Cli, HelpTellsTheExitCodes) {
+TEST_F(Cli, HelpShowsTheExitCodes) {
   const auto result = Run({"--help"});
   EXPECT_EQ(result.status, kDone);
   for (const char* text : {"ports", "find", "info", "ls", "get", "rm", "mv", "set", "check"}) {

@@ -175,7 +175,7 @@ TEST_F(Mirror, AnEmptyFileIsNotDeleted) {
   EXPECT_EQ(NamesOn(receiver), Names{"a.jps"});
 }
 
-TEST_F(Mirror, KeepsFileTimesAndSaysTheZone) {
+TEST_F(Mirror, KeepsFileTimesAndShowsTheZone) {
   const bed::TempFolder source;
   source.Write("a.jps", Content(30));
   const auto time = std::filesystem::last_write_time(source / "a.jps") - std::chrono::hours(30);
@@ -214,7 +214,7 @@ TEST_F(Mirror, DeletesOnlyWhatASecondDownloadVerified) {
   EXPECT_EQ(downloads, 4U) << transcript;
 }
 
-TEST_F(Mirror, SaysAtWhichFileItIsAndHowLongAllTake) {
+TEST_F(Mirror, ShowsTheCurrentFileAndTheTimeLeft) {
   const bed::SimulatedPort receiver({"quorin"},
                                     {{"a.jps", Content(30000)}, {"b.jps", Content(40)}});
   const auto result = RunMirror(receiver, {});
@@ -229,7 +229,7 @@ TEST_F(Mirror, WithoutThenDeleteNothingIsDeleted) {
   EXPECT_EQ(NamesOn(receiver), Names{"a.jps"});
 }
 
-TEST_F(Mirror, CtrlCEndsItAndLeavesNothingHalf) {
+TEST_F(Mirror, CtrlCEndsItAndLeavesNoPartialFile) {
   const bed::SimulatedPort receiver({"quorin", "--pace"},
                                     {{"a.jps", Content(30)}, {"b.jps", Content(200000)}});
   bed::Program program(

@@ -35,7 +35,7 @@ TEST_F(Cli, AReportBecomesAnExchangeAndAPage) {
   std::filesystem::remove(std::filesystem::temp_directory_path() / name);
 }
 
-TEST_F(Cli, WhatIsNoReportIsSaidToBeNone) {
+TEST_F(Cli, AFileThatIsNoReportIsRefused) {
   folder.Write("letter.txt", "Dear Sir\r\n");
   const auto letter = Run({"report", "letter.txt"});
   EXPECT_EQ(letter.status, kFailed);

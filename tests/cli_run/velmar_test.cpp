@@ -29,7 +29,7 @@ class VelmarCli : public Cli {
   }
 };
 
-TEST_F(VelmarCli, FindAndInfoTellTheFamily) {
+TEST_F(VelmarCli, FindAndInfoShowTheFamily) {
   const bed::SimulatedPort receiver({"velmar", "--id", "VM7", "--model", "VR9"});
   const auto found = RunOn(receiver, {"find"});
   EXPECT_EQ(found.status, kDone) << found.errors;
@@ -56,7 +56,7 @@ TEST_F(VelmarCli, ListShowsNamesSizesAndTotal) {
 }
 
 // The library's buffer ends the list: whoever reads it has to know.
-TEST_F(VelmarCli, AListThatMayBeCutIsSaidToBe) {
+TEST_F(VelmarCli, AListThatMayBeCutGivesAWarning) {
   Files files;
   const auto add_until = [&](size_t count) {
     while (files.size() < count) files.emplace("file" + std::to_string(100 + files.size()), "x");
@@ -169,7 +169,7 @@ TEST_F(VelmarCli, AListThatWasRefusedIsReadAgain) {
 }
 
 // The rest of a list that did not fit is still on its way when the next command goes out.
-TEST_F(VelmarCli, AListThatDoesNotFitSpoilsNothing) {
+TEST_F(VelmarCli, AListThatDoesNotFitDoesNotDisturbTheNextCommand) {
   constexpr size_t kFiles = 110;
   Files files;
   while (files.size() < kFiles) {
@@ -219,7 +219,7 @@ TEST_F(VelmarCli, ParitiesReachTheReceiverInItsOwnWords) {
   EXPECT_THAT(receiver.Transcript(), HasSubstr(R"(> COM 9600 O 8 1 N\r)"));
 }
 
-TEST_F(VelmarCli, TheRtsLineIsRefusedWithASentence) {
+TEST_F(VelmarCli, TheRtsLineIsRefusedWithAMessage) {
   const bed::SimulatedPort receiver({"velmar"});
   const auto result = RunOn(receiver, {"set", "rts", "off"});
   EXPECT_EQ(result.status, kFailed);

@@ -71,7 +71,7 @@ TEST_F(PlainFamily, IsNotFoundWhereNobodyAnswers) {
   EXPECT_EQ(receiver, nullptr);
 }
 
-TEST_F(PlainFamily, TellsWhoItIs) {
+TEST_F(PlainFamily, ReportsItsIdentity) {
   ASSERT_EQ(Find(PlainReceiver()), S_OK);
   CReceiverInfo info{};
   ASSERT_EQ(devapi::GetReceiverInfo(receiver, nullptr, &info), S_OK);

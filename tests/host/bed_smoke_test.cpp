@@ -105,7 +105,7 @@ TEST_F(BedTest, ReceiverCanBeKilled) {
   EXPECT_EQ(OpenPort(receiver.path()), INVALID_HANDLE_VALUE);
 }
 
-TEST(BedRefusal, TellsWhatTheSimulatorSaid) {
+TEST(BedRefusal, ReportsWhatTheSimulatorPrinted) {
   EXPECT_THROW(bed::SimulatedPort({"no-such-family"}), bed::Error);
 }
 

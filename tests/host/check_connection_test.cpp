@@ -14,7 +14,7 @@ namespace {
 
 constexpr short kUntouched = 7;
 
-TEST(ApiCheckConnection, GreetsTheReceiverAgain) {
+TEST(ApiCheckConnection, ProbesTheReceiverAgain) {
   const bed::SimulatedPort port({"quorin"});
   const host::Receiver receiver(port);
   const host::Report report;
@@ -31,7 +31,7 @@ TEST(ApiCheckConnection, GreetsTheReceiverAgain) {
   EXPECT_THAT(sent, ElementsAreArray(host::HandshakeOfHost()));
 }
 
-TEST(ApiCheckConnection, TellsASilentReceiverAndFindsItAgain) {
+TEST(ApiCheckConnection, ReportsASilentReceiverAndFindsItAgain) {
   bed::SimulatedPort port({"quorin"});
   const host::Receiver receiver(port);
   const host::Report report;

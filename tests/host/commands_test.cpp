@@ -133,7 +133,7 @@ TEST_F(ApiPortSettings, RtsIsOnOrOff) {
   ExpectSetting("rts,on", "= port c rts on");
 }
 
-TEST_F(ApiPortSettings, SpeedIsTheReceiversOnly) {
+TEST_F(ApiPortSettings, SpeedChangesOnTheReceiverOnly) {
   EXPECT_EQ(devapi::DCSetRcvBaudrate(handle_, 4294967295UL), S_OK);
   port_.WaitForTranscript(R"(rate,-1\r\n)");
   EXPECT_EQ(devapi::DCSetRcvBaudrate(handle_, 19200), S_OK);

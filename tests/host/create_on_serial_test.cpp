@@ -59,7 +59,7 @@ long Create(const bed::SimulatedPort& port,
   return devapi::CreateReceiverOnSerial(name.data(), protocol, &settings, abort_event, handle);
 }
 
-TEST(ApiCreateOnSerial, TellsItsStepsAndGreetsTheReceiver) {
+TEST(ApiCreateOnSerial, TracesItsStepsAndProbesTheReceiver) {
   const bed::SimulatedPort port({"quorin"});
   const std::string name = host::Narrow(port.name());
   const host::Report report;

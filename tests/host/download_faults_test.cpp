@@ -79,7 +79,7 @@ INSTANTIATE_TEST_SUITE_P(
 // What does not touch the blocks does not touch the transfer either.
 using ApiDownloadIgnores = FaultyDownload;
 
-TEST_P(ApiDownloadIgnores, WhatIsNoneOfItsBusiness) {
+TEST_P(ApiDownloadIgnores, WhatDoesNotTouchTheBlocks) {
   EXPECT_EQ(Download(), S_OK);
   EXPECT_TRUE(HasWholeFile());
   port_.WaitForTranscript("\n> #\n");

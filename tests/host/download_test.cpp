@@ -76,7 +76,7 @@ TEST_P(ApiDownloadOf, DeliversEveryByte) {
 
 INSTANTIATE_TEST_SUITE_P(Sizes, ApiDownloadOf, testing::Values(1, 511, 512, 513, 60000));
 
-TEST(ApiDownload, TellsItsSteps) {
+TEST(ApiDownload, TracesItsSteps) {
   const bed::SimulatedPort port({"quorin"}, {{"A.log", host::Content(20000)}});
   const host::Receiver receiver(port);
   const host::Report report;
@@ -162,7 +162,7 @@ TEST(ApiDownload, RunsOnTwoPortsAtOnce) {
 }
 
 // The size that the receiver tells is what percents are counted by; the blocks are what counts.
-TEST(ApiDownload, PercentsFollowTheSizeTold) {
+TEST(ApiDownload, PercentsFollowTheReportedSize) {
   const bed::SimulatedPort port({"quorin", "--speed", "115200", "--lie-size", "A.log=256"},
                                 {{"A.log", host::Content(8000)}});
   const host::Receiver receiver(port, CBR_115200);
@@ -227,7 +227,7 @@ TEST(ApiDownload, RefusedGetFails) {
 }
 
 // On a serial port the host's own failure is its own to see; the receiver is told to stop.
-TEST(ApiDownload, FailingStreamEndsItWithoutAWord) {
+TEST(ApiDownload, FailingStreamEndsItWithoutAFailure) {
   const bed::SimulatedPort port({"quorin", "--speed", "115200"}, {{"A.log", host::Content(9000)}});
   const host::Receiver receiver(port, CBR_115200);
   host::MemoryStream stream;

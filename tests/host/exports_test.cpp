@@ -73,7 +73,7 @@ TEST(ApiExports, EveryNameIsThere) {
   for (const std::string& name : names) EXPECT_NE(Find(name), nullptr) << name;
 }
 
-TEST(ApiExports, BothNamesOfAFunctionLeadToTheSamePlace) {
+TEST(ApiExports, BothNamesOfAFunctionHaveTheSameAddress) {
   std::map<std::string, FARPROC> microsoft;
   std::map<std::string, FARPROC> gnu;
   for (const std::string& name : ExportedNames()) {
@@ -90,7 +90,7 @@ TEST(ApiExports, BothNamesOfAFunctionLeadToTheSamePlace) {
   }
 }
 
-TEST(ApiExports, TheHeaderLeadsToThemToo) {
+TEST(ApiExports, TheHeaderDeclaresTheSameFunctions) {
   EXPECT_EQ(reinterpret_cast<void*>(&devapi::DeleteFileW),
             reinterpret_cast<void*>(Find("?DeleteFileW@devapi@@YAJPEAXPEA_W@Z")));
   EXPECT_EQ(

@@ -61,7 +61,7 @@ std::ostream& operator<<(std::ostream& out, const Amount& amount) { return out <
 
 class ApiFileListOf : public testing::TestWithParam<Amount> {};
 
-TEST_P(ApiFileListOf, TellsNamesSizesAndTimes) {
+TEST_P(ApiFileListOf, HasNamesSizesAndTimes) {
   bed::TempFolder folder;
   for (size_t i = 0; i < GetParam().files; ++i) {
     folder.Write(NumberedName(i), host::Content(i * i * 7));
@@ -97,7 +97,7 @@ INSTANTIATE_TEST_SUITE_P(
                     Amount{50, {"--pieces", "23", "--piece-gap", "1"}},
                     Amount{3, {"--garbage", "9", "--other-tag-first", "print,/log"}}));
 
-TEST(ApiFileList, TellsItsSteps) {
+TEST(ApiFileList, TracesItsSteps) {
   const bed::SimulatedPort port({"quorin"}, {{"A.log", "abc"}});
   const host::Receiver receiver(port);
   const host::Report report;
@@ -115,7 +115,7 @@ TEST(ApiFileList, TellsItsSteps) {
 }
 
 // Names travel as bytes of the thread's code page.
-TEST(ApiFileList, NamesBeyondAsciiComeAndGo) {
+TEST(ApiFileList, NamesBeyondAsciiAreConverted) {
   const std::u8string utf8 = u8"Gr\u00F6\u00DFe.log";
   const std::string bytes(utf8.begin(), utf8.end());
   const std::string content = host::Content(700);

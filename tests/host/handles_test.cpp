@@ -43,7 +43,7 @@ void ExpectUnknown(void* handle) {
   EXPECT_EQ(stream.writes, 0U);
 }
 
-TEST(ApiHandles, NeverHandedOutAreUnknown) {
+TEST(ApiHandles, ThatWereNeverGivenAreUnknown) {
   int something = 0;
   const host::Report report;
   ExpectUnknown(nullptr);
@@ -97,7 +97,7 @@ TEST(ApiHandles, CountTheirUsers) {
   EXPECT_EQ(devapi::OpenReceiver(name.data(), &again), S_FALSE);
 }
 
-TEST(ApiHandles, AreTornDownByName) {
+TEST(ApiHandles, AreDestroyedByName) {
   const bed::SimulatedPort port({"quorin"});
   host::Receiver receiver(port);
   void* const handle = receiver.Release();

@@ -50,7 +50,7 @@ TEST_P(ApiVelmarInfoRefused, LeavesTheReceiverFree) {
   EXPECT_EQ(host::OnThread([&] { return Delete(receiver.get(), L"A.log"); }).get(), S_OK);
 }
 
-TEST_P(ApiVelmarInfoRefused, TakesNothingFromAThreadThatHeldItBefore) {
+TEST_P(ApiVelmarInfoRefused, KeepsTheLockOfAThreadThatHeldItBefore) {
   const host::Velmar receiver({GetParam(), "log versiona"});
   ASSERT_EQ(devapi::LockConnection(receiver.get(), nullptr), S_OK);
   EXPECT_EQ(GetInfo(receiver.get()), S_FALSE);
@@ -67,7 +67,7 @@ INSTANTIATE_TEST_SUITE_P(Refusals,
                          });
 
 // It gives back a lock that it did not get: that is another thread's, and stays it.
-TEST(ApiVelmarInfo, ThatDidNotGetTheLockTakesItFromNobody) {
+TEST(ApiVelmarInfo, ThatDidNotGetTheLockReleasesNone) {
   const host::Velmar receiver({});
   ASSERT_EQ(devapi::LockConnection(receiver.get(), nullptr), S_OK);
   const host::Report report;

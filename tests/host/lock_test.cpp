@@ -50,7 +50,7 @@ TEST_F(ApiLock, KeepsOtherThreadsOut) {
                           "CQuorinProtocol::UnlockConnection - connection is unlocked [HANDLE]"));
 }
 
-TEST_F(ApiLock, IsGivenBackAsOftenAsItWasTaken) {
+TEST_F(ApiLock, IsReleasedAsOftenAsItWasTaken) {
   EXPECT_EQ(Lock(), S_OK);
   EXPECT_EQ(TryLock(), S_OK);
   EXPECT_EQ(Unlock(), S_OK);

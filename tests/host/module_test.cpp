@@ -18,7 +18,7 @@ using testing::Not;
 
 namespace {
 
-TEST(ApiModule, LoadLineNeverShows) {
+TEST(ApiModule, LoadLineIsInNoReport) {
   const host::Report report;
   host::LibraryCopy copy;
   ASSERT_TRUE(copy.Load());
@@ -33,7 +33,7 @@ TEST(ApiModule, LoadLineNeverShows) {
   DeleteFileW(host::ReportPath(name).c_str());
 }
 
-TEST(ApiModule, SaysGoodbyeInItsReportOnly) {
+TEST(ApiModule, WritesByeInItsReportOnly) {
   const std::wstring name = host::NewReportName();
   host::LibraryCopy copy;
   ASSERT_TRUE(copy.Load());
@@ -65,7 +65,7 @@ class ApiModuleWithReceiver : public testing::Test {
   const std::wstring path_ = host::ReportPath(name_);
 };
 
-TEST_F(ApiModuleWithReceiver, LetsGoOfItWhenUnloaded) {
+TEST_F(ApiModuleWithReceiver, ClosesItWhenUnloaded) {
   LoadAndUnload();  // the system keeps something of the first time
   EXPECT_EQ(LoadAndUnload(), 0);
 

@@ -83,7 +83,7 @@ std::ostream& operator<<(std::ostream& out, const Model& model) { return out << 
 
 class ApiReceiverInfoOfModel : public testing::TestWithParam<Model> {};
 
-TEST_P(ApiReceiverInfoOfModel, TellsTheVariant) {
+TEST_P(ApiReceiverInfoOfModel, HasTheVariant) {
   const bed::SimulatedPort port({"quorin", "--model", GetParam().text});
   const host::Receiver receiver(port);
   CReceiverInfo info{};

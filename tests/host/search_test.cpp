@@ -271,7 +271,7 @@ TEST_F(ApiSearchOfNoPort, LooksForTheFamilyNamedOnly) {
       host::CountStarting(report_.LinesFrom(before), "CreateReceiverOnSerial - looking for Q"), 0U);
 }
 
-TEST_F(ApiSearchOfNoPort, TakesAStaleHandleForAFind) {
+TEST_F(ApiSearchOfNoPort, TakesAStaleHandleForAFoundReceiver) {
   void* const stale = &name_;
   handle_ = stale;
   EXPECT_EQ(Search(eInstanceSerial, eProtocolAny), S_OK);

@@ -121,7 +121,7 @@ INSTANTIATE_TEST_SUITE_P(
 // What does not touch the blocks does not touch the transfer either.
 class ApiUsbDownloadIgnores : public testing::TestWithParam<Fault> {};
 
-TEST_P(ApiUsbDownloadIgnores, WhatIsNoneOfItsBusiness) {
+TEST_P(ApiUsbDownloadIgnores, WhatDoesNotTouchTheBlocks) {
   const std::string content = host::Content(kSeveralMb);
   const bed::SimulatedUsb usb(Arguments(GetParam().switches), {{"A.log", content}});
   const host::UsbReceiver receiver(usb);
@@ -156,7 +156,7 @@ TEST(ApiUsbDownload, TakesBlocksInPiecesOfAnySize) {
 
 // --- Time-outs
 
-TEST(ApiUsbDownload, ForgivesThreeTimeoutsInAll) {
+TEST(ApiUsbDownload, AllowsThreeTimeoutsInAll) {
   const ReadTimeout timeout(kShortTimeoutMs);
   const std::string content = host::Content(kSize);
   const bed::SimulatedUsb usb(
@@ -190,7 +190,7 @@ TEST(ApiUsbDownloadSettings, TheRegistrySetsTheTimeout) {
 }
 
 // Four bytes of another type are taken as they are, and no line tells it.
-TEST(ApiUsbDownloadSettings, AnotherTypeIsTakenInSilence) {
+TEST(ApiUsbDownloadSettings, AnotherTypeIsAcceptedWithoutALine) {
   const host::Report report;
   const ReadTimeout timeout(300, REG_BINARY);
   const bed::SimulatedUsb usb({"quorin", "--lost-byte", "0@4"}, {{"A.log", "a"}});
@@ -202,7 +202,7 @@ TEST(ApiUsbDownloadSettings, AnotherTypeIsTakenInSilence) {
   EXPECT_THAT(report.LinesWith("CQuorinProtocol::CQuorinProtocol - file download"), IsEmpty());
 }
 
-TEST(ApiUsbDownloadSettings, WithoutAValueNothingIsSaid) {
+TEST(ApiUsbDownloadSettings, WithoutAValueNothingIsTraced) {
   const host::Report report;
   const UserSettings none;
   const bed::SimulatedUsb usb({"quorin"});
@@ -382,7 +382,7 @@ TEST_P(ApiUsbUnplugged, IsAFailure) {
 
 INSTANTIATE_TEST_SUITE_P(Percents, ApiUsbUnplugged, testing::Values(0, 1, 2));
 
-TEST(ApiUsbDownload, UnpluggedInAWaitItEndsAtOnce) {
+TEST(ApiUsbDownload, EndsAtOnceWhenUnpluggedInAWait) {
   bed::SimulatedUsb usb({"quorin", "--block-silence", "1:3600"}, {{"A.log", host::Content(kSize)}});
   const host::UsbReceiver receiver(usb);
   host::MemoryStream stream;
@@ -394,7 +394,7 @@ TEST(ApiUsbDownload, UnpluggedInAWaitItEndsAtOnce) {
   EXPECT_LT(GetTickCount() - start, 15000U) << "it waited for its time-out";
 }
 
-TEST(ApiUsbDownload, PluggedInAgainItWorks) {
+TEST(ApiUsbDownload, WorksWhenPluggedInAgain) {
   bed::SimulatedUsb usb({"quorin"}, {{"A.log", "a"}});
   {
     const host::UsbReceiver receiver(usb);

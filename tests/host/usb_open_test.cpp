@@ -68,7 +68,7 @@ TEST_F(ApiUsb, BindsAndResetsBothPipesInOrder) {
   EXPECT_EQ(receiver_.Check(), -1);
 }
 
-TEST_F(ApiUsb, ClosingLetsGoOfBothHandles) {
+TEST_F(ApiUsb, ClosingClosesBothHandles) {
   const bed::SimulatedUsb usb({"quorin"});
   EXPECT_EQ(Create(usb), S_OK);
   EXPECT_EQ(devapi::CloseReceiver(receiver_.Release()), S_OK);
@@ -271,7 +271,7 @@ TEST_F(ApiUsb, ListsAndDeletesFiles) {
   devapi::CloseFileList(list);
 }
 
-TEST_F(ApiUsb, TwoDevicesDoNotMeet) {
+TEST_F(ApiUsb, TwoDevicesDoNotDisturbEachOther) {
   const bed::SimulatedUsb usb({"quorin", "--id", "ONE"});
   const bed::SimulatedUsb other({"quorin", "--id", "TWO"});
   const host::UsbReceiver one(usb);

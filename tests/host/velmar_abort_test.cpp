@@ -77,7 +77,7 @@ TEST_F(ApiVelmarAbortedDownload, OfAReceiverThatFallsSilent) {
   EXPECT_TRUE(report_.Has("CSerialConnection::SetSpeed - changing of baudrate [115200 -> 9600]"));
 }
 
-TEST_F(ApiVelmarAbortedDownload, WritesNothingOfATimeOutThatNeverWas) {
+TEST_F(ApiVelmarAbortedDownload, TracesNoTimeOutThatDidNotHappen) {
   Start();
   devapi::Abort(receiver_.get());
   EXPECT_EQ(download_.get(), S_OK);

@@ -51,7 +51,7 @@ void SetModified(const std::filesystem::path& path, const SYSTEMTIME& time) {
   CloseHandle(file);
 }
 
-TEST(ApiVelmarFileList, TellsNamesSizesAndTimes) {
+TEST(ApiVelmarFileList, HasNamesSizesAndTimes) {
   // Year, month, no day of the week, day, hour, minute, second, no milliseconds.
   const SYSTEMTIME times[] = {{2024, 2, 0, 29, 23, 59, 58, 0}, {2023, 12, 0, 1, 0, 2, 3, 0}};
   const bed::TempFolder folder;

@@ -43,7 +43,7 @@ class ApiVelmarSearch : public testing::Test {
   void* handle_ = nullptr;
 };
 
-TEST_F(ApiVelmarSearch, FindsItWithoutAWordOfTheOtherFamily) {
+TEST_F(ApiVelmarSearch, FindsItWithoutAskingTheOtherFamily) {
   ASSERT_EQ(Create(eProtocolVelmar), S_OK);
   EXPECT_NE(handle_, nullptr);
   ExpectSteps(

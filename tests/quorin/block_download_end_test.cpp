@@ -87,7 +87,7 @@ TEST_P(QuorinBlockDownloadEnd, IsDoneThoughTheEndCannotBeWritten) {
   EXPECT_EQ(stream.bytes, content);
 }
 
-TEST_P(QuorinBlockDownloadEnd, SaysEachControlByteWhole) {
+TEST_P(QuorinBlockDownloadEnd, SendsEachControlByteWhole) {
   std::string cut;
   connection->on_write = [&](std::string_view bytes) {
     if (!connection->wait_rule.shielded) cut += bytes;
@@ -110,7 +110,7 @@ TEST_P(QuorinBlockDownloadEnd, GivesEachControlByteThreeSeconds) {
 }
 
 // What a failure of the host's stream gives differs; that the receiver hears of it does not.
-TEST_P(QuorinBlockDownloadEnd, TellsTheReceiverOfAFailedStream) {
+TEST_P(QuorinBlockDownloadEnd, SendsTheReceiverTheEndAfterAFailedStream) {
   GiveFile();
   stream.fail_at_write = 1;
   Download();
@@ -119,7 +119,7 @@ TEST_P(QuorinBlockDownloadEnd, TellsTheReceiverOfAFailedStream) {
   EXPECT_EQ(Controls(), "\x06#");
 }
 
-TEST_P(QuorinBlockDownloadEnd, ReportsNoProgressOfAFailedStream) {
+TEST_P(QuorinBlockDownloadEnd, ReportsNoProgressAfterAFailedStream) {
   GiveLate(FirstBlock());
   stream.fail_at_write = 0;
   Download();
@@ -200,7 +200,7 @@ TEST_P(QuorinBlockDownloadEnd, IsAbortedWithItsNak) {
   EXPECT_EQ(Controls(), "\x15#\x15#");
 }
 
-TEST_P(QuorinBlockDownloadEnd, UsesTheAbortUp) {
+TEST_P(QuorinBlockDownloadEnd, ClearsTheAbort) {
   driver.Abort();
   EXPECT_EQ(Download(), S_FALSE);
   GiveFile();
@@ -214,7 +214,7 @@ TEST_P(QuorinBlockDownloadEnd, GivesTheFailureOfTheEndAfterAnAbort) {
   EXPECT_EQ(Download(), E_HANDLE);
 }
 
-TEST_P(QuorinBlockDownloadEnd, SaysTheEndWhole) {
+TEST_P(QuorinBlockDownloadEnd, SendsTheEndWhole) {
   std::vector<bool> shielded;
   connection->on_write = [&](std::string_view bytes) {
     if (bytes == "#") shielded.push_back(connection->wait_rule.shielded);

@@ -297,7 +297,7 @@ TEST_P(QuorinBlockDownload, DoesNotCountRejectedBlocks) {
 }
 
 // The number in a block has sixteen bits, the one that is expected goes on.
-TEST_P(QuorinBlockDownload, ExpectsNoSequenceNumberBehind65535) {
+TEST_P(QuorinBlockDownload, ExpectsNoSequenceNumberAfter65535) {
   constexpr uint32_t kNumbers = 0x10000;
   uint32_t accepted = 0;
   uint32_t rejected = 0;

@@ -96,7 +96,7 @@ TEST_P(QuorinProgress, IsTruncated) {
   EXPECT_THAT(progress.percents, ElementsAre(99));
 }
 
-TEST_P(QuorinProgress, IsAHundredAtMostForMoreThanWasSaid) {
+TEST_P(QuorinProgress, IsAHundredAtMostForALargerFileThanAnnounced) {
   GiveDataAt(501);
   GiveLastAt(1002, 512);
   Download(400);
@@ -114,7 +114,7 @@ TEST_P(QuorinProgress, IsCutToEightBits) {
   EXPECT_THAT(progress.percents, ElementsAre(267 - 256, 534 - 512, 801 - 768));
 }
 
-TEST_P(QuorinProgress, IsCutToEightBitsHoweverLittleWasSaid) {
+TEST_P(QuorinProgress, IsCutToEightBitsForAMuchLargerFileThanAnnounced) {
   GiveDataAt(501);
   GiveDataAt(1002);
   GiveLastAt(1503);
@@ -171,7 +171,7 @@ TEST_F(QuorinUsbProgress, IsReportedAgainMoreThanHalfASecondAfterTheLastReport) 
 }
 
 // A percent that was not told in time is not made up for while it stays.
-TEST_F(QuorinUsbProgress, IsDroppedNotDeferred) {
+TEST_F(QuorinUsbProgress, IsSkippedNotDeferred) {
   GiveDataAt(100);   // 1.1: changed, too early
   GiveDataAt(600);   // 1.2: not changed
   GiveDataAt(1100);  // 1.3

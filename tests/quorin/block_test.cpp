@@ -74,7 +74,7 @@ TEST(QuorinBlock, IsChainedToTheChecksumBefore) {
 }
 
 // Every byte of the header and the payload counts, and both of the checksum; the end byte does not.
-TEST(QuorinBlock, IsUnchainedByAnyDamage) {
+TEST(QuorinBlock, FailsItsChecksumAfterAnyDamage) {
   const std::string good = BlockStream::Make(0x02, 1, TestContent(512), 0xABCD);
   for (size_t i = 0; i < good.size() - 1; ++i) {
     std::string damaged = good;

@@ -68,7 +68,7 @@ TEST_F(QuorinConnectionLock, CountsHowOftenItIsTaken) {
   EXPECT_EQ(driver.UnlockConnection(), 0);
 }
 
-TEST_F(QuorinConnectionLock, CannotBeReleasedByWhoDoesNotHoldIt) {
+TEST_F(QuorinConnectionLock, CannotBeReleasedByAnotherThread) {
   EXPECT_EQ(driver.UnlockConnection(), 0);
   driver.LockConnection(nullptr);
   HRESULT result = E_FAIL;

@@ -305,7 +305,7 @@ INSTANTIATE_TEST_SUITE_P(
     FatalCaseName);
 
 // Sizes that are not true serve the progress only.
-TEST(QuorinSimulatedDownload, TakesAllOfAFileThatIsLargerThanTold) {
+TEST(QuorinSimulatedDownload, DownloadsAllOfAFileThatIsLargerThanItsSize) {
   sim::QuorinOptions options;
   options.faults.sizes = {{"A0101.log", 700}};
   SimulatedDownload download(options);
@@ -317,7 +317,7 @@ TEST(QuorinSimulatedDownload, TakesAllOfAFileThatIsLargerThanTold) {
   EXPECT_THAT(progress.percents, testing::ElementsAre(0, 1, 73, 100, 100));
 }
 
-TEST(QuorinSimulatedDownload, TakesAllOfAFileThatIsSmallerThanTold) {
+TEST(QuorinSimulatedDownload, DownloadsAllOfAFileThatIsSmallerThanItsSize) {
   sim::QuorinOptions options;
   options.faults.sizes = {{"A0101.log", 13000}};
   SimulatedDownload download(options);

@@ -110,7 +110,7 @@ TEST_F(QuorinDownload, GoesOnSlowlyWhenTheReceiverRefusesItsPort) {
       report.Has("CQuorinProtocol::DownloadFile - receiver speed up is failed [0x8007048F]"));
 }
 
-TEST_F(QuorinDownload, GoesOnSlowlyWhenTheReceiverCannotBeTold) {
+TEST_F(QuorinDownload, GoesOnSlowlyWhenTheCommandCannotBeSent) {
   receiver.FailWriteOf(kRaise, E_HANDLE);
   EXPECT_EQ(Download(), S_OK);
   ExpectSaid({{"%%print,/cur/term\r\n", kRaise}, kStart, kBlocks});
@@ -339,14 +339,14 @@ TEST_F(QuorinDownload, FailsWhenTheHostCannotGoBack) {
   EXPECT_TRUE(IsFreeForOthers(driver));
 }
 
-TEST_F(QuorinDownload, FailsWithTheWayBackRatherThanWithTheTransfer) {
+TEST_F(QuorinDownload, ReturnsAFailedPutBackRatherThanAFailedTransfer) {
   receiver.Reply(kGetSize, "0");
   receiver.FailWriteOf(kPutBack, E_HANDLE);
   EXPECT_EQ(Download(), E_HANDLE);
 }
 
 // Half a line would stand in front of the command that puts the speed back.
-TEST_F(QuorinDownload, SaysAllWholeAtTheRaisedSpeed) {
+TEST_F(QuorinDownload, SendsEverythingWholeAtTheRaisedSpeed) {
   std::vector<std::string> cut;
   const auto answer = connection->on_write;
   bool raised = false;
@@ -360,7 +360,7 @@ TEST_F(QuorinDownload, SaysAllWholeAtTheRaisedSpeed) {
   EXPECT_THAT(cut, testing::IsEmpty());
 }
 
-TEST_F(QuorinDownload, SaysTheOldSpeedWhole) {
+TEST_F(QuorinDownload, SendsTheOldSpeedWhole) {
   bool shielded = false;
   receiver.on_hear = [&](const std::string& command) {
     if (command == kPutBack) shielded = connection->wait_rule.shielded;

@@ -130,7 +130,7 @@ TEST(QuorinListMessage, WithoutATimeIsOfTheReceiversZero) {
   }
 }
 
-TEST(QuorinListMessage, HasItsTimeOneCharacterBehindTheSize) {
+TEST(QuorinListMessage, HasItsTimeOneCharacterAfterTheSize) {
   EXPECT_EQ(Text(Parse("{n,12;86400}").entry.time), "1988 1 2 6 0 0 0 0 ");
   EXPECT_EQ(Text(Parse("{n,12, 86400}").entry.time), "1988 1 2 6 0 0 0 0 ");
   EXPECT_EQ(Text(Parse("{n,12;;86400}").entry.time), kZeroTime);
@@ -155,7 +155,7 @@ TEST(QuorinListMessage, EndsAtAZeroByte) {
   EXPECT_FALSE(message.last);
 }
 
-TEST(QuorinListMessage, WithATimeThatCannotBeSaidHasNone) {
+TEST(QuorinListMessage, WithATimeThatCannotBeConvertedHasNone) {
   for (const char* const time : {"-9000000000", "99999999999999", "9223372036854775807"}) {
     const ListMessage message = Parse("{n,5," + std::string(time) + "}");
     EXPECT_EQ(message.kind, Kind::kEntry) << time;
@@ -222,14 +222,14 @@ TEST_P(QuorinFileTime, KnowsLeapDays) {
   EXPECT_EQ(TimeText(366 * kDay), "1989 1 1 0 0 0 0 0 ");
 }
 
-TEST_P(QuorinFileTime, IsWhatTheRuntimeLibraryMakesOfIt) {
+TEST_P(QuorinFileTime, MatchesTheRuntimeLibrary) {
   // Every eleven days and a bit: all seasons, both sides of each change of the clock.
   for (int64_t seconds = 0; seconds < 60 * 365 * kDay; seconds += 11 * kDay + 12345) {
     ASSERT_EQ(TimeText(seconds), ExpectedText(seconds)) << seconds;
   }
 }
 
-TEST_P(QuorinFileTime, CannotSayTimesOutOfTheLibrarysRange) {
+TEST_P(QuorinFileTime, DoesNotConvertTimesOutOfTheLibrarysRange) {
   EXPECT_EQ(TimeText(-100 * 365 * kDay), "none");
   EXPECT_EQ(TimeText(2000 * 365 * kDay), "none");
   EXPECT_EQ(TimeText(INT64_MAX), "none");

@@ -88,7 +88,7 @@ TEST_F(QuorinHandshake, FindsNothingWhenThePortIsRefused) {
   EXPECT_THAT(Said(), ElementsAreArray(First(5)));
 }
 
-TEST_F(QuorinHandshake, FindsNothingWhenThePortIsNotTold) {
+TEST_F(QuorinHandshake, FindsNothingWhenThePortIsNotAnswered) {
   receiver.On(kGetPort, [](const std::string&) {});
   EXPECT_EQ(Check(), 0);
   EXPECT_THAT(Said(), ElementsAreArray(First(5)));
@@ -144,7 +144,7 @@ TEST_F(QuorinHandshake, ReportsARefusal) {
   EXPECT_TRUE(report.Has("CQuorinProtocol::DumpInvalidResponse - [0x8007048F] [{denied}] [COM7]"));
 }
 
-TEST_F(QuorinHandshake, LooksOverWhatIsNoAnswer) {
+TEST_F(QuorinHandshake, IgnoresWhatIsNotAnAnswer) {
   receiver.On(kPing, [this](const std::string& tag) {
     connection->GiveRead("$GPGGA,RE1 ER\x80\r\n" + Message("RE", "%0%old") + Message("RE", tag));
   });
@@ -188,7 +188,7 @@ TEST_P(QuorinHandshakeStep, IsTheLastOnceTheEventIsSignalled) {
 
 INSTANTIATE_TEST_SUITE_P(All, QuorinHandshakeStep, testing::Range(size_t{0}, size_t{6}));
 
-TEST_F(QuorinHandshake, SaysNothingOnceTheEventIsSignalled) {
+TEST_F(QuorinHandshake, SendsNothingOnceTheEventIsSignalled) {
   SetEvent(event.get());
   EXPECT_EQ(Check(), 0);
   EXPECT_TRUE(Said().empty());

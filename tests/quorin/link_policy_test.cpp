@@ -87,7 +87,7 @@ TEST_F(QuorinSerialBlocks, AreAskedForAgainWhenTheReadOfTheRestWasInterrupted) {
   EXPECT_EQ(Controls(), "\x15\x06\x06#");
 }
 
-TEST_F(QuorinSerialBlocks, AreTakenHoweverTheReadsEnded) {
+TEST_F(QuorinSerialBlocks, AreAcceptedWhateverTheReadsReturned) {
   connection->Give({kPositive, blocks.Last("x"), {}});
   EXPECT_EQ(Download(), S_OK);
   EXPECT_EQ(stream.bytes, "x");
@@ -106,14 +106,14 @@ TEST_F(QuorinSerialBlocks, AllowThreeSilencesEach) {
 }
 
 // The host knows of it already.
-TEST_F(QuorinSerialBlocks, KeepAFailureOfTheStreamToThemselves) {
+TEST_F(QuorinSerialBlocks, DoNotReturnAFailureOfTheStream) {
   GiveFile();
   stream.fail_at_write = 1;
   EXPECT_EQ(Download(), S_OK);
   EXPECT_THAT(report.Lines(), IsEmpty());
 }
 
-TEST_F(QuorinSerialBlocks, KeepAFailureOfTheStreamToThemselvesAtAnEmptyLastOne) {
+TEST_F(QuorinSerialBlocks, DoNotReturnAFailureOfTheStreamAtAnEmptyLastOne) {
   Give(blocks.Last(""));
   stream.fail_at_write = 0;
   EXPECT_EQ(Download(), S_OK);
@@ -121,7 +121,7 @@ TEST_F(QuorinSerialBlocks, KeepAFailureOfTheStreamToThemselvesAtAnEmptyLastOne) 
   EXPECT_EQ(Controls(), "#");
 }
 
-TEST_F(QuorinSerialBlocks, KeepToThemselvesHowTheStreamTookTheLastOne) {
+TEST_F(QuorinSerialBlocks, DoNotReturnTheStreamsResultForTheLastOne) {
   GiveFile();
   stream.fail_at_write = 2;
   stream.failure = kPositive;
@@ -140,7 +140,7 @@ TEST_F(QuorinSerialBlocks, EndWithoutAFailureWhenTheAckWasInterrupted) {
 }
 
 // The abort is seen once the failed read is dealt with.
-TEST_F(QuorinSerialBlocks, AreAbortedBehindASilence) {
+TEST_F(QuorinSerialBlocks, AreAbortedAfterASilence) {
   connection->Give({kTimedOut, "", [this] { driver.Abort(); }});
   EXPECT_EQ(Download(), S_FALSE);
   EXPECT_EQ(Controls(), "\x15#");
@@ -154,7 +154,7 @@ TEST_F(QuorinSerialBlocks, EndWithAFailedReadThoughTheAbortCameWithIt) {
   EXPECT_THAT(report.Lines(), IsEmpty());
 }
 
-TEST_F(QuorinSerialBlocks, AreTakenThoughTheAbortCameWithTheRest) {
+TEST_F(QuorinSerialBlocks, AreAcceptedThoughTheAbortCameWithTheRest) {
   GiveInTwo(FirstBlock(), [this] { driver.Abort(); });
   EXPECT_EQ(Download(), S_FALSE);
   EXPECT_EQ(Controls(), "#");
@@ -191,7 +191,7 @@ TEST_F(QuorinUsbBlocks, AreOfOneLength) {
 }
 
 // How long a read is waited for is the user's to say.
-TEST(QuorinUsbBlocksSettings, SayHowLongAReadMayTake) {
+TEST(QuorinUsbBlocksSettings, LimitTheTimeOfARead) {
   UserSettings settings;
   const DWORD timeout_ms = 1234;
   settings.SetValue(L"DownloadReadTimeout", REG_DWORD, &timeout_ms, sizeof(timeout_ms));
@@ -248,7 +248,7 @@ INSTANTIATE_TEST_SUITE_P(Sizes,
                                          Pieces{{64, 64, 390}, {512, 454, 390}},
                                          Pieces{{0, 512, 0, 0, 6}, {512, 512, 6, 6, 6}}));
 
-TEST_F(QuorinUsbBlocks, AreTakenByteByByte) {
+TEST_F(QuorinUsbBlocks, AreAcceptedByteByByte) {
   for (const char byte : blocks.Last(content.substr(0, 512))) Give(std::string(1, byte));
   EXPECT_EQ(Download(512), S_OK);
   EXPECT_EQ(stream.bytes, content.substr(0, 512));
@@ -281,7 +281,7 @@ TEST_P(QuorinUsbSilence, WithinABlockIsAskedAgain) {
   EXPECT_THAT(report.Lines(), ElementsAre(TimeoutLine()));
 }
 
-INSTANTIATE_TEST_SUITE_P(Behind, QuorinUsbSilence, testing::Values(1, 300, 517));
+INSTANTIATE_TEST_SUITE_P(After, QuorinUsbSilence, testing::Values(1, 300, 517));
 
 TEST_F(QuorinUsbBlocks, EndWithTheFourthSilenceWhereverItIs) {
   GiveSilences(2);
@@ -297,7 +297,7 @@ TEST_F(QuorinUsbBlocks, EndWithTheFourthSilenceWhereverItIs) {
   EXPECT_EQ(connection->AnswersLeft(), 1U);
 }
 
-TEST_F(QuorinUsbBlocks, EndAsTheAckDid) {
+TEST_F(QuorinUsbBlocks, EndWithTheResultOfTheAck) {
   for (const HRESULT result : {S_FALSE, kPositive}) {
     blocks = BlockStream();
     connection->DropAnswers();
@@ -310,7 +310,7 @@ TEST_F(QuorinUsbBlocks, EndAsTheAckDid) {
 }
 
 // Reads that end without a failure, but not well.
-TEST_F(QuorinUsbBlocks, EndAsTheReadDid) {
+TEST_F(QuorinUsbBlocks, EndWithTheResultOfTheRead) {
   connection->Give({kPositive, FirstBlock().substr(0, 512), {}});
   EXPECT_EQ(Download(), kPositive);
   EXPECT_THAT(connection->calls, ElementsAre(link.first_read));
@@ -318,7 +318,7 @@ TEST_F(QuorinUsbBlocks, EndAsTheReadDid) {
   EXPECT_THAT(report.Lines(), IsEmpty());
 }
 
-TEST_F(QuorinUsbBlocks, EndAsTheReadOfTheRestDidWhateverIsWrongWithThem) {
+TEST_F(QuorinUsbBlocks, EndWithTheResultOfTheReadOfTheRestWhateverIsWrongWithThem) {
   Give(FirstBlock().substr(0, 512));
   connection->Give({kPositive, std::string(6, '?'), {}});
   EXPECT_EQ(Download(), kPositive);
@@ -328,7 +328,7 @@ TEST_F(QuorinUsbBlocks, EndAsTheReadOfTheRestDidWhateverIsWrongWithThem) {
 }
 
 // The abort that ended the read is gone when another call has taken it.
-TEST_F(QuorinUsbBlocks, EndForTheReceiverTooWhenTheReadOfTheRestWasInterrupted) {
+TEST_F(QuorinUsbBlocks, EndTheReceiversTransferTooWhenTheReadOfTheRestWasInterrupted) {
   Give(FirstBlock().substr(0, 512));
   connection->GiveResult(S_FALSE);
   EXPECT_EQ(Download(), S_FALSE);
@@ -378,7 +378,7 @@ TEST_F(QuorinUsbBlocks, PassAFailureOfTheStreamOnThoughTheEndCannotBeWritten) {
   EXPECT_EQ(Download(), STG_E_MEDIUMFULL);
 }
 
-TEST_F(QuorinUsbBlocks, EndAsTheStreamTookTheLastOne) {
+TEST_F(QuorinUsbBlocks, EndWithTheStreamsResultForTheLastOne) {
   GiveFile();
   stream.fail_at_write = 2;
   stream.failure = kPositive;
@@ -386,7 +386,7 @@ TEST_F(QuorinUsbBlocks, EndAsTheStreamTookTheLastOne) {
   EXPECT_EQ(Controls(), "\x06\x06#");
 }
 
-TEST_F(QuorinUsbBlocks, GoOnWithAStreamThatIsNotQuiteContent) {
+TEST_F(QuorinUsbBlocks, GoOnAfterAStreamResultThatIsNoFailure) {
   GiveFile();
   stream.fail_at_write = 0;
   stream.failure = S_FALSE;
@@ -405,7 +405,7 @@ TEST_F(QuorinUsbBlocks, AreAbortedThoughTheReadFailed) {
   EXPECT_THAT(report.Lines(), ElementsAre(CancelLine(), CancelLine()));
 }
 
-TEST_F(QuorinUsbBlocks, AreNotTakenWhenTheAbortCameWithTheRest) {
+TEST_F(QuorinUsbBlocks, AreNotAcceptedWhenTheAbortCameWithTheRest) {
   GiveInTwo(FirstBlock(), [this] { driver.Abort(); });
   EXPECT_EQ(Download(), S_FALSE);
   EXPECT_EQ(Controls(), "#");

@@ -226,7 +226,7 @@ TEST_F(QuorinProtocol, AbortEndsOneOperationOnly) {
 // Removing a file.
 class QuorinDeleteFile : public QuorinDriverTest {};
 
-TEST_F(QuorinDeleteFile, SaysWhichAndWaitsForTheReply) {
+TEST_F(QuorinDeleteFile, SendsTheNameAndWaitsForTheReply) {
   const ReportCapture report;
   receiver.Reply("remove,A0101.log\r\n", "");
   EXPECT_EQ(driver.DeleteFile(L"A0101.log"), S_OK);

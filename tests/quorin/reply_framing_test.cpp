@@ -60,7 +60,7 @@ INSTANTIATE_TEST_SUITE_P(Lengths,
                                          HeaderCase{"RE0034.", 0, ReplyKind::kReply, 0x34},
                                          HeaderCase{"RE000000FFF.", 0, ReplyKind::kReply, 4095}));
 
-INSTANTIATE_TEST_SUITE_P(BehindWhatIsNone,
+INSTANTIATE_TEST_SUITE_P(AfterWhatIsNoHeader,
                          QuorinHeader,
                          testing::Values(HeaderCase{"*$\xFF RE003%1%", 4, ReplyKind::kReply, 3},
                                          HeaderCase{"RRE003%1%", 1, ReplyKind::kReply, 3},
@@ -116,13 +116,13 @@ INSTANTIATE_TEST_SUITE_P(TooShort,
                          QuorinNoHeader,
                          testing::Values("", "R", "RE", "RE0", "RE00", " ", "  ", "  00", "E"));
 
-TEST(QuorinHeaderSearch, StartsWhereItIsTold) {
+TEST(QuorinHeaderSearch, StartsAtTheGivenPosition) {
   EXPECT_EQ(Find("RE001aER001b", 1)->position, 6U);
   EXPECT_EQ(Find("RE001aER001b", 6)->position, 6U);
   EXPECT_FALSE(Find("RE001aER001b", 7));
 }
 
-TEST(QuorinHeaderSearch, FromBehindTheEndFindsNothing) {
+TEST(QuorinHeaderSearch, StartingAfterTheEndFindsNothing) {
   EXPECT_FALSE(Find("RE000", 5));
   EXPECT_FALSE(Find("RE000", 9));
 }
@@ -144,13 +144,13 @@ TEST(QuorinHeaderSearch, KeepsAHeaderThatIsCutOff) {
   }
 }
 
-TEST(QuorinHeaderSearch, PassesOverWhatIsNoneForGood) {
+TEST(QuorinHeaderSearch, SkipsBytesThatAreNoHeader) {
   size_t scan_from = 0;
   EXPECT_FALSE(FindReplyHeader(std::string(1000, '*'), scan_from));
   EXPECT_EQ(scan_from, 996U);
 }
 
-TEST(QuorinHeaderSearch, ReadsNothingBehindTheBytes) {
+TEST(QuorinHeaderSearch, ReadsNothingAfterTheBytes) {
   const std::string bytes = "RERE   ER0REFFF0x RE0x";
   for (size_t end = 0; end <= bytes.size(); ++end) {
     for (size_t from = 0; from <= end; ++from) {

@@ -55,7 +55,7 @@ TEST_F(AbortSwitchTest, TakingNothingClearsNothing) {
   EXPECT_TRUE(IsCancelPending());
 }
 
-TEST_F(AbortSwitchTest, MarksTheCommandThatIsExecuted) {
+TEST_F(AbortSwitchTest, CancelsTheCommandThatIsExecuted) {
   {
     const AbortSwitch::CurrentCommand current(abort, command);
     abort.Abort();
@@ -63,7 +63,7 @@ TEST_F(AbortSwitchTest, MarksTheCommandThatIsExecuted) {
   EXPECT_TRUE(command.IsCancelled(nullptr));
 }
 
-TEST_F(AbortSwitchTest, DoesNotMarkACommandThatIsDone) {
+TEST_F(AbortSwitchTest, DoesNotCancelACommandThatIsDone) {
   { const AbortSwitch::CurrentCommand current(abort, command); }
   abort.Abort();
   EXPECT_FALSE(command.IsCancelled(nullptr));

@@ -113,7 +113,7 @@ TEST(BlockFaultsTest, AnEndByteEndsTheTransfer) {
   EXPECT_EQ(session.Ask("#%2%\r\n"), "RE003%2%\r\n");
 }
 
-TEST(BlockFaultsTest, AFaultHappensAsOftenAsTold) {
+TEST(BlockFaultsTest, AFaultHappensAsOftenAsAskedFor) {
   Session session(WithFault(BlockFaultKind::kDamagedCrc, 3));
   session.StartTransfer();
   EXPECT_NE(session.NextBlock(kAck), GoodBlock());
@@ -141,7 +141,7 @@ TEST(BlockFaultsTest, FaultsOfOneBlockComeOneAfterTheOther) {
   EXPECT_EQ(session.NextBlock(kNak), GoodBlock());
 }
 
-TEST(BlockFaultsTest, SilenceSwallowsTheNaksHeardMeanwhile) {
+TEST(BlockFaultsTest, NaksDuringSilenceAreIgnored) {
   QuorinOptions options;
   options.faults.blocks = {{BlockFaultKind::kSilence, 1, kOnce, 10'000}};
   Session session(options);

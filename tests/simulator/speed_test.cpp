@@ -98,7 +98,7 @@ TEST(SpeedTest, TheSpeedChangesOnlyWhenTheReplyHasLeft) {
   EXPECT_EQ(session.receiver.speed(), 115200U);
 }
 
-TEST(SpeedTest, AReplyTakenBackStillChangesTheSpeed) {
+TEST(SpeedTest, AReplyThatIsDiscardedStillChangesTheSpeed) {
   QuorinOptions options;
   options.faults.replies = {{ReplyFaultKind::kSilence, "set,", kAlways, 1000}};
   Session session(options);

@@ -33,7 +33,7 @@ TEST(VelmarLogsTest, TheHeaderHasTenFields) {
 }
 
 // The whole reply to the byte; its CRC has been worked out with another implementation.
-TEST(VelmarLogsTest, AReplyIsExactlyThis) {
+TEST(VelmarLogsTest, AReplyHasExactlyTheseBytes) {
   FileStore files;
   files.Add("A0101.log", ToBytes("0123456789abcdefghij"), 1'700'000'000);
   VelmarSession session({}, files);
@@ -59,7 +59,7 @@ TEST(VelmarLogsTest, TheVersionHasEightFieldsAComponent) {
   EXPECT_NE(body[10].find(','), std::string::npos);
 }
 
-TEST(VelmarLogsTest, ComponentsAreToldInTheOrderOfTheOptions) {
+TEST(VelmarLogsTest, ComponentsAreReportedInTheOrderOfTheOptions) {
   VelmarOptions options;
   options.identity.components = {
       {"ENCLOSURE", "Box, red"}, {"DB_USERAPPAUTO"}, {"RADIO"}, {kReceiverCard}};
@@ -117,7 +117,7 @@ TEST(VelmarLogsTest, ADirectoryCountsDownToZero) {
   }
 }
 
-TEST(VelmarLogsTest, DatesAreToldInUniversalTime) {
+TEST(VelmarLogsTest, DatesAreReportedInUniversalTime) {
   FileStore files;
   files.Add("x", {}, 1'356'998'399);
   files.Add("y", {}, 951'782'400);

@@ -161,7 +161,7 @@ TEST_F(SerialConnect, MakesItsCallsInOrder) {
   EXPECT_THAT(device.calls, ElementsAreArray(CallsOf(kTries)));
 }
 
-TEST_F(SerialConnect, TellsEachStepInOrder) {
+TEST_F(SerialConnect, TracesEachStepInOrder) {
   EXPECT_EQ(Connect(), S_FALSE);
   EXPECT_THAT(report.Lines(), ElementsAreArray(LinesOf(kTries)));
 }
@@ -235,7 +235,7 @@ TEST_F(SerialConnect, NeedsNoEvent) {
   EXPECT_TRUE(IsOpen());
 }
 
-TEST_F(SerialConnect, TellsThatItWasAskedBeforeItRefusesANullName) {
+TEST_F(SerialConnect, TracesTheCallBeforeItRefusesANullName) {
   EXPECT_EQ(connection.Connect(nullptr, nullptr, nullptr), E_INVALIDARG);
   EXPECT_THAT(report.Lines(), ElementsAre("CSerialConnection::Connect"));
   EXPECT_THAT(device.calls, IsEmpty());
@@ -345,7 +345,7 @@ TEST_P(SerialConnectAbortedAtTry, EndsAtTheNext) {
 
 INSTANTIATE_TEST_SUITE_P(All, SerialConnectAbortedAtTry, testing::Range(0, kTries - 1));
 
-TEST_F(SerialConnect, AReceiverThatAnsweredCountsMoreThanTheEvent) {
+TEST_F(SerialConnect, AReceiverThatAnsweredHasPriorityOverTheEvent) {
   answer_at = 4;
   on_probe = [&](int number) {
     if (number == 4) SetEvent(abort_event.get());
@@ -427,7 +427,7 @@ TEST_F(SerialConnect, AStateThatCannotBeReadIsTakenAsEmpty) {
 class SerialConnectWhereTheFlushFails : public SerialConnect,
                                         public testing::WithParamInterface<const char*> {};
 
-TEST_P(SerialConnectWhereTheFlushFails, TellsItOncePerOpeningAndGoesOn) {
+TEST_P(SerialConnectWhereTheFlushFails, TracesItOncePerOpeningAndGoesOn) {
   device.failing_call = GetParam();
   device.failure = ERROR_GEN_FAILURE;
   EXPECT_EQ(Connect(), S_FALSE);

@@ -30,7 +30,7 @@ class SerialOpenWhoseFlushFails : public testing::TestWithParam<const char*> {
   DCB settings{};
 };
 
-TEST_P(SerialOpenWhoseFlushFails, TellsItAndGoesOn) {
+TEST_P(SerialOpenWhoseFlushFails, TracesItAndGoesOn) {
   EXPECT_EQ(Open(), S_OK);
   EXPECT_THAT(
       report.Lines(),
@@ -40,7 +40,7 @@ TEST_P(SerialOpenWhoseFlushFails, TellsItAndGoesOn) {
                   "CSerialConnection::Open - OK [COM12]"));
 }
 
-TEST_P(SerialOpenWhoseFlushFails, MakesEveryCallAllTheSame) {
+TEST_P(SerialOpenWhoseFlushFails, StillMakesEveryCall) {
   Open();
   EXPECT_THAT(device.calls,
               ElementsAre("CreateFile",
@@ -71,7 +71,7 @@ INSTANTIATE_TEST_SUITE_P(Calls,
                          [](const auto& call) { return std::string(call.param); });
 
 // Errors of the line that were there before are told and then forgotten.
-TEST(SerialOpen, TellsErrorsOfTheLineAndGoesOn) {
+TEST(SerialOpen, TracesErrorsOfTheLineAndGoesOn) {
   const ReportCapture report;
   FakeDevice device;
   device.line = {{CE_FRAME | CE_RXPARITY, 0}};

@@ -400,7 +400,7 @@ TEST_F(UsbConnection, IsClosedWhenItGoes) {
   EXPECT_FALSE(IsOpen(ReadHandle()));
 }
 
-TEST_F(UsbConnection, ForgetsACancelWhenItIsClosed) {
+TEST_F(UsbConnection, ClearsACancelWhenItIsClosed) {
   OpenForTransfers();
   connection->Cancel();
   connection->Disconnect();

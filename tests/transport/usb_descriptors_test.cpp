@@ -49,7 +49,7 @@ TEST(UsbDescriptors, MayNameTheInputFirst) {
             Endpoints(0x04, 0x85));
 }
 
-TEST(UsbDescriptors, TellTheDirectionByTheTopBitAlone) {
+TEST(UsbDescriptors, HaveTheDirectionInTheTopBitAlone) {
   EXPECT_EQ(Find(DeviceBytes({EndpointBytes(0x7F, kBulk), EndpointBytes(0x80, kBulk)})),
             Endpoints(0x7F, 0x80));
   EXPECT_EQ(Find(DeviceBytes({EndpointBytes(0xFF, kBulk), EndpointBytes(0x00, kBulk)})),
@@ -67,7 +67,7 @@ TEST(UsbDescriptors, MayHaveEndpointsOfOtherKinds) {
             Endpoints(0x02, 0x86));
 }
 
-TEST(UsbDescriptors, TellTheKindByTheTwoLowestBits) {
+TEST(UsbDescriptors, HaveTheKindInTheTwoLowestBits) {
   EXPECT_EQ(Find(DeviceBytes({EndpointBytes(0x81, 0xFF),
                               EndpointBytes(0x01, 0xFD),
                               EndpointBytes(0x03, 0xFC),
@@ -90,7 +90,7 @@ TEST(UsbDescriptors, AreReadUntilBothEndpointsAreFound) {
 }
 
 // Each bulk endpoint takes the place of the one before until the other direction has its own.
-TEST(UsbDescriptors, MayNameMoreEndpointsOfOneDirectionAhead) {
+TEST(UsbDescriptors, MayNameMoreEndpointsOfOneDirectionBefore) {
   EXPECT_EQ(Find(DeviceBytes({EndpointBytes(0x81, kBulk),
                               EndpointBytes(0x82, kBulk),
                               EndpointBytes(0x03, kBulk),
@@ -103,7 +103,7 @@ TEST(UsbDescriptors, MayNameMoreEndpointsOfOneDirectionAhead) {
             Endpoints(0x06, 0x87));
 }
 
-TEST(UsbDescriptors, AreNotReadBehindTheSecondEndpoint) {
+TEST(UsbDescriptors, AreNotReadAfterTheSecondEndpoint) {
   for (const uint8_t length : std::initializer_list<uint8_t>{0, 1, 6, 8, 255}) {
     EXPECT_EQ(Find(DeviceBytes({EndpointBytes(0x02, kBulk),
                                 EndpointBytes(0x83, kBulk),
@@ -130,7 +130,7 @@ TEST(UsbDescriptors, NeedTwoEndpoints) {
   EXPECT_EQ(Find(DeviceBytes({})), kNone);
 }
 
-TEST(UsbDescriptors, MayHaveAsManyEndpointsAsTheCountCanTell) {
+TEST(UsbDescriptors, MayHaveAsManyEndpointsAsTheCountCanHold) {
   std::string rest = InterfaceBytes(255);
   for (int i = 0; i < 253; ++i) rest += EndpointBytes(0x81, kInterrupt);
   rest += EndpointBytes(0x02, kBulk) + EndpointBytes(0x83, kBulk);
@@ -178,7 +178,7 @@ TEST(UsbDescriptors, OfASecondInterfaceAreOfAnotherLayout) {
   EXPECT_EQ(Find(ConfigurationBytes(one + one)), kNone);
 }
 
-TEST(UsbDescriptors, TellTheLengthsOfConfigurationAndInterface) {
+TEST(UsbDescriptors, HaveTheLengthsOfConfigurationAndInterface) {
   const std::string endpoints = EndpointBytes(0x02, kBulk) + EndpointBytes(0x83, kBulk);
   for (const size_t length : std::initializer_list<size_t>{5, 8, 9, 10, 11, 16, 255}) {
     EXPECT_EQ(Find(ConfigurationBytes(InterfaceBytes(2, length) + endpoints)),
@@ -234,7 +234,7 @@ TEST(UsbDescriptors, ThatGoOnAreOfAnotherLayout) {
 }
 
 // The usb_interface's count may be the last byte there is.
-TEST(UsbDescriptors, AreNotReadBehindTheirEnd) {
+TEST(UsbDescriptors, AreNotReadAfterTheirEnd) {
   for (size_t size = 1; size <= 20; ++size) {
     for (unsigned first = 0; first < 256; ++first) {
       std::string bytes(size, '\x07');

@@ -63,7 +63,7 @@ TEST_F(WaitScopeTest, NothingEndsTheWaitsInAShield) {
   EXPECT_THAT(WaitedForByRead(), ElementsAre(cancel));
 }
 
-TEST_F(WaitScopeTest, TheWatchedEventEndsReadsBesideTheCancel) {
+TEST_F(WaitScopeTest, TheWatchedEventEndsReadsAsTheCancelDoes) {
   const HANDLE cancel = connection.GetAbortEvent();
   {
     const WaitScope watching = WaitScope::Watching(&connection, event.get());
@@ -78,7 +78,7 @@ TEST_F(WaitScopeTest, TheWatchedEventEndsReadsBesideTheCancel) {
 }
 
 // Half a line would stand in front of the next command.
-TEST_F(WaitScopeTest, TheWatchedEventDoesNotCutWrites) {
+TEST_F(WaitScopeTest, TheWatchedEventDoesNotEndWrites) {
   const WaitScope watching = WaitScope::Watching(&connection, event.get());
   EXPECT_THAT(WaitedForByWrite(), ElementsAre(connection.GetAbortEvent()));
 }
@@ -92,7 +92,7 @@ TEST_F(WaitScopeTest, AShieldInsideKeepsWhatIsWatchedForAfterIt) {
   EXPECT_THAT(WaitedForByRead(), ElementsAre(connection.GetAbortEvent(), IsHandleOf(event.get())));
 }
 
-TEST_F(WaitScopeTest, AnOutsideAbortEventStillTakesThePlaceOfTheCancel) {
+TEST_F(WaitScopeTest, AnOutsideAbortEventStillReplacesTheCancel) {
   const KernelHandle outside = MakeEvent();
   connection.SetAbortEvent(outside.get());
   const WaitScope watching = WaitScope::Watching(&connection, event.get());

@@ -161,7 +161,7 @@ TEST_F(WaitingTransfer, AnEventThatWasRemovedEndsNothing) {
   EXPECT_EQ(Received(), "data");
 }
 
-TEST_F(WaitingTransfer, AnotherEventTakesThePlaceOfTheFirst) {
+TEST_F(WaitingTransfer, AnotherEventReplacesTheFirst) {
   const KernelHandle second = NewEvent();
   connection.SetAbortEvent(outside.get());
   connection.SetAbortEvent(second.get());

@@ -96,7 +96,7 @@ TEST_F(UsbPipe, IsFreeWhenItsHandleIsClosed) {
             "= bind 0x81\n= bind 0x02\n= close 0x81\n= close 0x02\n= bind 0x81\n= bind 0x02\n");
 }
 
-TEST_F(UsbPipe, TellsOfHandlesThatWereNotBound) {
+TEST_F(UsbPipe, ReportsHandlesThatWereNotBound) {
   Plug();
   reader_.reset();
   usb_->WaitForTranscript("= close\n");
@@ -153,7 +153,7 @@ TEST_F(UsbPipe, GoesOneWay) {
   EXPECT_EQ(writer_->Write("x").error, DWORD{ERROR_INVALID_FUNCTION});
 }
 
-TEST_F(UsbPipe, KnowsNoOtherRequests) {
+TEST_F(UsbPipe, RefusesOtherRequests) {
   Plug();
   constexpr DWORD kUnknown = 0x80942200;
   constexpr DWORD kMethods = 4;

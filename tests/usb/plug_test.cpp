@@ -123,7 +123,7 @@ TEST(UsbPlug, HasNeighbours) {
   EXPECT_THAT(read.Finish().text(), HasSubstr("/dev/two"));
 }
 
-TEST(UsbPlug, TellsWhyItDoesNotStart) {
+TEST(UsbPlug, SaysWhyItDoesNotStart) {
   try {
     const bed::SimulatedUsb usb({"no-such-family"});
     FAIL() << "it has started";

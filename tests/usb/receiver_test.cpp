@@ -70,7 +70,7 @@ TEST(UsbReceiver, AnswersACommand) {
               HasSubstr("> %1%print,/par/rcvid\\r\\n\n< RE00A%1%USB0042\\r\\n\n"));
 }
 
-TEST(UsbReceiver, CallsItsPortUsb) {
+TEST(UsbReceiver, NamesItsPortUsb) {
   const bed::SimulatedUsb usb({"quorin"});
   const Connected host(usb.device());
   Say(host, "%1%print,/cur/term\r\n");

@@ -132,7 +132,7 @@ TEST_P(VelmarDownloadAbort, DoesNotDisturbACheck) {
 
 // Until the receiver is told of the new speed, an abort ends the download: at 9600 bit/s it would
 // take minutes.
-TEST_P(VelmarDownloadAbort, BringsNothingOnceFoundAheadOfTheTransfer) {
+TEST_P(VelmarDownloadAbort, DownloadsNothingWhenFoundBeforeTheTransfer) {
   AbortAtEachCall([](Bench& bench, HRESULT) {
     if (bench.log.str().find("> log filetransferb") == std::string::npos) {
       EXPECT_TRUE(bench.stream.bytes.empty());

@@ -235,7 +235,7 @@ TEST_F(VelmarExchange, ALogThatStaysIncompleteEndsWithTheTimeOut) {
   EXPECT_EQ(config.Config().port_name, L"");
 }
 
-TEST_F(VelmarExchange, ADirectoryTellsALogThatIsCutOffFromOneThatIsNotTheLast) {
+TEST_F(VelmarExchange, ADirectoryDistinguishesALogThatIsCutOffFromOneThatIsNotTheLast) {
   CGetFileListCmd command;
   const std::string log = AsciiLog("DIRENTA", "a,1,0,1,1", 1);
   const auto parse = [&](const std::string& text) {
@@ -273,7 +273,7 @@ TEST_F(VelmarExchange, StrayBytesEndTheWaitForALog) {
 }
 
 // A log behind a line end is not looked for, however long it is waited.
-TEST_F(VelmarExchange, ALogBehindALineEndIsNotSeen) {
+TEST_F(VelmarExchange, ALogAfterALineEndIsIgnored) {
   CGetReceiverInfoCmd command;
   const std::string log = AsciiLog("VERSIONA", kVersionBody);
   EXPECT_EQ(Run(command, {kOkPrompt + "\r\n", log}), S_OK);
@@ -476,7 +476,7 @@ TEST_F(FileTransfer, MessageLengthsOutsideTheirRangeMeanAFullChunk) {
   }
 }
 
-TEST_F(FileTransfer, MessageLengthsInTheirRangeTellTheChunk) {
+TEST_F(FileTransfer, MessageLengthsInTheirRangeGiveTheChunk) {
   for (const int length : {8, 9, 1031, 1032}) {
     ScriptedConnection once;
     once.GiveRead(kOkPrompt + BinaryLog{std::string(3000, 'x'), 0, length}.Bytes());
@@ -490,7 +490,7 @@ TEST_F(FileTransfer, MessageLengthsInTheirRangeTellTheChunk) {
 }
 
 // Whatever the lengths claim, the exchange ends and nothing outside the buffer is touched.
-TEST_F(FileTransfer, LyingLengthsEnd) {
+TEST_F(FileTransfer, WrongLengthsEndTheTransfer) {
   for (const uint8_t header : std::vector<uint8_t>{0, 1, 28, 255}) {
     for (const int length : {0, 8, 1032, 9000, 65535}) {
       for (const uint16_t sequence : std::vector<uint16_t>{0, 1, 65535}) {
@@ -541,7 +541,7 @@ TEST_F(FileTransfer, AFileManyTimesTheBufferPassesThrough) {
 
 // Only the first of the three sync bytes is looked at, and that only ahead of the first chunk; the
 // checksum never.
-TEST_F(FileTransfer, SyncBytesAndChecksumsAreNotLookedAt) {
+TEST_F(FileTransfer, SyncBytesAndChecksumsAreNotChecked) {
   std::string first = BinaryLog{"one..", 2}.Bytes();
   first[1] = 'x';
   first[2] = 'y';
@@ -552,7 +552,7 @@ TEST_F(FileTransfer, SyncBytesAndChecksumsAreNotLookedAt) {
   EXPECT_THAT(chunks.chunks, ElementsAre("one..", "two..", "three"));
 }
 
-TEST_F(FileTransfer, OtherBytesThanALogBehindThePromptEndIt) {
+TEST_F(FileTransfer, OtherBytesThanALogAfterThePromptEndIt) {
   EXPECT_EQ(Transfer({kOkPrompt + "x" + BinaryLog{"chunk", 0}.Bytes()}), S_OK);
   EXPECT_EQ(command.Response(), RESPONSE_UNKNOWN);
   EXPECT_TRUE(chunks.chunks.empty());
@@ -566,7 +566,7 @@ TEST_F(FileTransfer, ARefusalEndsIt) {
 }
 
 // The whole of a log goes by its own lengths, whatever was taken of it.
-TEST_F(FileTransfer, LongMessagesAreCutAndPassedOver) {
+TEST_F(FileTransfer, LongMessagesAreCutAndSkipped) {
   const std::string longer(1992, 'a');
   EXPECT_EQ(Transfer({kOkPrompt + BinaryLog{longer, 1}.Bytes() + BinaryLog{"the end", 0}.Bytes()}),
             S_OK);
@@ -650,7 +650,7 @@ TEST_F(FileTransfer, ALastChunkOfLessThanFourBytesIsWaitedForInVain) {
 }
 
 // Success of any kind goes on.
-TEST_F(FileTransfer, AHostThatIsContentGoesOn) {
+TEST_F(FileTransfer, AHostResultThatIsNoFailureGoesOn) {
   struct Content : Chunks {
     HRESULT OnDataReceived(void* context) override {
       Chunks::OnDataReceived(context);
@@ -665,7 +665,7 @@ TEST_F(FileTransfer, AHostThatIsContentGoesOn) {
   EXPECT_THAT(content.chunks, ElementsAre("data", "more"));
 }
 
-TEST_F(FileTransfer, ALogThatWasNotAcknowledgedIsNone) {
+TEST_F(FileTransfer, ALogThatWasNotAcknowledgedIsIgnored) {
   EXPECT_EQ(Transfer({BinaryLog{"data", 0}.Bytes()}), S_OK);
   EXPECT_EQ(command.Response(), RESPONSE_UNKNOWN);
   EXPECT_TRUE(chunks.chunks.empty());

@@ -95,7 +95,7 @@ TEST_F(VelmarDownload, AnySlowerLinkIsRaised) {
 
 // A host that knows no speed of its own, or one that is negative as a number, is raised, and
 // nothing is put back.
-TEST_F(VelmarDownload, StrangeSpeedsAreNotPutBack) {
+TEST_F(VelmarDownload, UnusualSpeedsAreNotPutBack) {
   for (const DWORD speed : {0ul, 0x80000000ul, 0xFFFFFFFFul}) {
     ScriptedConnection* const link = connection;
     const size_t before = link->Writes().size();
@@ -110,7 +110,7 @@ TEST_F(VelmarDownload, StrangeSpeedsAreNotPutBack) {
   }
 }
 
-TEST_F(VelmarDownload, ASpeedBelowTheSignIsFastEnough) {
+TEST_F(VelmarDownload, TheLargestPositiveSpeedIsFastEnough) {
   Serve(1);
   connection->speed = 0x7FFFFFFF;
   EXPECT_EQ(Download(), S_OK);
@@ -160,7 +160,7 @@ TEST_F(VelmarDownload, AHostThatCannotFollowPutsTheReceiverBackAtOnce) {
 }
 
 // The put-back that is made at once may fail without anybody knowing.
-TEST_F(VelmarDownload, AHostThatCannotFollowDoesNotLookAtThePutBack) {
+TEST_F(VelmarDownload, AHostThatCannotFollowIgnoresTheResultOfThePutBack) {
   Serve(1);
   connection->speed = 9600;
   connection->set_speed_result = E_ACCESSDENIED;
@@ -229,7 +229,7 @@ TEST_F(VelmarDownload, ARefusalAtRaisedSpeedIsPutBackToo) {
   EXPECT_THAT(percents, ElementsAre(0, 100));
 }
 
-TEST_F(VelmarDownload, AFailingCommandEndsItWithoutALastReport) {
+TEST_F(VelmarDownload, AFailingCommandEndsItWithoutALastProgress) {
   Serve(1);
   for (const std::string& failing : {kCurrent, kHeader, kRead}) {
     const std::string answer = std::exchange(answers[failing], kOkPrompt + "<");
@@ -263,7 +263,7 @@ TEST_F(VelmarDownload, WithoutAHeaderNothingIsRead) {
 }
 
 // The put-back's result takes the place of the transfer's.
-TEST_F(VelmarDownload, AtRaisedSpeedAFailureIsCoveredByThePutBack) {
+TEST_F(VelmarDownload, AtRaisedSpeedTheResultOfThePutBackReplacesAFailure) {
   Serve(3);
   connection->speed = 9600;
   stream.fail_at_write = 1;
@@ -440,7 +440,7 @@ TEST_F(VelmarAbortedPutBack, AsTheLineIsAboutToBeSent) {
 }
 
 // The line has left before the host changes its own speed.
-TEST_F(VelmarAbortedPutBack, LetsTheLineLeave) {
+TEST_F(VelmarAbortedPutBack, DoesNotInterruptTheLine) {
   DownloadAndAbortAt(kConfig);
   const auto told = std::ranges::find(connection->calls, "write " + kRestoreEven);
   ASSERT_NE(told, connection->calls.end());
@@ -448,7 +448,7 @@ TEST_F(VelmarAbortedPutBack, LetsTheLineLeave) {
               ElementsAre("flush", "speed 9600"));
 }
 
-TEST_F(VelmarDownload, AnAbortThatEndedItDisturbsNothingOfThePutBack) {
+TEST_F(VelmarDownload, AnAbortThatEndedItDoesNotDisturbThePutBack) {
   Serve(3);
   connection->speed = 9600;
   before_command = [&](const std::string& command) {
@@ -463,7 +463,7 @@ TEST_F(VelmarDownload, AnAbortThatEndedItDisturbsNothingOfThePutBack) {
 }
 
 // The answer of what was cut off would be taken for that of the next command.
-TEST_F(VelmarDownload, WhatFollowsACutOffCommandWaitsForItsLateAnswer) {
+TEST_F(VelmarDownload, TheCommandAfterAnInterruptedOneWaitsForItsLateAnswer) {
   Serve(3);
   before_command = [&](const std::string& command) {
     if (command == kCurrent) driver.Abort();

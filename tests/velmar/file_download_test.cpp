@@ -28,7 +28,7 @@ TEST_F(VelmarFileDownload, BringsTheFileAndReportsEachPercentOnce) {
 
 // Each chunk is in the stream before its percent is told, and the last percent is told while the
 // link is still fast.
-TEST_F(VelmarFileDownload, TellsThePercentOfWhatIsWritten) {
+TEST_F(VelmarFileDownload, ReportsThePercentOfWhatIsWritten) {
   Serve(2);
   connection->speed = 9600;
   std::vector<size_t> written;
@@ -53,7 +53,7 @@ TEST_F(VelmarFileDownload, ATransferThatStopsInBetweenIsASuccess) {
   EXPECT_THAT(percents, ElementsAre(0, 25, 50, 75, 100));
 }
 
-TEST_F(VelmarFileDownload, AFileSaidToBeEmptyIsCompleteAtOnce) {
+TEST_F(VelmarFileDownload, AFileOfSizeZeroIsCompleteAtOnce) {
   Serve(2);
   answers[kHeader] = HeaderReply("0");
   EXPECT_EQ(Download(), S_OK);
@@ -75,14 +75,14 @@ TEST_F(VelmarFileDownload, AFailingStreamEndsIt) {
 
 // A file that turns out longer than its header said: the percent is kept in a byte, and told as 100
 // at the most.
-TEST_F(VelmarFileDownload, ThePercentOfAFileThatIsLongerThanSaid) {
+TEST_F(VelmarFileDownload, ThePercentOfAFileThatIsLongerThanItsSize) {
   Serve(3);
   answers[kHeader] = HeaderReply("100");
   EXPECT_EQ(Download(), S_OK);
   EXPECT_THAT(percents, ElementsAre(0, 100, 100, 300 - 256, 100));
 }
 
-TEST_F(VelmarFileDownload, APercentThatDoesNotChangeIsNotTold) {
+TEST_F(VelmarFileDownload, APercentThatDoesNotChangeIsNotReported) {
   Serve(4);
   answers[kHeader] = HeaderReply("20000");
   EXPECT_EQ(Download(), S_OK);

@@ -74,7 +74,7 @@ TEST(VersionLog, TypesCompareExactly) {
   }
 }
 
-TEST(VersionLog, QuotesGoAtBothEndsAndOnlyThere) {
+TEST(VersionLog, QuotesAreRemovedAtBothEndsOnly) {
   VersionLog log;
   DecodeVersion("1,GPSCARD,\"\"M\"\",S\"1\"N,\"\",plain,B,D,T", log);
   EXPECT_EQ(log.model, L"M");
@@ -93,7 +93,7 @@ TEST(VersionLog, NoComponentIsCompleteAndEmpty) {
 }
 
 // The components behind the count are not there.
-TEST(VersionLog, TheCountTellsHowManyComponentsThereAre) {
+TEST(VersionLog, TheCountGivesTheNumberOfComponents) {
   VersionLog log;
   EXPECT_EQ(DecodeVersion("1" + Component("GPSCARD", "card") + Component("ENCLOSURE", "box"), log),
             Progress::kComplete);
@@ -218,7 +218,7 @@ TEST(DirectoryLogs, CountDownToTheLast) {
   EXPECT_THAT(Names(entries), testing::ElementsAre(L"a", L"b", L"c", L"d"));
 }
 
-TEST(DirectoryLogs, AGapContradictsAndKeepsWhatWasRead) {
+TEST(DirectoryLogs, AGapIsAnErrorAndKeepsWhatWasRead) {
   std::vector<FileEntry> entries;
   EXPECT_EQ(DecodeDirectory(Entry("a", 3) + Entry("b", 1), entries), Progress::kContradiction);
   EXPECT_THAT(Names(entries), testing::ElementsAre(L"a", L"b"));
@@ -244,7 +244,7 @@ TEST(DirectoryLogs, EveryBeginningWaitsForMore) {
   EXPECT_EQ(DecodeDirectory(text, entries), Progress::kComplete);
 }
 
-TEST(DirectoryLogs, TheSameNumberTwiceContradicts) {
+TEST(DirectoryLogs, TheSameNumberTwiceIsAnError) {
   std::vector<FileEntry> entries;
   EXPECT_EQ(DecodeDirectory(Entry("a", 1) + Entry("b", 1), entries), Progress::kContradiction);
   EXPECT_EQ(DecodeDirectory(Entry("a", 1) + Entry("b", 2), entries), Progress::kContradiction);
@@ -258,7 +258,7 @@ TEST(DirectoryLogs, CountOnBelowZero) {
   EXPECT_EQ(entries.size(), 2u);
 }
 
-TEST(DirectoryLogs, StartAfresh) {
+TEST(DirectoryLogs, StartAgainFromTheFirstByte) {
   std::vector<FileEntry> entries(5);
   DecodeDirectory(Entry("a", 0), entries);
   EXPECT_EQ(entries.size(), 1u);
@@ -301,7 +301,7 @@ std::string PortFields(const std::string& settings) {
   return "," + settings + ",ON,OFF,NOVATEL,NOVATEL,ON";
 }
 
-TEST(PortConfig, TakesThePortThatIsTalkedOn) {
+TEST(PortConfig, TakesThePortThatIsUsed) {
   PortConfigLog log;
   const std::string body =
       "2" + PortFields("COM1,9600,N,8,1,N") + PortFields("COM2,115200,O,7,2,CTS");

@@ -12,7 +12,7 @@ using namespace VelmarCommands;
 
 ResponseType TypeOf(std::string_view bytes) { return RecogniseResponse(bytes).type; }
 
-TEST(VelmarResponse, AnAcknowledgementEndsBehindThePrompt) {
+TEST(VelmarResponse, AnAcknowledgementEndsAfterThePrompt) {
   const Response response = RecogniseResponse(kOkPrompt);
   EXPECT_EQ(response.type, RESPONSE_OK);
   EXPECT_EQ(response.prompt_end, kOkPrompt.size());

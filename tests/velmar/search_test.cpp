@@ -159,7 +159,7 @@ TEST_F(VelmarSearch, FindsTheLastSpeedInTheLastMode) {
 
 // Each silent try takes the answer's time-out and the pause behind an exchange, and the last one
 // the quiet second that ends a read.
-TEST_F(VelmarSearch, OfThisFamilyAloneSaysNothingElseOnTheLine) {
+TEST_F(VelmarSearch, OfThisFamilyAloneSendsNothingElse) {
   EXPECT_EQ(Search(eProtocolVelmar), S_OK);
   ExpectTries(AllTries(kLeftAt), eProtocolVelmar, true);
   EXPECT_EQ(clock_.paused, 18u * 500);

@@ -273,7 +273,7 @@ TEST(VelmarSimulatedReceiver, FilesOfAnyLength) {
   }
 }
 
-TEST(VelmarSimulatedReceiver, WhoseSizeIsALieSendsTheFileAllTheSame) {
+TEST(VelmarSimulatedReceiver, WithAWrongSizeStillSendsTheFile) {
   for (const uint32_t told : {0u, 1u, 1000000u}) {
     sim::VelmarOptions options;
     options.faults.sizes = {{"A.log", told}};
@@ -297,7 +297,7 @@ TEST(VelmarSimulatedReceiver, DamagedChunksAreTakenAsTheyAre) {
 
 // Whatever its lengths tell, the download ends, the speed is the old one, and the next one is
 // whole.
-TEST(VelmarSimulatedReceiver, WhoseLengthsLieIsLeftInOrder) {
+TEST(VelmarSimulatedReceiver, WithWrongLengthsIsLeftInOrder) {
   using Kind = sim::VelmarChunkFaultKind;
   for (const Kind kind : {Kind::kMessageLength, Kind::kBodyLength, Kind::kHeaderLength}) {
     for (const uint32_t amount : {0u, 1u, 7u, 8u, 255u, 1033u, 65535u}) {

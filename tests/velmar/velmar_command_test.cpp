@@ -122,7 +122,7 @@ TEST_F(VelmarCommand, AFailedReadEndsItWithoutAReply) {
   EXPECT_EQ(clock.paused, 0u);
 }
 
-TEST_F(VelmarCommand, ATimeOutEndsItInPeace) {
+TEST_F(VelmarCommand, ATimeOutEndsItWithoutAFailure) {
   CVelmarCommand command("x", 0);
   command.SetReply("before");
   EXPECT_EQ(command.Execute(&connection, nullptr), S_OK);
@@ -250,7 +250,7 @@ TEST_F(VelmarCommand, AnAbbreviatedLogIsNotOffered) {
   EXPECT_EQ(clock.paused, 0u);
 }
 
-TEST_F(VelmarCommand, ALineEndBehindThePromptEndsIt) {
+TEST_F(VelmarCommand, ALineEndAfterThePromptEndsIt) {
   for (const std::string& prompt : {kOkPrompt, kErrorPrompt}) {
     connection.calls.clear();
     connection.GiveRead(prompt + "\r\n");
@@ -261,7 +261,7 @@ TEST_F(VelmarCommand, ALineEndBehindThePromptEndsIt) {
   }
 }
 
-TEST_F(VelmarCommand, OtherBytesBehindThePromptAreUnknown) {
+TEST_F(VelmarCommand, OtherBytesAfterThePromptAreUnknown) {
   connection.GiveRead(kOkPrompt + "?");
   CVelmarCommand command("x", 0);
   command.Execute(&connection, nullptr);
@@ -327,7 +327,7 @@ TEST_F(VelmarCommand, ACancelEndsItAtEachCheckpoint) {
 }
 
 // A command without a reply has been sent when the cancel comes.
-TEST_F(VelmarCommand, ACancelBehindASendOnlyCommandIsTooLate) {
+TEST_F(VelmarCommand, ACancelAfterASendOnlyCommandIsTooLate) {
   CVelmarCommand command("x", kSendOnly);
   connection.on_write = [&](std::string_view) {
     command.Cancel();
@@ -569,7 +569,7 @@ TEST_F(VelmarCommand, ALogThatNobodyReadsIsDone) {
       ElementsAre("flush", "write x", "read 8192 30000", "flush", "write x", "read 8192 30000"));
 }
 
-TEST_F(VelmarCommand, AcknowledgementsAsText) {
+TEST_F(VelmarCommand, AcknowledgementsAreParsedAsText) {
   const auto parse = [](const char* text) {
     CVelmarCommand command("x", 0);
     const int answer = command.ParseAcknowledgement(text);
@@ -595,7 +595,7 @@ TEST_F(VelmarCommand, AcknowledgementsAsText) {
   EXPECT_EQ(parse("text"), std::tuple(1, 4, ""));
 }
 
-TEST_F(VelmarCommand, AsciiMessages) {
+TEST_F(VelmarCommand, AsciiMessagesAreHeaderAndBody) {
   CVelmarCommand command("x", 0);
   bool done = true;
   EXPECT_EQ(command.ParseAsciiMessage("no separator", &done), S_FALSE);

@@ -64,7 +64,7 @@ TEST_F(VelmarDriver, ASignalledEventEndsTheProbeButNotTheLock) {
   EXPECT_TRUE(report.HasStart("CVelmarProtocol::LockConnection - connection is locked [0x"));
 }
 
-TEST_F(VelmarDriver, TheEventIsLookedAtBehindTheFirstCommand) {
+TEST_F(VelmarDriver, TheEventIsCheckedAfterTheFirstCommand) {
   const Event event(false);
   before_command = [&](const std::string&) { SetEvent(event.get()); };
   short answer = 99;
@@ -74,7 +74,7 @@ TEST_F(VelmarDriver, TheEventIsLookedAtBehindTheFirstCommand) {
 }
 
 // Only that the first of the two commands could be sent counts.
-TEST_F(VelmarDriver, TheAnswerToTheFirstProbeCommandIsNotLookedAt) {
+TEST_F(VelmarDriver, TheAnswerToTheFirstProbeCommandIsIgnored) {
   answers = {{kInterfaceMode, kErrorPrompt}, {kUnlogAll, kOkPrompt}};
   short answer = 0;
   EXPECT_EQ(driver.CheckConnection(nullptr, &answer), S_OK);
@@ -95,7 +95,7 @@ TEST_F(VelmarDriver, ALogIsNoAnswerToTheProbe) {
 }
 
 // An answer that comes after the check has given up is discarded by what follows.
-TEST_F(VelmarDriver, WhatFollowsACheckInVainWaitsForALateAnswer) {
+TEST_F(VelmarDriver, TheCommandAfterAFailedCheckWaitsForALateAnswer) {
   short answer = 99;
   EXPECT_EQ(driver.CheckConnection(nullptr, &answer), S_OK);
   EXPECT_EQ(answer, 0);
@@ -201,7 +201,7 @@ TEST_F(VelmarDriver, AnIdentityThatFailsGivesItsCode) {
   EXPECT_FALSE(report.Has("CVelmarProtocol::GetReceiverInfo - OK"));
 }
 
-TEST_F(VelmarDriver, AnAbortEndsTheIdentityAndIsUsedUp) {
+TEST_F(VelmarDriver, AnAbortEndsTheIdentityAndIsCleared) {
   answers = {{kVersion, VersionReply()}};
   driver.Abort();
   CReceiverInfo info{};
@@ -433,7 +433,7 @@ TEST_F(VelmarDriver, AnAbortEndsAPortSettingBeforeItIsSent) {
   EXPECT_THAT(connection->Writes(), ElementsAre(kConfig));
 }
 
-TEST_F(VelmarDriver, APortSettingUsesTheAbortUp) {
+TEST_F(VelmarDriver, APortSettingClearsTheAbort) {
   answers = {{kConfig, ConfigReply()}};
   driver.Abort();
   EXPECT_EQ(driver.DCSetRcvBaudrate(57600), S_FALSE);
@@ -499,7 +499,7 @@ TEST_F(VelmarDriver, SendsItsSettingsAsTheyAre) {
 }
 
 // The port that the receiver is talked to on is in the header of its log.
-TEST_F(VelmarDriver, ChangesThePortThatItTalksOn) {
+TEST_F(VelmarDriver, ChangesThePortThatItUses) {
   const std::string ports =
       "2,COM1,9600,N,8,1,N,ON,OFF,NOVATEL,NOVATEL,ON,COM2,38400,O,7,2,CTS,ON,OFF,NOVATEL,NOVATEL,"
       "ON";
@@ -568,7 +568,7 @@ TEST_F(VelmarDriver, AConnectionWithoutANameHasAnEmptyOne) {
               ElementsAre("CVelmarProtocol::DumpInvalidResponse - [0x80070005] [] []"));
 }
 
-TEST_F(VelmarDriver, AReplyThatIsNotThereCannotBeWritten) {
+TEST_F(VelmarDriver, AMissingReplyIsNotTraced) {
   Ending command(E_ACCESSDENIED);
   command.SetReply("text");
   command.FreeReply();
@@ -595,7 +595,7 @@ TEST_F(VelmarDriver, AnAbortReachesTheCommandThatRuns) {
   EXPECT_FALSE(next.IsCancelled(nullptr));
 }
 
-TEST_F(VelmarDriver, WithoutACallbackNobodyIsTold) {
+TEST_F(VelmarDriver, WithoutACallbackThereIsNoProgress) {
   driver.SetCallback(nullptr);
   EXPECT_EQ(driver.DeleteFile(L"a"), S_OK);
   EXPECT_THAT(percents, IsEmpty());
