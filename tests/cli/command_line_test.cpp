@@ -24,7 +24,7 @@ std::string Help(const Words& words) {
   return std::get<HelpText>(ParseCommandLine(words, MakeCommands())).text;
 }
 
-/// The failure of a line that makes no sense.
+/// The failure of an invalid line.
 Failure Refusal(const Words& words) {
   try {
     ParseCommandLine(words, MakeCommands());
@@ -239,7 +239,7 @@ TEST(CommandLineTest, PortsAreTakenHoweverTheyAreWritten) {
   EXPECT_EQ(Parse({"find", "\\\\.\\COM7"}).arguments.port, L"COM7");
 }
 
-/// A variable of the environment for the time of a test.
+/// An environment variable during a test.
 class Variable {
  public:
   Variable(std::string name, const std::string& value) : name_(std::move(name)) {
@@ -267,7 +267,7 @@ TEST(CommandLineTest, TheEnvironmentIsRead) {
   EXPECT_EQ(Parse({"find", "COM8", "--speed", "9600"}).arguments.speed, 9600U);
 }
 
-// The first word of a command is its port when it can be one.
+// The first word of a command is the port if it looks like one.
 TEST(CommandLineTest, ThePortOfTheEnvironmentLeavesNamesAlone) {
   const Variable port("RCVLINK_PORT", "COM7");
   EXPECT_EQ(Parse({"get", "a.jps"}).arguments.port, L"COM7");

@@ -83,7 +83,7 @@ TEST(ExchangeTest, ADownloadOfASilentVelmarReceiverIsCancelled) {
   EXPECT_NE(ToText(exchange, false).find("  204    cancel"), std::string::npos);
 }
 
-// What is left after any cut is read, and nothing but the last entries differ.
+// A report cut at any place is read, and only its last entries differ.
 TEST(ExchangeTest, ATruncatedReportIsReadUpToItsEnd) {
   const std::string whole = Recorded("quorin-retries.txt");
   for (std::size_t length = 0; length < whole.size(); length += 7) {
@@ -147,9 +147,9 @@ TEST(ExchangeTest, ALineOfAMultiByteCodePageMayRunIntoTheNext) {
   EXPECT_EQ(exchange.entries[1].since_ms, 5U);
   ASSERT_EQ(exchange.remarks.size(), 1U);
   EXPECT_NE(exchange.remarks[0].find("code page"), std::string::npos);
-  // Its own end is no sign of a report that breaks off.
+  // Its missing line end is no sign of a truncated report.
   EXPECT_EQ(ReadExchange(report.substr(0, report.find("Bye") - 21), kJapanese).remarks.size(), 1U);
-  // In a line of ASCII alone it is the receiver's text.
+  // In a line of ASCII only, it is text of the receiver.
   EXPECT_EQ(Parse("12:00:00.0000      7 a 12:00:00.0005      7 b\r\n").entries.size(), 1U);
 }
 
@@ -210,7 +210,7 @@ constexpr char kSentCommand[] =
     "12:00:00.0300      7 CSerialConnection::Flush\r\n"
     "12:00:01.0000      7 CQuorinCommand::Execute - start reading. Timeout is [8000 msec]\r\n";
 
-// The text does without the line that a command was sent, so its times do too.
+// The text leaves out the lines of sent commands, so its times leave them out, too.
 TEST(ExchangeTest, TheTextHasALineForEachStep) {
   const Exchange exchange = Parse(kSentCommand);
   const std::string text = ToText(exchange, false);
@@ -245,7 +245,7 @@ TEST(ExchangePageTest, AHostsCallLastsAsLongAsItsThread) {
                                         "12:00:00.0100      1 a note\r\n"
                                         "12:00:00.0905      2 another's\r\n"),
                                   "a");
-  // A lane is 905 wide, so each millisecond is one.
+  // A lane is 905 wide and the report 905 ms long, so each millisecond is 1 wide.
   EXPECT_NE(page.find("<rect class=\"fill-host\" x=\"80\" y=\"6\" width=\"100\""),
             std::string::npos);
 }

@@ -46,7 +46,7 @@ TEST(MirrorPlanTest, APartOfASecondCounts) {
   EXPECT_EQ(InWords(state, L"A", 1), "File 2 of 2: A, 1 B, 1 s left in total");
 }
 
-// A log that is being recorded may turn out larger than it was listed.
+// A log that is still being recorded may be larger than listed.
 TEST(MirrorPlanTest, NoTimeIsLeftWhenMoreCameThanListed) {
   const MirrorState state{.file = 2, .files = 2, .done = 900, .total = 800, .elapsed_ms = 10'000};
   EXPECT_EQ(InWords(state, L"A", 0), "File 2 of 2: A, 0 B, 0 s left in total");

@@ -48,7 +48,7 @@ TEST_F(PartFileTest, AnIncompleteFileCanBeKept) {
   EXPECT_FALSE(folder_.Has(L"a"));
 }
 
-// What took an hour to download is not thrown away because its name is taken.
+// A long download must not be lost because its name exists.
 TEST_F(PartFileTest, ACompleteFileSurvivesARenameThatFails) {
   folder_.Write(L"a", "precious");
   {

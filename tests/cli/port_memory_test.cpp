@@ -160,7 +160,7 @@ TEST_F(PortMemoryTest, ProgramsThatRunAtTheSameTimeLoseNothing) {
   }
 }
 
-// It had the lock of all memories, and left it behind.
+// It was killed while it held the lock.
 TEST_F(PortMemoryTest, AProgramThatWasKilledDoesNotBlockOthers) {
   const UniqueHandle mutex(CreateMutexW(nullptr, FALSE, L"Local\\rcvlink-cli port memory"));
   std::jthread([&mutex] { WaitForSingleObject(mutex.get(), INFINITE); }).join();

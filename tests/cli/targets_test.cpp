@@ -120,7 +120,7 @@ TEST_F(TargetsTest, TwoNamesNeverShareAFile) {
   targets.Choose(L"LOG");
   ExpectRefusal(targets, L"LOG");
   ExpectRefusal(targets, L"log");
-  ExpectRefusal(targets, L"log.part");  // LOG grows under that name
+  ExpectRefusal(targets, L"log.part");  // LOG is downloaded under that name
   targets.Choose(L"x.part");
   ExpectRefusal(targets, L"X");
   targets.Choose(L"a/b");

@@ -49,7 +49,7 @@ TEST(WildcardTest, AnEmptyNameFitsStarsOnly) {
   EXPECT_FALSE(FitsPattern(L"", L"?"));
 }
 
-// Each star more must not double the time.
+// Another star must not double the time.
 TEST(WildcardTest, ManyStarsDoNotSlowTheSearch) {
   const std::wstring name(250, L'a');
   std::wstring pattern;

@@ -54,7 +54,7 @@ TEST_F(Cli, SettingsReachTheReceiverInItsOwnWords) {
   }
 }
 
-// What the RTS line does is not seen from here.
+// The program cannot check the RTS line.
 TEST_F(Cli, AnRtsLineIsReportedAsNotConfirmed) {
   const bed::SimulatedPort receiver({"quorin"});
   const auto result = RunOn(receiver, {"set", "rts", "off", "--json"});
@@ -69,7 +69,7 @@ TEST_F(Cli, ANewSpeedIsTried) {
   EXPECT_EQ(result.status, kDone) << result.errors;
   EXPECT_THAT(result.output, HasSubstr("it answers with that setting"));
   EXPECT_THAT(result.output, HasSubstr("--speed 57600"));
-  // Asked there: the ping came after the change.
+  // The receiver is checked: the ping comes after the change.
   const std::string transcript = receiver.Transcript();
   EXPECT_NE(transcript.find("> dm", transcript.find("= speed 57600")), std::string::npos);
 }
@@ -84,7 +84,7 @@ TEST_F(Cli, ARefusedSpeedIsReportedAsRefused) {
   }
 }
 
-// The other family is not asked again: it would take seconds in which nothing answers.
+// The other family is not asked: that would take seconds without an answer.
 TEST_F(Cli, ANewSpeedIsConfirmedByTheFamilyThatWasFound) {
   const bed::SimulatedPort receiver({"velmar"}, {{"a.log", "a"}});
   EXPECT_EQ(RunOn(receiver, {"set", "baud", "57600"}).status, kDone);
@@ -95,7 +95,7 @@ TEST_F(Cli, ANewSpeedIsConfirmedByTheFamilyThatWasFound) {
   EXPECT_EQ(transcript.find("%", change), std::string::npos) << transcript;
 }
 
-// A question that nobody needs is time at the cable. Two questions of each are the greeting's.
+// A command that is not needed costs time. Two commands of each count belong to the handshake.
 TEST_F(Cli, CommandsSendOnlyWhatTheyNeed) {
   const bed::SimulatedPort receiver({"quorin"}, {{"a.jps", "a"}, {"b.jps", "b"}});
   const auto questions = [&receiver] {
@@ -121,13 +121,13 @@ TEST_F(Cli, CommandsSendOnlyWhatTheyNeed) {
 
 class SetMemory : public Cli {
  protected:
-  // One family is asked only: each that is not there takes long.
+  // Only one family is asked, because a family that does not answer takes long.
   bed::ProgramResult SetBaud(const bed::SimulatedPort& receiver,
                              const std::string& speed,
                              const std::string& option) const {
     return RunOn(receiver, {"set", "baud", speed, "--protocol", "quorin", option});
   }
-  // What a search begins with.
+  // The first try of a search.
   std::string FirstTry(const bed::SimulatedPort& receiver) const {
     bed::Program search(kProgram,
                         {"find", Port(receiver), "--protocol", "quorin"},
@@ -142,7 +142,7 @@ class SetMemory : public Cli {
   }
 };
 
-// A speed that no search begins with.
+// A speed that is not among the first tries of a search.
 constexpr char kOtherSpeed[] = "57600";
 
 TEST_F(SetMemory, ANewSpeedIsRemembered) {

@@ -1,4 +1,5 @@
-// rcvlink-cli completion: the script for PowerShell, as far as it can be looked at without one.
+// rcvlink-cli completion: the script for PowerShell, as far as it can be checked without
+// PowerShell.
 #include <algorithm>
 
 #include "tests/cli_run/cli.h"

@@ -1,4 +1,4 @@
-// rcvlink-cli get: what lands on the disk, and what never does.
+// rcvlink-cli get: which files are written, and which never are.
 #include <windows.h>
 
 #include <filesystem>
@@ -60,7 +60,7 @@ TEST_F(Cli, GetOfAnUnknownFileTransfersNothing) {
   EXPECT_THAT(LocalFiles(), IsEmpty());
 }
 
-// The library calls it a success; the program knows better, and throws nothing away.
+// The library returns success; the program compares the sizes and keeps the data.
 TEST_F(Cli, AFileOfAnotherSizeThanListedIsKeptAsAPart) {
   for (const char* listed : {"4000", "2000"}) {
     const bed::SimulatedPort receiver({"velmar", "--lie-size", std::string("a.jps=") + listed},
@@ -142,7 +142,7 @@ TEST_F(Cli, ExistingFilesCanBeSkipped) {
   EXPECT_EQ(files[0].at("skipped"), true);
   EXPECT_EQ(files[1].at("bytes"), 4);
   EXPECT_FALSE(files[2].contains("skipped"));
-  // A quiet user hears of the file that is not the receiver's, and of that alone.
+  // With --quiet only the file with another size is reported.
   EXPECT_EQ(result.errors, "b.jps: already exists, with 4 bytes; the receiver lists 40\n");
 }
 
@@ -155,7 +155,7 @@ TEST_F(Cli, AFileThatDiffersInCaseAloneIsNotSkippedInSilence) {
   EXPECT_THAT(result.errors, HasSubstr("already used for another file"));
 }
 
-// A stale part, a file that is here, and two names that are one on this computer.
+// An old .part, an existing file, and two names that are one on this computer.
 TEST_F(Cli, WhatCannotBeKeptStopsNoOtherFile) {
   folder.Write("a.jps.part", "what came of an earlier download");
   folder.Write("b.jps", "mine");
@@ -198,7 +198,7 @@ TEST_F(Cli, AFileThatCannotGetItsNameStopsNoOther) {
   EXPECT_EQ(folder.Read("b.jps"), Content(40));
 }
 
-// Each of them is told although no receiver is there: the search comes after.
+// Each error is reported although there is no receiver: the search comes later.
 TEST_F(Cli, LocalErrorsAreReportedBeforeTheSearch) {
   folder.Write("taken", "a file");
   folder.Write("b.jps.part", "what came of an earlier download");
@@ -273,7 +273,7 @@ TEST_F(Cli, AFolderThatCannotBeMadeIsALocalError) {
   EXPECT_THAT(LocalFiles(), ElementsAre("taken"));
 }
 
-// Names that would climb out of the folder or open a device are kept inside, under another name.
+// Names that would leave the folder or open a device are saved inside it under another name.
 TEST_F(Cli, NamesOfTheReceiverStayInTheFolder) {
   std::filesystem::create_directory(folder / "in");
   folder.Write("in/keep", "");
@@ -356,7 +356,7 @@ TEST_F(Cli, ProgressIsShownAsAskedFor) {
   EXPECT_EQ(first.at("total"), 3000);
 }
 
-// The set-up of a download and the reading of a list are shown as well.
+// The preparation of a download and the reading of a list are shown, too.
 TEST_F(Cli, ATerminalShowsWhatTheProgramWaitsFor) {
   const bed::SimulatedPort receiver({"quorin", "--reply-silence", "3:print,/log/@1"},
                                     {{"a.jps", Content(3000)}});

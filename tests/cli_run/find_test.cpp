@@ -1,4 +1,4 @@
-// The search: at which setting a receiver answers, what is remembered of it, several ports at once.
+// The search: the setting at which a receiver answers, what is remembered, several ports at once.
 #include <windows.h>
 
 #include <nlohmann/json.hpp>
@@ -81,7 +81,7 @@ TEST_F(Find, EachTryIsAlsoJson) {
   EXPECT_THAT(result.output, HasSubstr("(serial, 9600 bit/s, RTS on)"));
 }
 
-// One try at a setting that was asked for is no progress.
+// One try at a given setting shows no progress.
 TEST_F(Find, ASingleTryHasNoLine) {
   const bed::SimulatedPort receiver({"quorin"});
   EXPECT_EQ(RunOn(receiver, {"find", "--protocol", "quorin", "--progress", "json"}).errors, "");
@@ -101,7 +101,7 @@ TEST_F(Find, ATerminalShowsTheTryAndErasesIt) {
   EXPECT_THAT(result.output, AllOf(HasSubstr("Quorin receiver"), Not(HasSubstr("try 1"))));
 }
 
-// Nothing else is shown after the try, which would cover it.
+// Nothing else is shown after the try that would overwrite it.
 TEST_F(Find, AFailedTryIsErased) {
   const bed::SimulatedPort silent({"quorin", "--mute", "*"});
   const auto result =
@@ -131,7 +131,7 @@ TEST_F(Find, WhatWasFoundIsTriedFirstTheNextTime) {
 
 TEST_F(Find, WithoutMemoryNothingIsRemembered) {
   const bed::SimulatedPort receiver({"quorin"});
-  // A setting that is not tried early is remembered, and stays so.
+  // A setting that is not among the first tries is remembered, too.
   ASSERT_EQ(RunOn(receiver, {"find", "--rts", "handshake"}).status, kDone);
   ASSERT_EQ(RunOn(receiver, {"find", "--no-memory"}).status, kDone);
   EXPECT_THAT(Sweep(receiver, {"find"}).errors, HasSubstr(": 9600 bit/s, RTS handshake\n"));
@@ -165,8 +165,8 @@ TEST_F(Find, SeveralPortsAreSearchedSideBySide) {
   EXPECT_EQ(found.at("failures")[0].at("meaning"), "no receiver answered");
 }
 
-// The silent port comes first and takes long: whoever asks one after the other would have come to
-// the end before the second answers.
+// The silent port comes first and takes long: a search of one port after the other would not reach
+// the second in time.
 TEST_F(Find, APortThatAnswersIsShownBeforeTheSilentOnesEnd) {
   const bed::SimulatedPort silent({"quorin", "--mute", "*"});
   const bed::SimulatedPort answering({"quorin", "--id", "QR2"});
@@ -248,7 +248,7 @@ class ListedPort {
   HKEY key_ = nullptr;
 };
 
-// In one test: other tests run side by side with it, and --all must not reach the ports of theirs.
+// All in one test: other tests run at the same time, and --all must not reach their ports.
 TEST_F(Find, ListedPortsAreNamedAndAllAreAsked) {
   const bed::SimulatedPort receiver({"quorin", "--id", "QR4"});
   const ListedPort listed(receiver.name());

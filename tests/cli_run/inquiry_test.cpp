@@ -1,4 +1,4 @@
-// The commands that ask: find, info, ls, check, ports; and what is said when nobody answers.
+// The commands that only read: find, info, ls, check, ports; and the messages when nobody answers.
 #include <filesystem>
 #include <fstream>
 #include <iterator>
@@ -76,7 +76,7 @@ TEST_F(Cli, SilenceIsNoReceiver) {
   EXPECT_EQ(result.status, kNoReceiver);
   EXPECT_EQ(result.output, "");
   EXPECT_THAT(result.errors, HasSubstr("no receiver answered"));
-  EXPECT_THAT(result.errors, HasSubstr("is this its speed?"));  // and not asked for on USB
+  EXPECT_THAT(result.errors, HasSubstr("is this its speed?"));  // and USB was not searched
   EXPECT_THAT(result.errors, testing::Not(HasSubstr("0x0000")));
 }
 
@@ -154,7 +154,7 @@ TEST_F(Cli, APortIsUnderstoodHoweverItIsWritten) {
   }
 }
 
-// As `more` and `head` do when they have seen enough.
+// As `more` and `head` do when they end early.
 TEST_F(Cli, AReaderThatHasGoneIsNoFailure) {
   const bed::SimulatedPort receiver({"quorin"}, {{"a.jps", "a"}});
   for (const std::vector<std::string>& line : std::vector<std::vector<std::string>>{
@@ -166,7 +166,7 @@ TEST_F(Cli, AReaderThatHasGoneIsNoFailure) {
   }
 }
 
-// Its bytes are lost, which whoever asked for them has to know.
+// Its bytes are lost, so the exit code must say so.
 TEST_F(Cli, ADownloadWhoseReaderHasGoneIsAFailure) {
   const bed::SimulatedPort receiver({"quorin"}, {{"a.jps", Content(3000)}});
   const auto result = bed::Program(kProgram,
@@ -191,7 +191,7 @@ class ReportCli : public Cli {
  protected:
   ~ReportCli() override { std::filesystem::remove(path); }
 
-  // The folder's own name is unique, and so is this.
+  // Unique, because the folder's own name is.
   const std::string name =
       "cli-run-" + std::filesystem::path(folder.unix_path()).filename().string();
   const std::filesystem::path path = std::filesystem::temp_directory_path() / name;

@@ -1,4 +1,4 @@
-// rcvlink-cli mirror: what is brought, what is left alone, what is deleted, and how it ends.
+// rcvlink-cli mirror: what is downloaded, what is kept, what is deleted, and the exit codes.
 #include <chrono>
 #include <nlohmann/json.hpp>
 
@@ -16,7 +16,7 @@ class Mirror : public Cli {
  protected:
   Mirror() { std::filesystem::create_directory(folder / "out"); }
 
-  // mirror PORT out, with what follows.
+  // mirror PORT out, with more arguments.
   bed::ProgramResult RunMirror(const bed::SimulatedPort& receiver,
                                std::vector<std::string> arguments = {}) const {
     arguments.insert(arguments.begin(), {"mirror", "out"});
@@ -36,7 +36,7 @@ class Mirror : public Cli {
     }
     return names;
   }
-  // What lies in the folder of the mirror.
+  // The files in the folder of the mirror.
   std::vector<std::string> Mirrored() const {
     std::vector<std::string> names;
     for (const auto& entry : std::filesystem::directory_iterator(folder / "out")) {
@@ -81,7 +81,8 @@ TEST_F(Mirror, MakesItsFolder) {
   EXPECT_EQ(folder.Read("new/deep/a.jps"), Content(30));
 }
 
-// A number of logs may begin again when the receiver has been cleaned: the old log is not lost.
+// The numbers of logs start again when a receiver's files were deleted. The old log must not be
+// lost.
 TEST_F(Mirror, AnotherFileOfTheSameNameStays) {
   folder.Write("out/a.jps", "yesterday's log");
   const bed::SimulatedPort receiver({"quorin"}, {{"a.jps", Content(300)}, {"b.jps", Content(30)}});
@@ -102,7 +103,7 @@ TEST_F(Mirror, GoesOnAfterAFileThatFailed) {
   const auto result = RunMirror(receiver, {"--json"});
   EXPECT_EQ(result.status, kFailed);
   EXPECT_EQ(folder.Read("out/b.jps"), Content(30));
-  // What came of it is kept: it may be a log that is still being recorded.
+  // Its data is kept: it may be a log that is still being recorded.
   EXPECT_EQ(Mirrored(), (Names{"a.jps.new.part", "b.jps"}));
   const json document = json::parse(result.output);
   EXPECT_TRUE(FileOf(document, "a.jps").contains("error"));
@@ -110,7 +111,7 @@ TEST_F(Mirror, GoesOnAfterAFileThatFailed) {
   EXPECT_EQ(document.at("summary").at("downloaded"), 1);
   EXPECT_EQ(document.at("summary").at("failed"), 1);
 
-  // The next time it is out of date.
+  // In the next run it is out of date.
   const bed::SimulatedPort ready({"quorin"}, {{"a.jps", Content(4000)}, {"b.jps", Content(30)}});
   EXPECT_EQ(RunMirror(ready).status, kDone);
   EXPECT_EQ(Mirrored(), (Names{"a.jps", "b.jps"}));
@@ -168,7 +169,7 @@ TEST_F(Mirror, AnEmptyFileReplacesAnotherOnlyWhenForced) {
   EXPECT_EQ(folder.Read("out/a.jps"), "");
 }
 
-// No second download has verified it.
+// It was not verified by a second download.
 TEST_F(Mirror, AnEmptyFileIsNotDeleted) {
   const bed::SimulatedPort receiver({"quorin"}, {{"a.jps", ""}});
   EXPECT_EQ(RunMirror(receiver, {"--then-delete"}).status, kDone);
@@ -207,7 +208,7 @@ TEST_F(Mirror, DeletesOnlyWhatASecondDownloadVerified) {
   EXPECT_EQ(FileOf(document, "same.jps").at("deleted"), true);
   EXPECT_THAT(FileOf(document, "other.jps").at("error").at("meaning"),
               HasSubstr("different bytes"));
-  // Twice the one that was missing, once those that were there.
+  // Two downloads of the missing file, one of each existing file.
   size_t downloads = 0;
   const std::string transcript = receiver.Transcript();
   for (size_t at = 0; (at = transcript.find("get,", at)) != std::string::npos; ++at) ++downloads;
@@ -249,7 +250,7 @@ class VelmarMirror : public Mirror {
   }
 };
 
-// The first of all downloads has a wrong bit, which the protocol does not notice.
+// The first download has a wrong bit, which the protocol does not detect.
 TEST_F(VelmarMirror, WhatASecondDownloadDoesNotVerifyIsNeitherKeptNorDeleted) {
   const bed::SimulatedPort receiver({"velmar", "--flipped-bit", "0@1"}, {{"a.log", Content(30)}});
   const auto result = RunMirror(receiver, {"--then-delete"});
@@ -270,7 +271,7 @@ TEST_F(VelmarMirror, ARefusedDeletionIsNoticed) {
   EXPECT_EQ(folder.Read("out/a.log"), Content(30));
 }
 
-// The one file that was asked for came, but another of that name may be beyond the list's end.
+// The listed file was downloaded, but another file that matches may be missing from the list.
 TEST_F(VelmarMirror, ADirectoryThatDidNotFitIsNeverDone) {
   Files files;
   while (files.size() < 120)

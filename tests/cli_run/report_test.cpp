@@ -1,4 +1,4 @@
-// The command that shows a report, on one that the program has just written.
+// The command that shows a report, with a report that the program has just written.
 #include <filesystem>
 #include <nlohmann/json.hpp>
 

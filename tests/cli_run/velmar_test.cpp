@@ -1,4 +1,4 @@
-// The program with a Velmar receiver, whose refusals the library does not tell.
+// The program with a Velmar receiver, whose refusals the library does not report.
 #include <chrono>
 #include <deque>
 #include <nlohmann/json.hpp>
@@ -55,7 +55,7 @@ TEST_F(VelmarCli, ListShowsNamesSizesAndTotal) {
   EXPECT_THAT(result.output, HasSubstr("2 files, 730 bytes"));
 }
 
-// The library's buffer ends the list: whoever reads it has to know.
+// The list is cut at the end of the library's buffer; the user must be warned.
 TEST_F(VelmarCli, AListThatMayBeCutGivesAWarning) {
   Files files;
   const auto add_until = [&](size_t count) {
@@ -99,7 +99,7 @@ TEST_F(VelmarCli, AFileOfAnotherSizeThanListedIsAFailure) {
   EXPECT_EQ(folder.Read("a.log.part"), Content(3000));
 }
 
-// Its driver does not check what arrives.
+// The driver does not check the checksums.
 TEST_F(VelmarCli, VerifyFindsADamagedByte) {
   const bed::SimulatedPort receiver({"velmar", "--flipped-bit", "1@2"}, {{"a.log", Content(3000)}});
   EXPECT_EQ(RunOn(receiver, {"get", "a.log"}).status, kDone);
@@ -114,7 +114,7 @@ TEST_F(VelmarCli, VerifyFindsADamagedByte) {
   EXPECT_EQ(folder.Read("c.log"), Content(3000));
 }
 
-// That each file is here already keeps the test short.
+// The files exist already, to keep the test short.
 TEST_F(VelmarCli, AllSaysWhenTheListMayBeCut) {
   Files files;
   while (files.size() < 80) files.emplace("file" + std::to_string(100 + files.size()), "x");
@@ -135,7 +135,7 @@ TEST_F(VelmarCli, AllIsNeverDoneWhenTheListIsRefused) {
   EXPECT_THAT(result.errors, HasSubstr("may be missing"));
 }
 
-// Each of them waits twice for 30 s, so they wait side by side.
+// Each of them waits twice for 30 s, so they run at the same time.
 TEST_F(VelmarCli, AListThatIsNotAnsweredIsNeverDone) {
   const std::vector<std::vector<std::string>> commands = {
       {"ls", "--json"}, {"get", "--all", "--json"}, {"mirror", "out", "--json"}};
@@ -168,7 +168,7 @@ TEST_F(VelmarCli, AListThatWasRefusedIsReadAgain) {
   EXPECT_EQ(folder.Read("a.log"), Content(30));
 }
 
-// The rest of a list that did not fit is still on its way when the next command goes out.
+// The rest of a list that did not fit is still arriving when the next command is sent.
 TEST_F(VelmarCli, AListThatDoesNotFitDoesNotDisturbTheNextCommand) {
   constexpr size_t kFiles = 110;
   Files files;
@@ -210,7 +210,7 @@ TEST_F(VelmarCli, ARefusedRemoveIsNoticed) {
   EXPECT_THAT(result.errors, HasSubstr("still has the file"));
 }
 
-// The families number parities the other way round.
+// The two families use opposite numbers for odd and even parity.
 TEST_F(VelmarCli, ParitiesReachTheReceiverInItsOwnWords) {
   const bed::SimulatedPort receiver({"velmar"});
   EXPECT_EQ(RunOn(receiver, {"set", "parity", "even", "--yes"}).status, kDone);

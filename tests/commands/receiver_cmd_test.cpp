@@ -97,7 +97,7 @@ TEST(ReceiverCmd, FreeReplyLeavesTheLength) {
   EXPECT_EQ(command.GetReplyLength(), 3u);
 }
 
-// The old length means nothing once the reply is freed: nothing is read through it.
+// The old length is not used after the reply was freed.
 TEST(ReceiverCmd, AppendsToAFreedReplyFromTheStart) {
   TestCommand command("x");
   command.SetReply("abc");

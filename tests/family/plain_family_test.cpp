@@ -25,7 +25,7 @@ namespace {
 constexpr auto kPlain = static_cast<EProtocol>(3);
 constexpr wchar_t kPort[] = L"COM7";
 
-// A receiver that has one file, from its own side of the wire.
+// The receiver's side: a receiver with one file.
 std::string AnswerTo(std::string_view line) {
   if (line == "who\n") return "plain\n.\n";
   if (line == "id\n") return "P1\n.\n";

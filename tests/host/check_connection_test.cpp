@@ -24,7 +24,7 @@ TEST(ApiCheckConnection, ProbesTheReceiverAgain) {
   EXPECT_EQ(report.Lines().front(), "CAbstractReceiver::CheckConnection");
   EXPECT_EQ(report.Lines().back(),
             "CQuorinProtocol::UnlockConnection - connection is unlocked [HANDLE]");
-  // What comes last is not answered, so it may be under way still: the next command waits for it.
+  // The last command has no reply, so it may still be arriving: the next command waits for it.
   receiver.Identify();
   host::Lines sent = receiver.SentSince();
   sent.resize(host::HandshakeOfHost().size());

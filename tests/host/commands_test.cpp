@@ -81,7 +81,7 @@ TEST(ApiUnoffered, OperationsSaySoWithoutAskingTheReceiver) {
 
 class ApiPortSettings : public testing::Test {
  protected:
-  // A setting is not answered, so it is waited for.
+  // A setting has no reply, so the test waits for it.
   void ExpectSetting(const std::string& setting, const std::string& taken) {
     sent_.push_back(R"(%#%print,/cur/term\r\n)");
     sent_.push_back("set,/par/dev/ser/c/" + setting + R"(\r\n)");
@@ -143,7 +143,7 @@ TEST_F(ApiPortSettings, SpeedChangesOnTheReceiverOnly) {
                           R"(set,/par/dev/ser/c/rate,-1\r\n)",
                           R"(%#%print,/cur/term\r\n)",
                           R"(set,/par/dev/ser/c/rate,19200\r\n)"));
-  // The host has stayed behind; a new connection at the new speed finds the receiver.
+  // The host stays at the old speed; a new connection at the new speed finds the receiver.
   const host::Receiver follower(port_, CBR_19200);
   EXPECT_EQ(follower.Identify().result, S_OK);
 }

@@ -1,4 +1,4 @@
-// The names under which the DLL offers its functions, for the compilers of both worlds.
+// The names under which the DLL exports its functions, for GNU's and Microsoft's compilers.
 #include <gtest/gtest.h>
 #include <windows.h>
 
@@ -57,7 +57,7 @@ std::string GnuFunction(const std::string& name) {
   return function;
 }
 
-// Tells the functions of one name apart by their text argument.
+// Distinguishes functions of one name by their text argument.
 std::string Key(const std::string& name) {
   if (IsMicrosoft(name)) {
     const bool narrow = name.find("@@YAXPEBD") != std::string::npos;

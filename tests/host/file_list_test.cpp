@@ -114,7 +114,7 @@ TEST(ApiFileList, TracesItsSteps) {
                           "GetFileInfo - [A.log] [3]"));
 }
 
-// Names travel as bytes of the thread's code page.
+// Names are sent as bytes of the thread's code page.
 TEST(ApiFileList, NamesBeyondAsciiAreConverted) {
   const std::u8string utf8 = u8"Gr\u00F6\u00DFe.log";
   const std::string bytes(utf8.begin(), utf8.end());
@@ -215,8 +215,8 @@ struct Raised {
   DWORD flags;
 };
 
-// The call runs on a thread of its own, which the exception ends. A handler that is never left
-// stays installed for ever, so it looks at nothing but the calls made here.
+// The call runs on a thread of its own, which the exception ends. The handler stays installed for
+// ever, so it handles only the calls made here.
 Raised CallGetFileInfo(void* list, long index) {
   static Raised* current = nullptr;
   static thread_local bool calling = false;

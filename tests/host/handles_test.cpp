@@ -1,4 +1,4 @@
-// Handles and their users: what is registered, and for how long.
+// Handles and their users: which receivers are registered, and for how long.
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <windows.h>
@@ -15,7 +15,7 @@ using testing::IsEmpty;
 
 namespace {
 
-// Asks every function that takes a receiver's handle.
+// Calls every function that takes a receiver's handle.
 void ExpectUnknown(void* handle) {
   wchar_t name[] = L"A.log";
   short answer = 7;

@@ -1,4 +1,4 @@
-// The library loaded and unloaded while the test looks on: a copy of it under another name.
+// A copy of the library under another name, loaded and unloaded by the test.
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <windows.h>
@@ -46,7 +46,7 @@ TEST(ApiModule, WritesByeInItsReportOnly) {
 class ApiModuleWithReceiver : public testing::Test {
  protected:
   // Loads a copy, opens a receiver through it, and unloads it. Gives the number of handles that
-  // this leaves behind.
+  // stay open.
   long LoadAndUnload() {
     DeleteFileW(path_.c_str());
     const size_t before = host::HandleCount();
@@ -66,7 +66,7 @@ class ApiModuleWithReceiver : public testing::Test {
 };
 
 TEST_F(ApiModuleWithReceiver, ClosesItWhenUnloaded) {
-  LoadAndUnload();  // the system keeps something of the first time
+  LoadAndUnload();  // the system keeps some handles of the first time
   EXPECT_EQ(LoadAndUnload(), 0);
 
   std::vector<std::string> lines = host::ReportLines(path_);

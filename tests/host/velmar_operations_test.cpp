@@ -1,4 +1,4 @@
-// What a host does with a Velmar receiver: identity, files, settings, and what it does not offer.
+// What a host does with a Velmar receiver: identity, files, settings, and unsupported operations.
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <windows.h>
@@ -133,7 +133,7 @@ TEST(ApiVelmarDownload, OfAnUnknownFileIsASuccessWithoutBytes) {
   EXPECT_THAT(receiver.Sent(), ElementsAre(R"(currentfile B.log all\r)"));
 }
 
-// The download does not use the abort up: the next operation sends its command and then ends, once.
+// The download does not clear the abort: the next operation sends its command and then ends, once.
 TEST(ApiVelmarDownload, AbortEndsItAndTheNextOperation) {
   constexpr size_t kHalfAMinuteAndMore = 600000;
   constexpr auto kMuchLess = std::chrono::seconds(10);
@@ -175,7 +175,7 @@ TEST(ApiVelmarFiles, RefusalsAreSuccesses) {
   EXPECT_THAT(receiver.Names(), ElementsAre(L"A.log"));
 }
 
-// Each changes one value and keeps the others as the receiver tells them.
+// Each changes one value and keeps the others as the receiver reports them.
 TEST(ApiVelmarSettings, ChangeOneValueOfThePort) {
   const Velmar receiver({});
   const char* const question = R"(log comconfiga once\r)";

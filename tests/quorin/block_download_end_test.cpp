@@ -1,4 +1,4 @@
-// How a block transfer ends early: what is the same over both links.
+// How a block transfer ends early, as far as both links agree.
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
@@ -17,7 +17,7 @@ namespace {
 
 class QuorinBlockDownloadEnd : public QuorinBothLinksTest {
  protected:
-  // More than half a second after the block before it: over USB, progress is told then.
+  // More than half a second after the block before it, so that USB reports progress.
   void GiveLate(const std::string& block) {
     connection->Give({S_OK, block, [this] { clock.now += 501; }});
   }
@@ -109,7 +109,7 @@ TEST_P(QuorinBlockDownloadEnd, GivesEachControlByteThreeSeconds) {
   EXPECT_THAT(connection->write_timeouts, ElementsAre(3000, 3000, 3000));
 }
 
-// What a failure of the host's stream gives differs; that the receiver hears of it does not.
+// The result of a failed stream differs between the links, but the receiver is always sent the end.
 TEST_P(QuorinBlockDownloadEnd, SendsTheReceiverTheEndAfterAFailedStream) {
   GiveFile();
   stream.fail_at_write = 1;

@@ -188,7 +188,7 @@ class QuorinFileTime : public testing::TestWithParam<const char*> {
     return time ? Text(*time) : "none";
   }
 
-  // The same through the runtime library alone.
+  // The same with the runtime library alone.
   static std::string ExpectedText(int64_t seconds) {
     std::tm start{};
     start.tm_year = 88;

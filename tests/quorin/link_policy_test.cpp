@@ -1,4 +1,4 @@
-// What a block transfer does its own way over a serial link, and over USB.
+// How a block transfer differs over a serial link and over USB.
 #include "quorin/link_policy.h"
 
 #include <gmock/gmock.h>
@@ -36,7 +36,7 @@ TEST_F(QuorinSerialBlocks, AreEndedByAHeaderAlone) {
   EXPECT_THAT(connection->calls, ElementsAre(link.first_read));
 }
 
-// Less than a header says nothing, not even the end; the rest is not waited for.
+// Fewer bytes than a header are ignored, even the end. The rest is not read.
 class QuorinShortHeader : public QuorinSerialBlocks,
                           public testing::WithParamInterface<std::string> {};
 
@@ -59,7 +59,7 @@ INSTANTIATE_TEST_SUITE_P(Headers,
                                          std::string("\x04\x01", 2),
                                          std::string("#")));
 
-// As much of a second block as comes in the second read.
+// The part of a second block that comes with the second read.
 class QuorinShortRest : public QuorinSerialBlocks, public testing::WithParamInterface<size_t> {};
 
 TEST_P(QuorinShortRest, IsAskedForAgain) {
@@ -105,7 +105,7 @@ TEST_F(QuorinSerialBlocks, AllowThreeSilencesEach) {
   EXPECT_EQ(Controls(), "\x15\x15\x15\x06\x15\x15\x15\x06\x15\x15\x15#");
 }
 
-// The host knows of it already.
+// The stream is the host's own, so the host already knows of the failure.
 TEST_F(QuorinSerialBlocks, DoNotReturnAFailureOfTheStream) {
   GiveFile();
   stream.fail_at_write = 1;
@@ -139,7 +139,7 @@ TEST_F(QuorinSerialBlocks, EndWithoutAFailureWhenTheAckWasInterrupted) {
   EXPECT_EQ(Controls(), "\x06\x06");
 }
 
-// The abort is seen once the failed read is dealt with.
+// The failed read has priority over the abort.
 TEST_F(QuorinSerialBlocks, AreAbortedAfterASilence) {
   connection->Give({kTimedOut, "", [this] { driver.Abort(); }});
   EXPECT_EQ(Download(), S_FALSE);
@@ -168,7 +168,7 @@ TEST_F(QuorinSerialBlocks, AreCompleteThoughTheAbortCameWithTheLast) {
   EXPECT_EQ(stream.bytes, content.substr(0, 100));
 }
 
-// In 32 bits: a file is larger than that when it is told to be.
+// The arithmetic is in 32 bits, so larger files wrap.
 TEST(QuorinSerialPolicy, CountsThePercentInArithmeticThatWraps) {
   const SerialPolicy policy(nullptr);
   constexpr uint32_t kLargestProduct = 43383508;  // times 99
@@ -190,7 +190,7 @@ TEST_F(QuorinUsbBlocks, AreOfOneLength) {
   EXPECT_THAT(connection->calls, IsEmpty());
 }
 
-// How long a read is waited for is the user's to say.
+// The user can set the time-out of a read.
 TEST(QuorinUsbBlocksSettings, LimitTheTimeOfARead) {
   UserSettings settings;
   const DWORD timeout_ms = 1234;
@@ -206,8 +206,8 @@ TEST(QuorinUsbBlocksSettings, LimitTheTimeOfARead) {
 }
 
 struct Pieces {
-  std::vector<size_t> sizes;  // how the block comes
-  std::vector<size_t> asked;  // how it is asked for
+  std::vector<size_t> sizes;  // the parts in which the block arrives
+  std::vector<size_t> asked;  // the sizes of the reads
 };
 
 class QuorinUsbPieces : public QuorinUsbBlocks, public testing::WithParamInterface<Pieces> {
@@ -268,7 +268,7 @@ TEST_F(QuorinUsbBlocks, AreNotEndedByLessThanABlock) {
   EXPECT_THAT(report.Lines(), ElementsAre(TimeoutLine()));
 }
 
-// What came of the block is forgotten: it comes again from its beginning.
+// The part that arrived is discarded: the block is sent again from its beginning.
 class QuorinUsbSilence : public QuorinUsbBlocks, public testing::WithParamInterface<size_t> {};
 
 TEST_P(QuorinUsbSilence, WithinABlockIsAskedAgain) {
@@ -309,7 +309,7 @@ TEST_F(QuorinUsbBlocks, EndWithTheResultOfTheAck) {
   EXPECT_THAT(report.Lines(), IsEmpty());
 }
 
-// Reads that end without a failure, but not well.
+// Reads that end with a success code other than S_OK.
 TEST_F(QuorinUsbBlocks, EndWithTheResultOfTheRead) {
   connection->Give({kPositive, FirstBlock().substr(0, 512), {}});
   EXPECT_EQ(Download(), kPositive);
@@ -327,7 +327,7 @@ TEST_F(QuorinUsbBlocks, EndWithTheResultOfTheReadOfTheRestWhateverIsWrongWithThe
   EXPECT_THAT(report.Lines(), IsEmpty());
 }
 
-// The abort that ended the read is gone when another call has taken it.
+// The abort that ended the read may have been cleared by another call.
 TEST_F(QuorinUsbBlocks, EndTheReceiversTransferTooWhenTheReadOfTheRestWasInterrupted) {
   Give(FirstBlock().substr(0, 512));
   connection->GiveResult(S_FALSE);
@@ -335,7 +335,7 @@ TEST_F(QuorinUsbBlocks, EndTheReceiversTransferTooWhenTheReadOfTheRestWasInterru
   EXPECT_EQ(Controls(), "#");
 }
 
-// What the header says comes first.
+// The header is checked first.
 TEST_F(QuorinUsbBlocks, AreEndedByTheReceiverHoweverTheReadEnded) {
   connection->Give({kPositive, "#", {}});
   EXPECT_EQ(Download(), S_FALSE);
@@ -395,7 +395,7 @@ TEST_F(QuorinUsbBlocks, GoOnAfterAStreamResultThatIsNoFailure) {
   EXPECT_EQ(Controls(), "\x06\x06#");
 }
 
-// The abort counts more than how the read ended, and than what it brought.
+// The abort has priority over the result of the read and over its data.
 TEST_F(QuorinUsbBlocks, AreAbortedThoughTheReadFailed) {
   for (const HRESULT failure : {kTimedOut, E_HANDLE}) {
     connection->Give({failure, "", [this] { driver.Abort(); }});
@@ -427,7 +427,7 @@ TEST(QuorinUsbPolicy, CountsThePercentOfFilesOfAnySize) {
   EXPECT_EQ(policy.Percent(0x7FFFFFFF, 0x7FFFFFFF), 100);
 }
 
-// The sequence numbers end there.
+// The largest sequence number.
 TEST(QuorinLinkPolicies, CountUpThroughTheLargestTransfer) {
   AbortSwitch abort(nullptr);
   const SerialPolicy serial(nullptr);

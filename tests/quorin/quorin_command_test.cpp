@@ -173,7 +173,7 @@ TEST_F(QuorinCommandSending, ReadsNothingAfterACancelDuringTheText) {
   EXPECT_THAT(connection.calls, ElementsAre("flush", "write print\r\n"));
 }
 
-// What is sent whole reaches the receiver, whatever comes.
+// What is sent whole reaches the receiver in spite of cancels.
 class QuorinCommandSentWhole : public QuorinCommandSending {};
 
 TEST_F(QuorinCommandSentWhole, IsWrittenThoughCancelled) {

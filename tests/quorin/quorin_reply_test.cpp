@@ -80,7 +80,7 @@ TEST_F(QuorinReply, HasTheLongestLength) {
   EXPECT_EQ(untagged.ReplyText(), longest);
 }
 
-// What may come ahead of a reply.
+// What may come before a reply.
 class QuorinReplyAfter : public QuorinReply, public testing::WithParamInterface<std::string> {};
 
 TEST_P(QuorinReplyAfter, IsTheSameHoweverItIsCut) {
@@ -276,7 +276,7 @@ TEST_F(QuorinReply, IsTakenThoughACancelCameDuringItsRead) {
   EXPECT_EQ(command.ReplyText(), "x");
 }
 
-// A command that wants several messages, or whose memory runs out.
+// A command that expects several messages, or that runs out of memory.
 class PatientCommand : public AskCommand {
  public:
   explicit PatientCommand(size_t wanted) : AskCommand(kTagged), wanted_(wanted) {}

@@ -28,7 +28,7 @@ class QuorinReceiverInfo : public QuorinDriverTest {
   }
 
   HRESULT Get() { return driver.GetReceiverInfo(nullptr, &info); }
-  // After a failure: no strings, and the connection still held.
+  // After a failure there are no strings, and the connection is still locked.
   void ExpectNothingButTheLock() {
     EXPECT_EQ(info.bstrReceiverId, nullptr);
     EXPECT_EQ(info.bstrModel, nullptr);

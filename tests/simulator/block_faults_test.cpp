@@ -152,7 +152,7 @@ TEST(BlockFaultsTest, NaksDuringSilenceAreIgnored) {
   EXPECT_TRUE(session.NextBlock(kNak, 3000).empty());
   EXPECT_EQ(session.NextBlock(kNak, 3000), GoodBlock());
   EXPECT_EQ(session.port.Now() - start_ms, 10'000U);
-  // The next thing is the next block: none of the NAKs has brought a second copy.
+  // The next block follows: no NAK has brought a second copy.
   EXPECT_EQ(SeenBlock(session.NextBlock(kAck)).type, 0x04U);
   EXPECT_EQ(session.Ask("#"), "");
 }

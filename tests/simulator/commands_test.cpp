@@ -154,7 +154,7 @@ class ListTest : public testing::TestWithParam<std::string> {
 };
 
 TEST_P(ListTest, HasNameSizeAndLocalTimeOfEachFile) {
-  // 1988-01-02 00:00:05 by the clock on the wall is a day and five seconds after the zero.
+  // 1988-01-02 00:00:05 in local time is a day and five seconds after the zero.
   tm wall{};
   wall.tm_year = 88;
   wall.tm_mday = 2;

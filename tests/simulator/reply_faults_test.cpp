@@ -40,7 +40,7 @@ TEST(ReplyFaultsTest, AMuteReceiverIgnoresACommand) {
 
 TEST(ReplyFaultsTest, ThePingHasAName) {
   Session session(WithFault({ReplyFaultKind::kMute, std::string(kPingCommand), kOnce}));
-  // Lines that are not answered anyway use nothing up.
+  // Lines that are never answered do not count.
   EXPECT_EQ(session.Ask("\r\n"), "");
   EXPECT_EQ(session.Ask("%1%\r\n"), "");
   EXPECT_EQ(session.Ask("%2%\r\n"), "RE003%2%\r\n");

@@ -14,7 +14,7 @@ namespace {
 
 using testing::ElementsAre;
 
-// The shared part of a connection, opened on a fake device.
+// The common part of all connections, opened on a fake device.
 class TestConnection : public CAbstractConnection {
  public:
   explicit TestConnection(DeviceCalls& calls) : CAbstractConnection(calls) {}

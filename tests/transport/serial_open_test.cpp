@@ -1,4 +1,4 @@
-// What CSerialConnection::Open does, and tells, when it cannot empty the port.
+// What CSerialConnection::Open does and traces when it cannot clear the port.
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
@@ -70,7 +70,7 @@ INSTANTIATE_TEST_SUITE_P(Calls,
                          testing::Values("ClearCommError", "PurgeComm"),
                          [](const auto& call) { return std::string(call.param); });
 
-// Errors of the line that were there before are told and then forgotten.
+// Earlier errors of the line are traced and then cleared.
 TEST(SerialOpen, TracesErrorsOfTheLineAndGoesOn) {
   const ReportCapture report;
   FakeDevice device;

@@ -20,7 +20,7 @@ constexpr Found kDefaults = BulkEndpoints{0x01, 0x81};
 
 Found Endpoints(uint8_t out, uint8_t in) { return BulkEndpoints{out, in}; }
 
-// Behind the bytes is a page that cannot be read.
+// After the bytes is a page that cannot be read.
 Found Find(const std::string& descriptors) {
   const GuardedBytes guarded(descriptors);
   const std::string_view bytes = guarded.View();
@@ -89,7 +89,7 @@ TEST(UsbDescriptors, AreReadUntilBothEndpointsAreFound) {
             Endpoints(0x02, 0x83));
 }
 
-// Each bulk endpoint takes the place of the one before until the other direction has its own.
+// Each bulk endpoint replaces the previous one until both directions have one.
 TEST(UsbDescriptors, MayNameMoreEndpointsOfOneDirectionBefore) {
   EXPECT_EQ(Find(DeviceBytes({EndpointBytes(0x81, kBulk),
                               EndpointBytes(0x82, kBulk),
@@ -212,7 +212,7 @@ TEST(UsbDescriptors, WithAWrongLengthOfTheConfigurationAreOfAnotherLayout) {
   }
 }
 
-// An usb_interface of no length would be its own first endpoint, though the sum is right.
+// A usb_interface of length 0 would be its own first endpoint, although the total length is right.
 TEST(UsbDescriptors, OfAnInterfaceWithoutLengthAreOfAnotherLayout) {
   const std::string usb_interface = Bytes({0, 0x04, 0x02, kBulk, 2, 0, 0});
   const std::string in = EndpointBytes(0x83, kBulk);
@@ -233,7 +233,7 @@ TEST(UsbDescriptors, ThatGoOnAreOfAnotherLayout) {
   }
 }
 
-// The usb_interface's count may be the last byte there is.
+// The usb_interface's count may be the last byte.
 TEST(UsbDescriptors, AreNotReadAfterTheirEnd) {
   for (size_t size = 1; size <= 20; ++size) {
     for (unsigned first = 0; first < 256; ++first) {
@@ -244,7 +244,7 @@ TEST(UsbDescriptors, AreNotReadAfterTheirEnd) {
   }
 }
 
-// Whatever one byte of a good descriptor becomes, nothing is read outside, and nothing is made up.
+// With any damaged byte, nothing outside the descriptor is read, and no endpoint is invented.
 TEST(UsbDescriptors, WithADamagedByteGiveNoOtherEndpointsThanTheirs) {
   const std::string good = Good();
   for (size_t at = 0; at < good.size(); ++at) {

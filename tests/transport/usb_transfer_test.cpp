@@ -197,7 +197,7 @@ TEST_F(UsbFlush, EndsWithAFailedReadButSucceeds) {
                           Line("CAbstractConnection::Read - read failed [3758100489] [~]")));
 }
 
-// It is meant for the wait of the command that follows, and ends that as well.
+// The cancel also ends the wait of the next command, for which it is meant.
 TEST_F(UsbFlush, EndsWithACancelAndKeepsIt) {
   device.transfers = {{0, 1}, {ERROR_IO_PENDING, 0}, {ERROR_IO_PENDING, 0}};
   device.transferred = 1;

@@ -31,7 +31,7 @@ class WaitScopeTest : public testing::Test {
     connection.Open(L"COM7", &settings);
     device.transfer_error = ERROR_IO_PENDING;
     device.on_wait = [this](DWORD count, const HANDLE* handles) {
-      waited_for.assign(handles, handles + count - 1);  // but for the transfer's own event
+      waited_for.assign(handles, handles + count - 1);  // without the transfer's own event
     };
   }
 
@@ -77,7 +77,7 @@ TEST_F(WaitScopeTest, TheWatchedEventEndsReadsAsTheCancelDoes) {
   EXPECT_THAT(WaitedForByRead(), ElementsAre(cancel));
 }
 
-// Half a line would stand in front of the next command.
+// Half a line would come before the next command.
 TEST_F(WaitScopeTest, TheWatchedEventDoesNotEndWrites) {
   const WaitScope watching = WaitScope::Watching(&connection, event.get());
   EXPECT_THAT(WaitedForByWrite(), ElementsAre(connection.GetAbortEvent()));
@@ -99,7 +99,7 @@ TEST_F(WaitScopeTest, AnOutsideAbortEventStillReplacesTheCancel) {
   EXPECT_THAT(WaitedForByRead(), ElementsAre(outside.get(), IsHandleOf(event.get())));
 }
 
-// Looking at an event that resets itself would clear it.
+// Testing an event that resets itself would clear it.
 TEST_F(WaitScopeTest, ASignalledEventStaysSignalled) {
   const KernelHandle own(CreateEventW(nullptr, FALSE, TRUE, nullptr));
   const WaitScope watching = WaitScope::Watching(&connection, own.get());

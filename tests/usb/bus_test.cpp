@@ -1,4 +1,4 @@
-// The bus driver, as the program that plays a device uses it, and as it should not be used.
+// The bus driver, as the simulator of a device uses it, and with wrong requests.
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
@@ -33,7 +33,7 @@ constexpr DWORD kUnknownCode = 0x00223000;
 // A code of the host's that returns bytes through an MDL, and one through a buffer.
 constexpr DWORD kDirectCode = 0x80942006;
 constexpr DWORD kBufferedCode = 0x80942024;
-// Its output is not for the driver to write.
+// The driver must not write its output.
 constexpr DWORD kInDirectCode = 0x80942005;
 constexpr uint32_t kRefused = 0xC0000001;
 
@@ -246,7 +246,7 @@ TEST_F(UsbBus, EndsRequestsOfAHandleThatIsClosed) {
   EXPECT_TRUE(untold.Ended());
 }
 
-// Reads get transfers from when the program says so until it takes that back.
+// Reads get transfers only while the program allows it.
 TEST_F(UsbBus, SendsToReads) {
   PlugIn();
   const File host = OpenDevice();
@@ -351,7 +351,7 @@ TEST_F(UsbBus, EndsTheWaitWhenTheDeviceIsUnplugged) {
   EXPECT_EQ(waiting.Finish().error, kGone);
 }
 
-// The driver uses its device objects again, but not while a handle of an unplugged device is open.
+// The driver reuses its device objects, but not while a handle of an unplugged device is open.
 TEST_F(UsbBus, KeepsOldHandlesFromNewDevices) {
   constexpr int kNewDevices = 50;
   PlugIn();

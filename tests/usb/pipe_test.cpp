@@ -161,13 +161,13 @@ TEST_F(UsbPipe, RefusesOtherRequests) {
     const auto result = reader_->Control(kUnknown + method, Bytes(10), 10);
     EXPECT_EQ(result.error, DWORD{ERROR_INVALID_FUNCTION}) << method;
   }
-  // Of the last one, whose buffers are the caller's memory, the driver does not even tell.
+  // The driver does not even report the last one, whose buffers are the caller's memory.
   EXPECT_EQ(usb_->Transcript(),
             "- refused request 0x80942200\n- refused request 0x80942201\n"
             "- refused request 0x80942202\n");
 }
 
-// The receiver is on the first bulk endpoints; an interrupt endpoint never has anything to say.
+// The receiver is on the first bulk endpoints; an interrupt endpoint never sends anything.
 TEST_F(UsbPipe, CanBeOneThatIsSilent) {
   Plug({"--endpoints", "0x84:interrupt,0x02,0x83"});
   const File silent(usb_->device(), GENERIC_READ);

@@ -123,7 +123,7 @@ TEST(UsbReceiver, AnswersLate) {
   EXPECT_GE(GetTickCount64() - start, ULONGLONG{45});
 }
 
-// The block is answered, and that write still goes well.
+// The block is answered, and that write still succeeds.
 TEST(UsbReceiver, VanishesInTheMiddleOfAFile) {
   const bed::SimulatedUsb usb({"quorin", "--vanish-after", "1"}, {{"A0101.log", Content(5000)}});
   const Connected host(usb.device());

@@ -57,7 +57,7 @@ TEST_F(UsbTransfer, ReturnsHowManyBytesWereWritten) {
   EXPECT_EQ(result.bytes.size(), 5U);
 }
 
-// What a write does has been done when it has ended.
+// When a write has ended, its effect is complete.
 TEST_F(UsbTransfer, IsInTheTranscriptAtOnce) {
   Plug();
   Ping();

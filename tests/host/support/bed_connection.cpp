@@ -11,7 +11,7 @@ namespace {
 
 constexpr WORD kWinsockVersion = 0x0202;
 
-// Winsock counts its users.
+// Each user must start and clean up Winsock.
 class WinsockUser {
  public:
   WinsockUser() {

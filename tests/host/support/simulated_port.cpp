@@ -18,7 +18,7 @@ constexpr auto kPollInterval = std::chrono::milliseconds(5);
 std::mutex slots_mutex;
 std::array<bool, kPortsPerSet> slots_in_use{};
 
-// Which set of ports is this process's.
+// The set of ports of this process.
 int PortSet() {
   const char* const value = std::getenv("RCVLINK_PORT_SET");
   return value == nullptr ? 0 : std::atoi(value);

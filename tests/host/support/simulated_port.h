@@ -14,8 +14,8 @@
 
 namespace bed {
 
-// The right to use one of the serial ports of this test process. Each that runs has three of its
-// own, so those that run side by side do not meet. Nothing is plugged in.
+// Reserves one of the three serial ports of this test process. Each running process has its own
+// three, so processes do not disturb each other. No receiver is plugged in.
 class PortLease {
  public:
   // Raises Error when all three are in use.
@@ -34,10 +34,10 @@ class PortLease {
 // A serial port with a simulated receiver plugged in.
 class SimulatedPort {
  public:
-  // `arguments` are those of rcvlink-sim, the family first: {"quorin", "--id", "ABC"}. What it
-  // needs besides is added: --link, --transcript, and --folder with files(), unless it is given.
-  // `files` are put there first, by name; the receiver looks at its folder when it starts. Returns
-  // when the port can be opened.
+  // `arguments` are those of rcvlink-sim, the family first: {"quorin", "--id", "ABC"}. Added to
+  // them: --link, --transcript, and --folder with files(), unless it is given. `files` are put
+  // there first, by name; the receiver looks at its folder when it starts. Returns when the port
+  // can be opened.
   explicit SimulatedPort(std::vector<std::string> arguments,
                          const std::map<std::string, std::string>& files = {});
   SimulatedPort(const SimulatedPort&) = delete;
@@ -45,19 +45,19 @@ class SimulatedPort {
   // Unplugs the receiver.
   ~SimulatedPort();
 
-  // L"COM12", as a user says it.
+  // L"COM12", as a user writes it.
   std::wstring name() const;
-  // L"\\\\.\\COM12", as CreateFileW wants it.
+  // L"\\\\.\\COM12", as CreateFileW takes it.
   std::wstring path() const;
 
   // The folder that the receiver serves.
   const TempFolder& files() const { return files_; }
 
-  // Unplugs the receiver in peace and returns its program's exit status. The port is then absent.
+  // Ends the receiver normally and returns its program's exit status. The port is then absent.
   int Stop();
-  // Unplugs it in the middle of whatever it does.
+  // Kills it in the middle of what it does.
   void Kill();
-  // Plugs one in again after Stop or Kill. The transcript starts afresh.
+  // Plugs one in again after Stop or Kill. The transcript starts empty.
   void Start(std::vector<std::string> arguments);
   // The receiver does nothing until it is resumed; the port takes what is written to it.
   void Pause();
@@ -65,10 +65,10 @@ class SimulatedPort {
   // The exit status, when the receiver's program has ended by itself.
   std::optional<int> Status();
 
-  // What has passed over the line so far, one event a line: "> " from the host, "< " from the
-  // receiver, "= " a setting, "- " a remark.
+  // The transcript so far, one event per line: "> " from the host, "< " from the receiver, "= " a
+  // setting, "- " a remark.
   std::string Transcript() const;
-  // Waits until the transcript holds `text`; raises Error when it does not come.
+  // Waits until the transcript contains `text`; raises Error when it does not come.
   void WaitForTranscript(std::string_view text,
                          std::chrono::milliseconds timeout = std::chrono::seconds(20)) const;
 
