@@ -86,7 +86,7 @@ class AnyLinkSearch : public testing::Test {
   void* handle_ = nullptr;
 };
 
-TEST_F(AnyLinkSearch, ASweepThatFindsNobodyIsNoFailure) {
+TEST_F(AnyLinkSearch, ASweepThatFindsNoReceiverIsNoFailure) {
   EXPECT_EQ(Search(), S_FALSE);
   EXPECT_EQ(handle_, nullptr);
   EXPECT_EQ(port_.openings, kTriesOfSweep);

@@ -303,7 +303,7 @@ TEST(CommandLineTest, CodesToExplainAreNumbers) {
   EXPECT_EQ(Refusal({"explain", "all"}).exit, ExitCode::kUsage);
 }
 
-TEST(CommandLineTest, ListsItsWords) {
+TEST(CommandLineTest, ListsCommandsAndOptions) {
   const std::vector<CommandWords> words = WordsOf(MakeCommands());
   ASSERT_EQ(words.size(), MakeCommands().size() + 1);
   const auto has = [](const CommandWords& command, const std::string& option) {

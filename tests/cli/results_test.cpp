@@ -53,7 +53,7 @@ TEST(ResultsTest, AFailureShowsWhatWhereCodeAndMeaning) {
             "  Try again.\n");
 }
 
-TEST(ResultsTest, EachCodeThatIsExplainedSaysSo) {
+TEST(ResultsTest, EachExplainedCodeGivesAHint) {
   const Failure failure{.tried = "delete A.DAT", .code = ResultOfWin32(ERROR_DEVICE_NOT_CONNECTED)};
   EXPECT_NE(Describe(failure).find("`rcvlink-cli explain 0x8007048F`"), std::string::npos);
   EXPECT_EQ(HintOf(Failure{.code = ResultOfWin32(ERROR_ARENA_TRASHED)}), "");

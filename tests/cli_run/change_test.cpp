@@ -18,7 +18,7 @@ TEST_F(Cli, RemoveDeletesEachFile) {
   EXPECT_EQ(files[0].at("name"), "b.jps");
 }
 
-TEST_F(Cli, RemoveThatIsRefusedFailsInHexAndWords) {
+TEST_F(Cli, RemoveThatIsRefusedShowsCodeAndMeaning) {
   const bed::SimulatedPort receiver({"quorin", "--refuse", "remove"}, {{"a.jps", "a"}});
   const auto result = RunOn(receiver, {"rm", "a.jps"});
   EXPECT_EQ(result.status, kFailed);

@@ -115,7 +115,7 @@ TEST_F(VelmarCli, VerifyFindsADamagedByte) {
 }
 
 // The files exist already, to keep the test short.
-TEST_F(VelmarCli, AllSaysWhenTheListMayBeCut) {
+TEST_F(VelmarCli, AllWarnsWhenTheListMayBeCut) {
   Files files;
   while (files.size() < 80) files.emplace("file" + std::to_string(100 + files.size()), "x");
   for (const auto& [name, content] : files) folder.Write(name, content);

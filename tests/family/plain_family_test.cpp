@@ -66,7 +66,7 @@ TEST_F(PlainFamily, IsFoundAfterTheOthers) {
   EXPECT_THAT(report.Lines(), Contains("Find - Plain receiver found [COM7]"));
 }
 
-TEST_F(PlainFamily, IsNotFoundWhereNobodyAnswers) {
+TEST_F(PlainFamily, IsNotFoundWithoutAnAnswer) {
   EXPECT_EQ(Find(std::make_unique<ScriptedConnection>()), S_FALSE);
   EXPECT_EQ(receiver, nullptr);
 }

@@ -56,7 +56,7 @@ TEST(ApiDeleteFile, AbortEndsItOnce) {
   EXPECT_EQ(receiver.Identify().result, S_OK);
 }
 
-TEST(ApiUnoffered, OperationsSaySoWithoutAskingTheReceiver) {
+TEST(ApiUnoffered, OperationsAreRefusedWithoutACommand) {
   const bed::SimulatedPort port({"quorin"}, {{"A.log", "a"}});
   const host::Receiver receiver(port);
   const host::Report report;

@@ -194,7 +194,7 @@ TEST(ApiVelmarSettings, ChangeOneValueOfThePort) {
                           R"(COM 9600 N 8 2 N\r)"));
 }
 
-TEST(ApiVelmarUnoffered, OperationsSaySoWithoutAskingTheReceiver) {
+TEST(ApiVelmarUnoffered, OperationsAreRefusedWithoutACommand) {
   const Velmar receiver({});
   CFileInfo info{};
   host::MemoryStream stream;

@@ -69,7 +69,7 @@ TEST_P(QuorinBlockDownload, StartsAnewWithEachDownload) {
 // The last block.
 using QuorinLastBlock = QuorinBothLinksTestWith<size_t>;
 
-TEST_P(QuorinLastBlock, GivesAsMuchAsItSays) {
+TEST_P(QuorinLastBlock, GivesAsManyBytesAsItsLength) {
   Give(FirstBlock());
   Give(blocks.Next(0x04, static_cast<uint16_t>(Param()), content.substr(512, 512)));
   EXPECT_EQ(Download(), S_OK);

@@ -46,14 +46,14 @@ TEST(QuorinBlock, OfDataCountsWhole) {
   EXPECT_EQ(BlockOf(BlockStream::Make(0x02, 0xFFFF, "", 0)).PayloadLength(), 512U);
 }
 
-TEST(QuorinBlock, ThatIsTheLastSaysHowMuchCounts) {
+TEST(QuorinBlock, ThatIsTheLastHasItsLength) {
   EXPECT_EQ(LastBlock(0).PayloadLength(), 0U);
   EXPECT_EQ(LastBlock(1).PayloadLength(), 1U);
   EXPECT_EQ(LastBlock(0x0102).PayloadLength(), 258U);
   EXPECT_EQ(LastBlock(512).PayloadLength(), 512U);
 }
 
-TEST(QuorinBlock, ThatIsTheLastCannotSayMoreThanItHoldsOrLessThanNothing) {
+TEST(QuorinBlock, ThatIsTheLastHasNoNegativeOrTooLargeLength) {
   EXPECT_FALSE(LastBlock(513).PayloadLength());
   EXPECT_FALSE(LastBlock(0x7FFF).PayloadLength());
   EXPECT_FALSE(LastBlock(0x8000).PayloadLength());

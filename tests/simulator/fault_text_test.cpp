@@ -41,7 +41,7 @@ TEST(FaultTextTest, AnAmountMayBeForAnyCommand) {
   EXPECT_EQ(one.times, 7U);
 }
 
-TEST(FaultTextTest, ASizeLieNamesAFile) {
+TEST(FaultTextTest, AWrongSizeIsForAFile) {
   const SizeLie lie = ParseSizeLie("a=b=77");
   EXPECT_EQ(lie.file, "a=b");
   EXPECT_EQ(lie.size, 77U);

@@ -77,7 +77,7 @@ TEST(VelmarLogsTest, ComponentsAreReportedInTheOrderOfTheOptions) {
   EXPECT_TRUE(logs.at(0).good_crc);
 }
 
-TEST(VelmarLogsTest, AReceiverWithoutComponentsSaysSo) {
+TEST(VelmarLogsTest, AReceiverWithoutComponentsReportsNone) {
   VelmarOptions options;
   options.identity.components.clear();
   VelmarSession session(options);

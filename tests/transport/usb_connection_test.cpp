@@ -294,7 +294,7 @@ TEST_F(UsbConnectionFailure, OfADescriptorThatComesIncompleteTheSecondTimeIsNoFa
   ExpectEnd(S_FALSE, 3);
 }
 
-TEST_F(UsbConnectionFailure, IsSaidWithoutANameWhenItIsClosed) {
+TEST_F(UsbConnectionFailure, IsTracedWithoutANameWhenItIsClosed) {
   GiveDescriptors("");
   Open();
   EXPECT_EQ(connection->Disconnect(), S_OK);

@@ -155,7 +155,7 @@ TEST_F(UsbTransfer, EndsWhenTheHandleIsUnbound) {
   EXPECT_EQ(read.Finish().error, kAborted);
 }
 
-TEST_F(UsbTransfer, KeepsWhatNobodyHasRead) {
+TEST_F(UsbTransfer, KeepsBytesThatWereNotRead) {
   Plug();
   Ping();
   EXPECT_EQ(host_->reader.Unbind(), kDone);

@@ -643,7 +643,7 @@ TEST_F(FileTransfer, WithoutACallbackTheLastChunkStays) {
 }
 
 // With its checksum such a chunk is shorter than the 8 bytes that the parser needs.
-TEST_F(FileTransfer, ALastChunkOfLessThanFourBytesIsWaitedForInVain) {
+TEST_F(FileTransfer, ALastChunkOfLessThanFourBytesIsNotDelivered) {
   EXPECT_EQ(Transfer({kOkPrompt + BinaryLog{"data", 1}.Bytes() + BinaryLog{"abc", 0}.Bytes()}),
             S_OK);
   EXPECT_EQ(command.Response(), RESPONSE_OK);

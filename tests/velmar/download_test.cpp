@@ -294,7 +294,7 @@ TEST_F(VelmarDownload, APutBackThatCannotBeAskedForGivesItsCode) {
 }
 
 // A receiver that keeps its speed, or does not name its port, is not waited for.
-TEST_F(VelmarDownload, TheHostGoesBackWhateverTheReceiverSays) {
+TEST_F(VelmarDownload, TheHostGoesBackWhateverTheReceiverAnswers) {
   for (const auto& [command, answer] : {std::pair(kRestore, kErrorPrompt),
                                         std::pair(kRestore, kErrorTextPrompt),
                                         std::pair(kRestore, std::string()),

@@ -335,7 +335,7 @@ TEST(PortConfig, OfAPortThatIsListedTwiceIsTheLast) {
   EXPECT_EQ(log.handshake, 1);
 }
 
-TEST(PortConfig, TheCountTellsHowManyPortsThereAre) {
+TEST(PortConfig, TheCountGivesTheNumberOfPorts) {
   PortConfigLog log;
   const std::string two = PortFields("COM1,1,N,8,1,N") + PortFields("COM2,2,N,8,1,N");
   EXPECT_EQ(DecodePortConfig("1" + two, L"COM2", log), Progress::kComplete);

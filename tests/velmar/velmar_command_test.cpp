@@ -557,7 +557,7 @@ TEST_F(VelmarCommand, BinaryLogsAreWaitedForByTheirLengths) {
   }
 }
 
-TEST_F(VelmarCommand, ALogThatNobodyReadsIsDone) {
+TEST_F(VelmarCommand, ALogThatIsNotParsedIsDone) {
   for (const std::string& log : {AsciiLog("A", "body"), BinaryLog{"chunk"}.Bytes()}) {
     connection.GiveRead(kOkPrompt + log);
     CVelmarCommand command("x", 0);

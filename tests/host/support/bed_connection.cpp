@@ -25,10 +25,12 @@ class WinsockUser {
 
 sockaddr_in ServerAddress() {
   const char* const value = std::getenv("RCVLINK_BED");
-  if (value == nullptr) throw Error("RCVLINK_BED is not set: start the tests with ./test");
+  if (value == nullptr) {
+    throw Error("RCVLINK_BED is not set: start the tests with ./test, or see tests/README.md");
+  }
   const std::string text = value;
   const size_t colon = text.find(':');
-  if (colon == std::string::npos) throw Error("RCVLINK_BED is no address: " + text);
+  if (colon == std::string::npos) throw Error("RCVLINK_BED is not HOST:PORT: " + text);
   sockaddr_in address{};
   address.sin_family = AF_INET;
   address.sin_addr.s_addr = inet_addr(text.substr(0, colon).c_str());
