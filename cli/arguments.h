@@ -1,5 +1,5 @@
 /// @file arguments.h
-/// What the user asked for, as far as all commands share it.
+/// The arguments that all commands share.
 #ifndef RCVLINK_CLI_ARGUMENTS_H_
 #define RCVLINK_CLI_ARGUMENTS_H_
 
@@ -21,7 +21,7 @@ struct Arguments {
   EProtocol protocol = eProtocolAny;
   std::optional<unsigned long> speed;  ///< given: one try at this speed
   std::optional<RtsMode> rts;          ///< given: one try with this use of RTS
-  bool no_memory = false;              ///< what was found is neither looked up nor remembered
+  bool no_memory = false;              ///< neither use nor save the setting found last time
   bool json = false;
   ProgressMode progress = ProgressMode::kAuto;
   bool quiet = false;

@@ -27,7 +27,7 @@ void Busy::Draw() {
   constexpr std::uint64_t kMsPerSecond = 1000;
   const std::string line = what_ + " ... " +
                            FormatDuration((GetTickCount64() - start_ms_) / kMsPerSecond) +
-                           " (Ctrl-C ends it)";
+                           " (Ctrl-C stops it)";
   drawn_width_ = std::min(line.size(), context_.err.Width() - 1);
   context_.err.Write(Redrawn(line.substr(0, drawn_width_), drawn_width_));
 }

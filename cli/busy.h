@@ -1,5 +1,5 @@
 /// @file busy.h
-/// That the program waits for the receiver, on a terminal.
+/// A line on the terminal while the program waits for the receiver.
 #ifndef RCVLINK_CLI_BUSY_H_
 #define RCVLINK_CLI_BUSY_H_
 

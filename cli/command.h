@@ -1,5 +1,5 @@
 /// @file command.h
-/// What every subcommand is.
+/// The interface of all subcommands.
 #ifndef RCVLINK_CLI_COMMAND_H_
 #define RCVLINK_CLI_COMMAND_H_
 
@@ -36,8 +36,8 @@ class Command {
   /// @param arguments what `AddPort` fills; outlives `app`
   virtual void AddOptions(CLI::App& app, Arguments& arguments) = 0;
 
-  /// Looks at what was read, before anything is done.
-  /// @throws Failure with ExitCode::kUsage when it makes no sense
+  /// Checks the arguments before anything is done.
+  /// @throws Failure with ExitCode::kUsage when they are invalid
   virtual void Check() const {}
 
   /// @throws Failure when it could do nothing

@@ -34,13 +34,13 @@ class HelpFormatter : public CLI::Formatter {
     const auto is_common = [all](const CLI::Option* option) {
       return option != all->get_help_ptr() && option != all->get_version_ptr();
     };
-    // The group begins with a line end, and so does what stands before it.
+    // Both the group and the text before it supply a line end.
     return make_group("Options of all commands", false, all->get_options(is_common)).substr(1) +
            "\n" + Formatter::make_footer(app);
   }
 };
 
-/// The word of a command that looks most like another one; empty when none does.
+/// The command that is most similar to a word; empty when none is.
 std::string MostLike(const std::string& word, const Commands& commands) {
   constexpr std::size_t kMostChanges = 2;
   std::string best;
@@ -55,7 +55,7 @@ std::string MostLike(const std::string& word, const Commands& commands) {
   return best;
 }
 
-/// `help`, `help get` and `/?` as the parser knows them.
+/// Turns `help`, `help get` and `/?` into --help.
 std::vector<std::string> WithHelp(std::vector<std::string> words) {
   const auto end = std::find(words.begin(), words.end(), "--");
   std::replace(words.begin(), end, std::string("/?"), std::string("--help"));
@@ -71,13 +71,13 @@ std::string Examples() {
          "%APPDATA%\\rcvlink\\rcvlink-cli.ini, and from RCVLINK_PORT, RCVLINK_LINK,\n"
          "RCVLINK_PROTOCOL and RCVLINK_SPEED. The command line comes first, then the file.\n"
          "\nExamples:\n"
-         "  rcvlink-cli ports                          which ports does this computer have?\n"
-         "  rcvlink-cli find COM7                      is there a receiver, and which?\n"
-         "  rcvlink-cli ls COM7 --speed 115200         its files, without the search for the "
-         "speed\n"
-         "  rcvlink-cli get COM7 --all -o D:\\survey\\   all of them, into a folder\n"
-         "\n`rcvlink-cli COMMAND --help` explains a command. The options above may follow a "
-         "command.";
+         "  rcvlink-cli ports                          list the ports of this computer\n"
+         "  rcvlink-cli find COM7                      find the receiver on COM7\n"
+         "  rcvlink-cli ls COM7 --speed 115200         list its files at a known speed\n"
+         "  rcvlink-cli get COM7 --all -o D:\\survey\\   download all files into a folder\n"
+         "\n`rcvlink-cli COMMAND --help` shows the help of one command. The options above may "
+         "stand\n"
+         "before or after the command.";
 }
 
 std::map<std::string, EProtocol> FamilyWords() {
@@ -87,9 +87,9 @@ std::map<std::string, EProtocol> FamilyWords() {
   return words;
 }
 
-/// "The family: any (default), quorin or velmar"
+/// "The receiver family: any (default), quorin or velmar"
 std::string FamilyHelp() {
-  std::string help = "The family: any (default)";
+  std::string help = "The receiver family: any (default)";
   for (const Family& family : kFamilies) {
     help += (&family == &kFamilies.back() ? " or " : ", ") + FamilyWord(family.protocol);
   }
@@ -100,20 +100,20 @@ void AddLinkOptions(CLI::App& app, Arguments& arguments) {
   AddWord<EInstanceType>(
       app,
       "--link",
-      "The cable: serial (default), usb or any",
+      "The link: serial (default), usb or any",
       "LINK",
       {{"serial", eInstanceSerial}, {"usb", eInstanceUSB}, {"any", eInstanceAny}},
       arguments.link);
   AddWord<EProtocol>(app, "--protocol", FamilyHelp(), "FAMILY", FamilyWords(), arguments.protocol);
   app.get_option("--link")->envname("RCVLINK_LINK");
   app.get_option("--protocol")->envname("RCVLINK_PROTOCOL");
-  app.add_option("--speed", arguments.speed, "Try this speed only, instead of searching for it")
+  app.add_option("--speed", arguments.speed, "Try only this speed; do not search for it")
       ->check(CLI::Range(kSlowestSpeed, kFastestSpeed).description(""))
       ->option_text("BITS/S")
       ->envname("RCVLINK_SPEED");
   AddWord<RtsMode>(app,
                    "--rts",
-                   "Try this RTS only: handshake, on, off (with --speed: on)",
+                   "Try only this RTS mode: handshake, on or off",
                    "MODE",
                    {{"handshake", RtsMode::kHandshake},
                     {"on", RtsMode::kOn},
@@ -121,13 +121,11 @@ void AddLinkOptions(CLI::App& app, Arguments& arguments) {
                     {"off", RtsMode::kOff},
                     {"disable", RtsMode::kOff}},
                    arguments.rts);
-  AddFlag(app,
-          "--no-memory",
-          "Neither begin with what was found last time nor remember it",
-          arguments.no_memory);
+  AddFlag(
+      app, "--no-memory", "Neither use nor save the setting found last time", arguments.no_memory);
 }
 
-/// Where a user's own options are read from, when the file is there.
+/// The file with the user's own options; it need not exist.
 std::string DefaultConfig() {
   const char* const folder = std::getenv("APPDATA");
   return folder == nullptr ? "" : std::string(folder) + "\\rcvlink\\rcvlink-cli.ini";
@@ -139,18 +137,18 @@ void AddOptions(CLI::App& app, Arguments& arguments) {
   arguments.stall_timeout_s = kDefaultStallTimeoutS;
   app.add_option("--stall-timeout",
                  arguments.stall_timeout_s,
-                 "End a download that brings nothing new (30; 0: never)")
+                 "Abort a download without new data (30; 0: never)")
       ->check(CLI::Range(0U, kLongestStallTimeoutS).description(""))
       ->option_text("SECONDS");
   AddText(app,
           "--report",
-          "Trace the library's doings into this file in %TEMP%",
+          "Write a trace of the library to this file in %TEMP%",
           "NAME",
           arguments.report);
-  AddFlag(app, "--force", "Overwrite files of this computer that exist already", arguments.force);
+  AddFlag(app, "--force", "Overwrite existing files on this computer", arguments.force);
   AddWord<ProgressMode>(app,
                         "--progress",
-                        "auto (a bar, or lines), bar, lines, json or none",
+                        "Show progress as auto (default), bar, lines, json or none",
                         "HOW",
                         {{"auto", ProgressMode::kAuto},
                          {"bar", ProgressMode::kBar},
@@ -158,14 +156,14 @@ void AddOptions(CLI::App& app, Arguments& arguments) {
                          {"json", ProgressMode::kJson},
                          {"none", ProgressMode::kNone}},
                         arguments.progress);
-  app.set_config("--config", DefaultConfig(), "Read options from this file: json = true")
+  app.set_config("--config", DefaultConfig(), "Read options from this file, such as json = true")
       ->option_text("FILE");
-  AddFlag(app, "--json", "Print one JSON value, errors included", arguments.json);
+  AddFlag(app, "--json", "Print the result or the error as one JSON value", arguments.json);
   AddFlag(app,
           "--verbose",
-          "Tell more: SHA-256 of downloads, why --link any tried USB",
+          "Print more: SHA-256 of downloads, why --link any tried USB",
           arguments.verbose);
-  AddFlag(app, "--quiet", "Print only errors and what was asked for", arguments.quiet);
+  AddFlag(app, "--quiet", "Print only results and errors", arguments.quiet);
 }
 
 void AddCommands(CLI::App& app, Arguments& arguments, const Commands& commands) {
@@ -186,7 +184,7 @@ std::string Words(const Commands& commands) {
   return words;
 }
 
-/// Why the parser did not take the words.
+/// Why the parser refused the words.
 Failure ParseFailure(const CLI::App& app, const CLI::ParseError& error, const Commands& commands) {
   const std::vector<std::string> rest = app.remaining();
   if (!app.get_subcommands().empty() || rest.empty() || rest.front().starts_with('-')) {
@@ -194,32 +192,33 @@ Failure ParseFailure(const CLI::App& app, const CLI::ParseError& error, const Co
   }
   const std::string word = Printable(ToUtf16(Unmarked(rest.front())));
   const std::string similar = MostLike(Lowered(word), commands);
-  return UsageError(
-      "there is no command " + word +
-      (similar.empty() ? "; there is " + Words(commands) : "; did you mean " + similar + "?"));
+  return UsageError("unknown command " + word +
+                    (similar.empty() ? "; the commands are " + Words(commands)
+                                     : "; did you mean " + similar + "?"));
 }
 
 std::unique_ptr<Command> TakeChosen(const CLI::App& app, Commands& commands) {
   for (auto& command : commands) {
     if (app.got_subcommand(command->text().word)) return std::move(command);
   }
-  throw UsageError("a command is missing: " + Words(commands));
+  throw UsageError("a command is missing; the commands are " + Words(commands));
 }
 
 void CheckArguments(const Arguments& arguments, bool needs_port) {
   const bool control = std::any_of(arguments.port.begin(), arguments.port.end(), IsControl);
   if ((needs_port && arguments.port.empty()) || control) {
-    throw UsageError("the port's name is empty or garbled");
+    throw UsageError("the port name is empty or contains a control character");
   }
   if (needs_port && arguments.link == eInstanceUSB && (arguments.speed || arguments.rts)) {
-    throw UsageError("--speed and --rts are about serial ports, not about --link usb");
+    throw UsageError("--speed and --rts apply to serial ports, not to --link usb");
   }
   if (!arguments.report.empty() && !IsPlainFileName(arguments.report)) {
-    throw UsageError("the report's name must be a bare file name: " + Printable(arguments.report));
+    throw UsageError("--report takes a plain file name without a folder, not " +
+                     Printable(arguments.report));
   }
 }
 
-/// Reads the words and checks them, as far as the parser's own checks do not do that.
+/// Checks what the parser itself does not check.
 CommandLine Checked(CLI::App& app, Arguments& arguments, Commands commands) {
   std::unique_ptr<Command> command = TakeChosen(app, commands);
   arguments.port = PlainPortName(arguments.port);
@@ -263,12 +262,12 @@ std::vector<CommandWords> WordsOf(const Commands& commands) {
 
 std::variant<CommandLine, HelpText> ParseCommandLine(const std::vector<std::string>& args,
                                                      Commands commands) {
-  CLI::App app("Reaches Quorin and Velmar GNSS receivers on this computer's ports.", "rcvlink-cli");
+  CLI::App app("Finds Quorin and Velmar GNSS receivers and manages their files.", "rcvlink-cli");
   app.formatter(std::make_shared<HelpFormatter>());
   app.get_formatter()->column_width(kHelpColumn);
   app.allow_windows_style_options(false);  // a file's name may begin with a slash
   app.fallthrough();
-  app.require_subcommand(0, 1);  // none: `TakeChosen` says it better
+  app.require_subcommand(0, 1);  // none: `TakeChosen` has the better message
   app.set_version_flag("--version", "rcvlink-cli " RCVLINK_VERSION);
   Arguments arguments;
   AddOptions(app, arguments);

@@ -1,5 +1,5 @@
 /// @file command_line.h
-/// From the words of the command line to a command and its arguments.
+/// Parses the command line into a command and its arguments.
 #ifndef RCVLINK_CLI_COMMAND_LINE_H_
 #define RCVLINK_CLI_COMMAND_LINE_H_
 
@@ -13,7 +13,7 @@
 
 namespace cli {
 
-/// What is to be done, checked as far as that goes without a receiver.
+/// A parsed command line. All that can be checked without a receiver is checked.
 struct CommandLine {
   Arguments arguments;
   std::unique_ptr<Command> command;
@@ -26,12 +26,12 @@ struct HelpText {
 
 /// Reads the command line.
 /// @param args UTF-8, without the program's name
-/// @param commands those that there are
-/// @throws Failure with ExitCode::kUsage when the line makes no sense
+/// @param commands all commands of the program
+/// @throws Failure with ExitCode::kUsage when the line is invalid
 std::variant<CommandLine, HelpText> ParseCommandLine(const std::vector<std::string>& args,
                                                      Commands commands);
 
-/// What may stand on the command line.
+/// A command and its options, for completion.
 struct CommandWords {
   struct Word {
     std::string word;

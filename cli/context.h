@@ -1,5 +1,5 @@
 /// @file context.h
-/// What every command is given, and what it gives back.
+/// The input and the outcome of every command.
 #ifndef RCVLINK_CLI_CONTEXT_H_
 #define RCVLINK_CLI_CONTEXT_H_
 
@@ -21,7 +21,7 @@ struct Context {
   Output& out;
   Output& err;
 
-  /// Standard output: what was asked for, unless it is asked for as JSON.
+  /// Standard output: the result, unless it is printed as JSON.
   void PrintResult(const std::string& text) {
     if (!arguments.json) out.Write(text);
   }
@@ -31,7 +31,7 @@ struct Context {
     if (!arguments.quiet) PrintResult(text);
   }
 
-  /// Standard error: what is going on; not with --quiet or --json.
+  /// Standard error: the current step; not with --quiet or --json.
   void PrintStatus(const std::string& text) {
     if (!arguments.quiet && !arguments.json) err.Write(text);
   }

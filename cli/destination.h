@@ -26,7 +26,7 @@ class Destination {
   /// @throws Failure
   virtual void Complete() {}
 
-  /// Some bytes may be missing, but those that came are to be kept.
+  /// Keeps the bytes that were written, although some may be missing.
   /// @return the path under which they are; empty when there is none
   virtual std::wstring KeepIncomplete() { return {}; }
 

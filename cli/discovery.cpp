@@ -17,11 +17,11 @@ namespace cli {
 namespace {
 
 constexpr DWORD kShareAll = FILE_SHARE_READ | FILE_SHARE_WRITE;
-// In front of the name of a port, as `CreateFileW` takes it.
+// The prefix of a port's name for `CreateFileW`.
 const std::wstring kDevices = L"\\\\.\\";
 
-/// Why a device cannot be opened, as far as asking for nothing of it tells; S_OK when it can. A
-/// search on USB that cannot open its device finds no receiver, no more.
+/// Why a device cannot be opened; S_OK when it can. A search on USB does not report that: it just
+/// finds no receiver.
 long WhyNotOpened(const std::wstring& device) {
   const UniqueHandle handle(
       CreateFileW(device.c_str(), 0, kShareAll, nullptr, OPEN_EXISTING, 0, nullptr));
@@ -46,7 +46,7 @@ class SearchedPort : public SweepPort {
   }
 
   void Begin(std::size_t number, std::size_t count, const LineSetting& line) override {
-    // Of a port that is not there no try is worth a line: its first one ends the search.
+    // No line for a port that does not exist: the first try ends the search.
     if (there_) display_.Begin(port_, number, count, line);
   }
 
@@ -72,7 +72,7 @@ std::vector<Try> TriesOn(const std::wstring& port,
   return {{line, FamiliesOf(arguments.protocol)}};
 }
 
-/// What came of a search on one kind of link.
+/// The result of a search on one link.
 struct SearchResult {
   long code = S_FALSE;
   FoundReceiver found{};
@@ -86,7 +86,7 @@ SearchResult SearchSerial(const Context& context,
   SearchedPort searched(context, port, display);
   const SweepResult result = RunSweep(TriesOn(port, arguments, memory), searched);
   if (result.receiver == nullptr) return {.code = result.code};
-  // A speed of 0 would say nothing the next time.
+  // A speed of 0 would not help the next search.
   if (result.setting.line.speed != 0 && !memory.Remember(port, result.setting) &&
       arguments.verbose) {
     display.PrintStatus(UnwrittenMemory(port));
@@ -102,14 +102,16 @@ SearchResult SearchUsb(const Context& context, std::wstring device) {
 }
 
 std::string SilenceHint(const Arguments& arguments, EInstanceType link) {
-  if (link == eInstanceUSB) return "Is it switched on, and is it a Quorin receiver?";
+  if (link == eInstanceUSB) return "Is the receiver switched on, and is it a Quorin receiver?";
   if (IsOneTry(arguments)) {
-    return "Is it switched on, and is this its speed? Without --speed and --rts all are tried.";
+    return "Is the receiver switched on, and is this its speed? Without --speed and --rts all "
+           "settings are tried.";
   }
-  return "Is it switched on, and is this the port of its cable? `rcvlink-cli ports` lists them.";
+  return "Is the receiver switched on, and is its cable on this port? `rcvlink-cli ports` lists "
+         "the ports.";
 }
 
-/// A port that is a file of this computer would have its beginning overwritten.
+/// Refuses a file of this computer as a port: commands would be written into it.
 /// @throws Failure
 void RefuseFile(const std::wstring& port) {
   for (const std::wstring& path : {port, kDevices + port}) {
@@ -121,8 +123,8 @@ void RefuseFile(const std::wstring& port) {
     throw Failure{.exit = ExitCode::kUsage,
                   .tried = "use it as a port",
                   .code = ResultOfWin32(ERROR_BAD_DEVICE),
-                  .meaning = "it is a file of this computer, which would be overwritten",
-                  .hint = "The port comes first, then the receiver's files."};
+                  .meaning = "it is a file of this computer and would be overwritten",
+                  .hint = "Name the port first, then the files of the receiver."};
   }
 }
 
@@ -160,7 +162,7 @@ Failure SearchFailure(const Arguments& arguments, const SearchPlace& place, long
   Failure failure{
       .exit = ExitCode::kNoReceiver, .tried = "find a receiver", .port = port, .code = code};
   if (!on_usb && code == ResultOfWin32(ERROR_INVALID_NAME)) {
-    failure.meaning = port + " is no name of a COM port";
+    failure.meaning = port + " is not the name of a COM port";
     failure.hint = PortsInWords(ListPorts(), place.link);
   } else if (IsMissing(code)) {
     failure.meaning = port + " does not exist: nothing is plugged in there";
@@ -170,8 +172,8 @@ Failure SearchFailure(const Arguments& arguments, const SearchPlace& place, long
     failure.meaning = "another program is using " + port;
     failure.hint = "Close that program and try again.";
   } else if (code == ResultOfWin32(ERROR_NOT_READY)) {
-    failure.meaning = port + " is there, but the device behind it does not answer";
-    failure.hint = "Is it switched on, and in reach? Plug it in again and try once more.";
+    failure.meaning = port + " exists, but its device does not answer";
+    failure.hint = "Is the device switched on and in reach? Plug it in again, then try again.";
   } else if (SUCCEEDED(code)) {
     failure.meaning = "no receiver answered";
     failure.hint = SilenceHint(arguments, place.link);
@@ -203,7 +205,7 @@ PortMemory MemoryOf(const Arguments& arguments) {
 }
 
 std::string UnwrittenMemory(const std::wstring& port) {
-  return Printable(port) + ": what is known of its setting could not be written to " +
+  return Printable(port) + ": the setting found could not be saved in " +
          Printable(PortMemory::UsualFile().native()) + "\n";
 }
 
@@ -239,12 +241,12 @@ FoundReceiver FindReceiverAt(const Context& context,
   } else if (tried.link == eInstanceSerial && result.code == S_FALSE) {
     if (const std::string family = OtherFamily(context, place.port); !family.empty()) {
       failure.meaning = "a " + family + " receiver answered instead";
-      failure.hint = "Leave out --protocol, or say --protocol " + Lowered(family) + ".";
+      failure.hint = "Leave out --protocol, or use --protocol " + Lowered(family) + ".";
     }
   } else if (any) {
     failure.tried =
         arguments.verbose ? "find a receiver on USB" : "find a receiver on a serial port or on USB";
-    if (!arguments.verbose) failure.hint = "With --verbose the reason for each of them is told.";
+    if (!arguments.verbose) failure.hint = "--verbose shows the reason for each link.";
   }
   throw failure;
 }

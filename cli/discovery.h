@@ -1,5 +1,5 @@
 /// @file discovery.h
-/// Getting hold of the receiver that the command line names.
+/// Finds the receiver that the command line names.
 #ifndef RCVLINK_CLI_DISCOVERY_H_
 #define RCVLINK_CLI_DISCOVERY_H_
 
@@ -17,7 +17,7 @@
 namespace cli {
 
 struct FoundReceiver {
-  void* handle;  ///< the library's, to be given back with `devapi::CloseReceiver`
+  void* handle;  ///< of the library; closed with `devapi::CloseReceiver`
   EInstanceType link;
   std::optional<KnownSetting> setting{};  ///< of a serial port
 };
@@ -28,7 +28,7 @@ struct SearchPlace {
   EInstanceType link;
 };
 
-/// Searches the port of the command line, or tries it once when that tells speed or RTS.
+/// Searches the port of the command line, or tries one setting when speed or RTS is given.
 /// @throws Failure when there is no receiver
 FoundReceiver FindReceiver(Context& context);
 
@@ -48,7 +48,7 @@ std::optional<DCB> CurrentSettings(const std::wstring& port);
 /// What is remembered of ports; nothing with --no-memory.
 PortMemory MemoryOf(const Arguments& arguments);
 
-/// What --verbose says when the memory of a port could not be written down.
+/// What --verbose prints when the setting of a port could not be saved.
 std::string UnwrittenMemory(const std::wstring& port);
 
 }  // namespace cli

@@ -12,8 +12,8 @@ namespace {
 
 constexpr std::uint64_t kMsPerSecond = 1000;
 
-/// Looks after a running transfer from a thread of its own: shows how far it is, and ends it when
-/// nothing new arrives or what arrives cannot be kept.
+/// Watches a transfer on a thread of its own: shows the progress, and aborts the transfer when no
+/// new data arrives or the data cannot be written.
 class TransferWatch {
  public:
   TransferWatch(Context& context,
@@ -52,7 +52,7 @@ class TransferWatch {
   Ticker ticker_;  // ends before all that it uses
 };
 
-/// What became of one transfer.
+/// The result of one transfer.
 struct Transfer {
   long code = S_OK;
   bool stalled = false;
@@ -92,8 +92,8 @@ bool HasOtherSize(const Transfer& transfer, const RemoteFile& file) {
 
 std::string MeaningOf(const Context& context, const Transfer& transfer, const RemoteFile& file) {
   if (transfer.stalled) {
-    return "the receiver sent nothing new for " +
-           FormatDuration(context.arguments.stall_timeout_s) + ", so it was ended";
+    return "the receiver sent no new data for " +
+           FormatDuration(context.arguments.stall_timeout_s) + ", so the download was aborted";
   }
   if (transfer.code == S_OK) {
     return std::string(transfer.received < file.size ? "incomplete" : "longer than listed") +
@@ -102,12 +102,12 @@ std::string MeaningOf(const Context& context, const Transfer& transfer, const Re
   }
   if (transfer.code == S_FALSE) return "ended by the receiver before the file was complete";
   if (transfer.code == E_FAIL) {
-    return "the receiver says that the file is empty, or does not tell its size";
+    return "the receiver reports an empty file or no file size";
   }
   return "";
 }
 
-/// Why a transfer is not complete; what came of it is kept where that makes sense.
+/// Why a transfer is not complete. Keeps its data where that is useful.
 Failure WhyIncomplete(const Context& context,
                       const Receiver& receiver,
                       const Transfer& transfer,
@@ -123,7 +123,9 @@ Failure WhyIncomplete(const Context& context,
       "download " + Printable(file.name), transfer.code, MeaningOf(context, transfer, file));
   const bool other_size = HasOtherSize(transfer, file) && failure.exit != ExitCode::kCancelled;
   if (other_size) {
-    failure.hint = "A file that is still being recorded grows: list it again when it is closed.";
+    failure.hint =
+        "A file that is still being recorded grows. Close it on the receiver, then download it "
+        "again.";
   }
   if (keep_partial || other_size) failure.kept = ToUtf8(destination.KeepIncomplete());
   return failure;
@@ -139,9 +141,9 @@ void CheckSize(Receiver& receiver, const RemoteFile& file) {
   if (receiver.Family() != eProtocolQuorin) return;
   throw Failure{.tried = "download " + Printable(file.name),
                 .code = ResultOfWin32(ERROR_FILE_TOO_LARGE),
-                .meaning = "it has " + std::to_string(file.size) +
-                           " bytes; over a serial line a Quorin receiver can send " +
-                           std::to_string(kMostBytes) + " of a file",
+                .meaning = "the file has " + std::to_string(file.size) +
+                           " bytes; over a serial link a Quorin receiver can send at most " +
+                           std::to_string(kMostBytes) + " bytes of a file",
                 .hint = "Download it over USB."};
 }
 
@@ -165,8 +167,8 @@ Downloaded Download(Context& context,
           again.IsComplete(file)
               ? Failure{.tried = "verify " + Printable(file.name),
                         .code = ResultOfWin32(ERROR_CRC),
-                        .meaning = "a second download brought other bytes than the first",
-                        .hint = "Check the cable, lower the speed, and download it again."}
+                        .meaning = "the second download differs from the first",
+                        .hint = "Check the cable, lower the speed, and download the file again."}
               : WhyIncomplete(context, receiver, again, file, nowhere, false);
       if (options.keep_partial) failure.kept = ToUtf8(destination.KeepIncomplete());
       throw failure;

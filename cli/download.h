@@ -14,7 +14,7 @@ namespace cli {
 
 struct DownloadOptions {
   bool verify = false;        ///< download twice and compare
-  bool keep_partial = false;  ///< keep what came of a failed download too
+  bool keep_partial = false;  ///< also keep the data of a failed download
 };
 
 struct Downloaded {
@@ -22,12 +22,12 @@ struct Downloaded {
   std::string sha256{};
 };
 
-/// Refuses what the protocol cannot bring to its end, before minutes are spent on it.
+/// Refuses a file that is too large for the protocol, before minutes are spent on it.
 /// @throws Failure
 void CheckSize(Receiver& receiver, const RemoteFile& file);
 
 /// Copies a file, watching for silence and for Ctrl-C. The destination is complete only when every
-/// byte that the receiver listed is in it. What came of a file that has another size than listed is
+/// byte that the receiver listed is in it. The data of a file with another size than listed is
 /// kept: it may be a log that is still being recorded.
 /// @throws Failure when the file is not complete
 Downloaded Download(Context& context,
@@ -36,7 +36,7 @@ Downloaded Download(Context& context,
                     Destination& destination,
                     const DownloadOptions& options);
 
-/// Whether a failed download leaves hope for the next file: a receiver is asked whether it answers.
+/// Whether to try the next file after a failed one. Checks whether the receiver answers.
 bool MayGoOn(Receiver& receiver, const Failure& failure);
 
 }  // namespace cli

@@ -42,7 +42,8 @@ class Decoder {
   std::string Decode(const std::string& bytes) {
     if (const auto text = Decoded(bytes, CP_UTF8, MB_ERR_INVALID_CHARS)) return Printable(*text);
     all_utf8_ = false;
-    // A character that was cut at the line's end is shown as the code page's own mark for it.
+    // A character that was cut at the end of the line becomes the code page's replacement
+    // character.
     const auto text = Decoded(bytes, code_page_, 0);
     return text ? Printable(*text) : std::to_string(bytes.size()) + " bytes that cannot be read";
   }
@@ -54,13 +55,13 @@ class Decoder {
   bool all_utf8_ = true;
 };
 
-/// What a thread is doing, as far as its lines have told it.
+/// What a thread is doing, according to its lines so far.
 struct ThreadState {
   TraceFamily family = TraceFamily::kUnknown;
   std::optional<std::size_t> command{};    ///< the entry of the command that is not ended
   std::optional<std::size_t> read{};       ///< the entry of the read that is not ended
   std::optional<std::size_t> blocks{};     ///< the entry of the transfer that is not ended
-  std::optional<std::uint64_t> sent_ms{};  ///< when the command left
+  std::optional<std::uint64_t> sent_ms{};  ///< when the command was sent
   bool blocks_follow = false;              ///< the receiver has agreed to send blocks
   bool opening = false;                    ///< a port is being opened
   std::string last_class{};                ///< of the last command that the report names
@@ -104,7 +105,7 @@ class Reader {
     Push(std::move(entry));
   }
 
-  /// Gives the entry its time; midnight may have passed, and clocks are set.
+  /// Gives the entry its time. Midnight may have passed, or the clock may have been set.
   void Advance(ExchangeEntry& entry) {
     if (!exchange_.entries.empty()) {
       const std::uint32_t before = last_ms_of_day_;
@@ -134,8 +135,8 @@ class Reader {
     return ExchangeEnd::kReply;
   }
 
-  /// Adds what the report has no line for: a reply that came before the thread's next line, or that
-  /// a wait was cancelled.
+  /// Adds an entry for what has no line in the report: a reply before the thread's next line, or a
+  /// cancelled wait.
   void PushEnd(ExchangeEnd end,
                const ExchangeEntry& next,
                std::uint64_t begin_ms,
@@ -161,7 +162,7 @@ class Reader {
     const ExchangeEnd end = EndBy(next, read);
     const std::uint64_t begin_ms = At(read).elapsed_ms;
     if (next.kind == TraceKind::kRead) {
-      PushEnd(end, next, begin_ms, "a part of a reply, or somebody else's,");
+      PushEnd(end, next, begin_ms, "part of a reply, or a reply to another command,");
       return;
     }
     PushEnd(end, next, begin_ms, "a reply");
@@ -177,19 +178,19 @@ class Reader {
     thread.blocks_follow = end == ExchangeEnd::kReply && thread.last_class == "CGetFileCmd";
   }
 
-  /// Commands whose reads the report does not tell end with the thread's next line.
+  /// A command whose reads are not in the report ends with the thread's next line.
   void EndCommand(ThreadState& thread, const ExchangeEntry& next) {
     if (!thread.command) return;
     const bool is_failure = next.kind == TraceKind::kFailure || next.kind == TraceKind::kTimeout;
     if (!is_failure && (!thread.sent_ms || next.kind == TraceKind::kRead)) return;
-    // After a reply of this family the library rests for 500 ms; timers may be a little early.
+    // After a reply of this family the library pauses for 500 ms; timers may be a little early.
     constexpr std::uint64_t kRestMs = 450;
     const std::uint64_t sent_ms = thread.sent_ms.value_or(next.elapsed_ms);
     const bool is_answered =
         thread.family == TraceFamily::kVelmar && next.elapsed_ms - sent_ms >= kRestMs;
     ExchangeEnd end = EndBy(next, *thread.command);
     if (end == ExchangeEnd::kReply && !is_answered) end = ExchangeEnd::kUntold;
-    PushEnd(end, next, sent_ms, "a reply, and a rest of 500 ms,");
+    PushEnd(end, next, sent_ms, "a reply, and a pause of 500 ms,");
     FinishCommand(thread, next, end);
   }
 
@@ -210,20 +211,20 @@ class Reader {
     At(index).end = end;
   }
 
-  /// "Flush" stands in front of every command and of every block that is asked for again.
+  /// "Flush" comes before every command and before every block that is requested again.
   void TakeSend(ThreadState& thread, ExchangeEntry& entry) {
     if (thread.blocks) {
       entry.kind = TraceKind::kRetry;
-      entry.meaning = "the block is asked for again";
+      entry.meaning = "the block is requested again";
     } else if (thread.blocks_follow) {
       entry.kind = TraceKind::kBlocks;
-      entry.meaning = "the first block is asked for";
+      entry.meaning = "the first block is requested";
       thread.blocks = exchange_.entries.size();
     } else if (thread.opening) {
       entry.kind = TraceKind::kLink;
     } else if (!thread.command && thread.last_class == "CSetPortParamsCmd") {
       entry.kind = TraceKind::kLink;
-      entry.meaning = "waits until the command has left";
+      entry.meaning = "waits until the command is sent";
     } else if (!thread.command) {
       entry.kind = TraceKind::kCommand;
       entry.meaning = UnnamedCommand(thread) + " (not named)";
@@ -234,15 +235,15 @@ class Reader {
     }
   }
 
-  /// Which command it is that has no line of its own, by the one before it.
+  /// Guesses a command that has no line of its own from the one before it.
   static std::string UnnamedCommand(ThreadState& thread) {
     const std::string before = std::exchange(thread.last_class, "");
-    if (before == "CEchoOffCmd") return "stop your output: dm";
+    if (before == "CEchoOffCmd") return "stop all output: dm";
     if (before == "CGetPortCmd") return "set the port: set,/par/dev/...";
     if (before == "CSetInterfacemodeCommand" || before == "CReadFileCmd") {
-      return "stop your logs: unlogall thisport";
+      return "stop all logs: unlogall thisport";
     }
-    if (thread.family == TraceFamily::kQuorin) return "the end of half a line";
+    if (thread.family == TraceFamily::kQuorin) return "end an unfinished line";
     if (thread.family == TraceFamily::kVelmar) return "choose the file: currentfile NAME all";
     return "a command";
   }
@@ -258,7 +259,7 @@ class Reader {
       thread.sent_ms.reset();
     } else if (entry.kind == TraceKind::kHost) {
       thread.last_class.clear();
-      thread.command.reset();  // one that was made and never sent
+      thread.command.reset();  // it was made and never sent
       thread.opening = entry.text.find(" - opening ") != std::string::npos;
     } else if (entry.kind == TraceKind::kLink) {
       thread.last_class.clear();
@@ -273,19 +274,19 @@ class Reader {
     }
     if (trace.bytes_before != 0) {
       remarks.push_back("The first " + std::to_string(trace.bytes_before) +
-                        " bytes are no line of a report.");
+                        " bytes are not part of a report.");
     }
     if (trace.lines.empty()) return;
-    // Reports lose line ends behind such characters, which is no sign of a cut.
+    // Reports lose line ends after such characters, so that a missing one is no sign of a cut.
     const TraceLine& last = trace.lines.back();
     if (!last.has_end && !IsBeyondAscii(last.bytes)) {
-      remarks.push_back("The report breaks off in its last line.");
+      remarks.push_back("The report ends in the middle of its last line.");
     }
     if (!decoder_.all_utf8()) {
       remarks.push_back(
-          "Text that is not UTF-8 is shown as this computer's code page has it, and may be wrong.");
+          "Text that is not UTF-8 is shown in this computer's code page and may be wrong.");
     }
-    if (clock_was_set_) remarks.push_back("The clock was set back meanwhile.");
+    if (clock_was_set_) remarks.push_back("The clock was set back during the report.");
   }
 
   Decoder decoder_;

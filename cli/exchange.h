@@ -16,8 +16,8 @@ namespace cli {
 
 /// How a command or the blocks of a file ended.
 enum class ExchangeEnd {
-  kUntold,  ///< no reply is waited for, or the report ends before
-  kReply,   ///< something came that the library was content with
+  kUntold,  ///< no reply is expected, or the report ends before it
+  kReply,   ///< a reply that the library accepted
   kTimeout,
   kFailure,
   kCancelled,
@@ -26,8 +26,8 @@ enum class ExchangeEnd {
 struct ExchangeEntry {
   std::uint32_t ms_of_day = 0;
   std::uint64_t elapsed_ms = 0;  ///< since the report's first line
-  std::uint64_t since_ms =
-      0;  ///< since the entry before that is no kSend, which is not always shown
+  /// Since the entry before it. A kSend does not count, as it is not always shown.
+  std::uint64_t since_ms = 0;
   std::uint32_t thread = 0;
   TraceKind kind = TraceKind::kNote;
   std::string text{};     ///< the line, printable UTF-8; empty for a reply, which has no line
@@ -43,17 +43,17 @@ struct Exchange {
 
   std::size_t Count(TraceKind kind) const;
   std::uint64_t DurationMs() const;
-  /// The result codes that it tells, each once.
+  /// The result codes in it, each once.
   std::vector<long> Codes() const;
 };
 
 /// "12:30:01.250"
 std::string TimeOfDay(std::uint32_t ms_of_day);
 
-/// What a code means, as docs/troubleshooting.md says it, or Windows.
+/// What a code means, from docs/troubleshooting.md or else from Windows.
 std::string TitleOf(long code);
 
-/// Reads a report; as much of it as can be read. Without any stamp in it there are no entries.
+/// Reads as much of a report as can be read. A text without any stamp has no entries.
 /// @param code_page of text that is not UTF-8
 Exchange ReadExchange(std::string_view report, unsigned code_page);
 

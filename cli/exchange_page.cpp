@@ -219,7 +219,7 @@ class Drawing {
   std::string svg_;
 };
 
-/// What stands before the meaning: the arrow, or a word for trouble.
+/// The sign before the meaning: an arrow, or a word for a failure.
 std::string_view SignOf(TraceKind kind) {
   switch (kind) {
     case TraceKind::kHost:
@@ -233,7 +233,7 @@ std::string_view SignOf(TraceKind kind) {
     case TraceKind::kRetry:
       return "&rarr; Retry";
     case TraceKind::kTimeout:
-      return "Silence";
+      return "Time-out";
     case TraceKind::kFailure:
       return "Failure";
     default:
@@ -241,7 +241,7 @@ std::string_view SignOf(TraceKind kind) {
   }
 }
 
-/// Whether it is between the host and the library, rather than between that and the receiver.
+/// Whether it is between the host and the library, not between the library and the receiver.
 bool IsOfHost(TraceKind kind) {
   return kind == TraceKind::kHost || kind == TraceKind::kCancel || kind == TraceKind::kDone ||
          kind == TraceKind::kNote || kind == TraceKind::kLock;
@@ -271,7 +271,7 @@ std::string CodeSection(const Exchange& exchange) {
   for (const long code : exchange.Codes()) {
     const auto entry = FindTroubleshooting(code);
     section += "<details><summary>" + HexCode(code) + " " + Escaped(TitleOf(code)) + "</summary>" +
-               "<pre>" + (entry ? Escaped(entry->text) : "There is no entry for it.") +
+               "<pre>" + (entry ? Escaped(entry->text) : "This code has no entry.") +
                "</pre></details>\n";
   }
   return section.empty() ? "" : "<h2>Result codes</h2>\n" + section;
@@ -320,8 +320,8 @@ std::string ToPage(const Exchange& exchange, const std::string& title) {
   }
   if (entries.empty()) return page + "</body>\n</html>\n";
   page += "<h2>Time line</h2>\n" + Drawing(entries).Draw() +
-          "<p class=\"weak\">Red has failed, amber was cancelled or asked for again; a bar tells "
-          "more when the mouse is on it.</p>\n" +
+          "<p class=\"weak\">Red: failed. Amber: cancelled or requested again. Point at a bar to "
+          "see more.</p>\n" +
           CodeSection(exchange) +
           "<h2>Exchange</h2>\n<input type=\"checkbox\" id=\"lines\"> "
           "<label for=\"lines\">Show the lines of the report</label>\n<table>\n<thead><tr>"

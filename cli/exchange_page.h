@@ -18,7 +18,7 @@ inline constexpr std::size_t kMostPageEntries = 20'000;
 std::string Escaped(std::string_view text);
 
 /// One page that needs nothing else: a time line, and every entry between host, library and
-/// receiver. It has no script, and lets none in.
+/// receiver. It has no script, and allows none.
 /// @param title printable UTF-8, such as the report's name
 std::string ToPage(const Exchange& exchange, const std::string& title);
 

@@ -21,13 +21,13 @@ std::string Counted(std::size_t count, const std::string& one, const std::string
   return std::to_string(count) + " " + (count == 1 ? one : many);
 }
 
-/// What is in front of a line: trouble is seen at once.
+/// The mark before a line; failures stand out in capitals.
 std::string MarkOf(TraceKind kind) {
   switch (kind) {
     case TraceKind::kRetry:
       return "RETRY";
     case TraceKind::kTimeout:
-      return "SILENCE";
+      return "TIMEOUT";
     case TraceKind::kFailure:
       return "FAILURE";
     default:
@@ -87,7 +87,7 @@ std::string Summary(const Exchange& exchange) {
   return Seconds(exchange.DurationMs()) + ", " +
          Counted(exchange.Count(TraceKind::kCommand), "command", "commands") + ", " +
          Counted(exchange.Count(TraceKind::kRetry), "retry", "retries") + ", " +
-         Counted(exchange.Count(TraceKind::kTimeout), "silence", "silences") + ", " +
+         Counted(exchange.Count(TraceKind::kTimeout), "time-out", "time-outs") + ", " +
          Counted(exchange.Count(TraceKind::kFailure), "failure", "failures");
 }
 
@@ -102,7 +102,7 @@ std::string ToText(const Exchange& exchange, bool verbose) {
   text += "\n" + Summary(exchange) + "\n";
   for (const long code : exchange.Codes()) {
     text += HexCode(code) + "  " + TitleOf(code) + "; `rcvlink-cli explain " + HexCode(code) +
-            "` tells what to try\n";
+            "` says what to try\n";
   }
   return text;
 }

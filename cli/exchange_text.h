@@ -10,16 +10,16 @@
 
 namespace cli {
 
-/// "host -> library": who says it to whom; empty for what nobody says.
+/// "host -> library": from whom to whom; empty for entries that are no message.
 std::string PartiesOf(TraceKind kind);
 
-/// Whether a reader looks for it: retries, silences and failures.
+/// Whether it is a retry, a time-out or a failure.
 bool IsTrouble(TraceKind kind);
 
 /// "+15 ms", "+2.5 s"; empty for no time.
 std::string Gap(std::uint64_t ms);
 
-/// "5 s, 14 commands, 2 retries, 1 silence, no failures"
+/// "5.0 s, 14 commands, 2 retries, 1 time-out, no failures"
 std::string Summary(const Exchange& exchange);
 
 /// Every entry, the summary, and the result codes with their meaning.

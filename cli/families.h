@@ -14,7 +14,7 @@ namespace cli {
 struct Family {
   EProtocol protocol;
   const char* name;  ///< in small letters it is the word of --protocol
-  /// The speeds to try first: fresh from the factory, or left behind by a download that raised it.
+  /// The speeds to try first: the factory setting, or that of a download that raised it.
   std::array<unsigned long, 2> usual_speeds;
   /// What the family's port settings take for odd and even parity and for one stop bit; two stop
   /// bits are one more.
@@ -40,7 +40,7 @@ inline constexpr std::array kFamilies = {Family{.protocol = eProtocolQuorin,
                                                 .one_stop_bit = 1,
                                                 .sets_rts = false}};
 
-/// Null for a number that is no family's.
+/// Null for a number that belongs to no family.
 constexpr const Family* FindFamily(unsigned protocol) {
   for (const Family& family : kFamilies) {
     if (family.protocol == static_cast<EProtocol>(protocol)) return &family;

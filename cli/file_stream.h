@@ -24,11 +24,11 @@ struct ComReleaser {
 #pragma GCC diagnostic push
 #pragma GCC diagnostic ignored "-Wnon-virtual-dtor"
 
-/// A COM stream that only takes bytes. It counts them, adds them to a hash, and remembers its own first failure, since
-/// the library does not always tell of it. The counts may be read from any thread.
+/// A COM stream for writing only. It counts and hashes the bytes, and keeps its first write error,
+/// which the library does not always report. The counts may be read from any thread.
 class FileStream final : public IStream {
  public:
-  /// @param destination outlives the stream, or is taken away with `Detach`
+  /// @param destination outlives the stream, or is removed with `Detach`
   static std::unique_ptr<FileStream, ComReleaser> Make(Destination& destination);
 
   std::uint64_t received() const { return received_; }
@@ -36,7 +36,7 @@ class FileStream final : public IStream {
   /// Win32 error of the first write that failed; ERROR_SUCCESS for none.
   DWORD first_error() const { return first_error_; }
 
-  /// From now on the stream takes nothing, whoever still holds it.
+  /// From now on the stream refuses writes, even if the library still holds it.
   void Detach() { destination_ = nullptr; }
 
   /// SHA-256 of what was received, once the transfer is over; to be called once.

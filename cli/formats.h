@@ -24,7 +24,7 @@ struct TransferState {
   std::wstring name{};
   std::uint64_t done = 0;   ///< bytes
   std::uint64_t total = 0;  ///< bytes that the receiver listed
-  std::uint64_t rate = 0;   ///< bytes a second right now; 0 while that cannot be told
+  std::uint64_t rate = 0;   ///< bytes a second right now; 0 while it is not known
 };
 
 /// 0 to 100; 100 only when all has arrived.

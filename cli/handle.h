@@ -1,5 +1,5 @@
 /// @file handle.h
-/// Owners of the Win32 handles that the program opens.
+/// Owns the Win32 handles that the program opens.
 #ifndef RCVLINK_CLI_HANDLE_H_
 #define RCVLINK_CLI_HANDLE_H_
 

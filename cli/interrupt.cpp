@@ -6,11 +6,11 @@
 namespace cli {
 namespace {
 
-// Windows calls the handler without a context of ours.
+// Windows passes no context to the handler.
 std::atomic<HANDLE> g_event{nullptr};
 std::atomic<const std::string*> g_message{nullptr};
 
-/// Says at once that Ctrl-C was heard: the receiver may need a while to end what it does.
+/// Acknowledges Ctrl-C at once: the receiver may need a while to stop.
 void PrintMessage() {
   const std::string* const message = g_message.exchange(nullptr);
   if (message == nullptr) return;

@@ -10,7 +10,7 @@
 namespace cli {
 
 /// While it lives, Ctrl-C, Ctrl-Break and the closing of the console window signal an event instead
-/// of ending the process. There is one in a program.
+/// of ending the process. There is one per process.
 class Interrupt {
  public:
   /// @param message printed on standard error at the moment of the first Ctrl-C; may be empty

@@ -23,11 +23,11 @@ bool BeginsWith(const std::filesystem::path& file, const std::filesystem::path& 
 /// @throws Failure when the file cannot be read
 std::string Sha256Of(const std::filesystem::path& file);
 
-/// Makes an empty file in the place of whatever is there.
+/// Creates an empty file; replaces an existing one.
 /// @throws Failure
 void MakeEmpty(const std::filesystem::path& file);
 
-/// Gives a file the name of another one, which it replaces.
+/// Renames a file over another one.
 /// @throws Failure
 void MoveOver(const std::filesystem::path& from, const std::filesystem::path& target);
 
@@ -37,7 +37,7 @@ enum class TimeZone { kUtc, kLocal };
 /// "UTC" or "the local time of this computer (W. Europe Standard Time)"
 std::string InWords(TimeZone zone);
 
-/// Nothing for a time that the receiver did not tell, or that makes no sense.
+/// Nothing for a missing or invalid time.
 /// @param local what local time is; null: that of this computer
 std::optional<FILETIME> ToFileTime(const SYSTEMTIME& time,
                                    TimeZone zone,

@@ -28,7 +28,7 @@ struct LocalFreer {
   void operator()(wchar_t** memory) const { LocalFree(memory); }
 };
 
-/// The words behind the program's name, in UTF-8.
+/// The words after the program's name, in UTF-8.
 std::vector<std::string> CommandLineWords() {
   int count = 0;
   const std::unique_ptr<wchar_t*, LocalFreer> words(CommandLineToArgvW(GetCommandLineW(), &count));
@@ -37,13 +37,13 @@ std::vector<std::string> CommandLineWords() {
   return utf8;
 }
 
-/// Prints a document, with the report that was written besides.
+/// Prints a document, with the path of the report if there is one.
 void PrintJson(Json document, const std::wstring& report, Output& out) {
   if (!report.empty()) document["report"] = ToUtf8(report);
   out.Write(document.dump(kJsonIndent) + "\n");
 }
 
-/// Tells a failure in the way that was asked for.
+/// Prints a failure as text or as JSON.
 ExitCode Tell(
     const Failure& failure, bool json, const std::wstring& report, Output& out, Output& err) {
   if (json) {
@@ -85,7 +85,8 @@ ExitCode Run(Output& out, Output& err) {
   } catch (const Failure& failure) {
     return Tell(failure, json, L"", out, err);
   } catch (const std::exception& error) {
-    return Tell({.tried = "go on", .code = E_FAIL, .meaning = error.what()}, json, L"", out, err);
+    return Tell(
+        {.tried = "continue", .code = E_FAIL, .meaning = error.what()}, json, L"", out, err);
   }
 }
 

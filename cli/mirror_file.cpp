@@ -19,14 +19,16 @@ Failure Difference(const MirrorJob& job, std::string meaning, std::string hint) 
           .hint = std::move(hint)};
 }
 
-/// The place of a download until it may take its name; it vanishes unless it does.
+/// The temporary file of a download; deleted unless it is renamed.
 class NewFile {
  public:
   /// @throws Failure when there is a file of that name
   explicit NewFile(const std::filesystem::path& target) : path_(target.native() + L".new") {
     if (!Exists(path_)) return;
     Failure failure = LocalFailure("make " + Printable(path_.native()), ERROR_FILE_EXISTS);
-    failure.hint = "A mirror that was cut off left it, or another one is at work here; delete it.";
+    failure.hint =
+        "An interrupted mirror left it, or another mirror is running here. If none is running, "
+        "delete it.";
     throw failure;
   }
   ~NewFile() { DeleteFileW(path_.c_str()); }
@@ -49,9 +51,10 @@ std::string DownloadNew(Context& context, Receiver& receiver, const MirrorJob& j
   }
   const bool replaces = Exists(job.target);
   if (replaces && !context.arguments.force && !BeginsWith(file.path(), job.target)) {
-    throw Difference(job,
-                     "the file of that name on this computer is another one, not its beginning",
-                     "Move that file away, or say --force to replace it.");
+    throw Difference(
+        job,
+        "the file of that name on this computer is not the beginning of the receiver's file",
+        "Move that file away, or use --force to replace it.");
   }
   MoveOver(file.path(), job.target);
   return sha256;
@@ -62,8 +65,8 @@ std::string Compare(Context& context, Receiver& receiver, const MirrorJob& job) 
   const std::string sha256 = Download(context, receiver, job.file, nowhere, {}).sha256;
   if (sha256.empty() || sha256 != Sha256Of(job.target)) {
     throw Difference(job,
-                     "the file on this computer has the same size, but other bytes",
-                     "Move that file away, and mirror it again.");
+                     "the file on this computer has the same size but different bytes",
+                     "Move that file away, then run the mirror again.");
   }
   return sha256;
 }
@@ -80,9 +83,10 @@ std::string Mirror(Context& context, Receiver& receiver, const MirrorJob& job, b
       return Compare(context, receiver, job);
     case MirrorStep::kMakeEmpty:
       if (Exists(job.target) && !context.arguments.force) {
-        throw Difference(job,
-                         "it has no bytes, but the file of that name on this computer has",
-                         "Move that file away, or say --force to replace it.");
+        throw Difference(
+            job,
+            "the receiver's file is empty, but the file of that name on this computer is not",
+            "Move that file away, or use --force to replace it.");
       }
       MakeEmpty(job.target);
       break;

@@ -18,11 +18,10 @@ struct MirrorJob {
   MirrorStep step = MirrorStep::kNothing;
 };
 
-/// Brings a file to this computer as its job says. What was there stays whatever fails, and is
-/// replaced only by a file of which it is the beginning, such as a log that has grown since, or with
-/// --force.
+/// Executes a job. An existing file is kept whatever fails. Without --force it is replaced only by
+/// a file that begins with the same bytes, such as a log that has grown.
 /// @param verify download twice, and keep nothing when the bytes differ
-/// @return the SHA-256 of the file; empty for one without bytes
+/// @return the SHA-256 of the file; empty for an empty file
 /// @throws Failure
 std::string Mirror(Context& context, Receiver& receiver, const MirrorJob& job, bool verify);
 

@@ -34,7 +34,7 @@ std::string InWords(const MirrorState& state, const std::wstring& name, std::uin
       state.elapsed_ms == 0 ? 0 : state.done * kMsPerSecond / state.elapsed_ms;
   if (rate == 0) return text;
   const std::uint64_t rest = state.total - std::min(state.done, state.total);
-  return text + ", " + FormatDuration((rest + rate - 1) / rate) + " left over all";
+  return text + ", " + FormatDuration((rest + rate - 1) / rate) + " left in total";
 }
 
 }  // namespace cli

@@ -64,10 +64,12 @@ std::optional<std::string> WhyNotSendable(std::wstring_view name) {
   if (name.empty()) return "a file name is empty";
   const std::string quoted = "the file name " + Printable(name);
   if (std::any_of(name.begin(), name.end(), IsControl)) {
-    return quoted + " has a control character in it";
+    return quoted + " contains a control character";
   }
-  if (name.find_first_of(L"\"'") != std::wstring_view::npos) return quoted + " has a quote in it";
-  if (!SurvivesAnsi(name)) return quoted + " cannot be written in this computer's code page";
+  if (name.find_first_of(L"\"'") != std::wstring_view::npos) return quoted + " contains a quote";
+  if (!SurvivesAnsi(name)) {
+    return quoted + " has characters that this computer's code page does not have";
+  }
   return std::nullopt;
 }
 

@@ -1,5 +1,5 @@
 /// @file names.h
-/// Which file names may go to the receiver, and where a receiver's name may land on the disk.
+/// Which file names may be sent to a receiver, and which names its files get on this computer.
 #ifndef RCVLINK_CLI_NAMES_H_
 #define RCVLINK_CLI_NAMES_H_
 

@@ -14,7 +14,7 @@ namespace cli {
 namespace {
 
 // The parser would split a word like [a,b] into a list, take {} for an empty one, and would not
-// take "--" before the last names. A mark in front of such words hides them from it.
+// take "--" before the last names. A mark before such words hides them from it.
 constexpr char kLiteralMark = '\x01';
 constexpr std::string_view kMarked = "[{%\x01";
 
@@ -31,8 +31,8 @@ Failure UsageError(const std::string& meaning) {
           .code = E_INVALIDARG,
           .meaning = meaning,
           .hint =
-              "`rcvlink-cli --help` tells what there is, `rcvlink-cli get --help` tells it "
-              "for one command."};
+              "`rcvlink-cli --help` lists the commands, `rcvlink-cli get --help` shows the help of "
+              "one command."};
 }
 
 std::vector<std::string> Hidden(const std::vector<std::string>& words) {
@@ -53,7 +53,7 @@ std::string Unmarked(const std::string& word) {
 }
 
 void AddPort(CLI::App& app, Arguments& arguments, Need need) {
-  // The parser's own means would let the environment win over a positional.
+  // The parser's own `envname` would let the environment override a positional argument.
   const char* const usual = std::getenv("RCVLINK_PORT");
   if (usual != nullptr) {
     arguments.port = ToUtf16(usual);
@@ -61,7 +61,7 @@ void AddPort(CLI::App& app, Arguments& arguments, Need need) {
   }
   AddText(app,
           "PORT",
-          "The port's name, as in COM7; with --link usb the device's path",
+          "COM port, such as COM7; with --link usb the path of the device",
           "",
           arguments.port,
           need);
@@ -70,7 +70,7 @@ void AddPort(CLI::App& app, Arguments& arguments, Need need) {
   app.validate_positionals();
   app.get_option("PORT")->check(
       [](const std::string& word) {
-        return LooksLikePort(AsTyped(word)) ? "" : Printable(AsTyped(word)) + " names no port";
+        return LooksLikePort(AsTyped(word)) ? "" : Printable(AsTyped(word)) + " is not a port";
       },
       "");
 }

@@ -1,5 +1,5 @@
 /// @file options.h
-/// What commands put on the command line.
+/// Helpers with which commands declare their options.
 #ifndef RCVLINK_CLI_OPTIONS_H_
 #define RCVLINK_CLI_OPTIONS_H_
 
@@ -17,14 +17,14 @@ class App;
 
 namespace cli {
 
-/// A command line that makes no sense.
+/// The failure for an invalid command line.
 Failure UsageError(const std::string& meaning);
 
-/// The words of a command line as the parser is to be given them: from the last to the first, those
-/// that it would change marked.
+/// Prepares words for the parser: in reverse order, and with a mark before those that it would
+/// change.
 std::vector<std::string> Hidden(const std::vector<std::string>& words);
 
-/// A word that the parser gives back, as it was typed.
+/// Removes the mark: the word as it was typed.
 std::string Unmarked(const std::string& word);
 
 enum class Need { kRequired, kOptional };

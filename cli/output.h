@@ -17,7 +17,7 @@ class Output {
 
   bool is_terminal() const { return is_terminal_; }
 
-  /// Characters of a terminal's line; a usual number when it does not tell.
+  /// Width of the terminal in characters; a default when it is not known.
   std::size_t Width() const;
 
   void Write(std::string_view utf8);
@@ -29,8 +29,8 @@ class Output {
   /// Win32 error of the first write that failed; 0 for none.
   DWORD first_error() const { return first_error_; }
 
-  /// Whether that was because the reader had enough, as `more` and `head` do. What Windows calls it
-  /// depends on the kind of the pipe, and Wine has a third name for it.
+  /// Whether the reader has closed its end, as `more` and `head` do. The error depends on the kind
+  /// of pipe, and Wine has a third one.
   bool IsClosed() const {
     return first_error_ == ERROR_BROKEN_PIPE || first_error_ == ERROR_NO_DATA ||
            first_error_ == ERROR_PIPE_NOT_CONNECTED;

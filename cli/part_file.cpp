@@ -24,8 +24,8 @@ PartFile::PartFile(std::filesystem::path target, bool overwrite)
     Failure failure = LocalFailure("create " + Printable(part_.native()), error);
     if (error == ERROR_FILE_EXISTS) {
       failure.hint =
-          "A download that was cut off left it, or another one is writing it; --force "
-          "replaces it.";
+          "An interrupted download left it, or another download is writing it; --force replaces "
+          "it.";
     }
     throw failure;
   }
@@ -36,7 +36,7 @@ PartFile::PartFile(std::filesystem::path target, bool overwrite)
 PartFile::~PartFile() {
   if (kept_) return;
   file_.reset();
-  DeleteFileW(part_.c_str());  // for file systems that do not know of vanishing files
+  DeleteFileW(part_.c_str());  // for file systems that cannot delete on close
 }
 
 bool PartFile::SetVanishing(bool vanishing) {
@@ -59,7 +59,8 @@ void PartFile::Complete() {
   const DWORD replace = overwrite_ ? MOVEFILE_REPLACE_EXISTING : 0;
   if (MoveFileExW(part_.c_str(), target_.c_str(), replace | MOVEFILE_WRITE_THROUGH) == FALSE) {
     const DWORD error = GetLastError();
-    Failure failure = LocalFailure("rename it to " + Printable(target_.filename().native()), error);
+    Failure failure =
+        LocalFailure("rename the download to " + Printable(target_.filename().native()), error);
     failure.hint = "The download is complete. Rename the file yourself when " +
                    Printable(target_.filename().native()) + " is free.";
     throw KeptFailure(std::move(failure));

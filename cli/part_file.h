@@ -10,8 +10,8 @@
 
 namespace cli {
 
-/// A file that grows under the name of its target with ".part" after it, and vanishes unless it is
-/// kept, also when the process is killed.
+/// A file with the name of its target and ".part" after it. It is deleted unless it is kept, even
+/// when the process is killed.
 class PartFile : public Destination {
  public:
   /// @param overwrite whether files of either name may be replaced

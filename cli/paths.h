@@ -15,7 +15,7 @@ namespace cli {
 bool Exists(const std::filesystem::path& path);
 bool IsFolder(const std::filesystem::path& path);
 
-/// Makes a folder and those above it.
+/// Makes a folder and its parents.
 /// @throws Failure when that does not work
 void MakeFolder(const std::filesystem::path& folder);
 

@@ -24,8 +24,8 @@ bool IsUsbioDriver(const std::wstring& service) {
   return Capitals(service).find(L"USBIO") != std::wstring::npos;
 }
 
-/// Whether the path is that of the interface which the hub's driver gives every device: the driver of
-/// the device itself has one of its own.
+/// Whether the path is an interface of the hub's driver, which has one for every device. The
+/// device's own driver has another one.
 bool IsOfHub(const std::wstring& path) {
   constexpr std::wstring_view kHubsClass = L"#{A5DCBF10-6530-11D2-901F-00C04FB951ED}";
   return Capitals(path).ends_with(kHubsClass);
@@ -93,7 +93,7 @@ std::string PortsInWords(const std::vector<Port>& ports, EInstanceType link) {
     words.push_back(friendly_name.empty() ? name : name + " (" + friendly_name + ")");
   }
   if (words.empty()) {
-    return link == eInstanceUSB ? "No device of the USBIO driver is plugged into this computer."
+    return link == eInstanceUSB ? "This computer has no USB device with the USBIO driver."
                                 : "This computer has no COM ports.";
   }
   std::string text = "This computer has ";

@@ -13,12 +13,12 @@ namespace cli {
 struct Port {
   std::wstring name{};  ///< "COM7", or the path of a USB device
   EInstanceType link = eInstanceSerial;
-  std::wstring friendly_name{};  ///< Windows' words for it; empty when it has none
-  std::string vendor{};          ///< of a USB device, "1234"; empty when its path does not tell
+  std::wstring friendly_name{};  ///< Windows' name for it; empty when it has none
+  std::string vendor{};          ///< of a USB device, "1234"; empty when it is not in its path
   std::string product{};         ///< the same
 };
 
-/// What Windows tells of ports and devices.
+/// The ports and devices that Windows knows.
 class PortSource {
  public:
   struct NamedPort {
@@ -41,7 +41,7 @@ class PortSource {
   /// All names of devices that can be opened: some virtual ports are not registered.
   virtual std::vector<std::wstring> DeviceNames() const = 0;
 
-  /// The ports that Windows has words for.
+  /// The ports that have a friendly name.
   virtual std::vector<NamedPort> NamedPorts() const = 0;
 
   virtual std::vector<UsbInterface> UsbInterfaces() const = 0;
@@ -50,10 +50,10 @@ class PortSource {
 /// All COM ports in the order of their numbers, then the devices of the USBIO driver.
 std::vector<Port> ListPorts(const PortSource& source);
 
-/// The ports of this computer, as Windows tells them.
+/// The ports of this computer, from Windows.
 std::vector<Port> ListPorts();
 
-/// Those of a link as a hint: "This computer has COM3 (USB Serial Port) and COM7."
+/// The ports of a link, as a hint: "This computer has COM3 (USB Serial Port) and COM7."
 std::string PortsInWords(const std::vector<Port>& ports, EInstanceType link);
 
 }  // namespace cli

@@ -24,7 +24,7 @@ struct MemoryFreer {
   void operator()(wchar_t* text) const { CoTaskMemFree(text); }
 };
 
-/// Keeps the files of all memories for this thread, among all programs of the user.
+/// Locks the memory against other threads and other programs of the user.
 class MemoryLock {
  public:
   MemoryLock() : mutex_(CreateMutexW(nullptr, FALSE, L"Local\\rcvlink-cli port memory")) {
@@ -87,7 +87,7 @@ Json EntryOf(const KnownSetting& setting) {
           {"protocol", FamilyWord(setting.family)}};
 }
 
-/// Puts the ports into the place of the file in one step, so that nobody sees half of it.
+/// Replaces the file in one step, so that nobody reads half of it.
 bool Replace(const std::filesystem::path& file, const Json& ports) {
   constexpr int kIndent = 2;
   const std::filesystem::path fresh = file.native() + L".new";

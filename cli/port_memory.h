@@ -11,15 +11,15 @@
 
 namespace cli {
 
-/// A small JSON file. It is a help and no more: whatever happens to it, commands go on without it.
-/// Programs that run at the same time may use the same file.
+/// A small JSON file that only makes searches faster: commands work without it, too. Programs that
+/// run at the same time may use the same file.
 class PortMemory {
  public:
   /// @param file need not exist, nor its folder; empty: nothing is remembered
   explicit PortMemory(std::filesystem::path file) : file_(std::move(file)) {}
 
   /// Where the memory of this user is: in the folder for application data. Empty when Windows does
-  /// not tell that.
+  /// not know it.
   static std::filesystem::path UsualFile();
 
   /// Nothing for a port that is not known, or when the file cannot be read or is damaged.

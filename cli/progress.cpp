@@ -6,9 +6,9 @@ namespace cli {
 
 Progress::Progress(Context& context, const TransferState& start)
     : context_(context), mode_(ProgressModeOf(context)) {
-  // Until the first byte arrives the two sides agree on the speed of the line.
+  // Before the first byte arrives both sides agree on the speed of the line.
   const std::string line = "Downloading " + Printable(start.name) + ", " + FormatBytes(start.total);
-  if (mode_ == ProgressMode::kBar) Draw(line + ": getting ready ...");
+  if (mode_ == ProgressMode::kBar) Draw(line + ": preparing ...");
   if (mode_ == ProgressMode::kLines) context_.err.Write(line + "\n");
   if (mode_ == ProgressMode::kJson) context_.err.Write(ProgressJson(start) + "\n");
 }
@@ -20,7 +20,7 @@ void Progress::Show(TransferState state, std::uint64_t elapsed_ms) {
   rate_.Add(elapsed_ms, state.done);
   state.rate = rate_.BytesPerSecond();
   if (mode_ == ProgressMode::kBar) {
-    // The last column stays free: a full line would wrap.
+    // The last column stays free, because a full line would wrap.
     Draw(ProgressBar(state, context_.err.Width() - 1));
     return;
   }

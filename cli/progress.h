@@ -14,7 +14,7 @@ class Progress {
  public:
   Progress(Context& context, const TransferState& start);
 
-  /// Takes the bar away.
+  /// Erases the bar.
   ~Progress();
   Progress(const Progress&) = delete;
   Progress& operator=(const Progress&) = delete;

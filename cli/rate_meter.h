@@ -15,7 +15,7 @@ class RateMeter {
   /// @param done bytes that have arrived until then
   void Add(std::uint64_t elapsed_ms, std::uint64_t done);
 
-  /// Bytes a second; 0 while that cannot be told, or nothing arrives.
+  /// Bytes per second; 0 while it is not known, or nothing arrives.
   std::uint64_t BytesPerSecond() const;
 
  private:

@@ -26,7 +26,7 @@ struct StringFreer {
   void operator()(wchar_t* string) const { SysFreeString(string); }
 };
 
-/// Takes over a string of the library.
+/// Takes ownership of a string of the library.
 std::wstring Take(wchar_t* string) {
   const std::unique_ptr<wchar_t, StringFreer> owner(string);
   return {string, SysStringLen(string)};
@@ -41,8 +41,8 @@ long ReadEntry(void* list, long index, RemoteFile& file) {
   return S_OK;
 }
 
-/// Whether so many files may have filled the library's buffer for a Velmar directory, so that more
-/// of them got lost: from the lengths of their lines at the longest.
+/// Whether these files may have filled the library's buffer for a Velmar directory, so that others
+/// are missing. Assumes that each line has its longest form.
 bool MayBeCut(const std::vector<RemoteFile>& files) {
   constexpr std::size_t kBuffer = 8192;
   constexpr std::size_t kLongestLineBesidesName = 125;
@@ -76,13 +76,13 @@ const Identity& Receiver::Identify() {
   constexpr const char* kTried = "read the receiver's identity";
   if (identity_) return *identity_;
   ThrowIfCancelled(kTried);
-  const Busy busy(context_, "Asking the receiver who it is");
+  const Busy busy(context_, "Reading the receiver's identity");
   CReceiverInfo info{};
   const long result = devapi::GetReceiverInfo(handle(), interrupt_.event(), &info);
   if (result != S_OK) {
     devapi::UnlockConnection(handle());  // a failure may have left the receiver locked
     throw FailureOf(
-        kTried, result, result == S_FALSE ? "the receiver did not answer with its identity" : "");
+        kTried, result, result == S_FALSE ? "the receiver did not send its identity" : "");
   }
   identity_ = {.id = Take(info.bstrReceiverId),
                .model = Take(info.bstrModel),
@@ -124,19 +124,19 @@ std::vector<RemoteFile> Receiver::ReadDirectory() {
   return files;
 }
 
-/// Of Velmar receivers only, which are on serial ports: an empty list is read once more, as the
-/// library does not tell a refused or lost question from an empty directory.
+/// Only for Velmar receivers, which are on serial ports. An empty list is read again: the library
+/// reports a refused or lost command as an empty directory.
 std::string Receiver::DoubtAbout(std::vector<RemoteFile>& files) {
   if (!setting_ || setting_->family != eProtocolVelmar) return {};
   if (MayBeCut(files)) AwaitAnswer(kList);
   if (files.empty()) files = ReadDirectory();
   if (files.empty()) {
-    return "The list is empty: a Velmar receiver that has no files is not told from one that did "
-           "not answer.";
+    return "The list is empty: either the Velmar receiver has no files, or it did not answer. Try "
+           "again.";
   }
   if (!MayBeCut(files)) return {};
-  return "A Velmar receiver's directory is read up to 8192 bytes, some 70 files; those after them "
-         "appear when others have been deleted.";
+  return "Only the first 8192 bytes of a Velmar receiver's directory are read, about 70 files. The "
+         "other files appear when some have been deleted.";
 }
 
 bool Receiver::Answers() {
@@ -145,7 +145,7 @@ bool Receiver::Answers() {
   return code == S_OK && answer != VARIANT_FALSE;
 }
 
-/// The rest of a list that did not fit is still on its way: it would spoil the next exchange.
+/// The rest of a list that did not fit is still arriving and would disturb the next exchange.
 void Receiver::AwaitAnswer(const std::string& tried) {
   constexpr std::uint64_t kLongestRestMs = 120'000;
   const Busy busy(context_, "Waiting for the end of the list");
@@ -154,7 +154,7 @@ void Receiver::AwaitAnswer(const std::string& tried) {
     ThrowIfCancelled(tried);
     if (Answers()) return;
   }
-  throw FailureOf(tried, ResultOfWin32(ERROR_TIMEOUT), "the receiver does not answer any more");
+  throw FailureOf(tried, ResultOfWin32(ERROR_TIMEOUT), "the receiver no longer answers");
 }
 
 Failure Receiver::FailureOf(std::string tried, long code, std::string meaning) const {
@@ -184,10 +184,10 @@ const RemoteFile& FindFile(const std::vector<RemoteFile>& files,
       files.begin(), files.end(), [&](const auto& f) { return SameLocalName(f.name, name); });
   throw Failure{.tried = tried,
                 .code = ResultOfWin32(ERROR_FILE_NOT_FOUND),
-                .meaning = "the receiver has no file of the name " + Printable(name),
+                .meaning = "the receiver has no file named " + Printable(name),
                 .hint = similar == files.end()
-                            ? "`rcvlink-cli ls` shows what it has; nothing was done."
-                            : "It has " + Printable(similar->name) + "; nothing was done."};
+                            ? "`rcvlink-cli ls` lists its files. Nothing was done."
+                            : "It has " + Printable(similar->name) + ". Nothing was done."};
 }
 
 }  // namespace cli

@@ -18,7 +18,7 @@
 
 namespace cli {
 
-/// Who a receiver is.
+/// The identity of a receiver.
 struct Identity {
   std::wstring id{};
   std::wstring model{};
@@ -42,8 +42,8 @@ struct Directory {
   std::string doubt{};  ///< why some may be missing; empty: all are there
 };
 
-/// Asks the library once a second to end what it is doing: a request may fall between two steps
-/// and be lost.
+/// Asks the library once a second to abort: a single request may fall between two steps and be
+/// lost.
 class Aborter {
  public:
   /// How often `Tick` is to be called.
@@ -73,11 +73,11 @@ class Receiver {
   /// Where it answered, on a serial port.
   const std::optional<KnownSetting>& setting() const { return setting_; }
 
-  /// Asked for once only.
+  /// Read once only.
   /// @throws Failure
   const Identity& Identify();
 
-  /// A number of EProtocol. Asked for only when the search did not tell it.
+  /// A number of EProtocol. Read only when the search did not find it out.
   /// @throws Failure
   unsigned Family();
 
@@ -88,7 +88,7 @@ class Receiver {
   /// Asks the receiver whether it still answers.
   bool Answers();
 
-  /// What a result other than S_OK makes: a cancellation after Ctrl-C, else a failure.
+  /// The failure for a result other than S_OK; a cancellation after Ctrl-C.
   Failure FailureOf(std::string tried, long code, std::string meaning = "") const;
 
   /// @throws Failure when Ctrl-C was pressed

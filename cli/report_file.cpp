@@ -56,13 +56,13 @@ ReportFile::ReportFile(Context& context) {
   const std::wstring path = folder + name;
   const std::string shown = Printable(path);
   if (Exists(path) && !context.arguments.force) {
-    Failure failure = LocalFailure("make the report " + shown, ERROR_FILE_EXISTS);
-    failure.meaning = "it exists already";
-    failure.hint = "--force replaces it, --report with another name keeps it.";
+    Failure failure = LocalFailure("create the report " + shown, ERROR_FILE_EXISTS);
+    failure.meaning = "it already exists";
+    failure.hint = "--force replaces it; --report with another name keeps it.";
     throw failure;
   }
   dump_hlp::CreateReportFile(name.c_str());
-  if (!Exists(path)) throw LocalFailure("make the report " + shown, ERROR_CANNOT_MAKE);
+  if (!Exists(path)) throw LocalFailure("create the report " + shown, ERROR_CANNOT_MAKE);
   path_ = path;
   WriteHeading();
   context.PrintStatus("The report is in " + shown + " (a hidden file).\n");

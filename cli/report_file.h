@@ -9,8 +9,8 @@
 
 namespace cli {
 
-/// While it lives, the library writes down what it does, when the command line asks for that. The
-/// report begins with the versions and the command line.
+/// While it lives, the library writes a trace of what it does, if the command line asks for one.
+/// The report begins with the versions and the command line.
 class ReportFile {
  public:
   /// @throws Failure when the file exists already and may not be overwritten, or cannot be made

@@ -21,18 +21,18 @@ struct KnownCode {
 
 const std::array kKnownCodes = {
     KnownCode{S_OK, "done"},
-    KnownCode{S_FALSE, "nothing was done: nothing found, aborted, or ended by the receiver"},
-    KnownCode{E_INVALIDARG, "an argument is not valid"},
+    KnownCode{S_FALSE, "no result: nothing found, aborted, or ended by the receiver"},
+    KnownCode{E_INVALIDARG, "invalid argument"},
     KnownCode{E_OUTOFMEMORY, "this computer is out of memory"},
-    KnownCode{E_NOTIMPL, "not offered by this receiver's family, or not by this version"},
+    KnownCode{E_NOTIMPL, "not supported by this receiver family or by this version"},
     KnownCode{E_FAIL, "internal failure"},
     KnownCode{E_UNEXPECTED, "unexpected kind of link"},
     KnownCode{HRESULT_FROM_WIN32(ERROR_DEVICE_NOT_CONNECTED),
               "no connection, no complete reply, or the receiver refused the command"},
-    KnownCode{HRESULT_FROM_WIN32(ERROR_TIMEOUT), "the receiver stayed silent"},
+    KnownCode{HRESULT_FROM_WIN32(ERROR_TIMEOUT), "the receiver did not answer in time"},
     KnownCode{HRESULT_FROM_WIN32(ERROR_FILE_NOT_FOUND), "it does not exist"},
     KnownCode{HRESULT_FROM_WIN32(ERROR_NOT_READY),
-              "the device behind it does not answer: switched off, or out of reach"},
+              "the device does not answer: switched off or out of reach"},
     KnownCode{HRESULT_FROM_WIN32(ERROR_ACCESS_DENIED), "access denied: in use, or not allowed"},
 };
 
@@ -59,10 +59,10 @@ std::string ExitCodeTable() {
   return "Exit codes:\n"
          "  0  done\n"
          "  1  the receiver refused, or the operation failed\n"
-         "  2  the command line makes no sense\n"
+         "  2  invalid command line\n"
          "  3  no receiver: none answered, or the port could not be opened\n"
          "  4  cancelled with Ctrl-C\n"
-         "  5  a file on this computer could not be written, or exists already\n";
+         "  5  a file of this computer could not be written, or already exists\n";
 }
 
 std::string MeaningOf(long code) {
@@ -72,7 +72,7 @@ std::string MeaningOf(long code) {
   const auto value = static_cast<unsigned long>(code);
   const bool is_win32 = (value & kWin32Mask) == kWin32Results;
   const std::string text = WindowsText(is_win32 ? value & ~kWin32Mask : value);
-  return text.empty() ? "a result that Windows has no words for" : text;
+  return text.empty() ? "unknown result code" : text;
 }
 
 long ResultOfWin32(unsigned long error) { return HRESULT_FROM_WIN32(error); }
@@ -84,12 +84,12 @@ std::string MeaningOf(const Failure& failure) {
 std::string HintOf(const Failure& failure) {
   if (!failure.hint.empty() || failure.exit == ExitCode::kCancelled) return failure.hint;
   if (!FindTroubleshooting(failure.code)) return "";
-  return "`rcvlink-cli explain " + HexCode(failure.code) + "` tells what to try.";
+  return "`rcvlink-cli explain " + HexCode(failure.code) + "` says what to try.";
 }
 
 std::string Describe(const Failure& failure) {
   const bool cancelled = failure.exit == ExitCode::kCancelled;
-  // A code that reads as a success is no help to a person; the meaning says what is the matter.
+  // A success code does not help the user; the meaning says what failed.
   const bool has_code = failure.code < 0;
   std::string text = "rcvlink-cli: ";
   if (!failure.port.empty()) text += failure.port + ": ";
@@ -99,7 +99,7 @@ std::string Describe(const Failure& failure) {
   if (has_code) text += HexCode(failure.code) + ", ";
   text += MeaningOf(failure) + "\n";
   if (!failure.kept.empty()) {
-    text += "  What came is kept in " + Printable(ToUtf16(failure.kept)) + "\n";
+    text += "  The received data is kept in " + Printable(ToUtf16(failure.kept)) + "\n";
   }
   if (const std::string hint = HintOf(failure); !hint.empty()) text += "  " + hint + "\n";
   return text;

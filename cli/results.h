@@ -1,5 +1,5 @@
 /// @file results.h
-/// What the program says and returns when something did not work.
+/// Failures: their messages and exit codes.
 #ifndef RCVLINK_CLI_RESULTS_H_
 #define RCVLINK_CLI_RESULTS_H_
 
@@ -34,7 +34,7 @@ struct Failure {
   long code = 0;          ///< the result code
   std::string meaning{};  ///< empty: `MeaningOf` says it
   std::string hint{};     ///< what the user can do about it; may be empty
-  std::string kept{};     ///< path of what came of a download nevertheless; may be empty
+  std::string kept{};     ///< path of the data that a failed download kept; may be empty
 };
 
 /// The meaning of a failure: its own, or that of its code.

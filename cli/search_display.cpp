@@ -10,7 +10,7 @@ SearchDisplay::SearchDisplay(Context& context, std::size_t ports)
       mode_(ProgressModeOf(context)),
       ports_(ports),
       start_ms_(GetTickCount64()) {
-  doing_ = ports_ == 1 ? "Searching" : "Asking " + std::to_string(ports_) + " ports";
+  doing_ = ports_ == 1 ? "Searching" : "Searching " + std::to_string(ports_) + " ports";
   if (mode_ != ProgressMode::kBar) return;
   ticker_.emplace(kInterval, [this] {
     const std::scoped_lock lock(mutex_);
@@ -66,9 +66,9 @@ void SearchDisplay::PrintFailure(const Failure& failure) {
 void SearchDisplay::Draw() {
   constexpr std::uint64_t kMsPerSecond = 1000;
   const std::string seconds = FormatDuration((GetTickCount64() - start_ms_) / kMsPerSecond);
-  // The last column stays free: a full line would wrap.
+  // The last column stays free, because a full line would wrap.
   const std::size_t width = context_.err.Width() - 1;
-  const std::string line = (doing_ + ", " + seconds + " (Ctrl-C ends it)").substr(0, width);
+  const std::string line = (doing_ + ", " + seconds + " (Ctrl-C stops it)").substr(0, width);
   context_.err.Write(Redrawn(line, drawn_width_));
   drawn_width_ = line.size();
 }

@@ -14,15 +14,14 @@
 
 namespace cli {
 
-/// The present try where a bar would be shown, with the time; else a line for each try, as --progress
-/// says.
-/// While it lives, all that the program prints goes through it. For any number of threads.
+/// Shows the current try and the time where a bar would be shown, otherwise one line per try, as
+/// --progress says. While it lives, all output of the program goes through it, from any thread.
 class SearchDisplay {
  public:
-  /// @param ports how many are searched side by side
+  /// @param ports how many are searched at the same time
   SearchDisplay(Context& context, std::size_t ports);
 
-  /// Takes the line away.
+  /// Erases the line.
   ~SearchDisplay();
   SearchDisplay(const SearchDisplay&) = delete;
   SearchDisplay& operator=(const SearchDisplay&) = delete;

@@ -45,7 +45,7 @@ std::optional<RtsMode> ParseRts(std::string_view word);
 /// The family that a word of `FamilyWord` stands for; nothing for any other word.
 std::optional<EProtocol> ParseFamily(std::string_view word);
 
-/// Reads `SETTING VALUE` of the command line; nothing when the words make no sense.
+/// Reads `SETTING VALUE` of the command line; nothing for other words.
 std::optional<SettingChange> ParseSetting(std::string_view setting, std::string_view value);
 
 /// "baud rate", "parity", "stop bits", "RTS line"

@@ -1,5 +1,5 @@
 /// @file sha256.h
-/// The SHA-256 of what passes by, computed by Windows.
+/// The SHA-256 of a stream of bytes, computed by Windows.
 #ifndef RCVLINK_CLI_SHA256_H_
 #define RCVLINK_CLI_SHA256_H_
 

@@ -30,7 +30,7 @@ std::vector<unsigned long> SpeedsToTry(EProtocol protocol, unsigned long port_sp
 
 std::string InWords(const LineSetting& line) {
   const std::string speed =
-      line.speed == 0 ? "the port's own speed" : std::to_string(line.speed) + " bit/s";
+      line.speed == 0 ? "the port's current speed" : std::to_string(line.speed) + " bit/s";
   return speed + ", RTS " + RtsWord(line.rts);
 }
 

@@ -43,8 +43,8 @@ struct Try {
 std::vector<EProtocol> FamiliesOf(EProtocol protocol);
 
 /// All tries, the most promising first: the known setting, the speeds that receivers usually have,
-/// that of the port, the rest. RTS that is always on serves nearly every cable, so its tries come
-/// before those of the other modes.
+/// that of the port, the rest. RTS always on works with nearly every cable, so it is tried before
+/// the other modes.
 /// @param port_speed the speed that the port has; 0: not known
 /// @param known where a receiver answered the last time on this port
 std::vector<Try> PlanSweep(EProtocol protocol,
@@ -60,7 +60,7 @@ class SweepPort {
   /// @return as `devapi::CreateReceiverOnSerial`
   virtual long Ask(const LineSetting& line, EProtocol family, void** receiver) = 0;
 
-  /// Is told of each try before it.
+  /// Called before each try.
   /// @param number counts from 1
   virtual void Begin(std::size_t number, std::size_t count, const LineSetting& line) = 0;
 
@@ -68,7 +68,7 @@ class SweepPort {
 };
 
 struct SweepResult {
-  long code = 0;  ///< S_OK, S_FALSE when nobody answered, or why the port is not to be had
+  long code = 0;             ///< S_OK, S_FALSE when nobody answered, or why the port cannot be used
   void* receiver = nullptr;  ///< the library's handle, to be closed
   KnownSetting setting{};    ///< where the receiver answered
 };

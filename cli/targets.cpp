@@ -22,7 +22,7 @@ bool NamesFolder(const Place& place) {
 
 Failure Refusal(const std::wstring& name, DWORD error, std::string meaning, std::string hint) {
   return {.exit = ExitCode::kLocalFile,
-          .tried = "keep " + Printable(name),
+          .tried = "save " + Printable(name),
           .code = ResultOfWin32(error),
           .meaning = std::move(meaning),
           .hint = std::move(hint)};
@@ -30,7 +30,7 @@ Failure Refusal(const std::wstring& name, DWORD error, std::string meaning, std:
 
 /// @throws Failure when no file can be made in the folder
 void CheckWritable(const std::filesystem::path& folder) {
-  const std::string tried = "make files in " + Printable(folder.native());
+  const std::string tried = "create files in " + Printable(folder.native());
   if (!IsFolder(folder)) throw LocalFailure(tried, ERROR_DIRECTORY);
   const std::wstring name = L"rcvlink-cli-" + std::to_wstring(GetCurrentProcessId()) + L".tmp";
   const std::filesystem::path probe = folder / name;
@@ -53,8 +53,10 @@ Targets::Targets(const Place& place) : force_(place.force) {
 
 void Targets::CheckFolder() const {
   if (!file_.empty() && !IsPlainFileName(file_.filename().native())) {
-    throw Refusal(
-        file_.native(), ERROR_INVALID_NAME, "no file of this computer can have that name", "");
+    throw Refusal(file_.native(),
+                  ERROR_INVALID_NAME,
+                  "the name is not a valid file name on this computer",
+                  "");
   }
   const std::filesystem::path existing = ExistingFolder();
   const std::filesystem::path parent = file_.parent_path();
@@ -62,7 +64,7 @@ void Targets::CheckFolder() const {
     throw Refusal(file_.native(),
                   ERROR_PATH_NOT_FOUND,
                   "there is no folder " + Printable(parent.native()),
-                  "Make it first, or choose another one with -o.");
+                  "Create the folder, or choose another one with -o.");
   }
   CheckWritable(existing);
 }
@@ -75,12 +77,12 @@ void Targets::CheckRoom(std::uint64_t bytes) const {
   throw Failure{.exit = ExitCode::kLocalFile,
                 .tried = "download into " + Printable(folder.native()),
                 .code = ResultOfWin32(ERROR_DISK_FULL),
-                .meaning = "there is room for " + FormatBytes(available.QuadPart) +
-                           ", but the files have " + FormatBytes(bytes),
-                .hint = "Make room, choose another disk with -o, or name fewer files."};
+                .meaning = "the disk has room for " + FormatBytes(available.QuadPart) +
+                           ", but the files need " + FormatBytes(bytes),
+                .hint = "Free some space, choose another disk with -o, or download fewer files."};
 }
 
-/// The folder of the targets, or the nearest one above that is there already.
+/// The folder of the targets, or the nearest parent that exists.
 std::filesystem::path Targets::ExistingFolder() const {
   std::filesystem::path folder = file_.empty() ? folder_ : file_.parent_path();
   folder = std::filesystem::absolute(folder.empty() ? L"." : folder);
@@ -88,7 +90,8 @@ std::filesystem::path Targets::ExistingFolder() const {
   while (!Exists(folder) && folder.parent_path() != folder) {
     const std::wstring name = folder.filename().native();
     if (!name.empty() && !IsPlainFileName(name)) {
-      throw Refusal(name, ERROR_INVALID_NAME, "no folder of this computer can have that name", "");
+      throw Refusal(
+          name, ERROR_INVALID_NAME, "the name is not a valid folder name on this computer", "");
     }
     folder = folder.parent_path();
   }
@@ -99,18 +102,19 @@ std::filesystem::path Targets::Choose(const std::wstring& name) {
   const std::filesystem::path target = FreePathOf(name);
   const std::string shown = Printable(target.native());
   if (Exists(target) && (!force_ || IsFolder(target))) {
-    throw Refusal(name,
-                  ERROR_FILE_EXISTS,
-                  shown + (IsFolder(target) ? " is a folder" : " exists already"),
-                  IsFolder(target) ? "" : "--force overwrites it, -o chooses another place.");
+    throw Refusal(
+        name,
+        ERROR_FILE_EXISTS,
+        shown + (IsFolder(target) ? " is a folder" : " already exists"),
+        IsFolder(target) ? "" : "--force overwrites it; -o chooses another folder or name.");
   }
   const std::filesystem::path part = target.native() + std::wstring(kPartSuffix);
   if (Exists(part) && (!force_ || IsFolder(part))) {
-    throw Refusal(name,
-                  ERROR_FILE_EXISTS,
-                  Printable(part.native()) + " exists already",
-                  "A download that was cut off left it, or another one is writing it; --force "
-                  "replaces it.");
+    throw Refusal(
+        name,
+        ERROR_FILE_EXISTS,
+        Printable(part.native()) + " already exists",
+        "An interrupted download left it, or another download is writing it; --force replaces it.");
   }
   chosen_.push_back(target);
   return target;
@@ -127,18 +131,18 @@ std::optional<std::filesystem::path> Targets::TakeExisting(const std::wstring& n
 std::filesystem::path Targets::FreePathOf(const std::wstring& name) const {
   const std::filesystem::path target = PathOf(name);
   if (!IsTaken(target)) return target;
-  throw Refusal(
-      name,
-      ERROR_FILE_EXISTS,
-      Printable(target.native()) + " is the place of another file of this download already",
-      "Download it by itself, with -o and another name.");
+  throw Refusal(name,
+                ERROR_FILE_EXISTS,
+                Printable(target.native()) + " is already used for another file of this download",
+                "Download this file separately, with -o and another name.");
 }
 
 std::filesystem::path Targets::PathOf(const std::wstring& name) const {
   if (!file_.empty()) return file_;
   const auto local = SafeLocalName(name);
   if (!local) {
-    throw Refusal(name, ERROR_INVALID_NAME, "no file of this computer can have that name", "");
+    throw Refusal(
+        name, ERROR_INVALID_NAME, "the name is not a valid file name on this computer", "");
   }
   return folder_ / *local;
 }

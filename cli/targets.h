@@ -11,7 +11,7 @@
 
 namespace cli {
 
-/// What the user said about the place of the downloads.
+/// Where the user wants the downloads.
 struct Place {
   std::wstring output{};  ///< a folder or a file; may be empty
   bool many = false;      ///< more than one download: `output` is a folder
@@ -23,11 +23,11 @@ class Targets {
  public:
   explicit Targets(const Place& place);
 
-  /// Looks whether files can be made where they are to go. Makes nothing that stays.
+  /// Checks whether files can be made in the folder. Leaves nothing there.
   /// @throws Failure
   void CheckFolder() const;
 
-  /// Looks whether the disk has room for so many bytes.
+  /// Checks whether the disk has room for so many bytes.
   /// @throws Failure
   void CheckRoom(std::uint64_t bytes) const;
 
@@ -36,8 +36,8 @@ class Targets {
   ///         be overwritten, or an earlier name has taken it
   std::filesystem::path Choose(const std::wstring& name);
 
-  /// The file for a name of the receiver when it is there already, nothing otherwise. Later names
-  /// cannot have it.
+  /// The existing file for a name of the receiver; nothing when there is none. Later names cannot
+  /// use it.
   /// @throws Failure when the name is impossible, or an earlier name has taken the file
   std::optional<std::filesystem::path> TakeExisting(const std::wstring& name);
 

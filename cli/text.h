@@ -24,10 +24,10 @@ std::string HexCode(long code);
 /// Hexadecimal digits in capitals, at least `digits` of them.
 std::string Hex(unsigned long value, std::size_t digits);
 
-/// In small letters, as far as they are of ASCII.
+/// In lower case, ASCII letters only.
 std::string Lowered(std::string text);
 
-/// How many letters have to be added, taken away or changed to make one word the other.
+/// How many letters have to be added, removed or changed to turn one word into the other.
 std::size_t ChangesBetween(std::string_view first, std::string_view second);
 
 std::string PadLeft(std::string text, std::size_t width);
@@ -37,7 +37,7 @@ std::string PadRight(std::string text, std::size_t width);
 /// over what was there.
 std::string Redrawn(const std::string& line, std::size_t width);
 
-/// Takes away a line of that width.
+/// Erases a line of that width.
 std::string Erased(std::size_t width);
 
 }  // namespace cli

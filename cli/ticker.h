@@ -1,5 +1,5 @@
 /// @file ticker.h
-/// Something done again and again while the main thread is inside the library.
+/// A function that is called periodically while the main thread is inside the library.
 #ifndef RCVLINK_CLI_TICKER_H_
 #define RCVLINK_CLI_TICKER_H_
 

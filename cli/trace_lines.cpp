@@ -66,7 +66,7 @@ std::optional<Stamp> StampAt(std::string_view text) {
 
 bool IsBeyondAscii(char character) { return static_cast<signed char>(character) < 0; }
 
-/// Takes the line end off.
+/// Removes the line end.
 bool Trim(std::string& bytes) {
   const bool has_end = bytes.ends_with('\n');
   if (has_end) bytes.pop_back();
@@ -78,7 +78,7 @@ bool Trim(std::string& bytes) {
 
 TraceLines SplitTrace(std::string_view report) {
   TraceLines result;
-  bool may_begin = true;  // a stamp may stand here
+  bool may_begin = true;  // a stamp may begin here
   bool is_cut = false;    // the line has bytes beyond ASCII, so its end may be missing
   std::size_t position = 0;
   while (position < report.size()) {

@@ -14,18 +14,18 @@ namespace cli {
 struct TraceLine {
   std::uint32_t ms_of_day = 0;
   std::uint32_t thread = 0;
-  std::string bytes{};   ///< behind the stamp, without the line end; in the writer's code page
+  std::string bytes{};   ///< after the stamp, without the line end; in the writer's code page
   bool has_end = false;  ///< whether there was a line end
 };
 
 struct TraceLines {
   std::vector<TraceLine> lines{};
-  std::size_t bytes_before = 0;  ///< how many bytes stand in front of the first stamp
+  std::size_t bytes_before = 0;  ///< how many bytes come before the first stamp
 };
 
-/// Takes a report apart at its stamps, "hh:mm:ss.mmmm thread ". Lines without a stamp belong to the
-/// one before: receivers' replies have line ends in them. A line with bytes beyond ASCII may have
-/// lost its end, so that the next stamp stands in it.
+/// Splits a report at its stamps, "hh:mm:ss.mmmm thread ". Lines without a stamp belong to the one
+/// before: receivers' replies have line ends in them. A line with bytes beyond ASCII may have lost
+/// its end, so that the next stamp stands in it.
 TraceLines SplitTrace(std::string_view report);
 
 }  // namespace cli

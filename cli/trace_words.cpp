@@ -17,27 +17,27 @@ struct Pattern {
   std::string_view meaning;  ///< %1 is the text of the first *
 };
 
-// The first that fits counts.
+// The first one that matches counts.
 constexpr std::array kPatterns = {
     Pattern{"rcvlink-cli *, rcvlink.dll *", TraceKind::kNote, "rcvlink-cli %1, rcvlink.dll %2"},
-    Pattern{"command line: *", TraceKind::kNote, "started as: %1"},
+    Pattern{"command line: *", TraceKind::kNote, "command line: %1"},
     Pattern{"Module is loaded [*] [*]", TraceKind::kNote, "the library is loaded, version %2"},
     Pattern{"Bye!", TraceKind::kNote, "the library is unloaded"},
 
     Pattern{"OpenReceiver - ref [*] [*]",
             TraceKind::kHost,
-            "opens the receiver on %2 once more (%1 users)"},
+            "opens the receiver on %2 again (%1 users)"},
     Pattern{"CloseReceiver - removed [*]", TraceKind::kHost, "closes the receiver on %1"},
     Pattern{"CloseReceiver - ref [*] [*]",
             TraceKind::kHost,
-            "closes the receiver on %2, which %1 others still use"},
+            "closes the receiver on %2, which still has %1 users"},
     Pattern{"CloseReceiver - receiver not found [*]",
             TraceKind::kFailure,
-            "closes a receiver that there is not"},
-    Pattern{"DestroyReceiver - removed [*]", TraceKind::kHost, "throws the receiver on %1 out"},
+            "closes a receiver that is not open"},
+    Pattern{"DestroyReceiver - removed [*]", TraceKind::kHost, "removes the receiver on %1"},
     Pattern{"SearchReceiver - receiver already exists [*]",
             TraceKind::kHost,
-            "searches on %1, where a receiver is open already"},
+            "searches on %1, where a receiver is already open"},
     Pattern{"SearchReceiver - *failed[*] [0x*]", TraceKind::kFailure, "the search on %2 failed"},
     Pattern{"CreateReceiverOnSerial - opening serial port [*]",
             TraceKind::kHost,
@@ -49,15 +49,15 @@ constexpr std::array kPatterns = {
     Pattern{"CAbstractReceiver::CheckConnection",
             TraceKind::kHost,
             "checks whether the receiver answers"},
-    Pattern{"CAbstractReceiver::GetReceiverInfo", TraceKind::kHost, "wants model and id"},
-    Pattern{"CAbstractReceiver::GetFiles", TraceKind::kHost, "wants the list of files"},
+    Pattern{"CAbstractReceiver::GetReceiverInfo", TraceKind::kHost, "reads model and id"},
+    Pattern{"CAbstractReceiver::GetFiles", TraceKind::kHost, "reads the list of files"},
     Pattern{"CAbstractReceiver::DownloadFile", TraceKind::kHost, "downloads a file"},
     Pattern{"CAbstractReceiver::UploadFile", TraceKind::kHost, "uploads a file"},
     Pattern{"CAbstractReceiver::DeleteFile", TraceKind::kHost, "deletes a file"},
     Pattern{"CAbstractReceiver::RenameFile", TraceKind::kHost, "renames a file"},
     Pattern{"CAbstractReceiver::Abort",
             TraceKind::kCancel,
-            "aborts whatever runs (closing does that too)"},
+            "aborts the running operation (closing does so too)"},
     Pattern{"CAbstractReceiver::DCSetRcvBaudrate", TraceKind::kHost, "sets the receiver's speed"},
     Pattern{"CAbstractReceiver::DCSetRcvRTSControl", TraceKind::kHost, "sets the receiver's RTS"},
     Pattern{"CAbstractReceiver::DCSetRcvParity", TraceKind::kHost, "sets the receiver's parity"},
@@ -66,7 +66,7 @@ constexpr std::array kPatterns = {
 
     Pattern{"SearchReceiverOnSerial - try current port speed [*]",
             TraceKind::kLink,
-            "tries %1 at the speed that it has"},
+            "tries %1 at its current speed"},
     Pattern{"SearchReceiverOnSerial - try speed [*] [*]", TraceKind::kLink, "tries %2 at %1 bit/s"},
     Pattern{"*try RTS control is * [*]", TraceKind::kLink, "tries %3 with RTS: %2"},
     Pattern{
@@ -76,7 +76,7 @@ constexpr std::array kPatterns = {
     Pattern{"CSerialConnection::Open - OK [*]", TraceKind::kLink, "%1 is open"},
     Pattern{"CSerialConnection::SetSpeed - changing of baudrate [* -> *]",
             TraceKind::kLink,
-            "this computer's port goes from %1 to %2 bit/s"},
+            "this computer's port changes from %1 to %2 bit/s"},
     Pattern{"CSerialConnection::Flush - error detected [*] [*]",
             TraceKind::kFailure,
             "the line of %2 has an error: %1"},
@@ -84,18 +84,18 @@ constexpr std::array kPatterns = {
     Pattern{"CUSBConnection::Create - OK [*]", TraceKind::kLink, "%1 is open"},
     Pattern{"CUSBConnection::Create - DeviceIoControl(*) is failed [*] [*",
             TraceKind::kFailure,
-            "the USB device could not be configured; it is tried all the same"},
+            "the USB device could not be configured; it is used anyway"},
     Pattern{"CUSBConnection::DumpDriveErrorDesc - * [*]",
             TraceKind::kFailure,
             "the USB driver failed: %1"},
     Pattern{"CUSBConnection::Create", TraceKind::kLink, "opens the USB device"},
     Pattern{"CUSBConnection::Disconnect", TraceKind::kLink, "closes the USB device"},
     Pattern{"CAbstractConnection::Disconnect - disconnected [*]", TraceKind::kLink, "%1 is closed"},
-    Pattern{"CAbstractConnection::Cancel []", TraceKind::kCancel, "nothing waits yet"},
-    Pattern{"CAbstractConnection::Cancel [*]", TraceKind::kCancel, "ends what waits on %1"},
-    Pattern{"C*Connection::Flush", TraceKind::kSend, "what came before is dropped"},
+    Pattern{"CAbstractConnection::Cancel []", TraceKind::kCancel, "nothing is waiting"},
+    Pattern{"CAbstractConnection::Cancel [*]", TraceKind::kCancel, "ends the wait on %1"},
+    Pattern{"C*Connection::Flush", TraceKind::kSend, "discards what came before"},
     Pattern{
-        "Create*- looking for * receiver [*]", TraceKind::kLink, "is there a %2 receiver on %3?"},
+        "Create*- looking for * receiver [*]", TraceKind::kLink, "looks for a %2 receiver on %3"},
     Pattern{"Create*- * receiver found [*]", TraceKind::kDone, "a %2 receiver answers on %3"},
     Pattern{"Create*- OK [*]", TraceKind::kDone, "the receiver on %2 is ready"},
 
@@ -112,13 +112,13 @@ constexpr std::array kPatterns = {
             "waits %1 ms at most"},
     Pattern{"CAbstractConnection::Read - wait timeout [*]",
             TraceKind::kTimeout,
-            "nothing came on %1 in time"},
+            "no data on %1 in time"},
     Pattern{"CAbstractConnection::Read - GetOverlappedResult is failed [1460] [*]",
             TraceKind::kTimeout,
-            "nothing came on %1 in time"},
+            "no data on %1 in time"},
     Pattern{"CAbstractConnection::Write - wait timeout [*] [*]",
             TraceKind::kTimeout,
-            "%2 did not take what was sent in time"},
+            "%2 did not take the data in time"},
     Pattern{"CAbstractConnection::Read - *failed [*] [*]",
             TraceKind::kFailure,
             "reading from %3 failed"},
@@ -127,29 +127,29 @@ constexpr std::array kPatterns = {
             "writing to %3 failed"},
     Pattern{"*::DumpInvalidResponse - [*] [*] [*]",
             TraceKind::kFailure,
-            "refused, or not complete. The receiver said: %3"},
+            "refused or incomplete. The receiver sent: %3"},
     Pattern{"*::DumpInvalidResponse - [*] [*]", TraceKind::kFailure, "the command failed on %3"},
     Pattern{"*::CheckConnection - ping cmd failed [*] [*]",
             TraceKind::kFailure,
             "no receiver answers on %3"},
     Pattern{"CVelmarCommand::Execute - read failed [*]",
             TraceKind::kFailure,
-            "the reply did not come whole"},
+            "the reply is incomplete"},
     Pattern{"CVelmarCommand::Execute - unknown response type",
             TraceKind::kFailure,
-            "the reply is of no kind that is known"},
+            "the reply is of an unknown kind"},
     Pattern{"*::DownloadFile - receiver speed up is failed [*]",
             TraceKind::kFailure,
-            "the receiver's speed could not be raised; the download goes on without"},
+            "the receiver's speed could not be raised; the download continues at the old speed"},
     Pattern{"*::DownloadFile - host speed up is failed [*]",
             TraceKind::kFailure,
-            "this computer's speed could not be raised; the download goes on without"},
+            "this computer's speed could not be raised; the download continues at the old speed"},
     Pattern{"*::DownloadFile - download [*] is failed [0x*]",
             TraceKind::kFailure,
             "the download of %2 failed"},
     Pattern{"*::DownloadFile - file [*] size is zero",
             TraceKind::kFailure,
-            "the receiver says that %2 is empty, or does not tell its size"},
+            "the receiver reports size 0 or no size for %2"},
     Pattern{"*::DownloadFile - file size [*] is * bytes", TraceKind::kReply, "%2 has %3 bytes"},
     Pattern{"*::DownloadOver* - read timeout*", TraceKind::kBlocks, "a block is missing"},
     Pattern{
@@ -159,14 +159,14 @@ constexpr std::array kPatterns = {
             "the receiver ended the transfer"},
     Pattern{"*::DownloadOver* - recognisable byte is not recognised",
             TraceKind::kFailure,
-            "a block of a kind that is not known"},
+            "a block of an unknown type"},
     Pattern{"*::DownloadOver* - out of sequence", TraceKind::kFailure, "a block out of sequence"},
     Pattern{"*::DownloadOver* - eob character is missed",
             TraceKind::kFailure,
-            "a block without its end byte"},
+            "a block without an end byte"},
     Pattern{"*::DownloadOver* - cheksum missmatch",
             TraceKind::kFailure,
-            "a block whose checksum does not fit"},
+            "a block with a wrong checksum"},
     Pattern{"*::DownloadOver* - write to stream failed [*]",
             TraceKind::kFailure,
             "the file on this computer could not be written"},
@@ -186,41 +186,39 @@ struct CommandText {
 };
 
 constexpr std::array kCommands = {
-    CommandText{"CEchoOffCmd", TraceFamily::kUnknown, "stop echoing: #OFF#"},
-    CommandText{"CDisableEchoCmd", TraceFamily::kUnknown, "no echo on the port: set,...echo"},
-    CommandText{"CPingCmd", TraceFamily::kUnknown, "do you answer? (an empty line)"},
-    CommandText{"CGetPortCmd", TraceFamily::kUnknown, "which port is this? print,/cur/term"},
-    CommandText{"CGetFileListCmd",
-                TraceFamily::kQuorin,
-                "which files are there? print,/log/&[name,size,time]"},
-    CommandText{"CGetFileListCmd", TraceFamily::kVelmar, "which files are there? log direnta once"},
-    CommandText{"CGetFileListCmd", TraceFamily::kUnknown, "which files are there?"},
+    CommandText{"CEchoOffCmd", TraceFamily::kUnknown, "turn the echo off: #OFF#"},
+    CommandText{"CDisableEchoCmd", TraceFamily::kUnknown, "turn the port's echo off: set,...echo"},
+    CommandText{"CPingCmd", TraceFamily::kUnknown, "ping (an empty line)"},
+    CommandText{"CGetPortCmd", TraceFamily::kUnknown, "read the port: print,/cur/term"},
+    CommandText{
+        "CGetFileListCmd", TraceFamily::kQuorin, "list the files: print,/log/&[name,size,time]"},
+    CommandText{"CGetFileListCmd", TraceFamily::kVelmar, "list the files: log direnta once"},
+    CommandText{"CGetFileListCmd", TraceFamily::kUnknown, "list the files"},
     CommandText{"CDeleteFileCmd", TraceFamily::kQuorin, "delete the file: remove,NAME"},
     CommandText{"CDeleteFileCmd", TraceFamily::kVelmar, "delete the file: del file NAME"},
     CommandText{"CDeleteFileCmd", TraceFamily::kUnknown, "delete the file"},
     CommandText{"CGetFileCmd", TraceFamily::kUnknown, "send the file: get,NAME"},
     CommandText{
-        "CGetFileSizeCmd", TraceFamily::kUnknown, "how large is the file? print,/log/NAME&size"},
-    CommandText{"CGetReceiverIDCmd", TraceFamily::kUnknown, "what is your id? print,/par/rcvid"},
+        "CGetFileSizeCmd", TraceFamily::kUnknown, "read the file size: print,/log/NAME&size"},
+    CommandText{"CGetReceiverIDCmd", TraceFamily::kUnknown, "read the id: print,/par/rcvid"},
     CommandText{
-        "CGetReceiverModelCmd", TraceFamily::kUnknown, "what model are you? print,/par/rcv/model"},
-    CommandText{"CSetBoudRateCmd",
-                TraceFamily::kUnknown,
-                "go back to the speed of before: set,cur/term/rate"},
-    CommandText{"CGetReceiverInfoCmd",
-                TraceFamily::kUnknown,
-                "what model are you, and what is your id? log versiona once"},
-    CommandText{"CGetFileHeaderCmd", TraceFamily::kUnknown, "how large is the file? log filehdra"},
+        "CGetReceiverModelCmd", TraceFamily::kUnknown, "read the model: print,/par/rcv/model"},
     CommandText{
-        "CLogConfigCommand", TraceFamily::kUnknown, "how is the port set? log comconfiga once"},
+        "CSetBoudRateCmd", TraceFamily::kUnknown, "return to the old speed: set,cur/term/rate"},
+    CommandText{
+        "CGetReceiverInfoCmd", TraceFamily::kUnknown, "read model and id: log versiona once"},
+    CommandText{"CGetFileHeaderCmd", TraceFamily::kUnknown, "read the file size: log filehdra"},
+    CommandText{
+        "CLogConfigCommand", TraceFamily::kUnknown, "read the port settings: log comconfiga once"},
     CommandText{"CReadFileCmd", TraceFamily::kUnknown, "send the file: log filetransferb"},
     CommandText{"CRenameFileCmd", TraceFamily::kUnknown, "rename the file: rename OLD NEW"},
     CommandText{"CSetPortParamsCmd", TraceFamily::kUnknown, "set the port: COM SPEED ..."},
-    CommandText{
-        "CSetInterfacemodeCommand", TraceFamily::kUnknown, "talk this language: interfacemode"},
+    CommandText{"CSetInterfacemodeCommand",
+                TraceFamily::kUnknown,
+                "set the language of the port: interfacemode"},
 };
 
-/// The texts that stand for the stars; nothing when the pattern does not fit. The last bracket may be
+/// The texts that the stars match; nothing when the pattern does not match. The last bracket may be
 /// open: a line with bytes beyond ASCII loses its end.
 std::optional<std::vector<std::string_view>> Match(std::string_view pattern,
                                                    std::string_view line) {
@@ -276,7 +274,7 @@ std::string Filled(std::string_view meaning, const std::vector<std::string_view>
   return filled;
 }
 
-/// The number in the brackets that open at `open`; what Windows gives is told in decimal.
+/// The code in the brackets that open at `open`. Windows errors are decimal.
 std::optional<long> CodeIn(std::string_view line, std::size_t open) {
   constexpr std::size_t kHexLength = 10;  // 0x8007048F
   constexpr std::size_t kLongestError = 5;
@@ -291,8 +289,8 @@ std::optional<long> CodeIn(std::string_view line, std::size_t open) {
   return code && is_error ? ResultOfWin32(static_cast<unsigned long>(*code)) : code;
 }
 
-/// The result code of a line that tells a failure. It comes first where a receiver's text follows,
-/// otherwise last or before the port's name.
+/// The result code of a line that reports a failure. It comes first where a receiver's text
+/// follows, otherwise last or before the port's name.
 std::optional<long> CodeOf(std::string_view line) {
   constexpr std::string_view kResponse = "::DumpInvalidResponse - [";
   const std::size_t response = line.find(kResponse);

@@ -10,29 +10,29 @@
 namespace cli {
 
 enum class TraceKind {
-  kNote,     ///< nothing that is known, or about the report itself
+  kNote,     ///< unknown, or about the report itself
   kHost,     ///< the program calls the library
   kLink,     ///< a port is opened, set or closed
   kLock,     ///< a receiver is locked or unlocked
   kCommand,  ///< a command for the receiver
-  kSend,     ///< the line is emptied and the command sent
+  kSend,     ///< the line is cleared and the command sent
   kRead,     ///< the reply is waited for
   kReply,    ///< it came
   kBlocks,   ///< the blocks of a file
-  kRetry,    ///< a block is asked for again
-  kTimeout,  ///< silence
+  kRetry,    ///< a block is requested again
+  kTimeout,  ///< no data came in time
   kFailure,
   kCancel,
   kDone,
 };
 
-/// "command": what programs are given.
+/// "command": the word in JSON.
 std::string_view NameOf(TraceKind kind);
 
 struct TraceWords {
   TraceKind kind = TraceKind::kNote;
   std::string meaning{};
-  std::optional<long> code{};  ///< the result code that the line tells
+  std::optional<long> code{};  ///< the result code in the line
 };
 
 /// @param line a line without its stamp, printable
@@ -46,7 +46,7 @@ TraceFamily FamilyOf(std::string_view line);
 /// What a command asks for, and its text on the wire, by the name of its class.
 std::string CommandMeaning(std::string_view class_name, TraceFamily family);
 
-/// The class of a line that tells that a command was made; empty for another line.
+/// The class of the command that a line reports as made; empty for other lines.
 std::string_view CommandClass(std::string_view line);
 
 }  // namespace cli

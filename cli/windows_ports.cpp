@@ -1,4 +1,4 @@
-// What Windows itself tells of ports: the registry, the names of devices, and SetupAPI.
+// The ports and devices that Windows knows, from the registry, the device names, and SetupAPI.
 #include <windows.h>
 
 #include <objbase.h>
@@ -66,7 +66,7 @@ std::wstring PropertyOf(HDEVINFO devices, SP_DEVINFO_DATA& device, DWORD propert
   return read != FALSE ? TextOf(value, size) : std::wstring();
 }
 
-/// Windows' words for a device: its own name where it has one, else that of its kind.
+/// The name of a device: its own where it has one, otherwise that of its kind.
 std::wstring WordsOf(HDEVINFO devices, SP_DEVINFO_DATA& device) {
   const std::wstring name = PropertyOf(devices, device, SPDRP_FRIENDLYNAME);
   return name.empty() ? PropertyOf(devices, device, SPDRP_DEVICEDESC) : name;
@@ -90,7 +90,7 @@ std::wstring PathOf(HDEVINFO devices,
   return told != FALSE ? std::wstring(detail->DevicePath) : std::wstring();
 }
 
-/// Those classes of interfaces that devices have registered.
+/// The interface classes that devices have registered.
 std::vector<GUID> InterfaceClasses() {
   std::vector<GUID> classes;
   const UniqueKey key =

@@ -14,8 +14,8 @@ die() {
   exit 1
 }
 
-# One run at a time in a build folder: the Wine prefix and the ports are shared. What may outlive
-# this script must not inherit the lock, so commands are started through `unlocked`.
+# Only one run at a time in a build folder, because the Wine prefix and the ports are shared. A process
+# that may outlive this script must not inherit the lock, so commands are started with `unlocked`.
 take_lock() {
   exec {lock_fd}>"$build/.lock"
   if ! flock -n "$lock_fd"; then
@@ -28,17 +28,17 @@ unlocked() {
   "$@" {lock_fd}>&-
 }
 
-# logged LOG COMMAND...: keeps the output in a file, and shows its end only when the command fails.
+# logged LOG COMMAND...: writes the output to a file, and shows its end only if the command fails.
 logged() {
   local log="$1"
   shift
   if ! unlocked "$@" >>"$log" 2>&1 </dev/null; then
     tail -n 120 "$log" >&2
-    die "failed: $* (the whole output is in ${log#"$root"/})"
+    die "failed: $* (the full output is in ${log#"$root"/})"
   fi
 }
 
-# build_preset LOG PRESET WITH_TESTS [TARGET...]: all targets when none is named.
+# build_preset LOG PRESET WITH_TESTS [TARGET...]: builds all targets if none is named.
 build_preset() {
   local log="$1" preset="$2" with_tests="$3"
   shift 3

@@ -34,7 +34,7 @@ if [ ${#missing[@]} -eq 0 ]; then
 fi
 
 if [ "$(id -u)" -ne 0 ]; then
-  echo "these packages are missing, and only root can install them:" >&2
+  echo "Packages are missing, and only root can install them. Run this as root:" >&2
   echo "  apt-get install --no-install-recommends ${missing[*]}" >&2
   exit 1
 fi

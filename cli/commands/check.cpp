@@ -39,8 +39,8 @@ class Check : public Command {
 std::unique_ptr<Command> MakeCheck() {
   return std::make_unique<Check>(
       Command::Text{"check",
-                    "Ask whether the receiver still answers",
-                    "Example: rcvlink-cli check COM7 --speed 115200 && echo it does"});
+                    "Check whether the receiver answers",
+                    "Example: rcvlink-cli check COM7 --speed 115200 && echo connected"});
 }
 
 }  // namespace cli

@@ -13,8 +13,8 @@ constexpr std::string_view kStart =
     param($wordToComplete, $commandAst, $cursorPosition)
 )";
 
-// A COM port is asked for only by a command that is there already; what is no port is left to the
-// completion of file names.
+// COM ports are offered only after a command. All other words are left to the completion of file
+// names.
 constexpr std::string_view kEnd =
     R"(    $typed = @($commandAst.CommandElements | Select-Object -Skip 1 | ForEach-Object { "$_" })
     $command = $typed | Where-Object { $commands.Contains($_) } | Select-Object -First 1
@@ -34,7 +34,7 @@ constexpr std::string_view kEnd =
 }
 )";
 
-/// A string of PowerShell in which nothing has a meaning.
+/// A literal string of PowerShell.
 std::string Quoted(const std::string& text) {
   std::string quoted = "'";
   for (const char character : text) quoted.append(character == '\'' ? 2 : 1, character);
@@ -75,8 +75,8 @@ class Completion : public Command {
 std::unique_ptr<Command> MakeCompletion() {
   return std::make_unique<Completion>(
       Command::Text{"completion",
-                    "Print the script that completes commands in PowerShell",
-                    "Example, for the file that $PROFILE names:\n"
+                    "Print a script that completes commands in PowerShell",
+                    "Example, a line for the file named by $PROFILE:\n"
                     "  rcvlink-cli completion | Out-String | Invoke-Expression"});
 }
 

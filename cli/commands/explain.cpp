@@ -13,11 +13,8 @@ class Explain : public Command {
   using Command::Command;
 
   void AddOptions(CLI::App& app, Arguments& /*arguments*/) override {
-    AddText(app,
-            "CODE",
-            "A result code, such as 0x8007048F; without one all that are explained are listed",
-            "",
-            code_);
+    AddText(
+        app, "CODE", "Result code, such as 0x8007048F; without it all codes are listed", "", code_);
   }
 
   void Check() const override {
@@ -44,8 +41,8 @@ class Explain : public Command {
     const std::string title = entry ? entry->title : cli::MeaningOf(code);
     const std::string text =
         entry ? entry->text
-              : "There is no entry for it; that is what Windows says. With --report NAME the "
-                "library writes down what it does.\n";
+              : "This code has no entry; the title is the text of Windows. Run the command again "
+                "with --report NAME for a trace of the library.\n";
     context.PrintResult(HexCode(code) + " " + title + "\n\n" + text);
     return {.document = {{"code", HexCode(code)}, {"title", title}, {"text", text}}};
   }
@@ -57,7 +54,7 @@ class Explain : public Command {
 
 std::unique_ptr<Command> MakeExplain() {
   return std::make_unique<Explain>(Command::Text{"explain",
-                                                 "Explain a result code, and what to try",
+                                                 "Explain a result code and say what to try",
                                                  "Examples:\n"
                                                  "  rcvlink-cli explain 0x8007048F\n"
                                                  "  rcvlink-cli explain"});

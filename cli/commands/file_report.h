@@ -18,14 +18,14 @@ class FileReport {
   /// @param details what JSON says of it besides its name
   void AddDone(const std::wstring& name, const Json& details);
 
-  /// Records a file that failed, and tells the user.
+  /// Records a file that failed, and prints the failure.
   void AddFailed(const std::wstring& name, Failure failure);
 
   /// Records that the command ended early.
   void AddUntried(std::size_t count);
 
-  /// Records whether the receiver's list of files had all of them.
-  /// @param doubt why not; empty when it had
+  /// Records whether the receiver's file list was complete.
+  /// @param doubt why not; empty when it was
   void SetComplete(const std::string& doubt);
 
   /// The command's end: that of the first failure, or of the cancellation.

@@ -21,13 +21,13 @@ std::string InWords(const std::wstring& port, const Receiver& receiver, const Id
          " receiver, model " + Printable(identity.model) + ", id " + Printable(identity.id) + "\n";
 }
 
-/// What became of the search on one of several ports.
+/// The result of the search on one of several ports.
 struct Answer {
   Json receiver{};  ///< null when there is none
   std::optional<Failure> failure{};
 };
 
-/// Searches one of several ports, on a thread of its own, and says at once what came of it.
+/// Searches one of several ports, on a thread of its own, and prints the result at once.
 Answer Ask(Context& context, const SearchPlace& place, SearchDisplay& display) {
   Failure failure;
   try {
@@ -79,13 +79,13 @@ class Find : public Command {
   void AddOptions(CLI::App& app, Arguments& arguments) override {
     read_ = &arguments;
     AddPort(app, arguments, Need::kOptional);
-    AddNames(app, "MORE", "Further ports, to be searched side by side", more_, 0, kMostNames);
-    AddFlag(app, "--all", "Every COM port and USB device of this computer", all_);
+    AddNames(app, "MORE", "More ports, searched at the same time", more_, 0, kMostNames);
+    AddFlag(app, "--all", "Search every COM port and USB device", all_);
   }
 
   void Check() const override {
     if (all_ != read_->port.empty()) {
-      throw UsageError("find needs either the names of ports or --all");
+      throw UsageError("find needs either port names or --all");
     }
   }
 
@@ -102,10 +102,11 @@ class Find : public Command {
   Outcome FindOnMany(Context& context) const {
     const std::vector<SearchPlace> places = all_ ? AllPlaces() : NamedPlaces(context.arguments);
     if (places.empty()) {
-      throw Failure{.exit = ExitCode::kNoReceiver,
-                    .tried = "find a receiver",
-                    .code = ResultOfWin32(ERROR_FILE_NOT_FOUND),
-                    .meaning = "this computer has no COM ports, and no device of the USBIO driver"};
+      throw Failure{
+          .exit = ExitCode::kNoReceiver,
+          .tried = "find a receiver",
+          .code = ResultOfWin32(ERROR_FILE_NOT_FOUND),
+          .meaning = "this computer has no COM port and no USB device with the USBIO driver"};
     }
     const std::vector<Answer> answers = AskAll(context, places);
     const Outcome outcome = OutcomeOf(answers, context.interrupt.requested());
@@ -119,7 +120,7 @@ class Find : public Command {
     return places;
   }
 
-  /// A COM port is on a serial line whatever --link says, so that both links can be named together.
+  /// A COM port is serial whatever --link says, so that ports of both links can be named together.
   std::vector<SearchPlace> NamedPlaces(const Arguments& arguments) const {
     std::vector<std::wstring> names = {arguments.port};
     std::transform(more_.begin(), more_.end(), std::back_inserter(names), PlainPortName);
@@ -141,17 +142,16 @@ class Find : public Command {
 }  // namespace
 
 std::unique_ptr<Command> MakeFind() {
-  return std::make_unique<Find>(
-      Command::Text{"find",
-                    "Find the receiver on a port, or on all",
-                    "Without --speed or --rts all settings are tried, the usual ones first, which "
-                    "takes minutes on\n"
-                    "a silent port. What was found is remembered, and tried first the next time.\n"
-                    "Asking writes to whatever is connected: --all does so on every port.\n"
-                    "Examples:\n"
-                    "  rcvlink-cli find COM7\n"
-                    "  rcvlink-cli find COM7 --protocol quorin --speed 115200\n"
-                    "  rcvlink-cli find --all --speed 9600"});
+  return std::make_unique<Find>(Command::Text{
+      "find",
+      "Find the receiver on one port or on all ports",
+      "Without --speed or --rts all settings are tried, the usual ones first. On a silent\n"
+      "port this takes minutes. The setting found is saved and tried first the next time.\n"
+      "A search writes to the device that is connected; --all writes to every port.\n"
+      "Examples:\n"
+      "  rcvlink-cli find COM7\n"
+      "  rcvlink-cli find COM7 --protocol quorin --speed 115200\n"
+      "  rcvlink-cli find --all --speed 9600"});
 }
 
 }  // namespace cli

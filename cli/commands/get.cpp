@@ -48,7 +48,7 @@ struct Job {
   std::filesystem::path target;
 };
 
-/// One execution of `get`. A file that cannot be had or kept stops no other.
+/// One execution of `get`. A file that cannot be downloaded or saved does not stop the others.
 class GetRun {
  public:
   GetRun(Context& context, const GetOptions& options)
@@ -60,7 +60,7 @@ class GetRun {
         report_(context) {}
 
   Outcome Run() {
-    // What is wrong on this computer is told before a search that may take minutes.
+    // Errors on this computer are reported before a search that may take minutes.
     if (!options_.IsStream()) targets_.CheckFolder();
     const std::vector<std::wstring> wishes = Wishes();
     if (!options_.all && wishes.empty()) return std::move(report_).Finish();
@@ -78,7 +78,7 @@ class GetRun {
   }
 
  private:
-  /// The names and patterns of the command line, without names that no file here can have.
+  /// The names and patterns of the command line, without names that cannot be saved here.
   std::vector<std::wstring> Wishes() {
     std::vector<std::wstring> wishes;
     for (const std::wstring& name : options_.names) {
@@ -120,8 +120,8 @@ class GetRun {
       if (std::none_of(files.begin(), files.end(), fits)) {
         throw Failure{.tried = "download " + Printable(wish),
                       .code = ResultOfWin32(ERROR_FILE_NOT_FOUND),
-                      .meaning = "the receiver has no file of such a name",
-                      .hint = "`rcvlink-cli ls` shows the files."};
+                      .meaning = "no file of the receiver matches this pattern",
+                      .hint = "`rcvlink-cli ls` lists the files. Nothing was done."};
       }
       for (const RemoteFile& file : files) {
         if (fits(file)) add(file);
@@ -130,7 +130,7 @@ class GetRun {
     return wanted;
   }
 
-  /// What is to be transferred. What cannot be had or kept is left out and reported.
+  /// The files to transfer. Those that cannot be transferred or saved are reported instead.
   std::vector<Job> Plan(Receiver& receiver, const std::vector<RemoteFile>& files) {
     std::vector<Job> jobs;
     for (const RemoteFile& file : files) {
@@ -155,12 +155,12 @@ class GetRun {
     return jobs;
   }
 
-  /// A file that is here stays as it is; that it has another size is not kept quiet.
+  /// Keeps an existing file as it is. Warns when it has another size.
   void Skip(const RemoteFile& file, const std::filesystem::path& target) {
     const std::uint64_t here = SizeOf(target).value_or(0);
     report_.AddDone(file.name,
                     {{"path", ToUtf8(target.native())}, {"bytes", here}, {"skipped", true}});
-    const std::string start = Printable(file.name) + ": is here already";
+    const std::string start = Printable(file.name) + ": already exists";
     if (here == file.size) {
       context_.PrintDone(start + "\n");
     } else {
@@ -221,7 +221,7 @@ class GetRun {
     }
     const std::wstring local = job.target.filename().native();
     if (options_.output.empty() && local != job.file.name) {
-      context_.PrintStatus("  Windows cannot have the receiver's name, so it is kept as " +
+      context_.PrintStatus("  Windows does not allow the receiver's name; the file is saved as " +
                            Printable(local) + "\n");
     }
   }
@@ -241,24 +241,22 @@ class Get : public Command {
     AddPort(app, arguments);
     AddNames(app,
              "NAME",
-             "Files as `ls` shows them, or patterns of names, as in *.JPS",
+             "File names as listed by `ls`, or patterns such as *.JPS",
              options_.names,
              0,
              kMostNames);
     AddText(app,
             "-o",
-            "The folder, or the name for a single file; - is the standard output",
+            "Folder, or name of a single file; - is the standard output",
             "PATH",
             options_.output);
-    AddFlag(app, "--all", "Every file of the receiver", options_.all);
-    AddFlag(app,
-            "--skip-existing",
-            "Leave out files whose names are here already",
-            options_.skip_existing);
+    AddFlag(app, "--all", "Download every file of the receiver", options_.all);
+    AddFlag(
+        app, "--skip-existing", "Skip files that exist on this computer", options_.skip_existing);
     AddFlag(app, "--verify", "Download twice and compare", options_.download.verify);
     AddFlag(app,
             "--keep-partial",
-            "Keep what came of a failed download, as NAME.part",
+            "Keep the data of a failed download as NAME.part",
             options_.download.keep_partial);
   }
 
@@ -268,10 +266,11 @@ class Get : public Command {
       throw UsageError("-o - takes a single file");
     }
     if (options_.all == !options_.names.empty()) {
-      throw UsageError("get needs either the names of files or --all");
+      throw UsageError("get needs either file names or --all");
     }
     if (options_.IsStream() && options_.skip_existing) {
-      throw UsageError("with -o " + Printable(options_.output) + " no file can be here already");
+      throw UsageError("--skip-existing needs a folder or a file, not -o " +
+                       Printable(options_.output));
     }
   }
 
@@ -280,7 +279,7 @@ class Get : public Command {
       throw UsageError("-o - and --json both need the standard output");
     }
     if (options_.skip_existing && context.arguments.force) {
-      throw UsageError("--skip-existing and --force contradict each other");
+      throw UsageError("--skip-existing and --force cannot be used together");
     }
     return GetRun(context, options_).Run();
   }
@@ -294,9 +293,9 @@ class Get : public Command {
 std::unique_ptr<Command> MakeGet() {
   return std::make_unique<Get>(Command::Text{
       "get",
-      "Download files, or all of them",
-      "Each file grows as NAME.part and gets its name when it is complete.\n"
-      "The protocol of Velmar receivers does not find a damaged byte: --verify does.\n"
+      "Download files",
+      "A file is written as NAME.part and gets its name when it is complete.\n"
+      "The protocol of Velmar receivers does not detect damaged bytes; --verify does.\n"
       "Examples:\n"
       "  rcvlink-cli get COM7 LOG0001.DAT\n"
       "  rcvlink-cli get COM7 LOG0001.DAT -o monday.dat --force\n"

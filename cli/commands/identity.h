@@ -1,5 +1,5 @@
 /// @file identity.h
-/// What find and info tell of a receiver.
+/// What find and info print about a receiver.
 #ifndef RCVLINK_CLI_COMMANDS_IDENTITY_H_
 #define RCVLINK_CLI_COMMANDS_IDENTITY_H_
 

@@ -42,7 +42,7 @@ class Info : public Command {
 
 std::unique_ptr<Command> MakeInfo() {
   return std::make_unique<Info>(Command::Text{
-      "info", "Tell all about the receiver", "Example: rcvlink-cli info COM7 --json"});
+      "info", "Show everything known about the receiver", "Example: rcvlink-cli info COM7 --json"});
 }
 
 }  // namespace cli

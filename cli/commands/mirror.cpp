@@ -27,8 +27,8 @@ struct MirrorOptions {
   bool deletes = false;
 };
 
-/// The places of a mirror's files. What is there already may be replaced, by the rules of `Mirror`.
-/// @throws Failure when there can be none, before a search that may take minutes
+/// The local files of a mirror. Existing ones may be replaced, by the rules of `Mirror`.
+/// @throws Failure when the folder cannot be used: checked before a search that may take minutes
 Targets TargetsIn(const std::wstring& folder) {
   Targets targets({.output = folder, .many = true, .force = true});
   targets.CheckFolder();
@@ -101,8 +101,8 @@ class MirrorRun {
       total_.files += job.step != MirrorStep::kNothing;
     }
     context_.PrintStatus(std::to_string(jobs.size()) + " files on the receiver, " +
-                         std::to_string(jobs.size() - total_.files) + " here already; " +
-                         FormatBytes(total_.total) + " to come.\n");
+                         std::to_string(jobs.size() - total_.files) + " already here; " +
+                         FormatBytes(total_.total) + " to download.\n");
     if (options_.times) {
       context_.PrintStatus("File times are taken as " + InWords(*options_.times) + ".\n");
     }
@@ -167,7 +167,7 @@ class MirrorRun {
     asked_to_delete_.push_back(name);
   }
 
-  /// A receiver may refuse and the library not know it: the directory tells.
+  /// The library may not notice a refusal, so the directory is read again.
   void CheckDeleted(std::size_t listed_before) {
     std::vector<RemoteFile> files;
     std::optional<Failure> unread;
@@ -189,7 +189,7 @@ class MirrorRun {
         AddFailed(name,
                   {.tried = tried,
                    .code = S_OK,
-                   .meaning = "the receiver was asked to, but still has the file"});
+                   .meaning = "the command was sent, but the receiver still has the file"});
       } else {
         ++summary_.deleted;
         const auto entry = std::find_if(
@@ -208,7 +208,7 @@ class MirrorRun {
   void PrintSummary() {
     constexpr std::uint64_t kMsPerSecond = 1000;
     std::string text = std::to_string(summary_.downloaded) + " downloaded, " +
-                       std::to_string(summary_.present) + " here already, " +
+                       std::to_string(summary_.present) + " already here, " +
                        std::to_string(summary_.failed) + " failed";
     if (summary_.untried > 0) text += ", " + std::to_string(summary_.untried) + " not tried";
     if (options_.deletes) text += ", " + std::to_string(summary_.deleted) + " deleted";
@@ -248,29 +248,29 @@ class MirrorCommand : public Command {
 
   void AddOptions(CLI::App& app, Arguments& arguments) override {
     AddPort(app, arguments);
-    AddText(app, "FOLDER", "Where the files are kept", "", options_.folder, Need::kRequired);
+    AddText(app, "FOLDER", "Folder for the files", "", options_.folder, Need::kRequired);
     AddNames(app,
              "PATTERN",
-             "Only files of such names, as in *.JPS; without any, all",
+             "Only files that match, as in *.JPS; default: all files",
              options_.patterns,
              0,
              kMostNames);
     AddWord<TimeZone>(app,
                       "--times",
-                      "Keep the receiver's file times, which are utc or local",
+                      "Set file times as on the receiver, which are utc or local",
                       "ZONE",
                       {{"utc", TimeZone::kUtc}, {"local", TimeZone::kLocal}},
                       options_.times);
     AddFlag(app, "--verify", "Download each file twice and compare", options_.verify);
     AddFlag(app,
             "--then-delete",
-            "Delete files on the receiver that a second download verified",
+            "Then delete files on the receiver that were verified",
             options_.deletes);
   }
 
   void Check() const override {
     CheckNames(options_.patterns);
-    if (options_.folder.empty()) throw UsageError("the folder's name is empty");
+    if (options_.folder.empty()) throw UsageError("the folder name is empty");
   }
 
   Outcome Run(Context& context) override {
@@ -288,11 +288,12 @@ class MirrorCommand : public Command {
 std::unique_ptr<Command> MakeMirror() {
   return std::make_unique<MirrorCommand>(Command::Text{
       "mirror",
-      "Bring a folder up to date with the receiver's files",
-      "Files that are missing, or differ in size, are downloaded. One that failed stops no other;\n"
-      "the exit code is that of the worst. A file of this computer is replaced only when it is "
-      "the\n"
-      "beginning of the receiver's, as of a log that has grown.\n"
+      "Update a folder with the receiver's files",
+      "Files that are missing or differ in size are downloaded. After a file that failed, the\n"
+      "next one follows; the exit code is that of the worst failure.\n"
+      "A file of this computer is replaced only when the receiver's file begins with the same\n"
+      "bytes, such as a log that has grown.\n"
+      "--then-delete deletes a file only after a second download was equal to the first.\n"
       "Examples:\n"
       "  rcvlink-cli mirror COM7 D:\\survey\n"
       "  rcvlink-cli mirror COM7 D:\\survey *.JPS --times utc --then-delete"});

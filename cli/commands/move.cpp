@@ -15,11 +15,11 @@ void Rename(Receiver& receiver,
   receiver.ThrowIfCancelled(tried);
   const long code = devapi::RenameFile(receiver.handle(), from.data(), to.data());
   if (code != S_OK) throw receiver.FailureOf(tried, code);
-  // The receiver may refuse and the library not know it: its directory tells.
+  // The library may not notice a refusal, so the directory is read again.
   const std::vector<RemoteFile> files = receiver.ListFiles().files;
   if (!HasFile(files, new_name) || HasFile(files, old_name)) {
     throw receiver.FailureOf(
-        tried, code, "the receiver was asked to, but its directory does not show it");
+        tried, code, "the command was sent, but the receiver's file list does not show the change");
   }
 }
 
@@ -29,8 +29,8 @@ class Move : public Command {
 
   void AddOptions(CLI::App& app, Arguments& arguments) override {
     AddPort(app, arguments);
-    AddNames(app, "OLD", "The file's name", old_names_, 1, 1);
-    AddNames(app, "NEW", "Its new name", new_names_, 1, 1);
+    AddNames(app, "OLD", "Current name of the file", old_names_, 1, 1);
+    AddNames(app, "NEW", "New name of the file", new_names_, 1, 1);
   }
 
   void Check() const override {
@@ -50,14 +50,14 @@ class Move : public Command {
       throw Failure{
           .tried = tried,
           .code = E_NOTIMPL,
-          .meaning = "a " + FamilyName(identity.family) + " receiver does not offer renaming"};
+          .meaning = "a " + FamilyName(identity.family) + " receiver cannot rename files"};
     }
     const std::vector<RemoteFile> files = receiver.ListFiles().files;
     FindFile(files, old_name, tried);
     if (HasFile(files, new_name)) {
       throw Failure{.tried = tried,
                     .code = ResultOfWin32(ERROR_FILE_EXISTS),
-                    .meaning = "the receiver has a file of the new name already"};
+                    .meaning = "the receiver already has a file of that name"};
     }
     Rename(receiver, old_name, new_name, tried);
     context.PrintDone(Printable(old_name) + " is now " + Printable(new_name) + "\n");
@@ -76,7 +76,7 @@ class Move : public Command {
 std::unique_ptr<Command> MakeMove() {
   return std::make_unique<Move>(
       Command::Text{"mv",
-                    "Rename a file (only the Velmar family can)",
+                    "Rename a file (Velmar receivers only)",
                     "Example: rcvlink-cli mv COM7 LOG0001.DAT MONDAY.DAT"});
 }
 

@@ -39,7 +39,7 @@ class Ports : public Command {
     constexpr std::size_t kGap = 2;
     const std::vector<Port> ports = ListPorts();
     if (ports.empty()) {
-      context.PrintDone("This computer has no COM ports, and no device of the USBIO driver.\n");
+      context.PrintDone("This computer has no COM port and no USB device with the USBIO driver.\n");
     }
     std::size_t width = 0;
     for (const Port& port : ports) width = std::max(width, Printable(port.name).size() + kGap);
@@ -59,8 +59,8 @@ class Ports : public Command {
 std::unique_ptr<Command> MakePorts() {
   return std::make_unique<Ports>(
       Command::Text{"ports",
-                    "List this computer's COM ports and USB receivers",
-                    "A device on USB is listed when it has the USBIO driver.\n"
+                    "List the COM ports and USB receivers of this computer",
+                    "A USB device is listed when it uses the USBIO driver.\n"
                     "Example: rcvlink-cli ports"});
 }
 

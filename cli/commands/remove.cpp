@@ -12,13 +12,13 @@ namespace {
 
 std::string Tried(const std::wstring& name) { return "delete " + Printable(name); }
 
-/// The receiver may refuse and the library not know it: its directory tells.
+/// The library may not notice a refusal, so the directory is read again.
 std::optional<Failure> WhyStillThere(const std::vector<RemoteFile>& files,
                                      const std::wstring& name) {
   if (!HasFile(files, name)) return std::nullopt;
   return Failure{.tried = Tried(name),
                  .code = S_OK,
-                 .meaning = "the receiver was asked to, but still has the file"};
+                 .meaning = "the command was sent, but the receiver still has the file"};
 }
 
 /// Asks for each file; stops when cancelled.
@@ -57,7 +57,7 @@ void Verify(Context& context,
   try {
     files = receiver.ListFiles().files;
     if (files.empty() && listed_before > removed.size()) {
-      // It was not answered: without the files that were not removed it tells nothing.
+      // An empty list is no answer: the files that were not deleted are missing too.
       unread = Failure{.code = ResultOfWin32(ERROR_TIMEOUT),
                        .meaning = "the receiver did not list its files again"};
     }
@@ -81,7 +81,7 @@ class Remove : public Command {
 
   void AddOptions(CLI::App& app, Arguments& arguments) override {
     AddPort(app, arguments);
-    AddNames(app, "NAME", "Files as `ls` shows them", names_, 1, kMostNames);
+    AddNames(app, "NAME", "File names as listed by `ls`", names_, 1, kMostNames);
   }
 
   void Check() const override { CheckNames(names_); }
@@ -103,8 +103,10 @@ class Remove : public Command {
 }  // namespace
 
 std::unique_ptr<Command> MakeRemove() {
-  return std::make_unique<Remove>(Command::Text{
-      "rm", "Delete receiver's files", "Example: rcvlink-cli rm COM7 LOG0001.DAT LOG0002.DAT"});
+  return std::make_unique<Remove>(
+      Command::Text{"rm",
+                    "Delete files on the receiver",
+                    "Example: rcvlink-cli rm COM7 LOG0001.DAT LOG0002.DAT"});
 }
 
 }  // namespace cli

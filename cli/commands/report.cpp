@@ -16,7 +16,7 @@
 namespace cli {
 namespace {
 
-/// Reports of long sessions have some 100 kB; nobody reads more than this.
+/// Reports of long sessions have some 100 kB; a larger part would be of no use.
 constexpr std::size_t kMostBytes = 16'777'216;
 
 struct Content {
@@ -67,8 +67,8 @@ void WritePage(const std::filesystem::path& path, const std::string& page, bool 
   if (opened == INVALID_HANDLE_VALUE) {
     Failure failure = LocalFailure(tried, GetLastError());
     if (failure.code == ResultOfWin32(ERROR_FILE_EXISTS)) {
-      failure.meaning = "it exists already";
-      failure.hint = "--force replaces it, --html with another name keeps it.";
+      failure.meaning = "it already exists";
+      failure.hint = "--force replaces it; --html with another name keeps it.";
     }
     throw failure;
   }
@@ -115,11 +115,11 @@ class Report : public Command {
   void AddOptions(CLI::App& app, Arguments& /*arguments*/) override {
     AddText(app,
             "FILE",
-            "A report; a bare name is also looked for in %TEMP%, where --report puts it",
+            "Report file; a name without a folder is also looked for in %TEMP%",
             "",
             file_,
             Need::kRequired);
-    AddText(app, "--html", "Draw it as a page for a browser", "PAGE", page_);
+    AddText(app, "--html", "Write the exchange as an HTML page", "PAGE", page_);
   }
 
   Outcome Run(Context& context) override {
@@ -155,10 +155,10 @@ class Report : public Command {
   static Failure NoReport(const std::filesystem::path& path, const Exchange& exchange) {
     Failure failure{.tried = "read the report " + Printable(path.native()),
                     .code = ResultOfWin32(ERROR_INVALID_DATA),
-                    .meaning = "no line of a report is in it",
+                    .meaning = "the file contains no line of a report",
                     .hint =
-                        "A report is what --report writes: lines that begin with "
-                        "hh:mm:ss.mmmm and the number of a thread."};
+                        "A report is a file written with --report; its lines begin with "
+                        "hh:mm:ss.mmmm and a thread number."};
     if (!exchange.remarks.empty()) failure.hint = exchange.remarks.front() + " " + failure.hint;
     return failure;
   }
@@ -168,11 +168,11 @@ class Report : public Command {
                 const Exchange& exchange) const {
     std::error_code ignored;
     if (std::filesystem::equivalent(report, page_, ignored)) {
-      throw UsageError("the page would take the place of the report");
+      throw UsageError("the page would overwrite the report");
     }
     WritePage(
         page_, ToPage(exchange, Printable(report.filename().native())), context.arguments.force);
-    context.PrintDone(Summary(exchange) + "\nThe page is " + Printable(page_) + "\n");
+    context.PrintDone(Summary(exchange) + "\nThe page was written to " + Printable(page_) + "\n");
   }
 
   std::wstring file_;
@@ -184,8 +184,8 @@ class Report : public Command {
 std::unique_ptr<Command> MakeReport() {
   return std::make_unique<Report>(
       Command::Text{"report",
-                    "Show a report as the exchange between host and receiver",
-                    "The report has no line for a reply: it came before the line after it.\n"
+                    "Show a report as an exchange between host and receiver",
+                    "A report has no lines for replies: a reply arrived before the next line.\n"
                     "Examples:\n"
                     "  rcvlink-cli report trace.txt\n"
                     "  rcvlink-cli report trace.txt --html trace.html\n"

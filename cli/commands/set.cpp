@@ -9,10 +9,10 @@
 namespace cli {
 namespace {
 
-/// Keeps the receiver for this thread.
+/// Locks the receiver for this thread.
 class ReceiverLock {
  public:
-  /// @throws Failure when it cannot be had
+  /// @throws Failure when it cannot be locked
   ReceiverLock(const Context& context, Receiver& receiver, const std::string& tried)
       : receiver_(receiver.handle()) {
     const long code = devapi::LockConnection(receiver_, context.interrupt.event());
@@ -70,7 +70,7 @@ bool AnswersAt(const Context& context, EProtocol family, const DCB& settings) {
   return true;
 }
 
-/// Lets the next command begin with this setting; with none that is known when it is nothing.
+/// Saves this setting for the next command. Nothing deletes the saved one.
 void Remember(Context& context, const std::optional<KnownSetting>& setting) {
   const Arguments& arguments = context.arguments;
   const PortMemory memory = MemoryOf(arguments);
@@ -88,20 +88,20 @@ bool IsFoundAgain(const SettingChange& change) {
 
 std::string Advice(const SettingChange& change) {
   if (change.setting == Setting::kBaud) {
-    return "  Open it with --speed " + std::to_string(change.value) + " from now on.\n";
+    return "  Use --speed " + std::to_string(change.value) + " from now on.\n";
   }
   if (IsFoundAgain(change)) return "";
-  return "  This program does not find it again: it uses no parity and one stop bit.\n";
+  return "  This program cannot find the receiver again: it uses no parity and one stop bit.\n";
 }
 
-/// What the words ask for.
-/// @throws Failure when they make no sense
+/// Parses setting and value.
+/// @throws Failure when they are invalid
 SettingChange CheckedChange(const std::wstring& setting, const std::wstring& value) {
   const auto change = ParseSetting(Lowered(ToUtf8(setting)), Lowered(ToUtf8(value)));
   if (!change) {
-    throw UsageError("`set` does not know " + Printable(setting) + " " + Printable(value) +
-                     "; there is baud 110 to 4000000, parity none, odd or even, stopbits 1 or 2, "
-                     "and rts on or off");
+    throw UsageError("unknown setting " + Printable(setting) + " " + Printable(value) +
+                     "; the settings are baud 110 to 4000000, parity none, odd or even, stopbits 1 "
+                     "or 2, and rts on or off");
   }
   return *change;
 }
@@ -119,15 +119,15 @@ class Set : public Command {
             "",
             value_,
             Need::kRequired);
-    AddFlag(app, "--yes", "Also set what this program cannot use itself", yes_);
+    AddFlag(app, "--yes", "Also set values that this program cannot use itself", yes_);
   }
 
   void Check() const override {
     const SettingChange change = CheckedChange(setting_, value_);
     if (yes_ || IsFoundAgain(change)) return;
     throw UsageError("with that " + SettingName(change.setting) +
-                     " the receiver would not be found again by this program, which uses no parity "
-                     "and one stop bit; --yes sets it all the same");
+                     " this program would not find the receiver again, as it uses no parity and "
+                     "one stop bit; --yes sets it anyway");
   }
 
   Outcome Run(Context& context) override {
@@ -136,7 +136,7 @@ class Set : public Command {
     const std::string name = SettingName(change.setting);
     const std::string tried = "set the receiver's " + name + " to " + ValueWord(change);
     std::optional<KnownSetting> found = Change(context, change, tried);
-    // What the RTS line does cannot be seen from here, nor what a receiver's port does over USB.
+    // The RTS line cannot be checked from here, nor can the receiver's port over USB.
     const bool confirmed = found && change.setting != Setting::kRts;
     if (confirmed) {
       Confirm(context, found->family, change, tried);
@@ -145,10 +145,11 @@ class Set : public Command {
         Remember(context, found);
       }
     }
-    context.PrintDone(Printable(arguments.port) + ": the receiver's " + name + " was set to " +
-                      ValueWord(change) +
-                      (confirmed ? ", and it answers there.\n" : "; it does not confirm that.\n") +
-                      Advice(change));
+    context.PrintDone(
+        Printable(arguments.port) + ": the receiver's " + name + " was set to " +
+        ValueWord(change) +
+        (confirmed ? ", and it answers with that setting.\n" : "; this could not be confirmed.\n") +
+        Advice(change));
     return {.document = {{"port", ToUtf8(arguments.port)},
                          {"setting", SettingWord(change.setting)},
                          {"value", ValueWord(change)},
@@ -156,7 +157,7 @@ class Set : public Command {
   }
 
  private:
-  /// Sends the change, and lets go of the receiver.
+  /// Sends the change and closes the receiver.
   /// @return where it was found, on a serial port
   /// @throws Failure
   static std::optional<KnownSetting> Change(Context& context,
@@ -168,8 +169,7 @@ class Set : public Command {
     if (!number) {
       throw Failure{.tried = tried,
                     .code = E_NOTIMPL,
-                    .meaning = "a " + FamilyName(family) +
-                               " receiver does not offer to control its " +
+                    .meaning = "a " + FamilyName(family) + " receiver cannot change its " +
                                SettingName(change.setting)};
     }
     const ReceiverLock lock(context, receiver, tried);
@@ -190,13 +190,13 @@ class Set : public Command {
     Failure failure{.tried = tried, .code = ResultOfWin32(ERROR_DEVICE_NOT_CONNECTED)};
     if (context.interrupt.requested()) {
       failure.exit = ExitCode::kCancelled;
-      failure.meaning = "ended by Ctrl-C while it was asked whether it had changed";
+      failure.meaning = "ended by Ctrl-C before the change was confirmed";
     } else if (before && AnswersAt(context, family, *before)) {
-      failure.meaning = "refused: the receiver still answers as before";
-      failure.hint = "Receivers know certain values only, such as 115200, 57600 or 9600.";
+      failure.meaning = "refused: the receiver still answers with the old setting";
+      failure.hint = "Receivers accept only certain values, such as 115200, 57600 or 9600.";
     } else {
       failure.exit = ExitCode::kNoReceiver;
-      failure.meaning = "after the change the receiver answers neither as asked nor as before";
+      failure.meaning = "the receiver answers neither with the new setting nor with the old one";
       failure.hint = "`rcvlink-cli find` tries all the usual speeds.";
       Remember(context, std::nullopt);
     }
@@ -213,9 +213,9 @@ class Set : public Command {
 std::unique_ptr<Command> MakeSet() {
   return std::make_unique<Set>(Command::Text{
       "set",
-      "Change the receiver's own port settings",
-      "The change is the receiver's: from then on its port is reached with the new setting only.\n"
-      "The program then asks it whether it answers there.\n"
+      "Change the settings of the receiver's own port",
+      "The receiver's own port is changed; from then on it answers with the new setting only.\n"
+      "The program then checks whether it answers.\n"
       "Examples:\n"
       "  rcvlink-cli set COM7 baud 115200\n"
       "  rcvlink-cli set COM7 parity none"});

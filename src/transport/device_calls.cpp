@@ -43,7 +43,7 @@ BOOL DeviceCalls::DeviceIoControl(HANDLE device,
                                   DWORD* returned) {
   const KernelHandle done(CreateEventW(nullptr, TRUE, FALSE, nullptr));
   if (!done) return FALSE;
-  // Devices are opened for overlapped transfers, so Windows wants a block for every request.
+  // Devices are opened for overlapped transfers, so Windows wants a record of every transfer.
   OVERLAPPED overlapped{};
   overlapped.hEvent = done.get();
   void* const in = const_cast<void*>(input);  // it is only read, but Win32's parameter is not const

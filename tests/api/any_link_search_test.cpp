@@ -1,4 +1,4 @@
-// SearchReceiver where any link will do: the sweep of the serial port first, then USB.
+// SearchReceiver on any link: first the sweep of the serial port, then USB.
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
@@ -22,7 +22,7 @@ using testing::IsEmpty;
 using testing::SizeIs;
 
 constexpr size_t kTriesOfSweep = 18;
-// How long an answer is waited for, of a Velmar receiver and on USB.
+// The time-outs of a Velmar receiver and on USB.
 constexpr DWORD kAnswerMs = 8000;
 constexpr DWORD kPingMs = 8000;
 const std::string kOpeningUsb = "CreateReceiverOnUSB - opening USB [COM7]";
@@ -64,7 +64,7 @@ class AnyLinkSearch : public testing::Test {
     return devapi::SearchReceiver(
         name_.data(), type, eProtocolVelmar, abort_event_.get(), &handle_);
   }
-  // Something that no search has put there.
+  // A value that no search has set.
   void* Stale() { return &name_; }
 
   std::vector<std::string> LinesWith(const std::string& start) const {
@@ -72,7 +72,7 @@ class AnyLinkSearch : public testing::Test {
     std::erase_if(lines, [&](const std::string& line) { return !line.starts_with(start); });
     return lines;
   }
-  // Those of SearchReceiver itself, not of its serial half.
+  // The lines of SearchReceiver itself, without its serial part.
   std::vector<std::string> OwnLines() const { return LinesWith("SearchReceiver - "); }
 
   std::wstring name_ = L"COM7";
@@ -86,7 +86,7 @@ class AnyLinkSearch : public testing::Test {
   void* handle_ = nullptr;
 };
 
-TEST_F(AnyLinkSearch, ASweepThatFindsNobodyIsNoFailure) {
+TEST_F(AnyLinkSearch, ASweepThatFindsNoReceiverIsNoFailure) {
   EXPECT_EQ(Search(), S_FALSE);
   EXPECT_EQ(handle_, nullptr);
   EXPECT_EQ(port_.openings, kTriesOfSweep);
@@ -94,7 +94,7 @@ TEST_F(AnyLinkSearch, ASweepThatFindsNobodyIsNoFailure) {
   EXPECT_THAT(LinesWith("CreateReceiverOnUSB"), ElementsAre(kOpeningUsb, kAskingUsb));
 }
 
-TEST_F(AnyLinkSearch, AFailureOfUsbAloneIsTold) {
+TEST_F(AnyLinkSearch, AFailureOfUsbAloneIsReported) {
   port_.usb_error = 0xE0001009;
   EXPECT_EQ(Search(), static_cast<HRESULT>(0xE0001009));
   EXPECT_EQ(handle_, nullptr);
@@ -103,7 +103,7 @@ TEST_F(AnyLinkSearch, AFailureOfUsbAloneIsTold) {
               ElementsAre("SearchReceiver - CreateReceiverOnUSB failed[COM7] [0xE0001009]"));
 }
 
-TEST_F(AnyLinkSearch, AFailureOfTheSerialPortAloneIsTold) {
+TEST_F(AnyLinkSearch, AFailureOfTheSerialPortAloneIsReported) {
   port_.path = L"none";
   EXPECT_EQ(Search(), S_FALSE);
   EXPECT_THAT(OwnLines(),
@@ -144,14 +144,14 @@ TEST_F(AnyLinkSearch, AnEventInTheSilenceOfATryEndsTheSweepThere) {
   EXPECT_THAT(LinesWith("SearchReceiverOnSerial - try RTS"), SizeIs(4));
   EXPECT_THAT(LinesWith("CreateReceiverOnUSB"), ElementsAre(kOpeningUsb));
   EXPECT_THAT(OwnLines(), IsEmpty());
-  // Three silences were waited out, the fourth was not.
+  // The search waited for three time-outs, but not for the fourth.
   EXPECT_GE(clock_.now, 3 * kAnswerMs);
   EXPECT_LT(clock_.now, 4 * kAnswerMs);
 }
 
 TEST_F(AnyLinkSearch, AnEventInTheWaitForUsbEndsThatToo) {
   port_.path = L"none";
-  // A read over USB has no time-out of the device's.
+  // On USB the device has no time-out for a read.
   COMMTIMEOUTS patient{};
   patient.ReadTotalTimeoutConstant = 10 * kPingMs;
   port_.SetCommTimeouts(nullptr, &patient);
@@ -165,7 +165,7 @@ TEST_F(AnyLinkSearch, AnEventInTheWaitForUsbEndsThatToo) {
   EXPECT_THAT(LinesWith("CreateReceiverOnUSB"), ElementsAre(kOpeningUsb, kAskingUsb));
 }
 
-// --- A handle that was not set to null before. The search takes it for its own find.
+// --- A handle that was not set to null before. The search takes it for a found receiver.
 
 TEST_F(AnyLinkSearch, AStaleHandleEndsItAfterTheFirstTry) {
   handle_ = Stale();
@@ -198,15 +198,15 @@ TEST_F(AnyLinkSearch, AStaleHandleGivesWayToAReceiver) {
   handle_ = nullptr;
 }
 
-// The one that does not look at it.
-TEST_F(AnyLinkSearch, AStaleHandleIsNothingToASearchOfUsb) {
+// A search of USB only does not read it.
+TEST_F(AnyLinkSearch, AStaleHandleDoesNotAffectASearchOfUsb) {
   handle_ = Stale();
   EXPECT_EQ(Search(eInstanceUSB), S_FALSE);
   EXPECT_EQ(handle_, Stale());
   EXPECT_THAT(LinesWith("CreateReceiverOnUSB"), ElementsAre(kOpeningUsb, kAskingUsb));
 }
 
-// Both families are asked on one open port: an event in the first question keeps the second back.
+// Both families are asked on one open port. An event during the first probe prevents the second.
 TEST_F(AnyLinkSearch, AnEventInTheFirstProbeKeepsTheSecondFromAsking) {
   port_.on_wait = [this](DWORD timeout_ms) {
     if (timeout_ms == kPingMs) SetEvent(abort_event_.get());

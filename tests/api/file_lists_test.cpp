@@ -83,7 +83,7 @@ TEST_F(FileListHandles, NullPointersAndUnknownListsAreRefused) {
   void* list = nullptr;
   long count = 0;
   CFileInfo file{};
-  EXPECT_EQ(devapi::GetFilesCount(&count, &count), kInvalid);  // before any list was opened
+  EXPECT_EQ(devapi::GetFilesCount(&count, &count), kInvalid);  // before a list was opened
   EXPECT_EQ(devapi::OpenFileList(handle, nullptr), kInvalid);
   EXPECT_TRUE(receiver->calls.empty());
   devapi::OpenFileList(handle, &list);

@@ -23,7 +23,7 @@ using testing::IsEmpty;
 
 constexpr long kInvalid = static_cast<long>(0x80070057);
 
-// The functions take their names as hosts have them, not constant.
+// The functions take names that are not constant, as hosts have them.
 wchar_t* Name(const wchar_t* text) {
   static std::array<std::wstring, 8> names;
   static size_t next = 0;
@@ -87,7 +87,7 @@ TEST(Registry, OpenInAnEmptyRegistryFindsNothing) {
   EXPECT_EQ(devapi::OpenReceiver(Name(L"COM7"), &handle), S_FALSE);
 }
 
-TEST(Registry, CloseDropsOneUserAndRemovesWithTheLast) {
+TEST(Registry, CloseRemovesOneUserAndTheReceiverWithTheLast) {
   const ReportCapture report;
   const Registered one(L"COM7");
   void* handle = nullptr;
@@ -122,7 +122,7 @@ TEST(Registry, CloseOfAnUnknownHandleIsReported) {
               ElementsAre("CloseReceiver - receiver not found [0x0000000000001234]"));
 }
 
-TEST(Registry, DestroyDropsOneUserEachAndSaysSoOnlyOfTheRemoved) {
+TEST(Registry, DestroyRemovesOneUserEachAndReportsOnlyRemovedReceivers) {
   const ReportCapture report;
   const Registered one(L"COM7");
   void* handle = nullptr;
@@ -160,23 +160,25 @@ TEST(Registry, TwoReceiversMayShareAName) {
   EXPECT_EQ(devapi::OpenReceiver(Name(L"COM7"), &handle), S_OK);
   EXPECT_TRUE(handle == one.handle || handle == other.handle);
   devapi::CloseReceiver(handle);
-  // One call removes one of them: the walk stops there.
+  // One call removes one receiver, then it stops.
   EXPECT_EQ(devapi::DestroyReceiver(Name(L"COM7")), S_OK);
   EXPECT_NE(one.destroyed, other.destroyed);
   EXPECT_EQ(devapi::DestroyReceiver(Name(L"COM7")), S_OK);
   EXPECT_TRUE(one.destroyed && other.destroyed);
 }
 
-TEST(Registry, DestroyLowersEachThatItPasses) {
+TEST(Registry, DestroyRemovesAUserOfEachReceiverThatItPasses) {
   const Registered one(L"COM7");
   const Registered other(L"COM7");
-  // A second user for the one that is met first; the other has one and goes on the first walk.
+  // A second user for the receiver that comes first. The other has one user and is removed by the
+  // first call.
   void* first = nullptr;
   devapi::OpenReceiver(Name(L"COM7"), &first);
   EXPECT_EQ(devapi::DestroyReceiver(Name(L"COM7")), S_OK);
   EXPECT_EQ(one.destroyed, first != one.handle);
   EXPECT_EQ(other.destroyed, first != other.handle);
-  // The walk lowered the first on its way: it has one user left, and the next walk removes it.
+  // The call also removed a user of the first receiver. It has one left, so the next call removes
+  // it.
   EXPECT_EQ(devapi::DestroyReceiver(Name(L"COM7")), S_OK);
   EXPECT_TRUE(one.destroyed && other.destroyed);
 }
@@ -247,7 +249,7 @@ TEST(Registry, ACallInFlightKeepsTheReceiverAlive) {
     const KernelHandle inside(CreateEventW(nullptr, TRUE, FALSE, nullptr));
     const KernelHandle go_on(CreateEventW(nullptr, TRUE, FALSE, nullptr));
     one.receiver->during = [&] {
-      if (one.receiver->calls.back() == "Abort") return;  // of the removal: it does not wait
+      if (one.receiver->calls.back() == "Abort") return;  // by the removal, which does not wait
       SetEvent(inside.get());
       WaitForSingleObject(go_on.get(), INFINITE);
       EXPECT_FALSE(one.destroyed);
@@ -260,7 +262,7 @@ TEST(Registry, ACallInFlightKeepsTheReceiverAlive) {
     EXPECT_EQ(destroy ? devapi::DestroyReceiver(Name(L"COM7")) : devapi::CloseReceiver(one.handle),
               S_OK);
     EXPECT_FALSE(one.destroyed);
-    // Nobody else can end the call any more.
+    // From here only this test can end the call.
     EXPECT_THAT(one.receiver->calls, ElementsAre("DownloadFile", destroy ? "Stop" : "Abort"));
     EXPECT_EQ(devapi::Abort(one.handle), kInvalid);
     SetEvent(go_on.get());

@@ -29,7 +29,7 @@ class ApiUsb : public testing::Test {
     return files;
   }
   std::string Narrow() const { return {path.begin(), path.end()}; }
-  // The lines of discovery, without those of what it is made of.
+  // The lines of discovery itself.
   std::vector<std::string> Lines() const {
     std::vector<std::string> lines = report.Lines();
     std::erase_if(lines, [](const std::string& line) {

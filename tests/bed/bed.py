@@ -1,15 +1,15 @@
 #!/usr/bin/env python3
-"""The Unix side of the test bed: starts what Windows test programs under Wine ask for.
+"""The Unix side of the test bed: starts simulated receivers and programs for tests under Wine.
 
 Prints "listening HOST:PORT" as its first line. A client connects and sends requests, each a JSON
-object on a line of its own; each is answered by one line, {"ok": true, ...} or {"ok": false,
-"error": TEXT}. Whatever a connection has started is stopped when that connection closes, and its
-folders are removed, so a test that crashed leaves nothing behind.
+object on its own line. Each request is answered by one line, {"ok": true, ...} or {"ok": false,
+"error": TEXT}. When a connection closes, everything it started is stopped and its folders are
+removed, so a test that crashed leaves nothing behind.
 
 Simulated receivers, by port name ("COM12"):
   {"do": "start", "port": P, "arguments": [...]}     starts rcvlink-sim; answers when P can be opened
-  {"do": "stop", "port": P}                          ends it in peace -> {"status": exit status}
-  {"do": "kill", "port": P}                          SIGKILL: its port is gone without a word
+  {"do": "stop", "port": P}                          ends it with SIGTERM -> {"status": exit status}
+  {"do": "kill", "port": P}                          ends it with SIGKILL; its port disappears
   {"do": "pause", "port": P}, {"do": "resume", "port": P}     SIGSTOP, SIGCONT
   {"do": "status", "port": P}                        -> {"status": exit status, null while it runs}
 
@@ -18,15 +18,15 @@ Windows programs (paths relative to the folder of the release build's programs):
       -> {"job": N}. DIR, the folder to run in, may be left out. Its output is a "pipe", one whose
       reader has "closed" it, or a "terminal" (a console on a pseudo-terminal of 100 columns).
   {"do": "expect", "job": N, "text": T, "seconds": S}
-      waits until the output holds T; fails when the program ends without, or after S seconds
+      waits until the output contains T; fails if the program ends before, or after S seconds
   {"do": "interrupt", "job": N}                      Ctrl-C
   {"do": "finish", "job": N, "seconds": S}
       waits for the end -> {"status": exit status, "output": TEXT, "errors": TEXT, "history": [...]}
-      On a terminal, "output" is what stands on the screen at the end and "history" each thing that
-      a line of it showed in turn; "errors" is empty, as a terminal does not keep them apart.
+      On a terminal, "output" is the screen at the end and "history" every text that a line has
+      shown, in order; "errors" is empty, because a terminal does not separate them.
 
   {"do": "folder"}                                   -> {"path": a new, empty folder}
-  {"do": "write", "path": P, "bytes": HEX}           makes a file, under names that Windows has not
+  {"do": "write", "path": P, "bytes": HEX}           makes a file, even with a name that Windows forbids
 """
 
 import argparse
@@ -50,7 +50,7 @@ BUILD = os.path.join(ROOT, "build")
 
 
 class Connection(socketserver.StreamRequestHandler):
-    """The requests of one client, and what it has started."""
+    """The requests of one client, and all that it has started."""
 
     def setup(self):
         super().setup()
@@ -99,13 +99,13 @@ class Connection(socketserver.StreamRequestHandler):
 
     def _simulator(self, request):
         if request["port"] not in self._simulators:
-            raise Refused(f"nothing was started on {request['port']}")
+            raise Refused(f"no receiver was started on {request['port']}")
         return self._simulators[request["port"]]
 
     def _start(self, request):
         port = request["port"]
         if not re.fullmatch(r"COM\d+", port):
-            raise Refused(f"{port!r} is no port")
+            raise Refused(f"{port!r} is not a COM port")
         link = os.path.join(BUILD, "ports", port.lower())
         if os.path.islink(link):
             raise Refused(f"{port} is in use")
@@ -191,7 +191,7 @@ class Bed(socketserver.ThreadingTCPServer):
             for request in self._requests:
                 try:
                     request.shutdown(socket.SHUT_RDWR)
-                except OSError:  # the client was quicker
+                except OSError:  # the client has closed it already
                     pass
 
 
@@ -201,7 +201,7 @@ def main():
         "--simulator", default=os.path.join(BUILD, "native", "bin", "rcvlink-sim"), metavar="PROGRAM"
     )
     bed = Bed(parser.parse_args().simulator)
-    # shutdown() waits for serve_forever(), which the handler has interrupted: so, on a thread.
+    # shutdown() waits for serve_forever(), which this handler interrupts, so it needs its own thread.
     for number in (signal.SIGTERM, signal.SIGINT):
         signal.signal(number, lambda *_: threading.Thread(target=bed.shutdown).start())
     print("listening {}:{}".format(*bed.server_address), flush=True)

@@ -1,5 +1,5 @@
 #!/usr/bin/env python3
-"""Code that a page of docs/ quotes stands in the file that the comment before it names."""
+"""Checks that code quoted in docs/ is in the file named by the comment before the quote."""
 
 import os
 import re
@@ -18,7 +18,7 @@ def main():
     pages = [f"docs/{name}" for name in sorted(os.listdir(os.path.join(ROOT, "docs"))) if name.endswith(".md")]
     quotes = [(page, *quote) for page in pages for quote in QUOTE.findall(read(page))]
     mistakes = [f"{page}: not in {source}:\n{code}" for page, source, code in quotes if code not in read(source)]
-    print("\n".join(mistakes) if mistakes else f"{len(quotes)} quotes of code are as in their files")
+    print("\n".join(mistakes) if mistakes else f"{len(quotes)} quotes of code match their files")
     return 1 if mistakes or not quotes else 0
 
 

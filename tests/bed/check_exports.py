@@ -1,6 +1,6 @@
 #!/usr/bin/env python3
-"""Compares the built DLL with what it is meant to be: its exported names (tests/data/exports.txt), the
-DLLs it imports (tests/data/imports.txt) and the protections it asks of the system."""
+"""Checks the built DLL: its exported names (tests/data/exports.txt), the DLLs it imports
+(tests/data/imports.txt) and its security flags."""
 
 import os
 import re
@@ -43,7 +43,7 @@ def protections(text):
 
 def differences(what, expected, found):
     return [f"{what} {name} is missing" for name in sorted(expected - found)] + [
-        f"{what} {name} is not meant to be there" for name in sorted(found - expected)
+        f"{what} {name} is not expected" for name in sorted(found - expected)
     ]
 
 
@@ -56,7 +56,7 @@ def main():
     mistakes = differences("export", expected, exports(text))
     mistakes += differences("import", read_list("imports.txt"), imports(text))
     mistakes += [f"{name} is not set" for name in sorted(PROTECTIONS - protections(text))]
-    print("\n".join(mistakes) if mistakes else f"{len(expected)} exports, all as they should be")
+    print("\n".join(mistakes) if mistakes else f"{len(expected)} exports, all as expected")
     return 1 if mistakes else 0
 
 

@@ -1,13 +1,14 @@
 #!/usr/bin/env python3
-"""Refuses an #include that points up the layers, or across the borders of the project.
+"""Refuses an #include of a higher layer, or of a part of the project that must not be seen.
 
+What each part may include:
   include/    nothing of the project
   src/        include/
-  cli/        include/, and nothing of src/
-  simulator/  nothing of the others, and nobody sees it
+  cli/        include/, but nothing of src/
+  simulator/  nothing of the other parts; no other part includes it
 
-In src/ and simulator/ a folder is a layer. It includes itself and lower ones, none of its own height:
-families do not see each other.
+In src/ and simulator/ a folder is a layer. It may include itself and lower layers, but no other layer
+of the same height, so families do not include each other.
 """
 
 import os
@@ -29,7 +30,7 @@ HEIGHTS = {
     "simulator/ports": 2,
     "simulator/program": 3,
 }
-# A folder that holds such a file is a family's.
+# A folder with such a file belongs to a family.
 FAMILY_HEIGHTS = {"src/{0}/{0}_protocol.h": 5, "simulator/{0}/receiver.h": 1}
 LAYERED_AREAS = ("src", "simulator")
 SEEN_BY = {"include": ("src", "cli")}
@@ -46,7 +47,7 @@ def sources(folder):
 
 
 def resolve(source, name):
-    """The file of the project that is included, or None when it is none of ours."""
+    """The included file of the project, or None for a file from elsewhere."""
     for folder in [os.path.dirname(source), *INCLUDE_FOLDERS]:
         path = os.path.normpath(os.path.join(folder, name))
         if os.path.isfile(os.path.join(ROOT, path)):
@@ -59,7 +60,7 @@ def area_of(path):
 
 
 def height(layer):
-    """None for a folder that is no layer."""
+    """None for a folder that is not a layer."""
     for pattern, family_height in FAMILY_HEIGHTS.items():
         marker = pattern.format(os.path.basename(layer))
         if os.path.dirname(marker) == layer and os.path.isfile(os.path.join(ROOT, marker)):
@@ -73,7 +74,7 @@ def refusal(source, target):
     if area in SEEN_BY.get(target_area, ()):
         return None
     if area != target_area:
-        return f"{area}/ does not see {target_area}/"
+        return f"{area}/ must not include {target_area}/"
     layer, target_layer = os.path.dirname(source), os.path.dirname(target)
     if area not in LAYERED_AREAS or layer == target_layer:
         return None
@@ -102,7 +103,7 @@ def check(source):
 def main():
     files = [source for area in ("include", "src", "cli", "simulator") for source in sources(area)]
     mistakes = [mistake for source in files for mistake in check(source)]
-    print("\n".join(mistakes) if mistakes else f"{len(files)} files keep to the layers")
+    print("\n".join(mistakes) if mistakes else f"{len(files)} files respect the layers")
     return 1 if mistakes or not files else 0
 
 

@@ -1,5 +1,5 @@
 #!/usr/bin/env python3
-"""The README's host program is the one that the build compiles, examples/download.cpp."""
+"""Checks that the host program in README.md is the compiled one, examples/download.cpp."""
 
 import os
 import sys
@@ -15,7 +15,7 @@ def read(path):
 def main():
     example = read("examples/download.cpp")
     if f"```cpp\n{example}```\n" not in read("README.md"):
-        print("README.md does not show examples/download.cpp as it is")
+        print("The host program in README.md differs from examples/download.cpp")
         return 1
     return 0
 

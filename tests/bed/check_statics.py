@@ -1,9 +1,9 @@
 #!/usr/bin/env python3
-"""Refuses what would stay in the host when the DLL is unloaded.
+"""Refuses what would stay in the host process after the DLL is unloaded.
 
-A static local that is not constant-initialised has a guard of the C++ runtime, and a thread_local
-variable a key of it: neither is given back at unload. Looks for them in the object files of the
-library, and in the DLL for the calls that take a slot: TlsAlloc is the runtime's alone.
+The C++ runtime needs a guard for a static local that is not constant-initialised, and a TLS key for a
+thread_local variable; it frees neither when the DLL is unloaded. This script looks for both in the
+object files of the library, and for TlsAlloc in the DLL, which only the runtime would call.
 """
 
 import os

@@ -1,14 +1,14 @@
-"""What the programs of the bed have in common."""
+"""Helpers for all programs that the bed starts."""
 
 import os
 
 
 class Refused(Exception):
-    """A request that cannot be met; its text goes to the client."""
+    """A request that failed; its text is sent to the client."""
 
 
 def bound_to_this_process(command):
-    """The same command, ended by the system if this process dies without ending it."""
+    """The same command; the system ends it if this process dies first."""
     return ["setpriv", "--pdeathsig", "TERM", *command]
 
 

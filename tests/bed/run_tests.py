@@ -3,10 +3,9 @@
 
 usage: run_tests.py [PROGRAM | GTEST_FILTER | --fast]
 
-A program's name runs that program alone; --fast runs those that open no port; anything else is a GoogleTest
-filter, and programs that take none are then left out. The last line of the output is
-"N passed, N failed", with ", N skipped" when there are any; the exit status is 0 only when something
-ran and nothing failed.
+The name of a program runs only that program; --fast runs those that open no port. Anything else is a
+GoogleTest filter; programs that take no filter are then left out. The last line is "N passed, N failed", with
+", N skipped" if there are any. The exit status is 0 only if something ran and nothing failed.
 """
 
 import concurrent.futures
@@ -54,7 +53,7 @@ def port_sets():
     return [" ".join(f"COM{start + i}" for i in range(size)) for start in starts]
 
 
-# Those with ports run side by side at the end, the longest first.
+# Programs with ports run in parallel at the end, the longest first.
 PROGRAMS = [
     Program("check_layers", "tests/bed/check_layers.py", SCRIPT),
     Program("check_format", "tests/bed/check_format.py", SCRIPT),
@@ -112,7 +111,7 @@ def quietly(command, environment):
 
 @contextlib.contextmanager
 def wine_server(environment):
-    """Keeps Wine's server and services up, so that a program starts in 50 ms instead of seconds."""
+    """Keeps Wine's server and services running, so that a program starts in 50 ms, not in seconds."""
     quietly(["wineserver", "-p"], environment)
     try:
         quietly(["wine", "cmd", "/c", "exit"], environment)
@@ -123,8 +122,8 @@ def wine_server(environment):
 
 
 def port_environment(environment):
-    """For programs that open serial ports: their pseudo-terminals then behave like ports."""
-    # The folder goes apart from the name, as LD_PRELOAD takes no path with a space in it.
+    """For programs that open serial ports: makes pseudo-terminals behave like ports."""
+    # The folder is passed separately, because LD_PRELOAD does not allow spaces in a path.
     return dict(
         environment, LD_PRELOAD="tcflush.so", LD_LIBRARY_PATH=os.path.join(BUILD, "bed")
     )
@@ -132,7 +131,7 @@ def port_environment(environment):
 
 @contextlib.contextmanager
 def bed_server(environment):
-    """Gives the environment for programs that use the bed."""
+    """Starts the bed server; gives the environment for programs that use it."""
     environment = port_environment(environment)
     with open(os.path.join(LOGS, "bed.log"), "wb") as log:
         bed = subprocess.Popen(
@@ -167,7 +166,7 @@ def start_process(command, **options):
 
 
 def end_process(process):
-    """Ends a program, with all of its session, if it still runs."""
+    """Kills a program and its session, if it still runs."""
     with _running_lock:
         if process.poll() is None:
             os.killpg(process.pid, signal.SIGKILL)
@@ -181,7 +180,7 @@ def end_all_processes():
 
 
 def run_limited(command, environment, log, time_limit):
-    """The exit status, or None when the time was over."""
+    """The exit status, or None after the time limit."""
     with open(log, "wb") as output:
         process = start_process(
             command,
@@ -207,7 +206,7 @@ def command_of(program):
 
 
 def read_results(path):
-    """Outcome of a GoogleTest program by its own account."""
+    """The outcome, from the JSON output of a GoogleTest program."""
     with open(path, encoding="utf-8") as file:
         suites = json.load(file)["testsuites"]
     outcome = Outcome()
@@ -223,7 +222,7 @@ def read_results(path):
 
 
 def show(log):
-    """Prints a program's output without the tests that passed in silence."""
+    """Prints a program's output without tests that passed and printed nothing."""
     with open(log, encoding="utf-8", errors="replace") as file:
         text = file.read()
     print(re.sub(r"^\[ RUN .*\r?\n\[       OK .*\r?\n", "", text, flags=re.M).rstrip(), flush=True)
@@ -243,7 +242,7 @@ def run_shard(program, shard, gtest_filter, environment):
 
     command = command_of(program)
     if program.kind not in WITHOUT_FILTER:
-        # Relative, as a name that starts with a slash has no drive.
+        # Relative, because under Wine a path that starts with a slash has no drive.
         command.append(f"--gtest_output=json:{os.path.relpath(results, ROOT)}")
         environment = dict(
             environment,
@@ -268,13 +267,13 @@ def last_started_test(log):
 def outcome_of(program, name, status, results, log):
     if status is None:
         limit = program.time_limit
-        return Outcome(failures=[f"{name}: not done after {limit} s, in {last_started_test(log)}"])
+        return Outcome(failures=[f"{name}: time limit of {limit} s reached in {last_started_test(log)}"])
     if program.kind in WITHOUT_FILTER:
         return Outcome(passed=1) if status == 0 else Outcome(failures=[f"{name}: ended with {status}"])
     if not os.path.exists(results):
         return Outcome(failures=[f"{name}: ended with {status} in {last_started_test(log)}"])
     outcome = read_results(results)
-    # A crash on the way out, which leaves Wine's exit status at 0.
+    # A crash at the end of the program leaves Wine's exit status at 0.
     outcome.failures += [f"{name}: {line}" for line in lines_of(log, "wine: Unhandled")]
     if status != 0 and not outcome.failures:
         outcome.failures.append(f"{name}: ended with {status}")
@@ -282,7 +281,7 @@ def outcome_of(program, name, status, results, log):
 
 
 def run_programs(programs, gtest_filter, environment):
-    """Runs the shards of these programs side by side, as many as there are sets of ports."""
+    """Runs the shards of these programs in parallel, at most one per set of ports."""
     start = time.monotonic()
     sets = port_sets()
     free = queue.SimpleQueue()

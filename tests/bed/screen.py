@@ -1,14 +1,14 @@
-"""A terminal's screen, as far as Wine's console uses one."""
+"""A terminal screen that understands what Wine's console writes."""
 
 import re
 
 _TOKEN = re.compile(r"\x1b\[([0-9;?]*)([A-Za-z])|\x1b\][^\x07]*\x07|\x1b.|([\s\S])")
-# An escape sequence that may go on in the next chunk.
+# An escape sequence that may continue in the next chunk.
 _UNFINISHED = re.compile(r"\x1b(\[[0-9;?]*|\][^\x07]*)?$")
 
 
 class Screen:
-    """Keeps the lines and, in order, each distinct text that any line has shown."""
+    """Keeps the lines, and in order each text that a line has shown."""
 
     def __init__(self, rows, columns):
         self._rows = rows
@@ -102,7 +102,7 @@ class Screen:
 
 
 def _split_utf8(data):
-    """The text that is complete, and the bytes of a character that is not yet."""
+    """The complete text, and the bytes of an unfinished character."""
     for cut in range(len(data), max(-1, len(data) - 4), -1):
         try:
             return data[:cut].decode(), data[cut:]

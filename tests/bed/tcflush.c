@@ -1,8 +1,9 @@
-// Preloaded into the programs under Wine, so that a pseudo-terminal forgets as little as a port.
+// Preloaded into the programs under Wine, so that a pseudo-terminal does not lose bytes that a serial
+// port would have sent.
 //
-// PurgeComm(PURGE_TXCLEAR) throws away what has not been sent yet. On a port that is nothing once the
-// write has completed; on a pseudo-terminal it is everything the other side has not read yet, so that
-// a command could be lost whenever the receiver's process was late.
+// PurgeComm(PURGE_TXCLEAR) discards what has not been sent yet. On a serial port nothing is left after
+// a completed write. On a pseudo-terminal everything is left that the other side has not read yet, so a
+// command would be lost whenever the simulated receiver was late.
 #include <sys/ioctl.h>
 #include <termios.h>
 

@@ -24,7 +24,7 @@ std::string Help(const Words& words) {
   return std::get<HelpText>(ParseCommandLine(words, MakeCommands())).text;
 }
 
-/// The failure of a line that makes no sense.
+/// The failure of an invalid line.
 Failure Refusal(const Words& words) {
   try {
     ParseCommandLine(words, MakeCommands());
@@ -35,7 +35,7 @@ Failure Refusal(const Words& words) {
   return {};
 }
 
-TEST(CommandLineTest, Defaults) {
+TEST(CommandLineTest, HasDefaults) {
   const CommandLine line = Parse({"find", "COM7"});
   EXPECT_STREQ(line.command->text().word, "find");
   const Arguments& arguments = line.arguments;
@@ -49,7 +49,7 @@ TEST(CommandLineTest, Defaults) {
   EXPECT_EQ(arguments.stall_timeout_s, 30U);
 }
 
-TEST(CommandLineTest, Commands) {
+TEST(CommandLineTest, AcceptsEachCommand) {
   for (const Words& words : {Words{"ports"},
                              Words{"info", "COM7"},
                              Words{"ls", "COM7"},
@@ -173,7 +173,7 @@ TEST(CommandLineTest, NamesThatMustNotBeSentAreRefused) {
   EXPECT_EQ(Refusal({"mv", "COM7", "a", "b\"c"}).exit, ExitCode::kUsage);
 }
 
-TEST(CommandLineTest, SenselessLinesAreRefused) {
+TEST(CommandLineTest, InvalidLinesAreRefused) {
   for (const Words& words : {Words{},
                              Words{"bogus"},
                              Words{"find"},
@@ -193,7 +193,7 @@ TEST(CommandLineTest, SenselessLinesAreRefused) {
   }
 }
 
-TEST(CommandLineTest, HelpTellsCommandsExitCodesAndExamples) {
+TEST(CommandLineTest, HelpShowsCommandsExitCodesAndExamples) {
   const std::string help = Help({"--help"});
   for (const char* text : {"ports", "--stall-timeout", "Exit codes", "rcvlink-cli get COM7"}) {
     EXPECT_NE(help.find(text), std::string::npos) << text;
@@ -210,7 +210,7 @@ TEST(CommandLineTest, HelpFitsATerminal) {
   }
 }
 
-TEST(CommandLineTest, HelpIsHadInSeveralWays) {
+TEST(CommandLineTest, HelpWorksInSeveralWays) {
   EXPECT_EQ(Help({"help"}), Help({"--help"}));
   EXPECT_EQ(Help({"/?"}), Help({"--help"}));
   EXPECT_EQ(Help({"help", "get"}), Help({"get", "--help"}));
@@ -230,7 +230,7 @@ TEST(CommandLineTest, TheHelpOfACommandHasTheOptionsOfAll) {
 TEST(CommandLineTest, AMistypedCommandGetsASuggestion) {
   EXPECT_NE(Refusal({"fnid", "COM7"}).meaning.find("did you mean find?"), std::string::npos);
   EXPECT_NE(Refusal({"PORTS"}).meaning.find("did you mean ports?"), std::string::npos);
-  EXPECT_NE(Refusal({"dance", "COM7"}).meaning.find("there is ports, "), std::string::npos);
+  EXPECT_NE(Refusal({"dance", "COM7"}).meaning.find("the commands are ports, "), std::string::npos);
   EXPECT_EQ(Refusal({"info", "COM7", "fnid"}).meaning.find("did you mean"), std::string::npos);
 }
 
@@ -239,7 +239,7 @@ TEST(CommandLineTest, PortsAreTakenHoweverTheyAreWritten) {
   EXPECT_EQ(Parse({"find", "\\\\.\\COM7"}).arguments.port, L"COM7");
 }
 
-/// A variable of the environment for the time of a test.
+/// An environment variable during a test.
 class Variable {
  public:
   Variable(std::string name, const std::string& value) : name_(std::move(name)) {
@@ -253,7 +253,7 @@ class Variable {
   std::string name_;
 };
 
-TEST(CommandLineTest, TheEnvironmentIsAsked) {
+TEST(CommandLineTest, TheEnvironmentIsRead) {
   const Variable port("RCVLINK_PORT", "com7:");
   const Variable link("RCVLINK_LINK", "any");
   const Variable protocol("RCVLINK_PROTOCOL", "velmar");
@@ -267,7 +267,7 @@ TEST(CommandLineTest, TheEnvironmentIsAsked) {
   EXPECT_EQ(Parse({"find", "COM8", "--speed", "9600"}).arguments.speed, 9600U);
 }
 
-// The first word of a command is its port when it can be one.
+// The first word of a command is the port if it looks like one.
 TEST(CommandLineTest, ThePortOfTheEnvironmentLeavesNamesAlone) {
   const Variable port("RCVLINK_PORT", "COM7");
   EXPECT_EQ(Parse({"get", "a.jps"}).arguments.port, L"COM7");
@@ -285,7 +285,7 @@ TEST(CommandLineTest, SkippingNeedsFilesThatCanBeHere) {
   EXPECT_EQ(Refusal({"get", "COM7", "*.jps", "-o", "-"}).exit, ExitCode::kUsage);
 }
 
-TEST(CommandLineTest, AFileHasOptionsToo) {
+TEST(CommandLineTest, OptionsAreReadFromAFileToo) {
   const TemporaryFolder folder;
   folder.Write(L"my.ini", "speed = 57600\njson = true\nprogress = none\n");
   const std::string path = (folder.path() / L"my.ini").string();
@@ -303,7 +303,7 @@ TEST(CommandLineTest, CodesToExplainAreNumbers) {
   EXPECT_EQ(Refusal({"explain", "all"}).exit, ExitCode::kUsage);
 }
 
-TEST(CommandLineTest, TellsItsWords) {
+TEST(CommandLineTest, ListsCommandsAndOptions) {
   const std::vector<CommandWords> words = WordsOf(MakeCommands());
   ASSERT_EQ(words.size(), MakeCommands().size() + 1);
   const auto has = [](const CommandWords& command, const std::string& option) {
@@ -316,14 +316,14 @@ TEST(CommandLineTest, TellsItsWords) {
   const auto get = std::find_if(
       words.begin(), words.end(), [](const auto& entry) { return entry.command.word == "get"; });
   ASSERT_NE(get, words.end());
-  EXPECT_EQ(get->command.description, "Download files, or all of them");
+  EXPECT_EQ(get->command.description, "Download files");
   EXPECT_TRUE(has(*get, "--all"));
   EXPECT_TRUE(has(*get, "-o"));
   EXPECT_FALSE(has(*get, "PORT"));
   EXPECT_FALSE(has(*get, "--json"));
 }
 
-TEST(CommandLineTest, TellsItsVersion) { EXPECT_EQ(Help({"--version"}).find("rcvlink-cli "), 0U); }
+TEST(CommandLineTest, PrintsItsVersion) { EXPECT_EQ(Help({"--version"}).find("rcvlink-cli "), 0U); }
 
 }  // namespace
 }  // namespace cli

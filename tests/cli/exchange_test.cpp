@@ -44,13 +44,13 @@ TEST(ExchangeTest, ADownloadOfAQuorinReceiverShowsItsRetries) {
   EXPECT_EQ(exchange.DurationMs(), 10'334U);
   EXPECT_EQ(exchange.Codes(), std::vector{ResultOfWin32(ERROR_TIMEOUT)});
 
-  const ExchangeEntry size = Only(exchange, "how large is the file?");
+  const ExchangeEntry size = Only(exchange, "read the file size");
   EXPECT_EQ(size.end, ExchangeEnd::kReply);
   EXPECT_EQ(size.until_ms, size.elapsed_ms + 1003);
   EXPECT_EQ(Only(exchange, "set the port: set,").end, ExchangeEnd::kUntold);
-  EXPECT_EQ(Only(exchange, "stop your output: dm").kind, TraceKind::kCommand);
+  EXPECT_EQ(Only(exchange, "stop all output: dm").kind, TraceKind::kCommand);
 
-  const ExchangeEntry blocks = Only(exchange, "the first block is asked for");
+  const ExchangeEntry blocks = Only(exchange, "the first block is requested");
   EXPECT_EQ(blocks.end, ExchangeEnd::kReply);
   EXPECT_EQ(blocks.until_ms, blocks.elapsed_ms + 2170);
   const ExchangeEntry reply = Only(exchange, "the blocks ended within 2170 ms");
@@ -61,7 +61,7 @@ TEST(ExchangeTest, ADownloadOfAQuorinReceiverShowsItsRetries) {
 
 TEST(ExchangeTest, ARefusalIsAFailureWithItsCodeAndTheReceiversText) {
   const Exchange exchange = Parse(Recorded("quorin-refused.txt"));
-  const ExchangeEntry refusal = Only(exchange, "The receiver said: {refused}");
+  const ExchangeEntry refusal = Only(exchange, "The receiver sent: {refused}");
   EXPECT_EQ(refusal.kind, TraceKind::kFailure);
   EXPECT_EQ(refusal.code, ResultOfWin32(ERROR_DEVICE_NOT_CONNECTED));
   EXPECT_EQ(Only(exchange, "remove,NAME").end, ExchangeEnd::kFailure);
@@ -74,17 +74,17 @@ TEST(ExchangeTest, ARefusalIsAFailureWithItsCodeAndTheReceiversText) {
 TEST(ExchangeTest, ADownloadOfASilentVelmarReceiverIsCancelled) {
   const Exchange exchange = Parse(Recorded("velmar-silent.txt"));
   EXPECT_EQ(exchange.Count(TraceKind::kCommand), 10U);
-  EXPECT_EQ(Only(exchange, "talk this language").end, ExchangeEnd::kUntold);
+  EXPECT_EQ(Only(exchange, "set the language of the port").end, ExchangeEnd::kUntold);
   EXPECT_EQ(Only(exchange, "log filehdra").end, ExchangeEnd::kReply);
   EXPECT_EQ(Only(exchange, "log filetransferb").end, ExchangeEnd::kCancelled);
   EXPECT_EQ(Only(exchange, "currentfile NAME all").end, ExchangeEnd::kReply);
   EXPECT_EQ(Only(exchange, "the wait was cancelled after 24299 ms").thread, 36U);
-  EXPECT_EQ(Only(exchange, "waits until the command has left").kind, TraceKind::kLink);
+  EXPECT_EQ(Only(exchange, "waits until the command is sent").kind, TraceKind::kLink);
   EXPECT_NE(ToText(exchange, false).find("  204    cancel"), std::string::npos);
 }
 
-// What is left after any cut is read, and nothing but the last entries differ.
-TEST(ExchangeTest, AReportThatBreaksOffIsReadAsFarAsItGoes) {
+// A report cut at any place is read, and only its last entries differ.
+TEST(ExchangeTest, ATruncatedReportIsReadUpToItsEnd) {
   const std::string whole = Recorded("quorin-retries.txt");
   for (std::size_t length = 0; length < whole.size(); length += 7) {
     const Exchange exchange = Parse(whole.substr(0, length));
@@ -92,18 +92,18 @@ TEST(ExchangeTest, AReportThatBreaksOffIsReadAsFarAsItGoes) {
   }
   const Exchange cut = Parse(whole.substr(0, whole.size() - 5));
   ASSERT_EQ(cut.remarks.size(), 1U);
-  EXPECT_EQ(cut.remarks[0], "The report breaks off in its last line.");
+  EXPECT_EQ(cut.remarks[0], "The report ends in the middle of its last line.");
 }
 
-TEST(ExchangeTest, WhatStandsInFrontIsRemarkedAndNotLost) {
+TEST(ExchangeTest, TextBeforeTheFirstStampGetsARemark) {
   const Exchange exchange = Parse("half a line\r\n00:00:01.0000      7 Bye!\r\n");
   ASSERT_EQ(exchange.entries.size(), 1U);
   EXPECT_EQ(exchange.entries[0].meaning, "the library is unloaded");
   ASSERT_EQ(exchange.remarks.size(), 1U);
-  EXPECT_EQ(exchange.remarks[0], "The first 13 bytes are no line of a report.");
+  EXPECT_EQ(exchange.remarks[0], "The first 13 bytes are not part of a report.");
 }
 
-TEST(ExchangeTest, WhatIsNoReportHasNoEntries) {
+TEST(ExchangeTest, ATextThatIsNoReportHasNoEntries) {
   for (const char* text : {"",
                            "hello\r\n",
                            "12:00:00 36 Bye!\r\n",
@@ -122,7 +122,7 @@ TEST(ExchangeTest, AReplyMayHaveLineEndsInIt) {
       "[COM7]\r\n12:00:00.0001     36 Bye!\r\n");
   ASSERT_EQ(exchange.entries.size(), 2U);
   EXPECT_EQ(exchange.entries[0].meaning,
-            "refused, or not complete. The receiver said: \\x0D\\x0A<ERROR:a");
+            "refused or incomplete. The receiver sent: \\x0D\\x0A<ERROR:a");
 }
 
 TEST(ExchangeTest, MidnightPassesAndClocksAreSetBack) {
@@ -133,7 +133,7 @@ TEST(ExchangeTest, MidnightPassesAndClocksAreSetBack) {
 
   const Exchange set = Parse("12:00:00.0000      7 a\r\n11:59:00.0000      7 b\r\n");
   EXPECT_EQ(set.entries[1].since_ms, 0U);
-  EXPECT_EQ(set.remarks, std::vector<std::string>{"The clock was set back meanwhile."});
+  EXPECT_EQ(set.remarks, std::vector<std::string>{"The clock was set back during the report."});
 }
 
 // A line with characters of several bytes loses as many at its end, the line end with them.
@@ -147,9 +147,9 @@ TEST(ExchangeTest, ALineOfAMultiByteCodePageMayRunIntoTheNext) {
   EXPECT_EQ(exchange.entries[1].since_ms, 5U);
   ASSERT_EQ(exchange.remarks.size(), 1U);
   EXPECT_NE(exchange.remarks[0].find("code page"), std::string::npos);
-  // Its own end is no sign of a report that breaks off.
+  // Its missing line end is no sign of a truncated report.
   EXPECT_EQ(ReadExchange(report.substr(0, report.find("Bye") - 21), kJapanese).remarks.size(), 1U);
-  // In a line of ASCII alone it is the receiver's text.
+  // In a line of ASCII only, it is text of the receiver.
   EXPECT_EQ(Parse("12:00:00.0000      7 a 12:00:00.0005      7 b\r\n").entries.size(), 1U);
 }
 
@@ -198,7 +198,7 @@ TEST(ExchangeTest, ACodeIsExplainedOnce) {
   EXPECT_EQ(Parse(refusal + refusal).Codes().size(), 1U);
 }
 
-TEST(ExchangeTest, AnEditorsUtf16IsRemarked) {
+TEST(ExchangeTest, AUtf16FileGetsARemark) {
   for (const char* mark : {"\xFF\xFE", "\xFE\xFF"}) {
     EXPECT_EQ(Parse(mark).remarks.size(), 2U) << "the marks are no line either";
   }
@@ -210,7 +210,7 @@ constexpr char kSentCommand[] =
     "12:00:00.0300      7 CSerialConnection::Flush\r\n"
     "12:00:01.0000      7 CQuorinCommand::Execute - start reading. Timeout is [8000 msec]\r\n";
 
-// The text does without the line that a command was sent, so its times do too.
+// The text leaves out the lines of sent commands, so its times leave them out, too.
 TEST(ExchangeTest, TheTextHasALineForEachStep) {
   const Exchange exchange = Parse(kSentCommand);
   const std::string text = ToText(exchange, false);
@@ -220,7 +220,7 @@ TEST(ExchangeTest, TheTextHasALineForEachStep) {
   EXPECT_NE(ToText(exchange, true).find("    | CSerialConnection::Flush\n"), std::string::npos);
 }
 
-TEST(ExchangeTest, TellsAGapInTheUnitThatFits) {
+TEST(ExchangeTest, ShowsAGapInTheUnitThatFits) {
   EXPECT_EQ(Gap(0), "");
   EXPECT_EQ(Gap(999), "+999 ms");
   EXPECT_EQ(Gap(1000), "+1.0 s");
@@ -245,7 +245,7 @@ TEST(ExchangePageTest, AHostsCallLastsAsLongAsItsThread) {
                                         "12:00:00.0100      1 a note\r\n"
                                         "12:00:00.0905      2 another's\r\n"),
                                   "a");
-  // A lane is 905 wide, so each millisecond is one.
+  // A lane is 905 wide and the report 905 ms long, so each millisecond is 1 wide.
   EXPECT_NE(page.find("<rect class=\"fill-host\" x=\"80\" y=\"6\" width=\"100\""),
             std::string::npos);
 }
@@ -280,10 +280,10 @@ TEST(ExchangePageTest, NeedsNothingButItself) {
   EXPECT_NE(page.find("prefers-color-scheme: dark"), std::string::npos);
   EXPECT_NE(page.find("<tr class=\"retry\">"), std::string::npos);
   EXPECT_NE(page.find("<rect class=\"fill-retry\""), std::string::npos);
-  EXPECT_NE(page.find("0x800705B4 silence"), std::string::npos);
+  EXPECT_NE(page.find("0x800705B4 no answer in time"), std::string::npos);
 }
 
-TEST(ExchangePageTest, ALongReportIsCutAndThatIsSaid) {
+TEST(ExchangePageTest, ALongReportIsCutWithARemark) {
   Exchange exchange;
   exchange.entries.resize(kMostPageEntries + 1);
   EXPECT_NE(ToPage(exchange, "a").find("shows the first 20000 of 20001 entries"),

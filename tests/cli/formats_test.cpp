@@ -9,7 +9,7 @@ TransferState State(std::uint64_t done, std::uint64_t total, std::uint64_t rate)
   return {.name = L"LOG.DAT", .done = done, .total = total, .rate = rate};
 }
 
-TEST(FormatsTest, Bytes) {
+TEST(FormatsTest, FormatsBytes) {
   EXPECT_EQ(FormatBytes(0), "0 B");
   EXPECT_EQ(FormatBytes(999), "999 B");
   EXPECT_EQ(FormatBytes(1000), "1.0 kB");
@@ -19,7 +19,7 @@ TEST(FormatsTest, Bytes) {
   EXPECT_EQ(FormatBytes(5'000'000'000'000), "5000.0 GB");
 }
 
-TEST(FormatsTest, Durations) {
+TEST(FormatsTest, FormatsDurations) {
   EXPECT_EQ(FormatDuration(0), "0 s");
   EXPECT_EQ(FormatDuration(59), "59 s");
   EXPECT_EQ(FormatDuration(60), "1 min 00 s");
@@ -28,7 +28,7 @@ TEST(FormatsTest, Durations) {
   EXPECT_EQ(FormatDuration(100'000), "27 h 46 min");
 }
 
-TEST(FormatsTest, Times) {
+TEST(FormatsTest, FormatsTimes) {
   const SYSTEMTIME time = {2024, 5, 3, 1, 2, 4, 6, 0};
   EXPECT_EQ(FormatTime(time), "2024-05-01 02:04:06");
   EXPECT_EQ(FormatTime(time, 'T'), "2024-05-01T02:04:06");
@@ -49,18 +49,18 @@ TEST(FormatsTest, PercentOfTheLargestFile) {
   EXPECT_EQ(PercentOf(State(kLargest - 1, kLargest, 0)), 99U);
 }
 
-TEST(FormatsTest, Line) {
+TEST(FormatsTest, MakesAProgressLine) {
   EXPECT_EQ(ProgressLine(State(500'000, 1'000'000, 10'000)),
             "LOG.DAT: 50 %, 500.0 kB of 1.0 MB, 10.0 kB/s, 50 s left");
   EXPECT_EQ(ProgressLine(State(0, 1'000'000, 0)), "LOG.DAT: 0 %, 0 B of 1.0 MB, 0 B/s, -- left");
 }
 
-TEST(FormatsTest, Json) {
+TEST(FormatsTest, MakesJson) {
   EXPECT_EQ(ProgressJson(State(500, 1000, 250)),
             R"({"file":"LOG.DAT","done":500,"total":1000,"percent":50,"rate":250})");
 }
 
-TEST(FormatsTest, Bar) {
+TEST(FormatsTest, MakesAProgressBar) {
   EXPECT_EQ(ProgressBar(State(500'000, 1'000'000, 10'000), 100),
             "[##########          ]  50 %  500.0 kB of 1.0 MB   10.0 kB/s         50 s left  "
             "LOG.DAT");

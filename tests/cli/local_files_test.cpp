@@ -18,7 +18,7 @@ class LocalFilesTest : public testing::Test {
   TemporaryFolder folder_;
 };
 
-TEST_F(LocalFilesTest, TellsSizes) {
+TEST_F(LocalFilesTest, ReturnsSizes) {
   EXPECT_EQ(SizeOf(Write(L"a", "12345")), 5U);
   EXPECT_EQ(SizeOf(folder_.path() / L"none"), std::nullopt);
 }
@@ -98,12 +98,12 @@ TEST_F(LocalFilesTest, ALocalTimeIsThatOfTheZone) {
   EXPECT_EQ(time.wMinute, 30);
 }
 
-TEST_F(LocalFilesTest, ATimeThatMakesNoSenseIsNone) {
+TEST_F(LocalFilesTest, AnInvalidTimeIsIgnored) {
   EXPECT_EQ(ToFileTime({}, TimeZone::kUtc), std::nullopt);
   EXPECT_EQ(ToFileTime({}, TimeZone::kLocal), std::nullopt);
 }
 
-TEST_F(LocalFilesTest, TheZoneIsSaid) {
+TEST_F(LocalFilesTest, TheZoneIsShown) {
   EXPECT_EQ(InWords(TimeZone::kUtc), "UTC");
   EXPECT_NE(InWords(TimeZone::kLocal).find("local time"), std::string::npos);
 }

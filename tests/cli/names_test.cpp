@@ -22,7 +22,7 @@ TEST(NamesTest, QuotesAndControlCharactersAreNotSent) {
 }
 
 TEST(NamesTest, NamesThatTheCodePageWouldChangeAreNotSent) {
-  // A wide quote would arrive as an ordinary one, or as a question mark.
+  // A wide quote would be sent as an ordinary one, or as a question mark.
   EXPECT_NE(WhyNotSendable(L"a\xFF02"), std::nullopt);
   EXPECT_NE(WhyNotSendable(L"\xD83D\xDE00"), std::nullopt);
 }
@@ -89,7 +89,7 @@ INSTANTIATE_TEST_SUITE_P(Impossible,
                                                 L"b"}));
 
 TEST(NamesTest, NoNameAndTooLongNamesAreRefused) {
-  constexpr std::size_t kLongest = 250;  // what ".part" leaves of 255
+  constexpr std::size_t kLongest = 250;  // 255 without ".part"
   EXPECT_EQ(SafeLocalName(L""), std::nullopt);
   EXPECT_NE(SafeLocalName(std::wstring(kLongest, L'a')), std::nullopt);
   EXPECT_EQ(SafeLocalName(std::wstring(kLongest + 1, L'a')), std::nullopt);

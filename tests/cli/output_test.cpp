@@ -7,7 +7,7 @@
 namespace cli {
 namespace {
 
-/// Makes a pipe the standard output for the time of a test.
+/// Replaces the standard output with a pipe during a test.
 class OutputTest : public testing::Test {
  protected:
   OutputTest() {

@@ -36,7 +36,7 @@ TEST_F(PartFileTest, VanishesUnlessItIsKept) {
   EXPECT_FALSE(folder_.Has(L"a.part"));
 }
 
-TEST_F(PartFileTest, WhatCameCanBeKept) {
+TEST_F(PartFileTest, AnIncompleteFileCanBeKept) {
   std::wstring path;
   {
     PartFile part(Target(), false);
@@ -48,7 +48,7 @@ TEST_F(PartFileTest, WhatCameCanBeKept) {
   EXPECT_FALSE(folder_.Has(L"a"));
 }
 
-// What took an hour to download is not thrown away because its name is taken.
+// A long download must not be lost because its name exists.
 TEST_F(PartFileTest, ACompleteFileSurvivesARenameThatFails) {
   folder_.Write(L"a", "precious");
   {
@@ -87,7 +87,7 @@ TEST_F(PartFileTest, TwoDownloadsCannotShareAPart) {
   EXPECT_THROW(PartFile(Target(), true), Failure);
 }
 
-TEST_F(PartFileTest, SaysWhyItCannotBeMade) {
+TEST_F(PartFileTest, ReportsWhyItCannotBeMade) {
   try {
     const PartFile part(folder_.path() / L"none" / L"a", false);
     ADD_FAILURE() << "was made";

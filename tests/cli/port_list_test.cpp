@@ -54,7 +54,7 @@ TEST(PortListTest, DevicesOfTheDriverFollowWithTheirIds) {
   EXPECT_EQ(device.product, "5678");
 }
 
-TEST(PortListTest, OtherDriversAreNoneOfOurs) {
+TEST(PortListTest, DevicesOfOtherDriversAreNotListed) {
   FakeSource source;
   source.usb = {{kDevice, L"HidUsb", L"Mouse"}, {LR"(\\?\usb#other#{1})", L"", L""}};
   EXPECT_TRUE(ListPorts(source).empty());
@@ -90,7 +90,7 @@ TEST(PortListTest, TheHintNamesThePortsOfTheLink) {
   FakeSource source;
   EXPECT_EQ(PortsInWords(ListPorts(source), eInstanceSerial), "This computer has no COM ports.");
   EXPECT_EQ(PortsInWords(ListPorts(source), eInstanceUSB),
-            "No device of the USBIO driver is plugged into this computer.");
+            "This computer has no USB device with the USBIO driver.");
   source.registered = {L"COM1", L"COM2", L"COM3"};
   source.named = {{L"COM2", L"Modem"}};
   source.usb = {{LR"(\\?\receiver)", L"usbio", L""}};

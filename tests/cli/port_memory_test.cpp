@@ -86,7 +86,7 @@ TEST_F(PortMemoryTest, AFileThatIsMuchTooLongIsAnEmptyOne) {
   EXPECT_EQ(memory_.Recall(L"COM7"), std::nullopt);
 }
 
-TEST_F(PortMemoryTest, EntriesThatMakeNoSenseDoNotCount) {
+TEST_F(PortMemoryTest, InvalidEntriesAreIgnored) {
   const auto entry = [](const char* speed, const char* rts, const char* protocol) {
     return std::string(R"({"ports": {"COM7": {"speed": )") + speed + R"(, "rts": ")" + rts +
            R"(", "protocol": ")" + protocol + R"("}}})";
@@ -117,7 +117,7 @@ class HeldFile {
   UniqueHandle handle_;
 };
 
-TEST_F(PortMemoryTest, AFileThatCannotBeWrittenIsSaidToBe) {
+TEST_F(PortMemoryTest, AFileThatCannotBeWrittenIsReported) {
   folder_.Write(L"folder", "");
   const PortMemory nowhere(folder_.path() / L"folder" / L"ports.json");
   EXPECT_FALSE(nowhere.Remember(L"COM7", kSetting));
@@ -160,8 +160,8 @@ TEST_F(PortMemoryTest, ProgramsThatRunAtTheSameTimeLoseNothing) {
   }
 }
 
-// It had the lock of all memories, and left it behind.
-TEST_F(PortMemoryTest, AProgramThatWasKilledHoldsUpNobody) {
+// It was killed while it held the lock.
+TEST_F(PortMemoryTest, AProgramThatWasKilledDoesNotBlockOthers) {
   const UniqueHandle mutex(CreateMutexW(nullptr, FALSE, L"Local\\rcvlink-cli port memory"));
   std::jthread([&mutex] { WaitForSingleObject(mutex.get(), INFINITE); }).join();
   EXPECT_TRUE(memory_.Remember(L"COM7", kSetting));

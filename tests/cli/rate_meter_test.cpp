@@ -14,7 +14,7 @@ TEST(RateMeterTest, IsUnknownAtFirst) {
   EXPECT_EQ(meter.BytesPerSecond(), 2000U);
 }
 
-// A receiver that took its time at the beginning is not held against it.
+// A slow start of the transfer must not affect the rate later.
 TEST(RateMeterTest, ForgetsWhatIsLongAgo) {
   RateMeter meter;
   meter.Add(0, 0);

@@ -8,27 +8,26 @@
 namespace cli {
 namespace {
 
-TEST(ResultsTest, EveryCodeOfTheLibraryHasItsOwnWords) {
+TEST(ResultsTest, EveryCodeOfTheLibraryHasItsOwnText) {
   EXPECT_EQ(MeaningOf(S_OK), "done");
-  EXPECT_EQ(MeaningOf(S_FALSE),
-            "nothing was done: nothing found, aborted, or ended by the receiver");
-  EXPECT_EQ(MeaningOf(E_INVALIDARG), "an argument is not valid");
+  EXPECT_EQ(MeaningOf(S_FALSE), "no result: nothing found, aborted, or ended by the receiver");
+  EXPECT_EQ(MeaningOf(E_INVALIDARG), "invalid argument");
   EXPECT_EQ(MeaningOf(E_OUTOFMEMORY), "this computer is out of memory");
-  EXPECT_EQ(MeaningOf(E_NOTIMPL), "not offered by this receiver's family, or not by this version");
+  EXPECT_EQ(MeaningOf(E_NOTIMPL), "not supported by this receiver family or by this version");
   EXPECT_EQ(MeaningOf(E_FAIL), "internal failure");
   EXPECT_EQ(MeaningOf(E_UNEXPECTED), "unexpected kind of link");
   EXPECT_EQ(MeaningOf(static_cast<long>(0x8007048F)),
             "no connection, no complete reply, or the receiver refused the command");
-  EXPECT_EQ(MeaningOf(static_cast<long>(0x800705B4)), "the receiver stayed silent");
+  EXPECT_EQ(MeaningOf(static_cast<long>(0x800705B4)), "the receiver did not answer in time");
   EXPECT_EQ(MeaningOf(static_cast<long>(0x80070002)), "it does not exist");
   EXPECT_EQ(MeaningOf(static_cast<long>(0x80070005)), "access denied: in use, or not allowed");
 }
 
-TEST(ResultsTest, WindowsHasWordsForTheOthers) {
+TEST(ResultsTest, OtherCodesHaveTheTextOfWindows) {
   const std::string text = MeaningOf(ResultOfWin32(ERROR_DISK_FULL));
   EXPECT_FALSE(text.empty());
   EXPECT_EQ(text.find_first_of("\r\n"), std::string::npos);
-  EXPECT_EQ(MeaningOf(static_cast<long>(0x8007FFF0)), "a result that Windows has no words for");
+  EXPECT_EQ(MeaningOf(static_cast<long>(0x8007FFF0)), "unknown result code");
 }
 
 TEST(ResultsTest, ExitCodesDiffer) {
@@ -43,17 +42,18 @@ TEST(ResultsTest, ExitCodesDiffer) {
   }
 }
 
-TEST(ResultsTest, AFailureTellsWhatWhereCodeAndMeaning) {
+TEST(ResultsTest, AFailureShowsWhatWhereCodeAndMeaning) {
   const Failure failure{.tried = "download A.DAT",
                         .port = "COM7",
                         .code = ResultOfWin32(ERROR_TIMEOUT),
                         .hint = "Try again."};
   EXPECT_EQ(Describe(failure),
-            "rcvlink-cli: COM7: could not download A.DAT: 0x800705B4, the receiver stayed silent\n"
+            "rcvlink-cli: COM7: could not download A.DAT: 0x800705B4, the receiver did not answer "
+            "in time\n"
             "  Try again.\n");
 }
 
-TEST(ResultsTest, EachCodeThatIsExplainedSaysSo) {
+TEST(ResultsTest, EachExplainedCodeGivesAHint) {
   const Failure failure{.tried = "delete A.DAT", .code = ResultOfWin32(ERROR_DEVICE_NOT_CONNECTED)};
   EXPECT_NE(Describe(failure).find("`rcvlink-cli explain 0x8007048F`"), std::string::npos);
   EXPECT_EQ(HintOf(Failure{.code = ResultOfWin32(ERROR_ARENA_TRASHED)}), "");
@@ -68,7 +68,7 @@ TEST(ResultsTest, ACodeThatReadsAsASuccessIsNotShown) {
   }
 }
 
-TEST(ResultsTest, WhatIsKeptIsTold) {
+TEST(ResultsTest, TheKeptFileIsShown) {
   const Failure failure{.tried = "download A.DAT", .code = S_OK, .hint = "x", .kept = "A.DAT.part"};
   EXPECT_NE(Describe(failure).find("kept in A.DAT.part\n"), std::string::npos);
   EXPECT_EQ(ToJson(failure).at("kept"), "A.DAT.part");
@@ -94,7 +94,7 @@ TEST(ResultsTest, AFailureIsAlsoJson) {
                          {"port", "COM7"},
                          {"code", "0x00000001"},
                          {"meaning", "no receiver answered"},
-                         {"hint", "`rcvlink-cli explain 0x00000001` tells what to try."},
+                         {"hint", "`rcvlink-cli explain 0x00000001` says what to try."},
                          {"exit", 3}};
   EXPECT_EQ(ToJson(failure), expected);
   EXPECT_TRUE(ToJson(Failure{})["port"].is_null());

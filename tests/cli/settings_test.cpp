@@ -44,7 +44,7 @@ TEST(SettingsTest, SpeedsAreTheSameForAll) {
   EXPECT_EQ(Number("baud", "115200", eProtocolVelmar), 115200U);
 }
 
-TEST(SettingsTest, OtherWordsMeanNothing) {
+TEST(SettingsTest, OtherWordsAreRefused) {
   for (const char* value : {"", "0", "-9600", "9600x", "5", "99999999", "99999999999999999999"}) {
     EXPECT_FALSE(ParseSetting("baud", value)) << value;
   }

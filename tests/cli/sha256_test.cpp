@@ -6,7 +6,7 @@ namespace cli {
 namespace {
 
 // The examples of the standard that defines it.
-TEST(Sha256Test, KnownValues) {
+TEST(Sha256Test, GivesKnownValues) {
   EXPECT_EQ(Sha256().Finish(), "e3b0c44298fc1c149afbf4c8996fb92427ae41e4649b934ca495991b7852b855");
   Sha256 whole;
   whole.Add("abc", 3);

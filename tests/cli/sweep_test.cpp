@@ -59,9 +59,9 @@ TEST(SweepTest, AKnownReceiverOfAnotherFamilyThanAskedForDoesNotCount) {
   EXPECT_EQ(PlanSweep(eProtocolQuorin, 0, known), PlanSweep(eProtocolQuorin, 0, {}));
 }
 
-TEST(SweepTest, SaysATryInWords) {
+TEST(SweepTest, DescribesATry) {
   EXPECT_EQ(InWords({57600, RtsMode::kOn}), "57600 bit/s, RTS on");
-  EXPECT_EQ(InWords({0, RtsMode::kHandshake}), "the port's own speed, RTS handshake");
+  EXPECT_EQ(InWords({0, RtsMode::kHandshake}), "the port's current speed, RTS handshake");
 }
 
 /// A port on which a receiver of one family answers at one setting.

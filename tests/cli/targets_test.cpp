@@ -82,7 +82,7 @@ TEST_F(TargetsTest, WhatAnEarlierDownloadLeftIsKeptUnlessForced) {
   EXPECT_EQ(forced.Choose(L"a"), folder_.path() / L"a");
 }
 
-TEST_F(TargetsTest, FoldersThatCanBeMadeWillDo) {
+TEST_F(TargetsTest, FoldersThatCanBeMadeAreAccepted) {
   EXPECT_NO_THROW(Targets(Into()).CheckFolder());
   EXPECT_NO_THROW(Targets(Into(L"new\\deep\\")).CheckFolder());
   EXPECT_NO_THROW(Targets(Into(L"a.dat")).CheckFolder());
@@ -120,7 +120,7 @@ TEST_F(TargetsTest, TwoNamesNeverShareAFile) {
   targets.Choose(L"LOG");
   ExpectRefusal(targets, L"LOG");
   ExpectRefusal(targets, L"log");
-  ExpectRefusal(targets, L"log.part");  // LOG grows under that name
+  ExpectRefusal(targets, L"log.part");  // LOG is downloaded under that name
   targets.Choose(L"x.part");
   ExpectRefusal(targets, L"X");
   targets.Choose(L"a/b");

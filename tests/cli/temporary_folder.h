@@ -12,7 +12,7 @@
 
 namespace cli {
 
-/// Gone, with all that is in it, at the end of the test.
+/// Deleted with its content at the end of the test.
 class TemporaryFolder {
  public:
   TemporaryFolder()

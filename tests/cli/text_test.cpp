@@ -51,9 +51,9 @@ TEST(TextTest, RedrawsALineOverALongerOne) {
   EXPECT_EQ(Erased(3), "\r   \r");
 }
 
-TEST(TextTest, SmallLetters) { EXPECT_EQ(Lowered("Com7 \xC3\x84"), "com7 \xC3\x84"); }
+TEST(TextTest, LowersAsciiLettersOnly) { EXPECT_EQ(Lowered("Com7 \xC3\x84"), "com7 \xC3\x84"); }
 
-TEST(TextTest, ChangesBetweenWords) {
+TEST(TextTest, CountsChangesBetweenWords) {
   EXPECT_EQ(ChangesBetween("", ""), 0U);
   EXPECT_EQ(ChangesBetween("find", "find"), 0U);
   EXPECT_EQ(ChangesBetween("", "ls"), 2U);

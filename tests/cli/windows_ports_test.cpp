@@ -1,4 +1,4 @@
-// What Windows tells of devices, with one that a test puts into its registry.
+// The devices that Windows knows, with one that the test adds to the registry.
 #include <windows.h>
 
 #include <gtest/gtest.h>
@@ -16,7 +16,7 @@ const std::wstring kInstance = L"RCVLINK-TEST";
 const std::wstring kClasses = L"SYSTEM\\CurrentControlSet\\Control\\DeviceClasses\\" + kClass;
 const std::wstring kPath = LR"(\\?\usb#vid_12ab&pid_5678#rcvlink-test#)" + kClass;
 
-/// A USB device that is plugged in, as far as the registry tells.
+/// The registry entries of a USB device that is plugged in.
 class ListedDevice {
  public:
   explicit ListedDevice(const std::wstring& service) {

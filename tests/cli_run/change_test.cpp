@@ -18,7 +18,7 @@ TEST_F(Cli, RemoveDeletesEachFile) {
   EXPECT_EQ(files[0].at("name"), "b.jps");
 }
 
-TEST_F(Cli, RemoveThatIsRefusedFailsInHexAndWords) {
+TEST_F(Cli, RemoveThatIsRefusedShowsCodeAndMeaning) {
   const bed::SimulatedPort receiver({"quorin", "--refuse", "remove"}, {{"a.jps", "a"}});
   const auto result = RunOn(receiver, {"rm", "a.jps"});
   EXPECT_EQ(result.status, kFailed);
@@ -26,11 +26,11 @@ TEST_F(Cli, RemoveThatIsRefusedFailsInHexAndWords) {
   EXPECT_THAT(result.errors, HasSubstr("0x8007048F"));
 }
 
-TEST_F(Cli, MoveIsRefusedWithASentence) {
+TEST_F(Cli, MoveIsRefusedWithAMessage) {
   const bed::SimulatedPort receiver({"quorin"}, {{"a.jps", "a"}});
   const auto result = RunOn(receiver, {"mv", "a.jps", "b.jps"});
   EXPECT_EQ(result.status, kFailed);
-  EXPECT_THAT(result.errors, HasSubstr("does not offer renaming"));
+  EXPECT_THAT(result.errors, HasSubstr("cannot rename files"));
 }
 
 TEST_F(Cli, SettingsReachTheReceiverInItsOwnWords) {
@@ -54,27 +54,27 @@ TEST_F(Cli, SettingsReachTheReceiverInItsOwnWords) {
   }
 }
 
-// What the RTS line does is not seen from here.
-TEST_F(Cli, AnRtsLineIsNotConfirmedAndSaidToBeSo) {
+// The program cannot check the RTS line.
+TEST_F(Cli, AnRtsLineIsReportedAsNotConfirmed) {
   const bed::SimulatedPort receiver({"quorin"});
   const auto result = RunOn(receiver, {"set", "rts", "off", "--json"});
   EXPECT_EQ(result.status, kDone);
   EXPECT_EQ(nlohmann::json::parse(result.output).at("confirmed"), false);
-  EXPECT_THAT(RunOn(receiver, {"set", "rts", "on"}).output, HasSubstr("does not confirm"));
+  EXPECT_THAT(RunOn(receiver, {"set", "rts", "on"}).output, HasSubstr("could not be confirmed"));
 }
 
 TEST_F(Cli, ANewSpeedIsTried) {
   const bed::SimulatedPort receiver({"quorin"}, {{"a.jps", "a"}});
   const auto result = RunOn(receiver, {"set", "baud", "57600"});
   EXPECT_EQ(result.status, kDone) << result.errors;
-  EXPECT_THAT(result.output, HasSubstr("it answers there"));
+  EXPECT_THAT(result.output, HasSubstr("it answers with that setting"));
   EXPECT_THAT(result.output, HasSubstr("--speed 57600"));
-  // Asked there: the ping came after the change.
+  // The receiver is checked: the ping comes after the change.
   const std::string transcript = receiver.Transcript();
   EXPECT_NE(transcript.find("> dm", transcript.find("= speed 57600")), std::string::npos);
 }
 
-TEST_F(Cli, ARefusedSpeedIsSaidToBeRefused) {
+TEST_F(Cli, ARefusedSpeedIsReportedAsRefused) {
   for (const char* family : {"quorin", "velmar"}) {
     const bed::SimulatedPort receiver({family}, {{"a.jps", "a"}});
     const auto result = RunOn(receiver, {"set", "baud", "12345", "--protocol", family});
@@ -84,7 +84,7 @@ TEST_F(Cli, ARefusedSpeedIsSaidToBeRefused) {
   }
 }
 
-// The other family is not asked again: it would take seconds in which nothing answers.
+// The other family is not asked: that would take seconds without an answer.
 TEST_F(Cli, ANewSpeedIsConfirmedByTheFamilyThatWasFound) {
   const bed::SimulatedPort receiver({"velmar"}, {{"a.log", "a"}});
   EXPECT_EQ(RunOn(receiver, {"set", "baud", "57600"}).status, kDone);
@@ -95,9 +95,9 @@ TEST_F(Cli, ANewSpeedIsConfirmedByTheFamilyThatWasFound) {
   EXPECT_EQ(transcript.find("%", change), std::string::npos) << transcript;
 }
 
-// A question that nobody needs is time at the cable. Two questions of each are the greeting's; a
-// download at a low speed raises it and puts it back.
-TEST_F(Cli, CommandsAskOnlyWhatTheyNeed) {
+// A command that is not needed costs time. Two commands of each count belong to the handshake; a
+// download at a low speed raises the speed and puts it back.
+TEST_F(Cli, CommandsSendOnlyWhatTheyNeed) {
   const bed::SimulatedPort receiver({"quorin"}, {{"a.jps", "a"}, {"b.jps", "b"}});
   const auto questions = [&receiver] {
     const std::string transcript = receiver.Transcript();
@@ -122,13 +122,13 @@ TEST_F(Cli, CommandsAskOnlyWhatTheyNeed) {
 
 class SetMemory : public Cli {
  protected:
-  // One family is asked only: each that is not there takes long.
+  // Only one family is asked, because a family that does not answer takes long.
   bed::ProgramResult SetBaud(const bed::SimulatedPort& receiver,
                              const std::string& speed,
                              const std::string& option) const {
     return RunOn(receiver, {"set", "baud", speed, "--protocol", "quorin", option});
   }
-  // What a search begins with.
+  // The first try of a search.
   std::string FirstTry(const bed::SimulatedPort& receiver) const {
     bed::Program search(kProgram,
                         {"find", Port(receiver), "--protocol", "quorin"},
@@ -143,7 +143,7 @@ class SetMemory : public Cli {
   }
 };
 
-// A speed that no search begins with.
+// A speed that is not among the first tries of a search.
 constexpr char kOtherSpeed[] = "57600";
 
 TEST_F(SetMemory, ANewSpeedIsRemembered) {
@@ -165,19 +165,20 @@ TEST_F(SetMemory, WithoutMemoryANewSpeedIsNotRemembered) {
   EXPECT_THAT(FirstTry(receiver), HasSubstr(": 9600 bit/s, RTS off"));
 }
 
-TEST_F(SetMemory, ALostReceiverIsSaidToBeAndForgotten) {
+TEST_F(SetMemory, ALostReceiverIsReportedAndForgotten) {
   const bed::SimulatedPort receiver({"quorin", "--stray-speed", "19200"});
   const auto result = SetBaud(receiver, kOtherSpeed, "--json");
   EXPECT_EQ(result.status, kNoReceiver);
   const auto error = nlohmann::json::parse(result.output).at("error");
   EXPECT_EQ(error.at("exit"), kNoReceiver);
   EXPECT_EQ(error.at("tried"), "set the receiver's baud rate to 57600");
-  EXPECT_THAT(error.at("meaning"), HasSubstr("answers neither as asked nor as before"));
+  EXPECT_THAT(error.at("meaning"),
+              HasSubstr("answers neither with the new setting nor with the old one"));
   EXPECT_THAT(error.at("hint"), HasSubstr("rcvlink-cli find"));
   EXPECT_THAT(FirstTry(receiver), HasSubstr(": 115200 bit/s, RTS on"));
 }
 
-TEST_F(Cli, ASettingThatLosesTheReceiverNeedsAYes) {
+TEST_F(Cli, ASettingThatLosesTheReceiverNeedsTheYesOption) {
   const bed::SimulatedPort receiver({"quorin"});
   for (const std::vector<std::string>& change :
        std::vector<std::vector<std::string>>{{"set", "parity", "odd"}, {"set", "stopbits", "2"}}) {

@@ -1,4 +1,5 @@
-// rcvlink-cli completion: the script for PowerShell, as far as it can be looked at without one.
+// rcvlink-cli completion: the script for PowerShell, as far as it can be checked without
+// PowerShell.
 #include <algorithm>
 
 #include "tests/cli_run/cli.h"
@@ -11,8 +12,8 @@ using testing::HasSubstr;
 TEST_F(Cli, TheCompletionScriptKnowsCommandsAndOptions) {
   const auto result = Run({"completion"});
   EXPECT_EQ(result.status, kDone) << result.errors;
-  EXPECT_THAT(result.output, HasSubstr("'get' = 'Download files, or all of them'"));
-  EXPECT_THAT(result.output, HasSubstr("'--skip-existing' = 'Leave out"));
+  EXPECT_THAT(result.output, HasSubstr("'get' = 'Download files'"));
+  EXPECT_THAT(result.output, HasSubstr("'--skip-existing' = 'Skip files"));
   EXPECT_THAT(result.output, HasSubstr("'--json' = "));
 }
 

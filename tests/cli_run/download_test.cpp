@@ -1,4 +1,4 @@
-// rcvlink-cli get: what lands on the disk, and what never does.
+// rcvlink-cli get: which files are written, and which never are.
 #include <windows.h>
 
 #include <filesystem>
@@ -22,7 +22,7 @@ TEST_F(Cli, GetBringsTheFile) {
   EXPECT_THAT(result.output, HasSubstr("3000 bytes"));
 }
 
-TEST_F(Cli, GetSpeaksLittleWhenQuiet) {
+TEST_F(Cli, GetPrintsNothingWhenQuiet) {
   const bed::SimulatedPort receiver({"quorin"}, {{"a.jps", Content(30)}});
   const auto result = RunOn(receiver, {"get", "a.jps", "--quiet"});
   EXPECT_EQ(result.status, kDone);
@@ -60,7 +60,7 @@ TEST_F(Cli, GetOfAnUnknownFileTransfersNothing) {
   EXPECT_THAT(LocalFiles(), IsEmpty());
 }
 
-// The library calls it a success; the program knows better, and throws nothing away.
+// The library returns success; the program compares the sizes and keeps the data.
 TEST_F(Cli, AFileOfAnotherSizeThanListedIsKeptAsAPart) {
   for (const char* listed : {"4000", "2000"}) {
     const bed::SimulatedPort receiver({"velmar", "--lie-size", std::string("a.jps=") + listed},
@@ -103,7 +103,7 @@ TEST_F(Cli, ACompleteDownloadSurvivesARenameThatFails) {
   EXPECT_EQ(folder.Read("a.jps"), "mine");
 }
 
-TEST_F(Cli, WhatCameOfAFailedDownloadIsKeptWhenAskedFor) {
+TEST_F(Cli, TheDataOfAFailedDownloadIsKeptWhenAskedFor) {
   const bed::SimulatedPort receiver({"quorin", "--end-block", "2"}, {{"a.jps", Content(3000)}});
   const auto result = RunOn(receiver, {"get", "a.jps", "--keep-partial"});
   EXPECT_EQ(result.status, kFailed);
@@ -128,7 +128,7 @@ TEST_F(Cli, APatternThatFitsNothingTransfersNothing) {
   EXPECT_THAT(LocalFiles(), IsEmpty());
 }
 
-TEST_F(Cli, FilesThatAreHereCanBeSkipped) {
+TEST_F(Cli, ExistingFilesCanBeSkipped) {
   folder.Write("a.jps", Content(30));
   folder.Write("b.jps", "mine");
   const bed::SimulatedPort receiver(
@@ -142,8 +142,8 @@ TEST_F(Cli, FilesThatAreHereCanBeSkipped) {
   EXPECT_EQ(files[0].at("skipped"), true);
   EXPECT_EQ(files[1].at("bytes"), 4);
   EXPECT_FALSE(files[2].contains("skipped"));
-  // A quiet user hears of the file that is not the receiver's, and of that alone.
-  EXPECT_EQ(result.errors, "b.jps: is here already, with 4 bytes; the receiver lists 40\n");
+  // With --quiet only the file with another size is reported.
+  EXPECT_EQ(result.errors, "b.jps: already exists, with 4 bytes; the receiver lists 40\n");
 }
 
 // "A.JPS" and "a.jps" are two files on a receiver.
@@ -152,10 +152,10 @@ TEST_F(Cli, AFileThatDiffersInCaseAloneIsNotSkippedInSilence) {
   const bed::SimulatedPort receiver({"quorin"}, {{"A.JPS", Content(30)}, {"a.jps", Content(40)}});
   const auto result = RunOn(receiver, {"get", "--all", "--skip-existing"});
   EXPECT_EQ(result.status, kLocalFile);
-  EXPECT_THAT(result.errors, HasSubstr("place of another file"));
+  EXPECT_THAT(result.errors, HasSubstr("already used for another file"));
 }
 
-// A stale part, a file that is here, and two names that are one on this computer.
+// An old .part, an existing file, and two names that are one on this computer.
 TEST_F(Cli, WhatCannotBeKeptStopsNoOtherFile) {
   folder.Write("a.jps.part", "what came of an earlier download");
   folder.Write("b.jps", "mine");
@@ -169,9 +169,9 @@ TEST_F(Cli, WhatCannotBeKeptStopsNoOtherFile) {
            {"get", "a.jps", "b.jps", "c.jps", "d.jps", "D.jps"}, {"get", "*.jps"}}) {
     const auto result = RunOn(receiver, line);
     EXPECT_EQ(result.status, kLocalFile);
-    EXPECT_THAT(result.errors, HasSubstr("a.jps.part exists already"));
-    EXPECT_THAT(result.errors, HasSubstr("b.jps exists already"));
-    EXPECT_THAT(result.errors, HasSubstr("place of another file"));
+    EXPECT_THAT(result.errors, HasSubstr("a.jps.part already exists"));
+    EXPECT_THAT(result.errors, HasSubstr("b.jps already exists"));
+    EXPECT_THAT(result.errors, HasSubstr("already used for another file"));
     EXPECT_EQ(folder.Read("c.jps"), Content(50));
     EXPECT_EQ(folder.Read("b.jps"), "mine");
     std::filesystem::remove(folder / "c.jps");
@@ -198,8 +198,8 @@ TEST_F(Cli, AFileThatCannotGetItsNameStopsNoOther) {
   EXPECT_EQ(folder.Read("b.jps"), Content(40));
 }
 
-// Each of them is told although no receiver is there: the search comes after.
-TEST_F(Cli, WhatIsWrongOnThisComputerIsToldBeforeTheSearch) {
+// Each error is reported although there is no receiver: the search comes later.
+TEST_F(Cli, LocalErrorsAreReportedBeforeTheSearch) {
   folder.Write("taken", "a file");
   folder.Write("b.jps.part", "what came of an earlier download");
   for (const std::vector<std::string>& line :
@@ -241,12 +241,12 @@ TEST_F(Cli, FilesThatTheDiskHasNoRoomForAreRefusedAtOnce) {
   const bed::SimulatedPort receiver(simulator, files);
   const auto result = RunOn(receiver, {"get", "--all", "--protocol", "velmar"});
   EXPECT_EQ(result.status, kLocalFile);
-  EXPECT_THAT(result.errors, HasSubstr("there is room for"));
+  EXPECT_THAT(result.errors, HasSubstr("the disk has room for"));
   EXPECT_THAT(receiver.Transcript(), testing::Not(HasSubstr("filetransfer")));
   EXPECT_THAT(LocalFiles(), IsEmpty());
 }
 
-TEST_F(Cli, AHashOfTheFileIsTold) {
+TEST_F(Cli, TheHashOfTheFileIsShown) {
   constexpr char kHashOfAbc[] = "ba7816bf8f01cfea414140de5dae2223b00361a396177a9cb410ff61f20015ad";
   const bed::SimulatedPort receiver({"quorin"}, {{"a.jps", "abc"}});
   const auto document =
@@ -273,7 +273,7 @@ TEST_F(Cli, AFolderThatCannotBeMadeIsALocalError) {
   EXPECT_THAT(LocalFiles(), ElementsAre("taken"));
 }
 
-// Names that would climb out of the folder or open a device are kept inside, under another name.
+// Names that would leave the folder or open a device are saved inside it under another name.
 TEST_F(Cli, NamesOfTheReceiverStayInTheFolder) {
   std::filesystem::create_directory(folder / "in");
   folder.Write("in/keep", "");
@@ -295,7 +295,7 @@ TEST_F(Cli, ASilentTransferIsEndedAfterTheStallTimeOut) {
                                     {{"a.jps", Content(5000)}});
   const auto result = RunOn(receiver, {"get", "a.jps", "--stall-timeout", "2"});
   EXPECT_EQ(result.status, kFailed);
-  EXPECT_THAT(result.errors, HasSubstr("nothing new"));
+  EXPECT_THAT(result.errors, HasSubstr("no new data"));
   EXPECT_THAT(LocalFiles(), IsEmpty());
 }
 
@@ -334,7 +334,7 @@ TEST_F(Cli, AFileGoesToTheStandardOutput) {
   EXPECT_THAT(LocalFiles(), IsEmpty());
 }
 
-TEST_F(Cli, AFileGoesNowhere) {
+TEST_F(Cli, AFileGoesToTheNullDevice) {
   const bed::SimulatedPort receiver({"quorin"}, {{"a.jps", Content(3000)}});
   const auto result = RunOn(receiver, {"get", "a.jps", "-o", "NUL"});
   EXPECT_EQ(result.status, kDone) << result.errors;
@@ -356,14 +356,14 @@ TEST_F(Cli, ProgressIsShownAsAskedFor) {
   EXPECT_EQ(first.at("total"), 3000);
 }
 
-// The set-up of a download and the reading of a list are shown as well.
-TEST_F(Cli, ATerminalShowsWhatIsWaitedFor) {
+// The preparation of a download and the reading of a list are shown, too.
+TEST_F(Cli, ATerminalShowsWhatTheProgramWaitsFor) {
   const bed::SimulatedPort receiver({"quorin", "--reply-silence", "3:print,/log/@1"},
                                     {{"a.jps", Content(3000)}});
   bed::Program program(
       kProgram, On(receiver, {"get", "a.jps"}), bed::Output::kTerminal, folder.unix_path());
   program.Expect("Reading the list of files ... ");
-  program.Expect("getting ready");
+  program.Expect("preparing");
   EXPECT_EQ(program.Finish().status, kDone);
 }
 

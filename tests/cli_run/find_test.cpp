@@ -1,4 +1,4 @@
-// The search: at which setting a receiver answers, what is remembered of it, several ports at once.
+// The search: the setting at which a receiver answers, what is remembered, several ports at once.
 #include <windows.h>
 
 #include <nlohmann/json.hpp>
@@ -31,7 +31,7 @@ class Find : public Cli {
   }
 };
 
-TEST_F(Find, TellsTheSettingThatAnswered) {
+TEST_F(Find, ShowsTheSettingThatAnswered) {
   const bed::SimulatedPort receiver({"quorin"});
   const auto text = RunOn(receiver, {"find"});
   EXPECT_EQ(text.status, kDone) << text.errors;
@@ -43,7 +43,7 @@ TEST_F(Find, TellsTheSettingThatAnswered) {
   EXPECT_EQ(found.at("rts"), "off");
 }
 
-TEST_F(Find, SaysEachTryToo) {
+TEST_F(Find, ShowsEachTryToo) {
   const bed::SimulatedPort receiver({"quorin", "--speed", "9600"});
   const auto result = Sweep(receiver, {"find", "--no-memory"});
   EXPECT_EQ(result.status, kDone) << result.errors;
@@ -81,14 +81,14 @@ TEST_F(Find, EachTryIsAlsoJson) {
   EXPECT_THAT(result.output, HasSubstr("(serial, 9600 bit/s, RTS on)"));
 }
 
-// One try at a setting that was asked for is no progress.
+// One try at a given setting shows no progress.
 TEST_F(Find, ASingleTryHasNoLine) {
   const bed::SimulatedPort receiver({"quorin"});
   EXPECT_EQ(RunOn(receiver, {"find", "--protocol", "quorin", "--progress", "json"}).errors, "");
   EXPECT_EQ(RunOn(receiver, {"find", "--protocol", "quorin", "--progress", "lines"}).errors, "");
 }
 
-TEST_F(Find, ATerminalShowsTheTryAndTakesItAway) {
+TEST_F(Find, ATerminalShowsTheTryAndErasesIt) {
   const bed::SimulatedPort receiver({"quorin", "--speed", "115200"});
   bed::Program program(kProgram,
                        {"find", NameOf(receiver), "--protocol", "quorin", "--no-memory"},
@@ -101,8 +101,8 @@ TEST_F(Find, ATerminalShowsTheTryAndTakesItAway) {
   EXPECT_THAT(result.output, AllOf(HasSubstr("Quorin receiver"), Not(HasSubstr("try 1"))));
 }
 
-// Nothing else is shown after the try, which would cover it.
-TEST_F(Find, NothingIsLeftOfATryThatWasInVain) {
+// Nothing else is shown after the try that would overwrite it.
+TEST_F(Find, AFailedTryIsErased) {
   const bed::SimulatedPort silent({"quorin", "--mute", "*"});
   const auto result =
       bed::Program(kProgram,
@@ -111,7 +111,7 @@ TEST_F(Find, NothingIsLeftOfATryThatWasInVain) {
                    folder.unix_path())
           .Finish();
   EXPECT_EQ(result.status, kNoReceiver) << result.output;
-  EXPECT_THAT(result.history, testing::Contains(HasSubstr("(Ctrl-C ends it)")));
+  EXPECT_THAT(result.history, testing::Contains(HasSubstr("(Ctrl-C stops it)")));
   EXPECT_THAT(result.output, Not(HasSubstr("Ctrl-C")));
 }
 
@@ -131,7 +131,7 @@ TEST_F(Find, WhatWasFoundIsTriedFirstTheNextTime) {
 
 TEST_F(Find, WithoutMemoryNothingIsRemembered) {
   const bed::SimulatedPort receiver({"quorin"});
-  // A setting that is not tried early is remembered, and stays so.
+  // A setting that is not among the first tries is remembered, too.
   ASSERT_EQ(RunOn(receiver, {"find", "--rts", "handshake"}).status, kDone);
   ASSERT_EQ(RunOn(receiver, {"find", "--no-memory"}).status, kDone);
   EXPECT_THAT(Sweep(receiver, {"find"}).errors, HasSubstr(": 9600 bit/s, RTS handshake\n"));
@@ -165,9 +165,9 @@ TEST_F(Find, SeveralPortsAreSearchedSideBySide) {
   EXPECT_EQ(found.at("failures")[0].at("meaning"), "no receiver answered");
 }
 
-// The silent port comes first and takes long: whoever asks one after the other would have come to
-// the end before the second answers.
-TEST_F(Find, APortThatAnswersIsToldBeforeTheSilentOnesEnd) {
+// The silent port comes first and takes long: a search of one port after the other would not reach
+// the second in time.
+TEST_F(Find, APortThatAnswersIsShownBeforeTheSilentOnesEnd) {
   const bed::SimulatedPort silent({"quorin", "--mute", "*"});
   const bed::SimulatedPort answering({"quorin", "--id", "QR2"});
   bed::Program program(
@@ -196,7 +196,7 @@ TEST_F(Find, AComPortIsSerialAmongUsbDevices) {
   ASSERT_EQ(found.at("failures").size(), 1U);
 }
 
-TEST_F(Find, WithoutASpeedThatOfThePortIsTold) {
+TEST_F(Find, WithoutASpeedTheSpeedOfThePortIsReported) {
   const bed::SimulatedPort receiver({"quorin"});
   ASSERT_EQ(RunOn(receiver, {"find"}).status, kDone);
   const auto result = Sweep(receiver, {"find", "--rts", "on", "--json"});
@@ -248,7 +248,7 @@ class ListedPort {
   HKEY key_ = nullptr;
 };
 
-// In one test: other tests run side by side with it, and --all must not reach the ports of theirs.
+// All in one test: other tests run at the same time, and --all must not reach their ports.
 TEST_F(Find, ListedPortsAreNamedAndAllAreAsked) {
   const bed::SimulatedPort receiver({"quorin", "--id", "QR4"});
   const ListedPort listed(receiver.name());
@@ -267,7 +267,7 @@ TEST_F(Find, ListedPortsAreNamedAndAllAreAsked) {
   EXPECT_THAT(found.output, StartsWith(name + " (serial, 9600 bit/s, RTS on): Quorin receiver"));
 }
 
-TEST_F(Find, AComPortOnUsbIsSaidToBeSerial) {
+TEST_F(Find, AComPortOnUsbGivesAHint) {
   const auto usb = Run({"ls", "COM99", "--link", "usb"});
   EXPECT_THAT(usb.errors, HasSubstr("COM ports are for --link serial"));
 }

@@ -1,4 +1,4 @@
-// The tags of Quorin commands, which count through a process: each that starts begins at 1.
+// The tags of Quorin commands: they are counted per process, from 1.
 #include "tests/cli_run/cli.h"
 #include "tests/host/support/simulated_usb.h"
 #include "tests/host/support/wire.h"
@@ -18,7 +18,7 @@ TEST_F(Cli, TheFirstTagOfAProcessIsOne) {
   for (size_t i = 0; i < tags.size(); ++i) EXPECT_EQ(tags[i], static_cast<int>(i) + 1);
 }
 
-// Identity and model are asked for after the greeting.
+// Identity and model come after the handshake.
 TEST_F(Cli, EachProcessCountsItsTagsFromOne) {
   const bed::SimulatedPort receiver({"quorin"});
   EXPECT_EQ(RunOn(receiver, {"info"}).status, kDone);

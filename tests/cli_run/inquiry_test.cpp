@@ -1,4 +1,4 @@
-// The commands that ask: find, info, ls, check, ports; and what is said when nobody answers.
+// The commands that only read: find, info, ls, check, ports; and the messages when nobody answers.
 #include <filesystem>
 #include <fstream>
 #include <iterator>
@@ -49,7 +49,7 @@ TEST_F(Cli, ListShowsNamesSizesAndTotal) {
   EXPECT_THAT(result.output, HasSubstr("2 files, 730 bytes"));
 }
 
-TEST_F(Cli, ListAsJsonTellsFilesAndTotal) {
+TEST_F(Cli, ListAsJsonHasFilesAndTotal) {
   const bed::SimulatedPort receiver({"quorin"}, {{"a.jps", Content(700)}});
   const auto result = RunOn(receiver, {"ls", "--json"});
   ASSERT_EQ(result.status, kDone) << result.errors;
@@ -65,7 +65,7 @@ TEST_F(Cli, ListAsJsonTellsFilesAndTotal) {
   EXPECT_EQ(json::parse(RunOn(empty, {"ls", "--json"}).output).at("files"), json::array());
 }
 
-TEST_F(Cli, CheckTellsThatTheReceiverAnswers) {
+TEST_F(Cli, CheckReportsThatTheReceiverAnswers) {
   const bed::SimulatedPort receiver({"quorin"});
   EXPECT_EQ(RunOn(receiver, {"check"}).status, kDone);
 }
@@ -76,7 +76,7 @@ TEST_F(Cli, SilenceIsNoReceiver) {
   EXPECT_EQ(result.status, kNoReceiver);
   EXPECT_EQ(result.output, "");
   EXPECT_THAT(result.errors, HasSubstr("no receiver answered"));
-  EXPECT_THAT(result.errors, HasSubstr("is this its speed?"));  // and not asked for on USB
+  EXPECT_THAT(result.errors, HasSubstr("is this its speed?"));  // and USB was not searched
   EXPECT_THAT(result.errors, testing::Not(HasSubstr("0x0000")));
 }
 
@@ -88,7 +88,7 @@ TEST_F(Cli, AMissingPortIsNoReceiver) {
   EXPECT_THAT(result.errors, HasSubstr("does not exist"));
 }
 
-TEST_F(Cli, ErrorsAsJsonTellAll) {
+TEST_F(Cli, ErrorsAsJsonHaveAllFields) {
   const auto result = Run({"ls", "COM99", "--json"});
   EXPECT_EQ(result.status, kNoReceiver);
   const json error = json::parse(result.output).at("error");
@@ -99,7 +99,7 @@ TEST_F(Cli, ErrorsAsJsonTellAll) {
   EXPECT_FALSE(error.at("meaning").get<std::string>().empty());
 }
 
-TEST_F(Cli, UsbIsRefusedWithASentence) {
+TEST_F(Cli, UsbIsRefusedWithAMessage) {
   const auto result = Run({"find", "COM99", "--link", "usb"});
   EXPECT_NE(result.status, kDone);
   EXPECT_THAT(result.errors, HasSubstr("USB"));
@@ -128,7 +128,7 @@ TEST_F(Cli, WrongCommandLinesAreUsageErrors) {
   }
 }
 
-TEST_F(Cli, HelpTellsTheExitCodes) {
+TEST_F(Cli, HelpShowsTheExitCodes) {
   const auto result = Run({"--help"});
   EXPECT_EQ(result.status, kDone);
   for (const char* text : {"ports", "find", "info", "ls", "get", "rm", "mv", "set", "check"}) {
@@ -154,7 +154,7 @@ TEST_F(Cli, APortIsUnderstoodHoweverItIsWritten) {
   }
 }
 
-// As `more` and `head` do when they have seen enough.
+// As `more` and `head` do when they end early.
 TEST_F(Cli, AReaderThatHasGoneIsNoFailure) {
   const bed::SimulatedPort receiver({"quorin"}, {{"a.jps", "a"}});
   for (const std::vector<std::string>& line : std::vector<std::vector<std::string>>{
@@ -166,7 +166,7 @@ TEST_F(Cli, AReaderThatHasGoneIsNoFailure) {
   }
 }
 
-// Its bytes are lost, which whoever asked for them has to know.
+// Its bytes are lost, so the exit code must say so.
 TEST_F(Cli, ADownloadWhoseReaderHasGoneIsAFailure) {
   const bed::SimulatedPort receiver({"quorin"}, {{"a.jps", Content(3000)}});
   const auto result = bed::Program(kProgram,
@@ -183,7 +183,7 @@ TEST_F(Cli, ACodeIsExplained) {
   EXPECT_EQ(result.status, kDone);
   EXPECT_THAT(result.output, HasSubstr("0x8007048F"));
   EXPECT_THAT(result.output, HasSubstr("check the cable"));
-  EXPECT_THAT(Run({"explain"}).output, HasSubstr("0x800705B4  silence"));
+  EXPECT_THAT(Run({"explain"}).output, HasSubstr("0x800705B4  no answer in time"));
   EXPECT_THAT(Run({"explain", "0x800700C1"}).output, HasSubstr("no entry"));
 }
 
@@ -191,7 +191,7 @@ class ReportCli : public Cli {
  protected:
   ~ReportCli() override { std::filesystem::remove(path); }
 
-  // The folder's own name is unique, and so is this.
+  // Unique, because the folder's own name is.
   const std::string name =
       "cli-run-" + std::filesystem::path(folder.unix_path()).filename().string();
   const std::filesystem::path path = std::filesystem::temp_directory_path() / name;
@@ -220,7 +220,7 @@ TEST_F(ReportCli, IsNeverReplacedUnlessForced) {
   std::ofstream(path) << "an earlier report";
   const auto refused = Run({"find", "COM99", "--report", name});
   EXPECT_EQ(refused.status, kLocalFile);
-  EXPECT_THAT(refused.errors, HasSubstr("exists already"));
+  EXPECT_THAT(refused.errors, HasSubstr("already exists"));
   EXPECT_EQ(Report(), "an earlier report");
   EXPECT_EQ(Run({"find", "COM99", "--report", name, "--force"}).status, kNoReceiver);
   EXPECT_THAT(Report(), HasSubstr("command line: "));

@@ -1,4 +1,4 @@
-// rcvlink-cli mirror: what is brought, what is left alone, what is deleted, and how it ends.
+// rcvlink-cli mirror: what is downloaded, what is kept, what is deleted, and the exit codes.
 #include <chrono>
 #include <nlohmann/json.hpp>
 
@@ -16,7 +16,7 @@ class Mirror : public Cli {
  protected:
   Mirror() { std::filesystem::create_directory(folder / "out"); }
 
-  // mirror PORT out, with what follows.
+  // mirror PORT out, with more arguments.
   bed::ProgramResult RunMirror(const bed::SimulatedPort& receiver,
                                std::vector<std::string> arguments = {}) const {
     arguments.insert(arguments.begin(), {"mirror", "out"});
@@ -36,7 +36,7 @@ class Mirror : public Cli {
     }
     return names;
   }
-  // What lies in the folder of the mirror.
+  // The files in the folder of the mirror.
   std::vector<std::string> Mirrored() const {
     std::vector<std::string> names;
     for (const auto& entry : std::filesystem::directory_iterator(folder / "out")) {
@@ -63,9 +63,9 @@ TEST_F(Mirror, BringsWhatIsMissingOrHasGrown) {
   EXPECT_EQ(Mirrored(), (Names{"a.jps", "b.jps", "c.jps"}));
   EXPECT_THAT(result.errors,
               AllOf(HasSubstr("File 1 of 2: b.jps"), HasSubstr("File 2 of 2: c.jps")));
-  EXPECT_THAT(result.output, HasSubstr("2 downloaded, 1 here already, 0 failed"));
+  EXPECT_THAT(result.output, HasSubstr("2 downloaded, 1 already here, 0 failed"));
 
-  EXPECT_THAT(RunMirror(receiver).output, HasSubstr("0 downloaded, 3 here already, 0 failed"));
+  EXPECT_THAT(RunMirror(receiver).output, HasSubstr("0 downloaded, 3 already here, 0 failed"));
 }
 
 TEST_F(Mirror, TakesOnlyNamesThatFitAPattern) {
@@ -81,13 +81,14 @@ TEST_F(Mirror, MakesItsFolder) {
   EXPECT_EQ(folder.Read("new/deep/a.jps"), Content(30));
 }
 
-// A number of logs may begin again when the receiver has been cleaned: the old log is not lost.
+// The numbers of logs start again when a receiver's files were deleted. The old log must not be
+// lost.
 TEST_F(Mirror, AnotherFileOfTheSameNameStays) {
   folder.Write("out/a.jps", "yesterday's log");
   const bed::SimulatedPort receiver({"quorin"}, {{"a.jps", Content(300)}, {"b.jps", Content(30)}});
   const auto result = RunMirror(receiver);
   EXPECT_EQ(result.status, kFailed);
-  EXPECT_THAT(result.errors, HasSubstr("is another one, not its beginning"));
+  EXPECT_THAT(result.errors, HasSubstr("is not the beginning of the receiver's file"));
   EXPECT_EQ(folder.Read("out/a.jps"), "yesterday's log");
   EXPECT_EQ(folder.Read("out/b.jps"), Content(30));
   EXPECT_EQ(Mirrored(), (Names{"a.jps", "b.jps"}));
@@ -102,7 +103,7 @@ TEST_F(Mirror, GoesOnAfterAFileThatFailed) {
   const auto result = RunMirror(receiver, {"--json"});
   EXPECT_EQ(result.status, kFailed);
   EXPECT_EQ(folder.Read("out/b.jps"), Content(30));
-  // What came of it is kept: it may be a log that is still being recorded.
+  // Its data is kept: it may be a log that is still being recorded.
   EXPECT_EQ(Mirrored(), (Names{"a.jps.new.part", "b.jps"}));
   const json document = json::parse(result.output);
   EXPECT_TRUE(FileOf(document, "a.jps").contains("error"));
@@ -110,7 +111,7 @@ TEST_F(Mirror, GoesOnAfterAFileThatFailed) {
   EXPECT_EQ(document.at("summary").at("downloaded"), 1);
   EXPECT_EQ(document.at("summary").at("failed"), 1);
 
-  // The next time it is out of date.
+  // In the next run it is out of date.
   const bed::SimulatedPort ready({"quorin"}, {{"a.jps", Content(4000)}, {"b.jps", Content(30)}});
   EXPECT_EQ(RunMirror(ready).status, kDone);
   EXPECT_EQ(Mirrored(), (Names{"a.jps", "b.jps"}));
@@ -162,20 +163,20 @@ TEST_F(Mirror, AnEmptyFileReplacesAnotherOnlyWhenForced) {
   const bed::SimulatedPort receiver({"quorin"}, {{"a.jps", ""}});
   const auto result = RunMirror(receiver);
   EXPECT_EQ(result.status, kFailed);
-  EXPECT_THAT(result.errors, HasSubstr("it has no bytes, but the file of that name"));
+  EXPECT_THAT(result.errors, HasSubstr("the receiver's file is empty, but the file of that name"));
   EXPECT_EQ(folder.Read("out/a.jps"), "mine");
   EXPECT_EQ(RunMirror(receiver, {"--force"}).status, kDone);
   EXPECT_EQ(folder.Read("out/a.jps"), "");
 }
 
-// No second download has verified it.
+// It was not verified by a second download.
 TEST_F(Mirror, AnEmptyFileIsNotDeleted) {
   const bed::SimulatedPort receiver({"quorin"}, {{"a.jps", ""}});
   EXPECT_EQ(RunMirror(receiver, {"--then-delete"}).status, kDone);
   EXPECT_EQ(NamesOn(receiver), Names{"a.jps"});
 }
 
-TEST_F(Mirror, KeepsFileTimesAndSaysTheZone) {
+TEST_F(Mirror, KeepsFileTimesAndShowsTheZone) {
   const bed::TempFolder source;
   source.Write("a.jps", Content(30));
   const auto time = std::filesystem::last_write_time(source / "a.jps") - std::chrono::hours(30);
@@ -205,21 +206,22 @@ TEST_F(Mirror, DeletesOnlyWhatASecondDownloadVerified) {
   const json document = json::parse(result.output);
   EXPECT_EQ(FileOf(document, "new.jps").at("deleted"), true);
   EXPECT_EQ(FileOf(document, "same.jps").at("deleted"), true);
-  EXPECT_THAT(FileOf(document, "other.jps").at("error").at("meaning"), HasSubstr("other bytes"));
-  // Twice the one that was missing, once those that were there.
+  EXPECT_THAT(FileOf(document, "other.jps").at("error").at("meaning"),
+              HasSubstr("different bytes"));
+  // Two downloads of the missing file, one of each existing file.
   size_t downloads = 0;
   const std::string transcript = receiver.Transcript();
   for (size_t at = 0; (at = transcript.find("get,", at)) != std::string::npos; ++at) ++downloads;
   EXPECT_EQ(downloads, 4U) << transcript;
 }
 
-TEST_F(Mirror, SaysAtWhichFileItIsAndHowLongAllTake) {
+TEST_F(Mirror, ShowsTheCurrentFileAndTheTimeLeft) {
   const bed::SimulatedPort receiver({"quorin"},
                                     {{"a.jps", Content(30000)}, {"b.jps", Content(40)}});
   const auto result = RunMirror(receiver, {});
   EXPECT_EQ(result.status, kDone) << result.errors;
   EXPECT_THAT(result.errors, HasSubstr("File 1 of 2: a.jps, 30.0 kB\n"));
-  EXPECT_THAT(result.errors, HasSubstr("File 2 of 2: b.jps, 40 B, 1 s left over all\n"));
+  EXPECT_THAT(result.errors, HasSubstr("File 2 of 2: b.jps, 40 B, 1 s left in total\n"));
 }
 
 TEST_F(Mirror, WithoutThenDeleteNothingIsDeleted) {
@@ -228,7 +230,7 @@ TEST_F(Mirror, WithoutThenDeleteNothingIsDeleted) {
   EXPECT_EQ(NamesOn(receiver), Names{"a.jps"});
 }
 
-TEST_F(Mirror, CtrlCEndsItAndLeavesNothingHalf) {
+TEST_F(Mirror, CtrlCEndsItAndLeavesNoPartialFile) {
   const bed::SimulatedPort receiver({"quorin", "--pace"},
                                     {{"a.jps", Content(30)}, {"b.jps", Content(200000)}});
   bed::Program program(
@@ -248,12 +250,12 @@ class VelmarMirror : public Mirror {
   }
 };
 
-// The first of all downloads has a wrong bit, which the protocol does not notice.
+// The first download has a wrong bit, which the protocol does not detect.
 TEST_F(VelmarMirror, WhatASecondDownloadDoesNotVerifyIsNeitherKeptNorDeleted) {
   const bed::SimulatedPort receiver({"velmar", "--flipped-bit", "0@1"}, {{"a.log", Content(30)}});
   const auto result = RunMirror(receiver, {"--then-delete"});
   EXPECT_EQ(result.status, kFailed);
-  EXPECT_THAT(result.errors, HasSubstr("other bytes"));
+  EXPECT_THAT(result.errors, HasSubstr("differs from the first"));
   EXPECT_EQ(Mirrored(), Names{});
   EXPECT_EQ(NamesOn(receiver), Names{"a.log"});
 
@@ -269,7 +271,7 @@ TEST_F(VelmarMirror, ARefusedDeletionIsNoticed) {
   EXPECT_EQ(folder.Read("out/a.log"), Content(30));
 }
 
-// The one file that was asked for came, but another of that name may be beyond the list's end.
+// The listed file was downloaded, but another file that matches may be missing from the list.
 TEST_F(VelmarMirror, ADirectoryThatDidNotFitIsNeverDone) {
   Files files;
   while (files.size() < 120)
@@ -299,7 +301,7 @@ TEST_F(VelmarMirror, FilesThatTheDiskHasNoRoomForAreRefusedAtOnce) {
   const bed::SimulatedPort receiver(simulator, files);
   const auto result = RunMirror(receiver, {});
   EXPECT_EQ(result.status, kLocalFile);
-  EXPECT_THAT(result.errors, HasSubstr("there is room for"));
+  EXPECT_THAT(result.errors, HasSubstr("the disk has room for"));
   EXPECT_EQ(Mirrored(), Names{});
 }
 

@@ -27,7 +27,7 @@ class UsbCli : public Cli {
   }
 };
 
-TEST_F(UsbCli, FindAndInfoTellTheLink) {
+TEST_F(UsbCli, FindAndInfoShowTheLink) {
   const bed::SimulatedUsb usb({"quorin", "--id", "QU7", "--model", "QR9"});
   const auto found = RunOn(usb, {"find"});
   EXPECT_EQ(found.status, kDone) << found.errors;
@@ -84,13 +84,13 @@ TEST_F(UsbCli, AnyLinkFindsItOnASerialPort) {
   EXPECT_EQ(json::parse(result.output).at("link"), "serial");
 }
 
-TEST_F(UsbCli, AMissingDeviceIsSaidToBeMissing) {
+TEST_F(UsbCli, AMissingDeviceIsReportedAsMissing) {
   const auto result = Run({"find", R"(\\?\rcvlink-none)", "--link", "usb"});
   EXPECT_EQ(result.status, kNoReceiver);
   EXPECT_THAT(result.errors, HasSubstr(R"(\\?\rcvlink-none does not exist)"));
 }
 
-TEST_F(UsbCli, OfTwoFailuresVerboseTellsBoth) {
+TEST_F(UsbCli, VerboseShowsBothFailures) {
   const auto brief = Run({"find", R"(\\?\rcvlink-none)", "--link", "any"});
   EXPECT_EQ(brief.status, kNoReceiver);
   EXPECT_THAT(brief.errors, HasSubstr("on a serial port or on USB"));
@@ -98,7 +98,7 @@ TEST_F(UsbCli, OfTwoFailuresVerboseTellsBoth) {
   const auto verbose = Run({"find", R"(\\?\rcvlink-none)", "--link", "any", "--verbose"});
   EXPECT_THAT(verbose.errors, HasSubstr("find a receiver on a serial port:"));
   EXPECT_THAT(verbose.errors, HasSubstr("find a receiver on USB:"));
-  EXPECT_THAT(verbose.errors, Not(HasSubstr("With --verbose")));
+  EXPECT_THAT(verbose.errors, Not(HasSubstr("--verbose shows")));
 }
 
 TEST_F(UsbCli, ADeviceOfAnotherLayoutHasNoReceiver) {

@@ -1,4 +1,4 @@
-// The program with a Velmar receiver, whose refusals the library does not tell.
+// The program with a Velmar receiver, whose refusals the library does not report.
 #include <chrono>
 #include <deque>
 #include <nlohmann/json.hpp>
@@ -29,7 +29,7 @@ class VelmarCli : public Cli {
   }
 };
 
-TEST_F(VelmarCli, FindAndInfoTellTheFamily) {
+TEST_F(VelmarCli, FindAndInfoShowTheFamily) {
   const bed::SimulatedPort receiver({"velmar", "--id", "VM7", "--model", "VR9"});
   const auto found = RunOn(receiver, {"find"});
   EXPECT_EQ(found.status, kDone) << found.errors;
@@ -55,8 +55,8 @@ TEST_F(VelmarCli, ListShowsNamesSizesAndTotal) {
   EXPECT_THAT(result.output, HasSubstr("2 files, 730 bytes"));
 }
 
-// The library's buffer ends the list: whoever reads it has to know.
-TEST_F(VelmarCli, AListThatMayBeCutIsSaidToBe) {
+// The list is cut at the end of the library's buffer; the user must be warned.
+TEST_F(VelmarCli, AListThatMayBeCutGivesAWarning) {
   Files files;
   const auto add_until = [&](size_t count) {
     while (files.size() < count) files.emplace("file" + std::to_string(100 + files.size()), "x");
@@ -99,14 +99,14 @@ TEST_F(VelmarCli, AFileOfAnotherSizeThanListedIsAFailure) {
   EXPECT_EQ(folder.Read("a.log.part"), Content(3000));
 }
 
-// Its driver does not check what arrives.
+// The driver does not check the checksums.
 TEST_F(VelmarCli, VerifyFindsADamagedByte) {
   const bed::SimulatedPort receiver({"velmar", "--flipped-bit", "1@2"}, {{"a.log", Content(3000)}});
   EXPECT_EQ(RunOn(receiver, {"get", "a.log"}).status, kDone);
   EXPECT_NE(folder.Read("a.log"), Content(3000));
   const auto verified = RunOn(receiver, {"get", "a.log", "-o", "b.log", "--verify"});
   EXPECT_EQ(verified.status, kFailed);
-  EXPECT_THAT(verified.errors, HasSubstr("other bytes"));
+  EXPECT_THAT(verified.errors, HasSubstr("differs from the first"));
   EXPECT_THAT(LocalFiles(), ElementsAre("a.log"));
   const auto sound = RunOn(receiver, {"get", "a.log", "-o", "c.log", "--verify", "--json"});
   EXPECT_EQ(sound.status, kDone);
@@ -114,8 +114,8 @@ TEST_F(VelmarCli, VerifyFindsADamagedByte) {
   EXPECT_EQ(folder.Read("c.log"), Content(3000));
 }
 
-// That each file is here already keeps the test short.
-TEST_F(VelmarCli, AllSaysWhenTheListMayBeCut) {
+// The files exist already, to keep the test short.
+TEST_F(VelmarCli, AllWarnsWhenTheListMayBeCut) {
   Files files;
   while (files.size() < 80) files.emplace("file" + std::to_string(100 + files.size()), "x");
   for (const auto& [name, content] : files) folder.Write(name, content);
@@ -135,7 +135,7 @@ TEST_F(VelmarCli, AllIsNeverDoneWhenTheListIsRefused) {
   EXPECT_THAT(result.errors, HasSubstr("may be missing"));
 }
 
-// Each of them waits twice for 30 s, so they wait side by side.
+// Each of them waits twice for 30 s, so they run at the same time.
 TEST_F(VelmarCli, AListThatIsNotAnsweredIsNeverDone) {
   const std::vector<std::vector<std::string>> commands = {
       {"ls", "--json"}, {"get", "--all", "--json"}, {"mirror", "out", "--json"}};
@@ -168,8 +168,8 @@ TEST_F(VelmarCli, AListThatWasRefusedIsReadAgain) {
   EXPECT_EQ(folder.Read("a.log"), Content(30));
 }
 
-// The rest of a list that did not fit is still on its way when the next command goes out.
-TEST_F(VelmarCli, AListThatDoesNotFitSpoilsNothing) {
+// The rest of a list that did not fit is still arriving when the next command is sent.
+TEST_F(VelmarCli, AListThatDoesNotFitDoesNotDisturbTheNextCommand) {
   constexpr size_t kFiles = 110;
   Files files;
   while (files.size() < kFiles) {
@@ -193,7 +193,7 @@ TEST_F(VelmarCli, ARefusedMoveIsNoticed) {
   const bed::SimulatedPort receiver({"velmar", "--refuse", "rename"}, {{"a.log", "a"}});
   const auto result = RunOn(receiver, {"mv", "a.log", "c.log"});
   EXPECT_EQ(result.status, kFailed);
-  EXPECT_THAT(result.errors, HasSubstr("its directory does not show it"));
+  EXPECT_THAT(result.errors, HasSubstr("file list does not show the change"));
 }
 
 TEST_F(VelmarCli, RemoveDeletesTheFile) {
@@ -211,7 +211,7 @@ TEST_F(VelmarCli, ARefusedRemoveIsNoticed) {
   EXPECT_THAT(result.errors, HasSubstr("still has the file"));
 }
 
-// The families number parities the other way round.
+// The two families use opposite numbers for odd and even parity.
 TEST_F(VelmarCli, ParitiesReachTheReceiverInItsOwnWords) {
   const bed::SimulatedPort receiver({"velmar"});
   EXPECT_EQ(RunOn(receiver, {"set", "parity", "even", "--yes"}).status, kDone);
@@ -220,11 +220,11 @@ TEST_F(VelmarCli, ParitiesReachTheReceiverInItsOwnWords) {
   EXPECT_THAT(receiver.Transcript(), HasSubstr(R"(> COM 9600 O 8 1 N\r)"));
 }
 
-TEST_F(VelmarCli, TheRtsLineIsRefusedWithASentence) {
+TEST_F(VelmarCli, TheRtsLineIsRefusedWithAMessage) {
   const bed::SimulatedPort receiver({"velmar"});
   const auto result = RunOn(receiver, {"set", "rts", "off"});
   EXPECT_EQ(result.status, kFailed);
-  EXPECT_THAT(result.errors, HasSubstr("a Velmar receiver does not offer to control its RTS line"));
+  EXPECT_THAT(result.errors, HasSubstr("a Velmar receiver cannot change its RTS line"));
 }
 
 }  // namespace

@@ -22,7 +22,7 @@ std::string Reply(const CReceiverCmd& command) {
   return {command.GetReply(), command.GetReply() + command.GetReplyLength()};
 }
 
-TEST(ReceiverCmd, HoldsWhatItWasMadeWith) {
+TEST(ReceiverCmd, HoldsItsArguments) {
   const TestCommand command("log\r");
   EXPECT_EQ(Command(command), "log\r");
   EXPECT_EQ(command.GetCommandLength(), 4u);
@@ -78,7 +78,7 @@ TEST(ReceiverCmd, SetReplyStoresNoTerminator) {
   EXPECT_EQ(command.GetReplyLength(), 0u);
 }
 
-TEST(ReceiverCmd, AppendReplyTellsWhatItDid) {
+TEST(ReceiverCmd, AppendReplyReturnsWhatItDid) {
   TestCommand command("x");
   EXPECT_EQ(command.AppendReply(nullptr, 5), static_cast<HRESULT>(0x80070057));
   EXPECT_EQ(command.AppendReply("ab", 0), S_FALSE);
@@ -97,7 +97,7 @@ TEST(ReceiverCmd, FreeReplyLeavesTheLength) {
   EXPECT_EQ(command.GetReplyLength(), 3u);
 }
 
-// The old length means nothing once the reply is freed: nothing is read through it.
+// The old length is not used after the reply was freed.
 TEST(ReceiverCmd, AppendsToAFreedReplyFromTheStart) {
   TestCommand command("x");
   command.SetReply("abc");
@@ -106,7 +106,7 @@ TEST(ReceiverCmd, AppendsToAFreedReplyFromTheStart) {
   EXPECT_EQ(Reply(command), "de");
 }
 
-TEST(ReceiverCmd, CancelIsForGood) {
+TEST(ReceiverCmd, CancelIsNeverCleared) {
   const KernelHandle quiet(CreateEventW(nullptr, TRUE, FALSE, nullptr));
   TestCommand command("x");
   EXPECT_FALSE(command.IsCancelled(quiet.get()));

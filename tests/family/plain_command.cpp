@@ -5,7 +5,7 @@ namespace {
 constexpr std::string_view kEnd = "\n.\n";
 constexpr uint32_t kNoFlags = 0;
 constexpr uint32_t kTimeoutMs = 3000;
-// No answer is longer; what a receiver sends must not fill the host's memory.
+// The longest answer; a receiver must not fill the host's memory.
 constexpr uint32_t kLongestAnswer = 65536;
 
 }  // namespace

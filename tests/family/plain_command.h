@@ -1,5 +1,5 @@
-// The one exchange of a Plain receiver: a line of the host, then the receiver's answer, which ends
-// with a line that is a single dot.
+// The only exchange of a Plain receiver: a line of the host, then the receiver's answer, which ends
+// with a line of a single dot.
 #ifndef RCVLINK_TESTS_FAMILY_PLAIN_COMMAND_H_
 #define RCVLINK_TESTS_FAMILY_PLAIN_COMMAND_H_
 
@@ -14,7 +14,7 @@ class CPlainCommand : public CReceiverCmd {
 
   HRESULT Execute(CIConnection* connection, HANDLE abort_event) override;
 
-  // What the receiver said, without the dot.
+  // The answer of the receiver, without the dot.
   std::string_view Answer() const;
 };
 

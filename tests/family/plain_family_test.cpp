@@ -25,7 +25,7 @@ namespace {
 constexpr auto kPlain = static_cast<EProtocol>(3);
 constexpr wchar_t kPort[] = L"COM7";
 
-// A receiver that has one file, from its own side of the wire.
+// The receiver's side: a receiver with one file.
 std::string AnswerTo(std::string_view line) {
   if (line == "who\n") return "plain\n.\n";
   if (line == "id\n") return "P1\n.\n";
@@ -66,12 +66,12 @@ TEST_F(PlainFamily, IsFoundAfterTheOthers) {
   EXPECT_THAT(report.Lines(), Contains("Find - Plain receiver found [COM7]"));
 }
 
-TEST_F(PlainFamily, IsNotFoundWhereNobodyAnswers) {
+TEST_F(PlainFamily, IsNotFoundWithoutAnAnswer) {
   EXPECT_EQ(Find(std::make_unique<ScriptedConnection>()), S_FALSE);
   EXPECT_EQ(receiver, nullptr);
 }
 
-TEST_F(PlainFamily, TellsWhoItIs) {
+TEST_F(PlainFamily, ReportsItsIdentity) {
   ASSERT_EQ(Find(PlainReceiver()), S_OK);
   CReceiverInfo info{};
   ASSERT_EQ(devapi::GetReceiverInfo(receiver, nullptr, &info), S_OK);

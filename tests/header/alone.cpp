@@ -1,4 +1,4 @@
-// A host that never sees <windows.h>.
+// A host that never includes <windows.h>.
 #include "rcvlink.h"
 
 long Host() {

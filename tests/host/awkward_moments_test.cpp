@@ -1,5 +1,4 @@
-// A host that aborts, closes and destroys at awkward moments, from several
-// threads at once.
+// A host that aborts, closes and destroys at difficult moments, from several threads at once.
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <windows.h>
@@ -38,7 +37,7 @@ long Delete(void* handle, std::wstring name = L"X.log") {
   return devapi::DeleteFileW(handle, name.data());
 }
 
-// The host closes its event under the feet of the check.
+// The host closes its event during the check.
 TEST(ApiAwkwardMoments, EventIsClosedDuringTheCheck) {
   bed::SimulatedPort port({"quorin"});
   const host::Receiver receiver(port);
@@ -59,8 +58,7 @@ TEST(ApiAwkwardMoments, EventIsClosedDuringTheCheck) {
 
 class ApiAwkwardProgress : public testing::TestWithParam<int> {};
 
-// The download's own thread lets the receiver go, with locks of the receiver
-// held.
+// The download's own thread closes the receiver while it holds locks of it.
 TEST_P(ApiAwkwardProgress, ReceiverIsClosed) {
   const bed::SimulatedPort port({"quorin"}, {{"A.log", host::Content(1500)}});
   void* const handle = host::Receiver(port).Release();
@@ -78,14 +76,13 @@ TEST_P(ApiAwkwardProgress, ReceiverIsClosed) {
 INSTANTIATE_TEST_SUITE_P(Percents, ApiAwkwardProgress, testing::Values(0, 1, 50, 100));
 
 struct Silence {
-  const char* command;  // is not heard
-  const char* line;     // of the report, when it is about to be sent
+  const char* command;  // is not received
+  const char* line;     // of the report, just before it is sent
 };
 
 class ApiAwkwardVelmarDownload : public testing::TestWithParam<Silence> {};
 
-// An abort before the file is asked for is followed by no command that stops
-// one.
+// After an abort before the file is requested, no command to stop the file is sent.
 TEST_P(ApiAwkwardVelmarDownload, IsAbortedBeforeTheFileComes) {
   host::Velmar receiver({"--mute", std::string(GetParam().command) + "@1"},
                         {{"A.log", host::Content(5000)}},
@@ -108,8 +105,7 @@ INSTANTIATE_TEST_SUITE_P(
     testing::Values(Silence{"currentfile", "CVelmarProtocol::DownloadFile - connection is locked"},
                     Silence{"log filehdra", "CGetFileHeaderCmd::CGetFileHeaderCmd"}));
 
-// Threads that work on one receiver without looking at each other, while two
-// more abort.
+// Threads that use one receiver independently, while two more abort.
 void WorkAndAbort(void* handle) {
   constexpr auto kDuration = std::chrono::seconds(3);
   std::atomic<bool> is_over = false;
@@ -160,7 +156,7 @@ void WorkAndAbort(void* handle) {
   for (auto& thread : threads) thread.get();
 }
 
-// What the last abort left is taken, and then all is as ever.
+// The next operation clears the last abort; after that everything works.
 void ExpectNothingIsLeft(const host::OpenReceiver& receiver) {
   Check(receiver.get());
   Delete(receiver.get());
@@ -179,7 +175,7 @@ TEST(ApiAwkwardMoments, ManyThreadsOnUsb) {
   ExpectNothingIsLeft(receiver);
 }
 
-// What ends because of an abort, and not because somebody waited long enough.
+// A call that ends this soon was ended by the abort, not by a time-out.
 constexpr auto kSoon = std::chrono::seconds(6);
 
 template <typename Result>
@@ -187,7 +183,7 @@ bool EndsSoon(const std::future<Result>& call) {
   return call.wait_for(kSoon) == std::future_status::ready;
 }
 
-// An event that resets itself once somebody has looked at it.
+// An event that resets itself after a wait.
 class SelfResettingEvent {
  public:
   SelfResettingEvent() : handle_(CreateEventW(nullptr, FALSE, TRUE, nullptr)) {}
@@ -200,7 +196,7 @@ class SelfResettingEvent {
   HANDLE handle_;
 };
 
-// The step that spends the signal is the step that ends the check.
+// The step that clears the signal must also end the check.
 TEST(ApiAwkwardMoments, SelfResettingEventEndsTheCheckOnAPort) {
   const bed::SimulatedPort port({"quorin"});
   const host::Receiver receiver(port);
@@ -221,8 +217,8 @@ TEST(ApiAwkwardMoments, SelfResettingEventEndsTheCheckOfAVelmarReceiver) {
   EXPECT_EQ(Check(receiver.get()), -1);
 }
 
-// The receiver takes a moment to change its speed. The abort came when the last
-// block was in: the download returns when both ends are at the old speed.
+// The receiver takes a moment to change its speed. The abort comes after the last block: the
+// download returns when both ends are at the old speed.
 TEST(ApiAwkwardMoments, QuorinDownloadIsAbortedWithItsLastBlock) {
   const bed::SimulatedPort port({"quorin", "--reply-silence", "0.3:set,cur/term/rate"},
                                 {{"A.log", host::Content(1500)}});
@@ -235,10 +231,9 @@ TEST(ApiAwkwardMoments, QuorinDownloadIsAbortedWithItsLastBlock) {
   EXPECT_EQ(receiver.Check(), -1) << port.Transcript();
 }
 
-// The second abort ends a wait of the put-back. The next command is heard all
-// the same.
+// The second abort ends a wait while the speed is put back. The next command is still received.
 TEST(ApiAwkwardMoments, VelmarDownloadIsAbortedTwice) {
-  // In pieces with pauses between them, for time to abort; answers come whole.
+  // In pieces with pauses, for time to abort; answers come in one piece.
   host::Velmar receiver({"--pieces", "1000", "--piece-gap", "50", "--reply-silence", "0.3:COM"},
                         {{"A.log", host::Content(600000)}});
   host::MemoryStream stream;
@@ -263,7 +258,7 @@ TEST(ApiAwkwardMoments, AbortEndsTheRaisingOfTheSpeed) {
   const host::Report report;
   auto download = host::OnThread([&] { return receiver.Download(L"A.log", stream); });
   report.WaitFor("CSetPortParamsCmd::CSetPortParamsCmd");
-  // The first abort ends this wait, a further one that of the put-back.
+  // The first abort ends this wait, another one the wait while the speed is put back.
   const auto start = std::chrono::steady_clock::now();
   do {
     devapi::Abort(receiver.get());
@@ -273,7 +268,7 @@ TEST(ApiAwkwardMoments, AbortEndsTheRaisingOfTheSpeed) {
   download.get();
 }
 
-// An aborted command leaves nothing on the line in front of the next.
+// An aborted command leaves nothing on the line before the next one.
 TEST(ApiAwkwardMoments, AbortedCommandIsNotLeftHalfSent) {
   const bed::SimulatedUsb usb({"quorin"});
   const host::UsbReceiver receiver(usb);
@@ -286,7 +281,7 @@ TEST(ApiAwkwardMoments, AbortedCommandIsNotLeftHalfSent) {
   }
 }
 
-// The operation ends at its next step, not one silence later.
+// The operation ends at its next step, not after a time-out.
 TEST(ApiAwkwardMoments, QuorinDownloadIsAbortedInItsFirstCommand) {
   bed::SimulatedPort port({"quorin", "--speed", "115200"}, {{"A.log", "content"}});
   const host::Receiver receiver(port, CBR_115200);

@@ -1,4 +1,4 @@
-// The test bed itself: a receiver on a port, bytes both ways, and a port that forgets nothing.
+// The test bed itself: a receiver on a port, bytes both ways, and a port that loses nothing.
 #include <gtest/gtest.h>
 #include <windows.h>
 
@@ -68,8 +68,8 @@ TEST_F(BedTest, ReceiverAnswersOnItsPort) {
   EXPECT_NE(receiver.Transcript().find("> %1%"), std::string::npos) << receiver.Transcript();
 }
 
-// A receiver that is slow to read has still been sent what was written. There is more of it than a
-// pseudo-terminal keeps safe from a purge by itself.
+// A slow receiver still gets everything that was written, although it is more than a
+// pseudo-terminal itself protects from a purge.
 TEST_F(BedTest, PurgeAfterAWriteLosesNothing) {
   constexpr size_t kSize = 6000;
   bed::SimulatedPort receiver({"quorin", "--speed", "9600"});
@@ -105,7 +105,7 @@ TEST_F(BedTest, ReceiverCanBeKilled) {
   EXPECT_EQ(OpenPort(receiver.path()), INVALID_HANDLE_VALUE);
 }
 
-TEST(BedRefusal, TellsWhatTheSimulatorSaid) {
+TEST(BedRefusal, ReportsWhatTheSimulatorPrinted) {
   EXPECT_THROW(bed::SimulatedPort({"no-such-family"}), bed::Error);
 }
 

@@ -21,13 +21,13 @@ using testing::IsEmpty;
 
 namespace {
 
-// A receiver whose answer to the check's question comes late enough for an abort to come first.
+// A receiver that answers the check late enough for an abort to come first.
 class SlowReceiver {
  public:
   virtual ~SlowReceiver() = default;
   virtual void* handle() const = 0;
   virtual std::wstring name() const = 0;
-  // From here on the host is somebody else's to close.
+  // From here on the test's own code closes the receiver.
   virtual void Release() = 0;
   virtual std::string Transcript() const = 0;
 };
@@ -74,9 +74,9 @@ class QuorinOnUsb : public SlowReceiver {
 struct Link {
   const char* name;
   std::unique_ptr<SlowReceiver> (*open)();
-  // What the check asks, as the transcript has it.
+  // The command of the check, as in the transcript.
   const char* question;
-  // How much the receiver answers to all that is said before that, from its opening on.
+  // How many answers the receiver gives before that, from its opening on.
   ptrdiff_t answers_to_others;
 };
 
@@ -96,21 +96,21 @@ enum class EventOfHost { kNone, kNotSignalled };
 // A check of a slow receiver, which waits for the answer.
 class CheckOfSlowReceiver : public testing::TestWithParam<std::tuple<Link, EventOfHost>> {
  protected:
-  // Returns when the receiver has the question.
+  // Returns when the receiver has received the command.
   void Start() {
     const size_t before = PlaceOfQuestion();
     check_ = host::OnThread(
         [this] { return devapi::CheckConnection(slow_->handle(), event(), &answer_); });
     while (PlaceOfQuestion() == before) std::this_thread::sleep_for(kPollInterval);
   }
-  // It found nobody, and neither an answer nor the end of its patience did that.
+  // It found no receiver, and neither a reply nor a time-out ended it.
   void ExpectEndedAtOnce() {
     EXPECT_EQ(check_.get(), S_OK);
     EXPECT_EQ(answer_, 0);
     ExpectNoTimeOut();
     EXPECT_LE(Answers(), link().answers_to_others) << "it was waited for: " << slow_->Transcript();
   }
-  // But for that at the end of each flush over USB, which reads until nothing is there.
+  // Except at the end of each flush over USB, which reads until there is no more data.
   void ExpectNoTimeOut() const {
     EXPECT_LE(report_.LinesWith("CAbstractConnection::Read").size(),
               report_.LinesWith("CUSBConnection::Flush").size());
@@ -126,7 +126,7 @@ class CheckOfSlowReceiver : public testing::TestWithParam<std::tuple<Link, Event
     return std::count_if(
         lines.begin(), lines.end(), [](const std::string& line) { return line.starts_with("< "); });
   }
-  // Of the last one.
+  // The result of the last one.
   size_t PlaceOfQuestion() const { return slow_->Transcript().rfind(link().question); }
 
   static Link link() { return std::get<0>(GetParam()); }
@@ -184,7 +184,7 @@ INSTANTIATE_TEST_SUITE_P(All,
                                   (none ? "WithoutEvent" : "WithEvent");
                          });
 
-// A handle that is none is as good as an event that nobody signals.
+// An invalid handle is the same as an event that is never signalled.
 TEST(SearchWithAHandleThatIsNone, FindsTheReceiver) {
   const bed::SimulatedPort port({"quorin"});
   std::wstring name = port.name();

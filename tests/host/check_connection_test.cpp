@@ -14,7 +14,7 @@ namespace {
 
 constexpr short kUntouched = 7;
 
-TEST(ApiCheckConnection, GreetsTheReceiverAgain) {
+TEST(ApiCheckConnection, ProbesTheReceiverAgain) {
   const bed::SimulatedPort port({"quorin"});
   const host::Receiver receiver(port);
   const host::Report report;
@@ -24,14 +24,14 @@ TEST(ApiCheckConnection, GreetsTheReceiverAgain) {
   EXPECT_EQ(report.Lines().front(), "CAbstractReceiver::CheckConnection");
   EXPECT_EQ(report.Lines().back(),
             "CQuorinProtocol::UnlockConnection - connection is unlocked [HANDLE]");
-  // What comes last is not answered, so it may be under way still: the next command waits for it.
+  // The last command has no reply, so it may still be arriving: the next command waits for it.
   receiver.Identify();
   host::Lines sent = receiver.SentSince();
   sent.resize(host::HandshakeOfHost().size());
   EXPECT_THAT(sent, ElementsAreArray(host::HandshakeOfHost()));
 }
 
-TEST(ApiCheckConnection, TellsASilentReceiverAndFindsItAgain) {
+TEST(ApiCheckConnection, ReportsASilentReceiverAndFindsItAgain) {
   bed::SimulatedPort port({"quorin"});
   const host::Receiver receiver(port);
   const host::Report report;

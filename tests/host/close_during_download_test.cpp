@@ -1,4 +1,4 @@
-// A receiver that is let go of while another thread downloads from it.
+// A receiver that is closed while another thread downloads from it.
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <windows.h>
@@ -13,7 +13,7 @@ namespace {
 
 constexpr size_t kSize = 5000;
 
-// The download stands still at a percent.
+// The download is stopped at a percent.
 class HeldDownload : public testing::TestWithParam<int> {
  protected:
   void Start() {
@@ -107,7 +107,7 @@ TEST_P(ApiCloseOfOneOfTwoUsers, LeavesTheDownloadAlone) {
 
 INSTANTIATE_TEST_SUITE_P(Percents, ApiCloseOfOneOfTwoUsers, testing::Values(50));
 
-// Not held anywhere: whatever the download does just then, it comes to an end.
+// Without a stop: whatever the download does at that moment, it ends.
 TEST(ApiCloseDuringTransfer, EndsIt) {
   const bed::SimulatedPort port({"quorin", "--pace"}, {{"A.log", host::Content(300000)}});
   void* const handle = host::Receiver(port).Release();
@@ -126,7 +126,7 @@ TEST(ApiCloseDuringTransfer, EndsIt) {
   EXPECT_EQ(again.Identify().result, S_OK);
 }
 
-// The same while a command waits for its answer.
+// The same while a command waits for its reply.
 TEST(ApiCloseDuringCommand, EndsIt) {
   bed::SimulatedPort port({"quorin"}, {{"A.log", "a"}});
   void* const handle = host::Receiver(port).Release();

@@ -56,7 +56,7 @@ TEST(ApiDeleteFile, AbortEndsItOnce) {
   EXPECT_EQ(receiver.Identify().result, S_OK);
 }
 
-TEST(ApiUnoffered, OperationsSaySoWithoutAskingTheReceiver) {
+TEST(ApiUnoffered, OperationsAreRefusedWithoutACommand) {
   const bed::SimulatedPort port({"quorin"}, {{"A.log", "a"}});
   const host::Receiver receiver(port);
   const host::Report report;
@@ -81,7 +81,7 @@ TEST(ApiUnoffered, OperationsSaySoWithoutAskingTheReceiver) {
 
 class ApiPortSettings : public testing::Test {
  protected:
-  // A setting is not answered, so it is waited for.
+  // A setting has no reply, so the test waits for it.
   void ExpectSetting(const std::string& setting, const std::string& taken) {
     sent_.push_back(R"(%#%print,/cur/term\r\n)");
     sent_.push_back("set,/par/dev/ser/c/" + setting + R"(\r\n)");
@@ -133,7 +133,7 @@ TEST_F(ApiPortSettings, RtsIsOnOrOff) {
   ExpectSetting("rts,on", "= port c rts on");
 }
 
-TEST_F(ApiPortSettings, SpeedIsTheReceiversOnly) {
+TEST_F(ApiPortSettings, SpeedChangesOnTheReceiverOnly) {
   EXPECT_EQ(devapi::DCSetRcvBaudrate(handle_, 4294967295UL), S_OK);
   port_.WaitForTranscript(R"(rate,-1\r\n)");
   EXPECT_EQ(devapi::DCSetRcvBaudrate(handle_, 19200), S_OK);
@@ -143,7 +143,7 @@ TEST_F(ApiPortSettings, SpeedIsTheReceiversOnly) {
                           R"(set,/par/dev/ser/c/rate,-1\r\n)",
                           R"(%#%print,/cur/term\r\n)",
                           R"(set,/par/dev/ser/c/rate,19200\r\n)"));
-  // The host has stayed behind; a new connection at the new speed finds the receiver.
+  // The host stays at the old speed; a new connection at the new speed finds the receiver.
   const host::Receiver follower(port_, CBR_19200);
   EXPECT_EQ(follower.Identify().result, S_OK);
 }

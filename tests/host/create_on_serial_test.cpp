@@ -26,7 +26,7 @@ struct HandleCloser {
 };
 using UniqueHandle = std::unique_ptr<void, HandleCloser>;
 
-// A port as another program uses it.
+// A port opened as another program would open it.
 class RawPort {
  public:
   explicit RawPort(const std::wstring& path)
@@ -59,7 +59,7 @@ long Create(const bed::SimulatedPort& port,
   return devapi::CreateReceiverOnSerial(name.data(), protocol, &settings, abort_event, handle);
 }
 
-TEST(ApiCreateOnSerial, TellsItsStepsAndGreetsTheReceiver) {
+TEST(ApiCreateOnSerial, TracesItsStepsAndProbesTheReceiver) {
   const bed::SimulatedPort port({"quorin"});
   const std::string name = host::Narrow(port.name());
   const host::Report report;
@@ -149,7 +149,7 @@ TEST(ApiCreateOnSerial, QuorinReceiverIsNotAskedWhereVelmarIsWanted) {
   EXPECT_EQ(handle, nullptr);
   EXPECT_THAT(report.LinesWith("CreateReceiverOnSerial - looking for Quorin"), IsEmpty());
   EXPECT_EQ(report.LinesWith("CreateReceiverOnSerial - looking for Velmar").size(), 1U);
-  port.Stop();  // what it has heard without an end of line is noted then
+  port.Stop();  // only then an unfinished line is recorded
   const std::string transcript = port.Transcript();
   for (const char* const greeting : {"#OFF#", "dm", "print,", "%"}) {
     EXPECT_EQ(transcript.find(greeting), std::string::npos) << transcript;
@@ -221,7 +221,7 @@ TEST(ApiCreateOnSerial, SilentReceiverIsNoReceiver) {
                          host::Narrow(port.name()) + "]"));
 }
 
-// One receiver keeps its host waiting; the other is found meanwhile.
+// One receiver does not answer for a while; the other one is found in the meantime.
 TEST(ApiCreateOnSerial, TwoPortsAreTriedAtOnce) {
   bed::SimulatedPort slow({"quorin"});
   const bed::SimulatedPort quick({"quorin"});

@@ -33,10 +33,10 @@ class DownloadToAbort {
   }
   void Abort() const { EXPECT_EQ(devapi::Abort(receiver_.get()), S_OK); }
 
-  // What an aborted download leaves behind: a receiver that was told, at its old speed.
+  // The state after an aborted download: the receiver was sent the end and is at its old speed.
   void ExpectEnded() {
     const host::Lines lines = receiver_.WireSince();
-    // From the get on the receiver waits for the host.
+    // After the get command the receiver waits for the host.
     const size_t begun = host::CountStarting(lines, "> %#%get,");
     EXPECT_EQ(host::CountOf(lines, "> #") + host::CountStarting(lines, "> #%"), begun)
         << port_.Transcript();
@@ -44,7 +44,7 @@ class DownloadToAbort {
     EXPECT_EQ(stream_.bytes.size() % 512, 0U);
   }
   void ExpectNothingIsLeftOfIt() {
-    // An abort cuts the wait for the receiver's word on its speed short.
+    // An abort ends the wait for the receiver's reply about its speed.
     if (host::CountOf(receiver_.WireSince(), "= speed 115200") > 0) {
       port_.WaitForTranscript("= speed 9600\n");
     }
@@ -103,7 +103,7 @@ INSTANTIATE_TEST_SUITE_P(Moments,
                                          Moment{"TenthBlock", " seq=9 "}),
                          [](const auto& moment) { return moment.param.name; });
 
-// The download stands still in its progress function while the abort comes.
+// The download is stopped in its progress function while the abort comes.
 class ApiDownloadAbortAtPercent : public DownloadToAbort, public testing::TestWithParam<int> {
  protected:
   ApiDownloadAbortAtPercent() : DownloadToAbort(5000) {}
@@ -128,7 +128,7 @@ TEST_P(ApiDownloadAbortAtPercent, EndsIt) {
 
 INSTANTIATE_TEST_SUITE_P(Percents, ApiDownloadAbortAtPercent, testing::Values(0, 1, 50, 100));
 
-// Allowed by the host's own progress function as well.
+// The host's own progress function may abort, too.
 class ApiDownloadAbortFromProgress : public DownloadToAbort, public testing::Test {
  protected:
   ApiDownloadAbortFromProgress() : DownloadToAbort(5000) {}
@@ -146,7 +146,7 @@ TEST_F(ApiDownloadAbortFromProgress, EndsIt) {
   ExpectNextDownloadWorks();
 }
 
-// The receiver is silent while the speed is put back, until the abort ends the wait for its word.
+// The receiver does not answer while the speed is put back, until the abort ends that wait.
 TEST_F(ApiDownloadAbortFromProgress, EndsTheWaitAtTheEndToo) {
   const host::Report report;
   host::GatedProgress held(100);
@@ -177,8 +177,8 @@ TEST_F(ApiDownloadAbort, WhileAnotherThreadHoldsTheReceiver) {
   ExpectNothingIsLeftOfIt();
 }
 
-// A receiver that does not follow to the higher speed hears nothing more. The host gives up each
-// wait, goes back, and finds it again.
+// A receiver that does not follow to the higher speed receives nothing more. The host ends each
+// wait, returns to the old speed, and finds it again.
 TEST(ApiDownloadAbortOfDeafReceiver, GoesBackToItsSpeed) {
   const bed::SimulatedPort port({"quorin", "--keep-speed"}, {{"A.log", "a"}});
   const host::Receiver receiver(port);
@@ -186,7 +186,7 @@ TEST(ApiDownloadAbortOfDeafReceiver, GoesBackToItsSpeed) {
   host::MemoryStream stream;
   auto download = host::OnThread([&] { return receiver.Download(L"A.log", stream); });
   report.WaitFor("CSerialConnection::SetSpeed - changing of baudrate [9600 -> 115200]");
-  // One wait is over by now: the one for the name of the port.
+  // One wait is over: the one for the name of the port.
   for (size_t over = 1; download.wait_for(kPoll) != std::future_status::ready;) {
     const size_t waits = report.LinesWith(kReading).size();
     if (waits > over) devapi::Abort(receiver.get());
@@ -198,13 +198,13 @@ TEST(ApiDownloadAbortOfDeafReceiver, GoesBackToItsSpeed) {
   EXPECT_EQ(receiver.Identify().result, S_OK);
 }
 
-// Impatient users abort again and again.
+// Impatient users abort several times.
 TEST_F(ApiDownloadAbort, ManyTimesIsLikeOnce) {
   auto download = Start();
   port_.WaitForTranscript(" seq=3 ");
   for (int i = 0; i < 100; ++i) Abort();
   EXPECT_EQ(download.get(), S_FALSE);
-  port_.WaitForTranscript("= speed 9600\n");  // nobody waited for the receiver to hear it
+  port_.WaitForTranscript("= speed 9600\n");  // the download did not wait for the reply
   ExpectEnded();
 }
 

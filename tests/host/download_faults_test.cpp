@@ -1,4 +1,4 @@
-// DownloadFile from receivers and over lines that misbehave.
+// DownloadFile with faults of the receiver and of the line.
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <windows.h>
@@ -25,7 +25,7 @@ std::ostream& operator<<(std::ostream& out, const Fault& fault) { return out << 
 
 std::string FaultName(const testing::TestParamInfo<Fault>& fault) { return fault.param.name; }
 
-// A receiver at full speed, so that nothing but the transfer passes.
+// A receiver at full speed, so that no speed is changed.
 class FaultyDownload : public testing::TestWithParam<Fault> {
  protected:
   static std::vector<std::string> Arguments(const std::vector<std::string>& switches) {
@@ -48,7 +48,7 @@ class FaultyDownload : public testing::TestWithParam<Fault> {
   host::Progress progress_;
 };
 
-// A block that comes wrong is asked for again.
+// A damaged block is requested again.
 using ApiDownloadOvercomes = FaultyDownload;
 
 TEST_P(ApiDownloadOvercomes, ByAskingAgain) {
@@ -72,14 +72,14 @@ INSTANTIATE_TEST_SUITE_P(
                     Fault{"LostByte", {"--lost-byte", "2"}},
                     Fault{"Type", {"--bad-type", "3"}},
                     Fault{"Silence", {"--block-silence", "1:1"}},
-                    // Two silences for each of two blocks: more than a single block may have.
+                    // Two time-outs for each of two blocks, together more than one block may have.
                     Fault{"Silences", {"--block-silence", "1:2", "--block-silence", "2:2"}}),
     FaultName);
 
-// What does not touch the blocks does not touch the transfer either.
+// Faults outside the blocks do not affect the transfer.
 using ApiDownloadIgnores = FaultyDownload;
 
-TEST_P(ApiDownloadIgnores, WhatIsNoneOfItsBusiness) {
+TEST_P(ApiDownloadIgnores, WhatDoesNotTouchTheBlocks) {
   EXPECT_EQ(Download(), S_OK);
   EXPECT_TRUE(HasWholeFile());
   port_.WaitForTranscript("\n> #\n");
@@ -101,8 +101,8 @@ struct Ending {
   std::vector<std::string> switches;
   DWORD speed;
   HRESULT result;
-  size_t blocks;       // delivered before
-  size_t asked;        // how often NAK was sent
+  size_t blocks;       // delivered before the fault
+  size_t asked;        // the number of NAKs
   bool ends_transfer;  // whether # was sent
 };
 
@@ -136,7 +136,7 @@ TEST_P(ApiDownloadEnds, WithAClearResult) {
   EXPECT_EQ(next.bytes, "next");
   receiver.WaitForLastSent(speed == CBR_115200 ? "#" : R"(%#%set,cur/term/rate,9600\r\n)");
 
-  // Where the receiver has no transfer any more, the sign stands in front of the next command.
+  // When the receiver has no transfer any more, the # comes before the next command.
   const host::Lines sent = receiver.SentSince();
   const size_t ended = host::CountOf(sent, "#") + host::CountStarting(sent, "#%");
   EXPECT_EQ(ended, GetParam().ends_transfer ? 2U : 1U) << port.Transcript();
@@ -148,7 +148,7 @@ INSTANTIATE_TEST_SUITE_P(
     ApiDownloadEnds,
     testing::Values(
         Ending{"EndBlock", {"--end-block", "2"}, CBR_115200, S_FALSE, 2, 1, false},
-        // A lone '#' is no whole header: it is asked for again until the time-outs are spent.
+        // A single '#' is not a whole header: the block is requested again until the last time-out.
         Ending{"EndByte", {"--end-byte", "2"}, CBR_115200, host::kTimedOut, 2, 5, true},
         Ending{"NegativeLength",
                {"--negative-length", "1"},

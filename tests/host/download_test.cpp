@@ -1,4 +1,4 @@
-// DownloadFile where all goes well, and where it cannot begin.
+// DownloadFile without faults, and where it cannot begin.
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <windows.h>
@@ -20,7 +20,7 @@ namespace {
 
 constexpr size_t kBlock = 512;
 
-// What a download reports, by its formula: a new percent after each block that changes it.
+// The progress of a download, computed: a new percent after each block that changes it.
 std::vector<int> ExpectedPercents(uint32_t size, uint32_t told_size) {
   std::vector<int> percents = {0, 1};
   uint8_t last = 0;
@@ -33,7 +33,7 @@ std::vector<int> ExpectedPercents(uint32_t size, uint32_t told_size) {
   return percents;
 }
 
-// What passes between the size query and the end of a good transfer.
+// The lines from the size query to the end of a successful transfer.
 host::Lines TransferOf(const std::string& name, size_t size) {
   host::Lines lines = {R"(> %#%\n)",
                        R"(< RE%#%\r\n)",
@@ -76,7 +76,7 @@ TEST_P(ApiDownloadOf, DeliversEveryByte) {
 
 INSTANTIATE_TEST_SUITE_P(Sizes, ApiDownloadOf, testing::Values(1, 511, 512, 513, 60000));
 
-TEST(ApiDownload, TellsItsSteps) {
+TEST(ApiDownload, TracesItsSteps) {
   const bed::SimulatedPort port({"quorin"}, {{"A.log", host::Content(20000)}});
   const host::Receiver receiver(port);
   const host::Report report;
@@ -161,8 +161,9 @@ TEST(ApiDownload, RunsOnTwoPortsAtOnce) {
   EXPECT_TRUE(other_stream.bytes == std::string(7000, 'x'));
 }
 
-// The size that the receiver tells is what percents are counted by; the blocks are what counts.
-TEST(ApiDownload, PercentsFollowTheSizeTold) {
+// The size that the receiver reports is used for the percents only; the blocks decide what is
+// downloaded.
+TEST(ApiDownload, PercentsFollowTheReportedSize) {
   const bed::SimulatedPort port({"quorin", "--speed", "115200", "--lie-size", "A.log=256"},
                                 {{"A.log", host::Content(8000)}});
   const host::Receiver receiver(port, CBR_115200);
@@ -226,8 +227,8 @@ TEST(ApiDownload, RefusedGetFails) {
   EXPECT_EQ(receiver.WireSince().back(), "= speed 9600");
 }
 
-// On a serial port the host's own failure is its own to see; the receiver is told to stop.
-TEST(ApiDownload, FailingStreamEndsItWithoutAWord) {
+// On a serial port a failure of the host's stream is not returned; the receiver is sent the end.
+TEST(ApiDownload, FailingStreamEndsItWithoutAFailure) {
   const bed::SimulatedPort port({"quorin", "--speed", "115200"}, {{"A.log", host::Content(9000)}});
   const host::Receiver receiver(port, CBR_115200);
   host::MemoryStream stream;

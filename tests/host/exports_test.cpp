@@ -1,4 +1,4 @@
-// The names under which the DLL offers its functions, for the compilers of both worlds.
+// The names under which the DLL exports its functions, for GNU's and Microsoft's compilers.
 #include <gtest/gtest.h>
 #include <windows.h>
 
@@ -57,7 +57,7 @@ std::string GnuFunction(const std::string& name) {
   return function;
 }
 
-// Tells the functions of one name apart by their text argument.
+// Distinguishes functions of one name by their text argument.
 std::string Key(const std::string& name) {
   if (IsMicrosoft(name)) {
     const bool narrow = name.find("@@YAXPEBD") != std::string::npos;
@@ -73,7 +73,7 @@ TEST(ApiExports, EveryNameIsThere) {
   for (const std::string& name : names) EXPECT_NE(Find(name), nullptr) << name;
 }
 
-TEST(ApiExports, BothNamesOfAFunctionLeadToTheSamePlace) {
+TEST(ApiExports, BothNamesOfAFunctionHaveTheSameAddress) {
   std::map<std::string, FARPROC> microsoft;
   std::map<std::string, FARPROC> gnu;
   for (const std::string& name : ExportedNames()) {
@@ -90,7 +90,7 @@ TEST(ApiExports, BothNamesOfAFunctionLeadToTheSamePlace) {
   }
 }
 
-TEST(ApiExports, TheHeaderLeadsToThemToo) {
+TEST(ApiExports, TheHeaderDeclaresTheSameFunctions) {
   EXPECT_EQ(reinterpret_cast<void*>(&devapi::DeleteFileW),
             reinterpret_cast<void*>(Find("?DeleteFileW@devapi@@YAJPEAXPEA_W@Z")));
   EXPECT_EQ(

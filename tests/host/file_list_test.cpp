@@ -61,7 +61,7 @@ std::ostream& operator<<(std::ostream& out, const Amount& amount) { return out <
 
 class ApiFileListOf : public testing::TestWithParam<Amount> {};
 
-TEST_P(ApiFileListOf, TellsNamesSizesAndTimes) {
+TEST_P(ApiFileListOf, HasNamesSizesAndTimes) {
   bed::TempFolder folder;
   for (size_t i = 0; i < GetParam().files; ++i) {
     folder.Write(NumberedName(i), host::Content(i * i * 7));
@@ -97,7 +97,7 @@ INSTANTIATE_TEST_SUITE_P(
                     Amount{50, {"--pieces", "23", "--piece-gap", "1"}},
                     Amount{3, {"--garbage", "9", "--other-tag-first", "print,/log"}}));
 
-TEST(ApiFileList, TellsItsSteps) {
+TEST(ApiFileList, TracesItsSteps) {
   const bed::SimulatedPort port({"quorin"}, {{"A.log", "abc"}});
   const host::Receiver receiver(port);
   const host::Report report;
@@ -114,8 +114,8 @@ TEST(ApiFileList, TellsItsSteps) {
                           "GetFileInfo - [A.log] [3]"));
 }
 
-// Names travel as bytes of the thread's code page.
-TEST(ApiFileList, NamesBeyondAsciiComeAndGo) {
+// Names are sent as bytes of the thread's code page.
+TEST(ApiFileList, NamesBeyondAsciiAreConverted) {
   const std::u8string utf8 = u8"Gr\u00F6\u00DFe.log";
   const std::string bytes(utf8.begin(), utf8.end());
   const std::string content = host::Content(700);
@@ -215,8 +215,8 @@ struct Raised {
   DWORD flags;
 };
 
-// The call runs on a thread of its own, which the exception ends. A handler that is never left
-// stays installed for ever, so it looks at nothing but the calls made here.
+// The call runs on a thread of its own, which the exception ends. The handler stays installed for
+// ever, so it handles only the calls made here.
 Raised CallGetFileInfo(void* list, long index) {
   static Raised* current = nullptr;
   static thread_local bool calling = false;

@@ -1,4 +1,4 @@
-// Handles and their users: what is registered, and for how long.
+// Handles and their users: which receivers are registered, and for how long.
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <windows.h>
@@ -15,7 +15,7 @@ using testing::IsEmpty;
 
 namespace {
 
-// Asks every function that takes a receiver's handle.
+// Calls every function that takes a receiver's handle.
 void ExpectUnknown(void* handle) {
   wchar_t name[] = L"A.log";
   short answer = 7;
@@ -43,7 +43,7 @@ void ExpectUnknown(void* handle) {
   EXPECT_EQ(stream.writes, 0U);
 }
 
-TEST(ApiHandles, NeverHandedOutAreUnknown) {
+TEST(ApiHandles, ThatWereNeverGivenAreUnknown) {
   int something = 0;
   const host::Report report;
   ExpectUnknown(nullptr);
@@ -97,7 +97,7 @@ TEST(ApiHandles, CountTheirUsers) {
   EXPECT_EQ(devapi::OpenReceiver(name.data(), &again), S_FALSE);
 }
 
-TEST(ApiHandles, AreTornDownByName) {
+TEST(ApiHandles, AreDestroyedByName) {
   const bed::SimulatedPort port({"quorin"});
   host::Receiver receiver(port);
   void* const handle = receiver.Release();

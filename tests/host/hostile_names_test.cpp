@@ -10,7 +10,7 @@
 
 namespace {
 
-// For the two questions that a download asks about a name.
+// For the two commands of a download that contain a name.
 std::vector<std::wstring> NastyNames() {
   return {L"", std::wstring(10000, L'x'), L"\":{500,512}", L"A\r\nB", L"\x4E2D.log"};
 }
@@ -24,7 +24,7 @@ std::vector<std::wstring> HostileNames() {
 
 class ApiHostileNames : public testing::Test {
  protected:
-  // At full speed, so that a download goes straight to its file.
+  // At full speed, so that a download does not change the speed first.
   const bed::SimulatedPort port_{{"quorin", "--speed", "115200"}, {{"A.log", "content"}}};
   const host::Receiver receiver_{port_, CBR_115200};
 };

@@ -18,7 +18,7 @@ using testing::IsEmpty;
 
 namespace {
 
-// Its result; a record that failed has no strings.
+// Its result. After a failure the record has no strings.
 long GetInfo(void* receiver, HANDLE abort_event = nullptr) {
   CReceiverInfo info{};
   info.bstrModel = info.bstrReceiverId = reinterpret_cast<wchar_t*>(&info);
@@ -50,7 +50,7 @@ TEST_P(ApiVelmarInfoRefused, LeavesTheReceiverFree) {
   EXPECT_EQ(host::OnThread([&] { return Delete(receiver.get(), L"A.log"); }).get(), S_OK);
 }
 
-TEST_P(ApiVelmarInfoRefused, TakesNothingFromAThreadThatHeldItBefore) {
+TEST_P(ApiVelmarInfoRefused, KeepsTheLockOfAThreadThatHeldItBefore) {
   const host::Velmar receiver({GetParam(), "log versiona"});
   ASSERT_EQ(devapi::LockConnection(receiver.get(), nullptr), S_OK);
   EXPECT_EQ(GetInfo(receiver.get()), S_FALSE);
@@ -66,8 +66,8 @@ INSTANTIATE_TEST_SUITE_P(Refusals,
                            return refusal.index == 0 ? "WithAText" : "WithoutAText";
                          });
 
-// It gives back a lock that it did not get: that is another thread's, and stays it.
-TEST(ApiVelmarInfo, ThatDidNotGetTheLockTakesItFromNobody) {
+// It releases a lock that it did not get: the lock of another thread must stay held.
+TEST(ApiVelmarInfo, ThatDidNotGetTheLockReleasesNone) {
   const host::Velmar receiver({});
   ASSERT_EQ(devapi::LockConnection(receiver.get(), nullptr), S_OK);
   const host::Report report;
@@ -103,7 +103,7 @@ TEST_P(ApiQuorinInfoRefused, KeepsOtherThreadsWaitingUntilItIsUnlocked) {
 
   auto deletion = host::OnThread([&] { return Delete(handle_, L"A.log"); });
   report_.WaitFor("CAbstractReceiver::DeleteFile");
-  // The holder goes on meanwhile, and is heard first.
+  // The holder continues, and its command is received first.
   EXPECT_EQ(receiver_.Check(), -1);
   EXPECT_EQ(devapi::UnlockConnection(handle_), S_OK);
   EXPECT_EQ(deletion.get(), S_OK);
@@ -113,7 +113,7 @@ TEST_P(ApiQuorinInfoRefused, KeepsOtherThreadsWaitingUntilItIsUnlocked) {
   EXPECT_EQ(TryLockElsewhere(handle_), S_OK);
 }
 
-// Each failure takes the lock once more.
+// Each failure takes the lock again.
 TEST_P(ApiQuorinInfoRefused, HoldsItAsOftenAsItFailed) {
   EXPECT_EQ(GetInfo(handle_), host::kNotConnected);
   EXPECT_EQ(GetInfo(handle_), host::kNotConnected);
@@ -123,7 +123,7 @@ TEST_P(ApiQuorinInfoRefused, HoldsItAsOftenAsItFailed) {
   EXPECT_EQ(TryLockElsewhere(handle_), S_OK);
 }
 
-// Only the thread that failed can give it back.
+// Only the thread that failed can release it.
 TEST_P(ApiQuorinInfoRefused, IsNotUnlockedByAnotherThread) {
   EXPECT_EQ(GetInfo(handle_), host::kNotConnected);
   EXPECT_EQ(host::OnThread([&] { return devapi::UnlockConnection(handle_); }).get(), S_OK);

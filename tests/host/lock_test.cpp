@@ -18,7 +18,7 @@ class ApiLock : public testing::Test {
  protected:
   long Lock() const { return devapi::LockConnection(receiver_.get(), nullptr); }
   long Unlock() const { return devapi::UnlockConnection(receiver_.get()); }
-  // Takes the lock when it is free, and gives up at once when not.
+  // Takes the lock if it is free, and fails at once otherwise.
   long TryLock() const {
     const host::Event at_once(true);
     return devapi::LockConnection(receiver_.get(), at_once.get());
@@ -50,7 +50,7 @@ TEST_F(ApiLock, KeepsOtherThreadsOut) {
                           "CQuorinProtocol::UnlockConnection - connection is unlocked [HANDLE]"));
 }
 
-TEST_F(ApiLock, IsGivenBackAsOftenAsItWasTaken) {
+TEST_F(ApiLock, IsReleasedAsOftenAsItWasTaken) {
   EXPECT_EQ(Lock(), S_OK);
   EXPECT_EQ(TryLock(), S_OK);
   EXPECT_EQ(Unlock(), S_OK);
@@ -79,7 +79,7 @@ TEST_F(ApiLock, WaitsUntilTheOtherThreadIsDone) {
   EXPECT_EQ(other.get(), S_OK);
 }
 
-// What the holder does comes first, although the other thread has come before it.
+// The holder's operation comes first, although the other thread started earlier.
 TEST_F(ApiLock, OperationOfAnotherThreadWaits) {
   ASSERT_EQ(Lock(), S_OK);
   auto deletion = host::OnThread([&] {

@@ -1,4 +1,4 @@
-// What is done a thousand times leaves no handle behind.
+// An operation that is repeated a thousand times leaves no handle open.
 #include <gtest/gtest.h>
 #include <windows.h>
 
@@ -11,8 +11,8 @@
 
 namespace {
 
-// Runs an operation a few times, as the system keeps some handles of a first time, and then many
-// times more.
+// Executes an operation a few times, because the system keeps some handles of the first one, and
+// then many times.
 template <typename Operation>
 void ExpectNothingIsLeft(const char* name, int times, Operation operation) {
   constexpr int kFirstTimes = 3;
@@ -88,7 +88,7 @@ TEST(ApiManyTimes, OpeningAPortThatIsThere) {
   });
 }
 
-// Threads come and go.
+// Threads start and end.
 TEST(ApiManyTimes, FromManyThreads) {
   const bed::SimulatedPort port({"quorin"});
   const host::Receiver receiver(port);

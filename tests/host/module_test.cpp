@@ -1,4 +1,4 @@
-// The library loaded and unloaded while the test looks on: a copy of it under another name.
+// A copy of the library under another name, loaded and unloaded by the test.
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <windows.h>
@@ -18,7 +18,7 @@ using testing::Not;
 
 namespace {
 
-TEST(ApiModule, LoadLineNeverShows) {
+TEST(ApiModule, LoadLineIsInNoReport) {
   const host::Report report;
   host::LibraryCopy copy;
   ASSERT_TRUE(copy.Load());
@@ -33,7 +33,7 @@ TEST(ApiModule, LoadLineNeverShows) {
   DeleteFileW(host::ReportPath(name).c_str());
 }
 
-TEST(ApiModule, SaysGoodbyeInItsReportOnly) {
+TEST(ApiModule, WritesByeInItsReportOnly) {
   const std::wstring name = host::NewReportName();
   host::LibraryCopy copy;
   ASSERT_TRUE(copy.Load());
@@ -46,7 +46,7 @@ TEST(ApiModule, SaysGoodbyeInItsReportOnly) {
 class ApiModuleWithReceiver : public testing::Test {
  protected:
   // Loads a copy, opens a receiver through it, and unloads it. Gives the number of handles that
-  // this leaves behind.
+  // stay open.
   long LoadAndUnload() {
     DeleteFileW(path_.c_str());
     const size_t before = host::HandleCount();
@@ -65,8 +65,8 @@ class ApiModuleWithReceiver : public testing::Test {
   const std::wstring path_ = host::ReportPath(name_);
 };
 
-TEST_F(ApiModuleWithReceiver, LetsGoOfItWhenUnloaded) {
-  LoadAndUnload();  // the system keeps something of the first time
+TEST_F(ApiModuleWithReceiver, ClosesItWhenUnloaded) {
+  LoadAndUnload();  // the system keeps some handles of the first time
   EXPECT_EQ(LoadAndUnload(), 0);
 
   std::vector<std::string> lines = host::ReportLines(path_);

@@ -1,5 +1,5 @@
-// A host that ends while it has a receiver open: the system ends its other threads first, and the
-// library still closes what it can.
+// A host that ends with an open receiver: the system ends its other threads first, and the library
+// still closes what it can.
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <windows.h>
@@ -52,7 +52,7 @@ TEST_F(ApiProcessEnd, ClosesAReceiver) {
   EXPECT_EQ(again.Identify().result, S_OK);
 }
 
-// The receiver belongs to the download too, and with its thread gone nobody lets go of that share.
+// The download also owns the receiver, and its thread is gone, so that ownership is never released.
 TEST_F(ApiProcessEnd, LeavesADownloadAsItIs) {
   bed::SimulatedPort port({"quorin", "--pace"}, {{"A.log", host::Content(300000)}});
   RunHost(port, {"A.log"});

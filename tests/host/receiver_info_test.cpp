@@ -1,4 +1,4 @@
-// GetReceiverInfo: who the receiver is.
+// GetReceiverInfo: the identity of the receiver.
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <windows.h>
@@ -18,7 +18,7 @@ namespace {
 constexpr int kFill = 0xCD;
 constexpr unsigned kFilled = 0xCDCDCDCD;
 
-// A record in which every byte that was not written can be told.
+// A record in which every byte that was not written can be recognised.
 CReceiverInfo FilledRecord() {
   CReceiverInfo info;
   std::memset(&info, kFill, sizeof(info));
@@ -27,7 +27,7 @@ CReceiverInfo FilledRecord() {
 
 wchar_t* FilledPointer() { return FilledRecord().bstrReserved; }
 
-// What another thread would get now: S_OK and the lock at once, or S_FALSE when it is taken.
+// What another thread gets now: S_OK with the lock, or S_FALSE when it is held.
 long TryLockElsewhere(void* handle) {
   return host::OnThread([handle] {
            const host::Event at_once(true);
@@ -83,7 +83,7 @@ std::ostream& operator<<(std::ostream& out, const Model& model) { return out << 
 
 class ApiReceiverInfoOfModel : public testing::TestWithParam<Model> {};
 
-TEST_P(ApiReceiverInfoOfModel, TellsTheVariant) {
+TEST_P(ApiReceiverInfoOfModel, HasTheVariant) {
   const bed::SimulatedPort port({"quorin", "--model", GetParam().text});
   const host::Receiver receiver(port);
   CReceiverInfo info{};
@@ -149,7 +149,7 @@ TEST(ApiReceiverInfo, AbortEventEndsTheWaitForTheLock) {
   devapi::UnlockConnection(handle);
 }
 
-// An abort ends the operation that finds it, and no other.
+// An abort ends the operation that finds it, and only this one.
 TEST(ApiReceiverInfo, AbortBeforehandEndsOneCall) {
   const bed::SimulatedPort port({"quorin"});
   const host::Receiver receiver(port);

@@ -66,7 +66,7 @@ TEST(ApiReport, IsHiddenAndOthersMayOnlyReadIt) {
   EXPECT_EQ(GetLastError(), DWORD{ERROR_SHARING_VIOLATION});
 }
 
-TEST(ApiReport, NewOneOfTheSameNameStartsAfresh) {
+TEST(ApiReport, NewOneOfTheSameNameStartsEmpty) {
   const std::wstring name = host::NewReportName();
   const std::wstring path = host::ReportPath(name);
   dump_hlp::CreateReportFile(name.c_str());
@@ -93,7 +93,7 @@ TEST(ApiReport, SecondReportEndsTheFirst) {
   EXPECT_TRUE(DeleteFileW(host::ReportPath(second).c_str()));
 }
 
-TEST(ApiReport, CannotBeCreatedUnderAHopelessName) {
+TEST(ApiReport, CannotBeCreatedUnderAnInvalidName) {
   const host::Report report;
   dump_hlp::CreateReportFile(std::wstring(5000, L'x').c_str());
   Say("nowhere\r\n");
@@ -102,7 +102,7 @@ TEST(ApiReport, CannotBeCreatedUnderAHopelessName) {
   EXPECT_THAT(report.Lines(), IsEmpty());
 }
 
-TEST(ApiReport, LongLinesArriveWhole) {
+TEST(ApiReport, LongLinesAreWhole) {
   const host::Report report;
   const std::string narrow(20000, 'n');
   const std::wstring wide(20000, L'w');

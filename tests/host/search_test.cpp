@@ -1,4 +1,4 @@
-// SearchReceiver and its serial half: from a port's name to a receiver.
+// SearchReceiver and its serial part: from the name of a port to a receiver.
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <windows.h>
@@ -25,7 +25,7 @@ class ApiSearch : public testing::Test {
   long Search(EInstanceType type, EProtocol protocol, HANDLE abort_event = nullptr) {
     return devapi::SearchReceiver(name_.data(), type, protocol, abort_event, &handle_);
   }
-  // The lines of one try that opens the port and then gives up.
+  // The lines of one try that opens the port and then fails.
   host::Lines LinesOfTry(const std::string& speed, const std::string& rts) const {
     return {"SearchReceiverOnSerial - try " + speed + " [" + port_ + "]",
             "SearchReceiverOnSerial - try RTS control is " + rts + " [" + port_ + "]",
@@ -34,7 +34,7 @@ class ApiSearch : public testing::Test {
             "CSerialConnection::Flush",
             "CSerialConnection::Open - OK [" + port_ + "]"};
   }
-  // What a connection says at its end.
+  // The line at the end of a connection.
   host::Lines LinesOfEnd() const {
     return {"CAbstractConnection::Cancel [" + port_ + "]",
             "CAbstractConnection::Disconnect - disconnected [" + port_ + "]"};
@@ -69,7 +69,7 @@ class ApiSearchOfMissingPort : public ApiSearch {
             "CAbstractConnection::Cancel [" + port_ + "]"});
     return lines;
   }
-  // A device that cannot be opened is tried all the same, and does not answer.
+  // A device that cannot be opened is still tried, and does not answer.
   host::Lines LinesOfUsb() const {
     return {
         "CreateReceiverOnUSB - opening USB [" + port_ + "]",
@@ -153,7 +153,7 @@ TEST_F(ApiSearch, ReturnsARegisteredReceiverAtOnce) {
   EXPECT_EQ(port.Transcript(), before) << "it was asked nevertheless";
 }
 
-// The port was left at a speed that the receiver does not hear, so it is found at the second try.
+// The port was left at another speed than the receiver's, so it is found at the second try.
 TEST_F(ApiSearch, SweepsTheSpeedsFromTheCurrentOneOn) {
   const bed::SimulatedPort port({"quorin"});
   UsePort(port.name());
@@ -223,7 +223,7 @@ TEST_F(ApiSearch, EndsWhenItIsAbortedInASilence) {
   EXPECT_TRUE(report.Has("CAbstractConnection::Disconnect - disconnected [" + port_ + "]"));
 }
 
-// A port that opens and is none: a plain file in its place, where every try fails at once.
+// A plain file in place of a port: it can be opened, and every try fails at once.
 class ApiSearchOfNoPort : public ApiSearch {
  protected:
   ApiSearchOfNoPort() {
@@ -271,7 +271,7 @@ TEST_F(ApiSearchOfNoPort, LooksForTheFamilyNamedOnly) {
       host::CountStarting(report_.LinesFrom(before), "CreateReceiverOnSerial - looking for Q"), 0U);
 }
 
-TEST_F(ApiSearchOfNoPort, TakesAStaleHandleForAFind) {
+TEST_F(ApiSearchOfNoPort, TakesAStaleHandleForAFoundReceiver) {
   void* const stale = &name_;
   handle_ = stale;
   EXPECT_EQ(Search(eInstanceSerial, eProtocolAny), S_OK);

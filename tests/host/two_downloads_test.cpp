@@ -34,7 +34,7 @@ Files TwoFiles() {
   return {{"A.log", host::Content(kFirstSize)}, {"B.log", std::move(second)}};
 }
 
-// Stands still once some of the file has come. The download holds the receiver's lock then, and no
+// Stops after some of the file has arrived. The download then holds the receiver's lock, and no
 // other.
 class HeldStream : public host::MemoryStream {
  public:
@@ -47,7 +47,7 @@ class HeldStream : public host::MemoryStream {
   host::Gate gate;
 };
 
-// The receivers, each on its link: its handle, and what was said to it of files, in order.
+// The receivers, each on its link: the handle, and the file commands that were sent, in order.
 
 class QuorinOnSerial {
  public:
@@ -126,7 +126,7 @@ class ApiTwoDownloads : public testing::Test {
   long Download(std::wstring name, IStream& stream) const {
     return devapi::DownloadFile(link_.handle(), name.data(), &stream, nullptr);
   }
-  // How often a download has got the lock.
+  // How often a download got the lock.
   size_t TimesLocked() const {
     size_t times = 0;
     for (const std::string& line : report_.Lines()) {
@@ -157,7 +157,7 @@ struct LinkName {
 using Links = testing::Types<QuorinOnSerial, VelmarOnSerial, QuorinOnUsb>;
 TYPED_TEST_SUITE(ApiTwoDownloads, Links, LinkName);
 
-// The second comes in the middle of the first.
+// The second download starts in the middle of the first.
 TYPED_TEST(ApiTwoDownloads, TakeTurns) {
   constexpr auto kAWhile = std::chrono::milliseconds(300);
   HeldStream first;
@@ -182,7 +182,7 @@ TYPED_TEST(ApiTwoDownloads, TakeTurns) {
   EXPECT_EQ(TryLockElsewhere(this->link_.handle()), S_OK) << "the lock is still held";
 }
 
-// Whoever holds the receiver comes first, then both, in whatever order.
+// The holder of the receiver comes first, then both downloads in any order.
 TYPED_TEST(ApiTwoDownloads, WaitForAHolderAndThenForEachOther) {
   ASSERT_EQ(devapi::LockConnection(this->link_.handle(), nullptr), S_OK);
   host::MemoryStream streams[2];

@@ -1,4 +1,4 @@
-// Loading and unloading the library leaves nothing behind in the host.
+// Loading and unloading the library leaves nothing in the host.
 #include <gtest/gtest.h>
 #include <windows.h>
 
@@ -15,8 +15,8 @@
 
 namespace {
 
-// A thread of the system alone: what the C++ runtime of this program keeps for threads of its own
-// would be counted with the library's.
+// A plain Win32 thread: what the C++ runtime of this program keeps for its own threads would be
+// counted as the library's.
 class Thread {
  public:
   explicit Thread(std::function<void()> function) : function_(std::move(function)) {}
@@ -40,7 +40,7 @@ class Thread {
 
 class ApiUnload : public testing::Test {
  protected:
-  // Every third time something is raised inside.
+  // Every third time an exception is raised inside.
   void LoadAndUnload(int times) {
     constexpr int kRaiseEvery = 3;
     for (int i = 0; i < times; ++i) {
@@ -95,8 +95,8 @@ TEST_F(ApiUnload, LeavesNothingOfManyTimes) {
   EXPECT_LT(host::HeapBytes(), bytes_before + kSmall);
 }
 
-// What the library keeps for a thread that raised goes when the library does, and the thread's end
-// touches nothing of it.
+// What the library keeps for a thread that raised an exception is freed when the library is
+// unloaded; the end of the thread does not use it.
 TEST_F(ApiUnload, LeavesNothingForThreadsThatLiveOn) {
   constexpr int kThreads = 20;
   const auto unload_under_threads = [this] {
@@ -122,7 +122,7 @@ TEST_F(ApiUnload, LeavesNothingForThreadsThatLiveOn) {
   EXPECT_EQ(host::CountResources(), before);
 }
 
-// What it keeps for a thread that raised goes when the thread does.
+// What it keeps for a thread that raised an exception is freed when the thread ends.
 TEST_F(ApiUnload, ThreadsThatRaisedLeaveNothing) {
   constexpr int kThreads = 200;
   constexpr size_t kLeastOfAThread = 8;

@@ -30,7 +30,7 @@ std::vector<std::string> Arguments(const std::vector<std::string>& switches) {
   return arguments;
 }
 
-// Answers of the library's read time-out, for receivers that are made while this lives.
+// The setting of the library's read time-out, for receivers that are made while this lives.
 class ReadTimeout {
  public:
   explicit ReadTimeout(DWORD milliseconds, DWORD type = REG_DWORD) {
@@ -60,7 +60,7 @@ TEST(ApiUsbDownload, BringsTheFileWithoutTouchingAnySpeed) {
                           "#"));
 }
 
-// Blocks that fill their last one and blocks that do not; fewer bytes than one.
+// Sizes that fill the last block and sizes that do not; fewer bytes than one block.
 class ApiUsbDownloadOfSize : public testing::TestWithParam<size_t> {};
 
 TEST_P(ApiUsbDownloadOfSize, BringsTheFile) {
@@ -81,7 +81,7 @@ INSTANTIATE_TEST_SUITE_P(Sizes,
 struct Fault {
   std::string name;
   std::vector<std::string> switches;
-  std::string trace;  // what the report says of it, once
+  std::string trace;  // the line of the report for it, which is there once
 };
 
 std::ostream& operator<<(std::ostream& out, const Fault& fault) { return out << fault.name; }
@@ -118,10 +118,10 @@ INSTANTIATE_TEST_SUITE_P(
                     Fault{"Silence", {"--block-silence", "3000:4"}, "read timeout."}),
     [](const auto& fault) { return fault.param.name; });
 
-// What does not touch the blocks does not touch the transfer either.
+// Faults outside the blocks do not affect the transfer.
 class ApiUsbDownloadIgnores : public testing::TestWithParam<Fault> {};
 
-TEST_P(ApiUsbDownloadIgnores, WhatIsNoneOfItsBusiness) {
+TEST_P(ApiUsbDownloadIgnores, WhatDoesNotTouchTheBlocks) {
   const std::string content = host::Content(kSeveralMb);
   const bed::SimulatedUsb usb(Arguments(GetParam().switches), {{"A.log", content}});
   const host::UsbReceiver receiver(usb);
@@ -156,7 +156,7 @@ TEST(ApiUsbDownload, TakesBlocksInPiecesOfAnySize) {
 
 // --- Time-outs
 
-TEST(ApiUsbDownload, ForgivesThreeTimeoutsInAll) {
+TEST(ApiUsbDownload, AllowsThreeTimeoutsInAll) {
   const ReadTimeout timeout(kShortTimeoutMs);
   const std::string content = host::Content(kSize);
   const bed::SimulatedUsb usb(
@@ -189,8 +189,8 @@ TEST(ApiUsbDownloadSettings, TheRegistrySetsTheTimeout) {
                  "/DownloadReadTimeout/ - 1234"));
 }
 
-// Four bytes of another type are taken as they are, and no line tells it.
-TEST(ApiUsbDownloadSettings, AnotherTypeIsTakenInSilence) {
+// Four bytes of another type are used without a line in the report.
+TEST(ApiUsbDownloadSettings, AnotherTypeIsAcceptedWithoutALine) {
   const host::Report report;
   const ReadTimeout timeout(300, REG_BINARY);
   const bed::SimulatedUsb usb({"quorin", "--lost-byte", "0@4"}, {{"A.log", "a"}});
@@ -202,7 +202,7 @@ TEST(ApiUsbDownloadSettings, AnotherTypeIsTakenInSilence) {
   EXPECT_THAT(report.LinesWith("CQuorinProtocol::CQuorinProtocol - file download"), IsEmpty());
 }
 
-TEST(ApiUsbDownloadSettings, WithoutAValueNothingIsSaid) {
+TEST(ApiUsbDownloadSettings, WithoutAValueNothingIsTraced) {
   const host::Report report;
   const UserSettings none;
   const bed::SimulatedUsb usb({"quorin"});
@@ -215,7 +215,7 @@ TEST(ApiUsbDownloadSettings, WithoutAValueNothingIsSaid) {
 TEST(ApiUsbDownload, ReportsAtMostTwiceASecond) {
   constexpr size_t kTwentyBlocks = 10000;
   const std::string content = host::Content(kTwentyBlocks);
-  // Some blocks come more than half a second after the ones before.
+  // Some blocks come more than half a second after the previous one.
   const bed::SimulatedUsb usb({"quorin", "--block-silence", "2:0.8", "--block-silence", "15:0.8"},
                               {{"A.log", content}});
   const host::UsbReceiver receiver(usb);
@@ -225,7 +225,7 @@ TEST(ApiUsbDownload, ReportsAtMostTwiceASecond) {
   EXPECT_EQ(receiver.Download(L"A.log", stream, &progress), S_OK);
   const DWORD half_seconds = (GetTickCount() - start) / 500;
   const std::vector<int>& percents = progress.percents();
-  // The steps ahead of the transfer tell the first two.
+  // The steps before the transfer report the first two.
   ASSERT_GE(percents.size(), 4U);
   EXPECT_EQ(percents[0], 0);
   EXPECT_EQ(percents[1], 1);
@@ -239,7 +239,7 @@ struct Ending {
   std::string name;
   std::vector<std::string> switches;
   HRESULT result;
-  size_t blocks;  // delivered before
+  size_t blocks;  // delivered before the fault
 };
 
 std::ostream& operator<<(std::ostream& out, const Ending& ending) { return out << ending.name; }
@@ -268,14 +268,14 @@ INSTANTIATE_TEST_SUITE_P(
     ApiUsbDownloadEnds,
     testing::Values(
         Ending{"EndBlock", {"--end-block", "3000"}, S_FALSE, 3000},
-        // A lone '#' is no whole block: it is asked for until the time-outs are spent.
+        // A single '#' is not a whole block: the block is requested until the last time-out.
         Ending{"EndByte", {"--end-byte", "3000"}, host::kTimedOut, 3000},
         Ending{"NegativeLength", {"--negative-length", "1"}, host::kNotConnected, kSeveralMb / 512},
         Ending{"Silence", {"--block-silence", "3000:60"}, host::kTimedOut, 3000},
         Ending{"ARefusedGet", {"--refuse", "get@1"}, host::kNotConnected, 0}),
     [](const auto& ending) { return ending.param.name; });
 
-// Over USB a failure of the host's stream is passed on, other than on a serial port.
+// Over USB a failure of the host's stream is returned, unlike on a serial port.
 TEST(ApiUsbDownload, PassesOnAFailureOfTheStream) {
   const bed::SimulatedUsb usb({"quorin"}, {{"A.log", host::Content(kSize)}});
   const host::UsbReceiver receiver(usb);
@@ -291,7 +291,7 @@ TEST(ApiUsbDownload, PassesOnAFailureOfTheStream) {
 
 class ApiUsbDownloadAbort : public testing::TestWithParam<int> {};
 
-// The download stands still in its progress function while the abort comes.
+// The download is stopped in its progress function while the abort comes.
 TEST_P(ApiUsbDownloadAbort, EndsItAtAnyBlock) {
   const std::string content = host::Content(kSeveralMb);
   const bed::SimulatedUsb usb({"quorin"}, {{"A.log", content}, {"B.log", "next"}});
@@ -314,7 +314,7 @@ TEST_P(ApiUsbDownloadAbort, EndsItAtAnyBlock) {
 
 INSTANTIATE_TEST_SUITE_P(Percents, ApiUsbDownloadAbort, testing::Values(0, 1, 2));
 
-// Waits for a block behind that place of the transcript.
+// Waits for a block after that place of the transcript.
 void WaitForBlock(const bed::SimulatedUsb& usb, size_t number, size_t place) {
   constexpr auto kPatience = std::chrono::seconds(20);
   const std::string text = " seq=" + std::to_string(number) + " ";
@@ -325,7 +325,7 @@ void WaitForBlock(const bed::SimulatedUsb& usb, size_t number, size_t place) {
   }
 }
 
-// No moment is chosen: it comes in the middle of a wait, a write or a step.
+// At any moment: in the middle of a wait, of a write, or between two steps.
 TEST(ApiUsbDownload, AnAbortAtManyMomentsEndsIt) {
   const std::string content = host::Content(kSeveralMb);
   const bed::SimulatedUsb usb({"quorin"}, {{"A.log", content}, {"B.log", "next"}});
@@ -382,7 +382,7 @@ TEST_P(ApiUsbUnplugged, IsAFailure) {
 
 INSTANTIATE_TEST_SUITE_P(Percents, ApiUsbUnplugged, testing::Values(0, 1, 2));
 
-TEST(ApiUsbDownload, UnpluggedInAWaitItEndsAtOnce) {
+TEST(ApiUsbDownload, EndsAtOnceWhenUnpluggedInAWait) {
   bed::SimulatedUsb usb({"quorin", "--block-silence", "1:3600"}, {{"A.log", host::Content(kSize)}});
   const host::UsbReceiver receiver(usb);
   host::MemoryStream stream;
@@ -394,7 +394,7 @@ TEST(ApiUsbDownload, UnpluggedInAWaitItEndsAtOnce) {
   EXPECT_LT(GetTickCount() - start, 15000U) << "it waited for its time-out";
 }
 
-TEST(ApiUsbDownload, PluggedInAgainItWorks) {
+TEST(ApiUsbDownload, WorksWhenPluggedInAgain) {
   bed::SimulatedUsb usb({"quorin"}, {{"A.log", "a"}});
   {
     const host::UsbReceiver receiver(usb);

@@ -21,7 +21,7 @@ namespace {
 constexpr const char* kTryToContinue =
     "CUSBConnection::Create - DeviceIoControl(IOCTL_USBIO_SET_CONFIGURATION) is failed [";
 
-// What the device is asked for, in order, up to the first byte that is sent.
+// The requests to the device, in order, up to the first byte that is sent.
 host::Lines RequestsOf(const bed::SimulatedUsb& usb) {
   host::Lines requests;
   for (const std::string& line : host::WireLines(usb.Transcript())) {
@@ -68,18 +68,18 @@ TEST_F(ApiUsb, BindsAndResetsBothPipesInOrder) {
   EXPECT_EQ(receiver_.Check(), -1);
 }
 
-TEST_F(ApiUsb, ClosingLetsGoOfBothHandles) {
+TEST_F(ApiUsb, ClosingClosesBothHandles) {
   const bed::SimulatedUsb usb({"quorin"});
   EXPECT_EQ(Create(usb), S_OK);
   EXPECT_EQ(devapi::CloseReceiver(receiver_.Release()), S_OK);
   usb.WaitForTranscript("= close 0x81\n");
   usb.WaitForTranscript("= close 0x02\n");
-  // And it can be opened again, though it is configured by now.
+  // It can be opened again, although it is already configured.
   EXPECT_EQ(Create(usb), S_OK);
   EXPECT_EQ(report_.LinesWith(kTryToContinue).size(), 1U);
 }
 
-// The family is not asked for: only Quorin receivers are on USB.
+// The family is ignored: only Quorin receivers are on USB.
 TEST_F(ApiUsb, LooksForQuorinWhateverIsAskedFor) {
   const bed::SimulatedUsb usb({"quorin"});
   EXPECT_EQ(Search(usb, eInstanceUSB, eProtocolVelmar), S_OK);
@@ -204,10 +204,10 @@ TEST_P(ApiUsbRefuses, TheDevice) {
   EXPECT_EQ(receiver_.get(), nullptr);
   EXPECT_THAT(report_.Lines(), Not(Contains(testing::StartsWith("CUSBConnection::Create - OK"))));
   EXPECT_EQ(host::CountStarting(RequestsOf(usb), "= bind"), GetParam().pipes) << usb.Transcript();
-  // Nothing got through to the receiver.
+  // The receiver received nothing.
   const bool heard = usb.Transcript().find("> ") != std::string::npos;
   EXPECT_FALSE(heard);
-  // Nothing keeps the device: it is free for the next, who meets the same.
+  // The device is not kept open: the next search can open it, with the same result.
   EXPECT_EQ(Create(usb), result);
 }
 
@@ -271,7 +271,7 @@ TEST_F(ApiUsb, ListsAndDeletesFiles) {
   devapi::CloseFileList(list);
 }
 
-TEST_F(ApiUsb, TwoDevicesDoNotMeet) {
+TEST_F(ApiUsb, TwoDevicesDoNotDisturbEachOther) {
   const bed::SimulatedUsb usb({"quorin", "--id", "ONE"});
   const bed::SimulatedUsb other({"quorin", "--id", "TWO"});
   const host::UsbReceiver one(usb);

@@ -1,4 +1,4 @@
-// Ports that vanish in mid-operation, and receivers that fall silent.
+// Ports that vanish during an operation, and receivers that stop answering.
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <windows.h>
@@ -87,10 +87,10 @@ TEST(ApiVanishingReceiver, EndsATransfer) {
   EXPECT_EQ(receiver.Identify().result, S_OK);
 }
 
-// Waits out the whole time that a receiver has for its answer, for three of them at once.
+// Waits for the whole time-out of a reply, for three receivers at once.
 //
-// The third has not followed to the higher speed of a download, and would not hear either that it
-// should come back: an abort spares its host the second wait.
+// The third one did not follow to the higher speed of a download and would not receive the old
+// speed either: an abort ends its host's second wait.
 TEST(ApiSilence, IsATimeOut) {
   bed::SimulatedPort first({"quorin"});
   bed::SimulatedPort second({"quorin"});

@@ -1,5 +1,5 @@
-// Abort of a Velmar receiver's operations at the moments that hurt: while they wait for the
-// receiver to be free, and while a download puts the link in order.
+// Abort of a Velmar receiver's operations at difficult moments: while they wait for the lock, and
+// while a download puts the speed back.
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <windows.h>
@@ -21,7 +21,7 @@ using testing::Not;
 
 namespace {
 
-// In pieces with pauses between them it takes the best part of a minute.
+// In pieces with pauses it takes nearly a minute.
 constexpr size_t kEndless = 600000;
 const std::vector<std::string> kSlowly = {"--pieces", "1000", "--piece-gap", "50"};
 constexpr const char* kTimeouts = "CVelmarCommand::Execute - read failed";
@@ -50,7 +50,7 @@ class ApiVelmarAbortedDownload : public testing::Test {
     download_ = host::OnThread([this] { return receiver_.Download(L"A.log", stream_); });
     port().WaitForTranscript(" offset=5120 ");
   }
-  // What a user does who loses patience.
+  // An impatient user: aborts several times.
   void AbortUntilItEnds() {
     do {
       devapi::Abort(receiver_.get());
@@ -66,8 +66,8 @@ class ApiVelmarAbortedDownload : public testing::Test {
   std::future<long> download_;
 };
 
-// The first abort ends the transfer. Nobody answers the put-back: the next ends its wait, but not
-// before the receiver was sent its old speed.
+// The first abort ends the transfer. The receiver does not answer when the speed is put back: the
+// next abort ends that wait, but only after the receiver was sent its old speed.
 TEST_F(ApiVelmarAbortedDownload, OfAReceiverThatFallsSilent) {
   Start();
   port().Pause();
@@ -77,7 +77,7 @@ TEST_F(ApiVelmarAbortedDownload, OfAReceiverThatFallsSilent) {
   EXPECT_TRUE(report_.Has("CSerialConnection::SetSpeed - changing of baudrate [115200 -> 9600]"));
 }
 
-TEST_F(ApiVelmarAbortedDownload, WritesNothingOfATimeOutThatNeverWas) {
+TEST_F(ApiVelmarAbortedDownload, TracesNoTimeOutThatDidNotHappen) {
   Start();
   devapi::Abort(receiver_.get());
   EXPECT_EQ(download_.get(), S_OK);

@@ -1,5 +1,5 @@
-// Downloads at raised speed that are broken off in the middle of the file: both ends are at the old
-// speed afterwards, whether the receiver goes on sending or not, and the next operation works.
+// Downloads at raised speed that end in the middle of the file: afterwards both ends are at the old
+// speed, whether the receiver goes on sending or not, and the next operation works.
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <windows.h>
@@ -19,7 +19,7 @@ using testing::ElementsAre;
 
 namespace {
 
-// Paced, this takes the best part of a minute: no download ends before it is broken off.
+// Paced, this takes nearly a minute: no download ends before it is interrupted.
 constexpr size_t kEndless = 600000;
 constexpr auto kMuchLess = std::chrono::seconds(20);
 
@@ -39,7 +39,7 @@ class ApiVelmarBrokenDownload : public testing::TestWithParam<Behaviour> {
         [this, progress] { return receiver_.Download(L"A.log", stream_, progress); });
   }
 
-  // The receiver is back at its speed, was told so at the higher one, and the host is there too.
+  // The receiver is back at its old speed, which it was sent at the higher one, and so is the host.
   void ExpectBothAtTheOldSpeed() {
     receiver_.port.WaitForTranscript("= speed 9600\n");
     host::Lines speeds;
@@ -78,7 +78,7 @@ class ApiVelmarBrokenDownload : public testing::TestWithParam<Behaviour> {
   host::MemoryStream stream_;
 };
 
-// The put-back's result takes the place of the failure.
+// The result of putting the speed back replaces the failure.
 TEST_P(ApiVelmarBrokenDownload, ByAStreamThatFails) {
   stream_.fail_at_write = 2;
   EXPECT_EQ(receiver_.Download(L"A.log", stream_), S_OK);
@@ -96,8 +96,8 @@ TEST_P(ApiVelmarBrokenDownload, ByAStreamThatFailsAtOnce) {
   ExpectNextDownloadWorks();
 }
 
-// The flag of an abort outlives the download: the next operation sends its command and ends with
-// it.
+// The flag of an abort stays set after the download: the next operation sends its command and then
+// ends.
 TEST_P(ApiVelmarBrokenDownload, ByAnAbortFromAnotherThread) {
   auto download = Start();
   receiver_.port.WaitForTranscript(" offset=5120 ");
@@ -110,7 +110,7 @@ TEST_P(ApiVelmarBrokenDownload, ByAnAbortFromAnotherThread) {
   ExpectFilesAreListed();
 }
 
-// But a download is no operation that looks at the flag: it is whole, and the flag is still there.
+// But a download does not check the flag: it is complete, and the flag is still set.
 TEST_P(ApiVelmarBrokenDownload, ByAnAbortFromItsOwnProgress) {
   host::Progress progress([&](int percent) {
     if (percent == 1) devapi::Abort(receiver_.get());

@@ -1,4 +1,4 @@
-// What a host does with a Velmar receiver: identity, files, settings, and what it does not offer.
+// What a host does with a Velmar receiver: identity, files, settings, and unsupported operations.
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <windows.h>
@@ -51,7 +51,7 @@ void SetModified(const std::filesystem::path& path, const SYSTEMTIME& time) {
   CloseHandle(file);
 }
 
-TEST(ApiVelmarFileList, TellsNamesSizesAndTimes) {
+TEST(ApiVelmarFileList, HasNamesSizesAndTimes) {
   // Year, month, no day of the week, day, hour, minute, second, no milliseconds.
   const SYSTEMTIME times[] = {{2024, 2, 0, 29, 23, 59, 58, 0}, {2023, 12, 0, 1, 0, 2, 3, 0}};
   const bed::TempFolder folder;
@@ -133,7 +133,7 @@ TEST(ApiVelmarDownload, OfAnUnknownFileIsASuccessWithoutBytes) {
   EXPECT_THAT(receiver.Sent(), ElementsAre(R"(currentfile B.log all\r)"));
 }
 
-// The download does not use the abort up: the next operation sends its command and then ends, once.
+// The download does not clear the abort: the next operation sends its command and then ends, once.
 TEST(ApiVelmarDownload, AbortEndsItAndTheNextOperation) {
   constexpr size_t kHalfAMinuteAndMore = 600000;
   constexpr auto kMuchLess = std::chrono::seconds(10);
@@ -175,7 +175,7 @@ TEST(ApiVelmarFiles, RefusalsAreSuccesses) {
   EXPECT_THAT(receiver.Names(), ElementsAre(L"A.log"));
 }
 
-// Each changes one value and keeps the others as the receiver tells them.
+// Each changes one value and keeps the others as the receiver reports them.
 TEST(ApiVelmarSettings, ChangeOneValueOfThePort) {
   const Velmar receiver({});
   const char* const question = R"(log comconfiga once\r)";
@@ -194,7 +194,7 @@ TEST(ApiVelmarSettings, ChangeOneValueOfThePort) {
                           R"(COM 9600 N 8 2 N\r)"));
 }
 
-TEST(ApiVelmarUnoffered, OperationsSaySoWithoutAskingTheReceiver) {
+TEST(ApiVelmarUnoffered, OperationsAreRefusedWithoutACommand) {
   const Velmar receiver({});
   CFileInfo info{};
   host::MemoryStream stream;

@@ -1,4 +1,4 @@
-// Velmar receivers on serial ports: which family is asked for, in which order.
+// Velmar receivers on serial ports: which families are probed, in which order.
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <windows.h>
@@ -43,7 +43,7 @@ class ApiVelmarSearch : public testing::Test {
   void* handle_ = nullptr;
 };
 
-TEST_F(ApiVelmarSearch, FindsItWithoutAWordOfTheOtherFamily) {
+TEST_F(ApiVelmarSearch, FindsItWithoutAskingTheOtherFamily) {
   ASSERT_EQ(Create(eProtocolVelmar), S_OK);
   EXPECT_NE(handle_, nullptr);
   ExpectSteps(
@@ -81,8 +81,8 @@ TEST_F(ApiVelmarSearch, IsNotAskedWhereQuorinIsWanted) {
   EXPECT_EQ(transcript.find("unlogall"), std::string::npos) << transcript;
 }
 
-// A receiver that refuses the second question is none. (The first one's answer, which nobody waits
-// for, could be taken for it.)
+// A receiver that refuses the second command is not found. (The reply to the first, for which
+// nobody waits, could be taken for it.)
 TEST(ApiVelmarSearchRefused, IsNoReceiver) {
   const bed::SimulatedPort port({"velmar", "--mute", "interfacemode", "--refuse", "unlogall"});
   std::wstring name = port.name();

@@ -1,4 +1,4 @@
-// A search that has to try long: it takes a hundred seconds, which are those of the time-outs.
+// A search with many tries: it takes a hundred seconds, because of the time-outs.
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <windows.h>
@@ -16,7 +16,7 @@ namespace {
 // The receiver hears 19200 only and overlooks the first questions that reach it: at the last speed
 // of the first mode, at the same speed as the port's current one in the second mode, and at the
 // last of the second. The third mode begins with that speed once more. (It never answers the first
-// of the two questions: nobody waits for that answer, and a late one would do for the second
+// of the two questions: nobody waits for that answer, and a late one could be taken for the second
 // question's.)
 TEST(ApiVelmarSweep, FindsAReceiverInTheThirdMode) {
   const bed::SimulatedPort port(
@@ -24,7 +24,7 @@ TEST(ApiVelmarSweep, FindsAReceiverInTheThirdMode) {
   std::wstring name = port.name();
   const std::string told = " [" + host::Narrow(name) + "]";
   const host::Report report;
-  // The speed that the port is left at.
+  // The speed at which the port was left.
   void* handle = nullptr;
   DCB settings = host::Settings(CBR_4800);
   const host::Event at_once(true);

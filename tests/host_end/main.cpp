@@ -18,7 +18,7 @@ void ShowProgress(void* arrived, unsigned char percent) {
   if (percent > 0) SetEvent(arrived);
 }
 
-// Runs on; returns when the first of the file has come.
+// Starts the download; returns when the first bytes have arrived.
 void StartDownload(void* receiver, const std::wstring& name) {
   static const HANDLE arrived = CreateEventW(nullptr, TRUE, FALSE, nullptr);
   std::thread([receiver, name] {

@@ -1,6 +1,6 @@
-// A host of Microsoft's ABI, linked by Microsoft's rules against rcvlink.lib. It has no C runtime:
-// it declares the few functions of Windows that it needs. Exit code 0: every check held; else the
-// line of the first that did not.
+// A host with Microsoft's ABI, linked against rcvlink.lib. It has no C runtime and declares the few
+// Windows functions that it needs. Exit code: 0 if every check passed, else the line of the first
+// that failed.
 #include "rcvlink.h"
 
 extern "C" {
@@ -25,14 +25,14 @@ constexpr unsigned long kNoFile = 0xFFFFFFFF;
 wchar_t missing_port[] = L"COM255";
 wchar_t no_name[] = L"";
 
-// Every exported function, so that none links under another name.
+// Uses every exported function, so that each must link.
 using Function = void (*)();
 template <typename F>
 Function Erase(F* function) {
   return reinterpret_cast<Function>(function);
 }
 bool AllAreLinked() {
-  // Imported addresses are known only at run time, and no C runtime initialises globals here.
+  // Imported addresses are known only at run time, and there is no C runtime to initialise globals.
   const volatile Function kAll[] = {
       Erase(&devapi::SearchReceiver),
       Erase(&devapi::CreateReceiverOnSerial),

@@ -12,7 +12,7 @@ TEST(HResult, IsMadeOfAWin32Error) {
   EXPECT_EQ(HResultFromError(0x12345), static_cast<HRESULT>(0x80072345)) << "16 bits of it";
 }
 
-// 0 is success, and what is negative is a result already.
+// 0 is success, and a negative number is already a result.
 TEST(HResult, LeavesZeroAndNegativesAlone) {
   EXPECT_EQ(HResultFromError(0), S_OK);
   EXPECT_EQ(HResultFromError(0xE0001009), static_cast<HRESULT>(0xE0001009));

@@ -1,4 +1,4 @@
-// How a block transfer ends early: what is the same over both links.
+// How a block transfer ends early, as far as both links agree.
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
@@ -17,7 +17,7 @@ namespace {
 
 class QuorinBlockDownloadEnd : public QuorinBothLinksTest {
  protected:
-  // More than half a second after the block before it: over USB, progress is told then.
+  // More than half a second after the block before it, so that USB reports progress.
   void GiveLate(const std::string& block) {
     connection->Give({S_OK, block, [this] { clock.now += 501; }});
   }
@@ -87,7 +87,7 @@ TEST_P(QuorinBlockDownloadEnd, IsDoneThoughTheEndCannotBeWritten) {
   EXPECT_EQ(stream.bytes, content);
 }
 
-TEST_P(QuorinBlockDownloadEnd, SaysEachControlByteWhole) {
+TEST_P(QuorinBlockDownloadEnd, SendsEachControlByteWhole) {
   std::string cut;
   connection->on_write = [&](std::string_view bytes) {
     if (!connection->wait_rule.shielded) cut += bytes;
@@ -109,8 +109,8 @@ TEST_P(QuorinBlockDownloadEnd, GivesEachControlByteThreeSeconds) {
   EXPECT_THAT(connection->write_timeouts, ElementsAre(3000, 3000, 3000));
 }
 
-// What a failure of the host's stream gives differs; that the receiver hears of it does not.
-TEST_P(QuorinBlockDownloadEnd, TellsTheReceiverOfAFailedStream) {
+// The result of a failed stream differs between the links, but the receiver is always sent the end.
+TEST_P(QuorinBlockDownloadEnd, SendsTheReceiverTheEndAfterAFailedStream) {
   GiveFile();
   stream.fail_at_write = 1;
   Download();
@@ -119,7 +119,7 @@ TEST_P(QuorinBlockDownloadEnd, TellsTheReceiverOfAFailedStream) {
   EXPECT_EQ(Controls(), "\x06#");
 }
 
-TEST_P(QuorinBlockDownloadEnd, ReportsNoProgressOfAFailedStream) {
+TEST_P(QuorinBlockDownloadEnd, ReportsNoProgressAfterAFailedStream) {
   GiveLate(FirstBlock());
   stream.fail_at_write = 0;
   Download();
@@ -200,7 +200,7 @@ TEST_P(QuorinBlockDownloadEnd, IsAbortedWithItsNak) {
   EXPECT_EQ(Controls(), "\x15#\x15#");
 }
 
-TEST_P(QuorinBlockDownloadEnd, UsesTheAbortUp) {
+TEST_P(QuorinBlockDownloadEnd, ClearsTheAbort) {
   driver.Abort();
   EXPECT_EQ(Download(), S_FALSE);
   GiveFile();
@@ -214,7 +214,7 @@ TEST_P(QuorinBlockDownloadEnd, GivesTheFailureOfTheEndAfterAnAbort) {
   EXPECT_EQ(Download(), E_HANDLE);
 }
 
-TEST_P(QuorinBlockDownloadEnd, SaysTheEndWhole) {
+TEST_P(QuorinBlockDownloadEnd, SendsTheEndWhole) {
   std::vector<bool> shielded;
   connection->on_write = [&](std::string_view bytes) {
     if (bytes == "#") shielded.push_back(connection->wait_rule.shielded);

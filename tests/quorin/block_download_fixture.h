@@ -22,19 +22,19 @@ inline constexpr char kAckWrite[] = "write \x06";
 inline constexpr char kNakWrite[] = "write \x15";
 inline constexpr char kEndWrite[] = "write #";
 
-inline constexpr HRESULT kPositive = 2;  // no failure, and neither S_OK nor S_FALSE
+inline constexpr HRESULT kPositive = 2;  // a success code other than S_OK and S_FALSE
 
-// A kind of link, as a transfer over it looks from outside.
+// A kind of link, and how a transfer over it behaves.
 struct Link {
   EInstanceType type;
   const char* name;  // in the report
-  // The two reads that a block takes when it comes as fast as it is asked for.
+  // The two reads of a block that arrives without delay.
   const char* first_read;
   const char* second_read;
-  size_t first_size;   // how much the first brings
-  size_t header_size;  // how much is read before the header is judged
+  size_t first_size;   // what the first read gives
+  size_t header_size;  // what is read before the header is checked
   const char* timeout_text;
-  bool tells_why;  // a block was not taken
+  bool tells_why;  // a block was rejected
 };
 
 inline constexpr Link kSerialLink = {.type = eInstanceSerial,
@@ -78,19 +78,19 @@ class QuorinBlockDownloadTest : public QuorinDriverTest {
     Give(blocks.Last(content.substr(1024)));
   }
   std::string FirstBlock() { return blocks.Data(0, content.substr(0, 512)); }
-  // In its two reads; something happens as the second begins.
+  // In its two reads, with an action at the beginning of the second.
   void GiveInTwo(const std::string& block, const std::function<void()>& before_rest) {
     Give(block.substr(0, link.first_size));
     connection->Give({S_OK, block.substr(link.first_size), before_rest});
   }
-  // As much of a block as is read before its header is judged; what is behind a wrong one is
+  // The part of a block that is read before its header is checked. The part after a wrong header is
   // discarded.
   void GiveHeaderOf(const std::string& block) { Give(block.substr(0, link.header_size)); }
   void GiveSilences(int count) {
     for (int i = 0; i < count; ++i) connection->GiveResult(kTimedOut);
   }
 
-  // What is seen of the transfer.
+  // The outcome of the transfer.
   std::string Controls() const { return connection->Written(); }
   std::vector<std::string> BlockReads() const { return {link.first_read, link.second_read}; }
   // Of a block whose header is wrong.
@@ -103,7 +103,7 @@ class QuorinBlockDownloadTest : public QuorinDriverTest {
   }
   std::string CancelLine() const { return Line("download is cancelled"); }
   std::string TimeoutLine() const { return Line(link.timeout_text); }
-  // What the report says of blocks that are not taken, if it says it at all.
+  // The line of the report for a rejected block, if there is one.
   std::vector<std::string> Why(const std::vector<std::string>& texts) const {
     std::vector<std::string> lines;
     for (const std::string& text : texts) {
@@ -126,14 +126,14 @@ inline constexpr char kSequenceText[] = "out of sequence";
 inline constexpr char kEndByteText[] = "eob character is missed";
 inline constexpr char kChecksumText[] = "cheksum missmatch";
 
-// For what is the same over both.
+// For tests that are the same over both links.
 class QuorinBothLinksTest : public QuorinBlockDownloadTest,
                             public testing::WithParamInterface<Link> {
  protected:
   QuorinBothLinksTest() : QuorinBlockDownloadTest(GetParam()) {}
 };
 
-// The same with some more that differs from test to test.
+// The same with a parameter of the test.
 template <typename More>
 class QuorinBothLinksTestWith : public QuorinBlockDownloadTest,
                                 public testing::WithParamInterface<std::tuple<Link, More>> {

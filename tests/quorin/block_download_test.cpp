@@ -1,4 +1,4 @@
-// The block transfer of a download, against blocks made by hand: what is the same over both links.
+// The block transfer of a download with blocks made by hand, as far as both links agree.
 #include "quorin/block_download.h"
 
 #include <gmock/gmock.h>
@@ -69,7 +69,7 @@ TEST_P(QuorinBlockDownload, StartsAnewWithEachDownload) {
 // The last block.
 using QuorinLastBlock = QuorinBothLinksTestWith<size_t>;
 
-TEST_P(QuorinLastBlock, GivesAsMuchAsItSays) {
+TEST_P(QuorinLastBlock, GivesAsManyBytesAsItsLength) {
   Give(FirstBlock());
   Give(blocks.Next(0x04, static_cast<uint16_t>(Param()), content.substr(512, 512)));
   EXPECT_EQ(Download(), S_OK);
@@ -101,7 +101,7 @@ TEST_P(QuorinWrongLastBlock, EndsTheDownload) {
   EXPECT_THAT(report.Lines(), IsEmpty());
 }
 
-// The length counts more than what else is wrong.
+// The length has priority over any other damage.
 TEST_P(QuorinWrongLastBlock, EndsTheDownloadThoughItIsDamaged) {
   std::string block = BlockStream::Make(0x04, Param(), "", 0x1111);
   block.back() = '?';
@@ -115,7 +115,7 @@ INSTANTIATE_TEST_SUITE_P(Lengths,
                          testing::Combine(BothLinks(),
                                           testing::Values(0xFFFF, 0x8000, 0xFE00, 513, 0x7FFF)));
 
-// The receiver's end, whatever else its block holds.
+// The receiver's end byte, whatever else the block holds.
 TEST_P(QuorinBlockDownload, IsEndedByTheReceiver) {
   Give(FirstBlock());
   Give("#" + std::string(517, '\xFF'));
@@ -144,7 +144,7 @@ std::function<std::string(std::string)> DamagedAt(size_t at) {
 
 class QuorinWrongBlock : public QuorinBothLinksTestWith<WrongBlock> {
  protected:
-  // What is wrong shows in its header, or only in the rest.
+  // The error is in the header, or only in the rest.
   void ExpectAskedAgain(bool in_header, const char* text) {
     Give(FirstBlock());
     const std::string good = blocks.Data(1, content.substr(512, 512));
@@ -209,7 +209,7 @@ INSTANTIATE_TEST_SUITE_P(Over,
                                                           WrongBlock{"Ack", Put(0, {6})},
                                                           WrongBlock{"TopBit", Put(0, "\x82")},
                                                           WrongBlock{"BesidesTheEnd", Put(0, "$")},
-                                                          // nor is its length looked at
+                                                          // nor is its length checked
                                                           WrongBlock{"Unknown",
                                                                      Put(0, "~\xFF\xFF")})),
                          WrongBlockName);
@@ -275,7 +275,7 @@ TEST_P(QuorinBlockDownload, ExpectsTheFirstBlockAsNumberZero) {
 TEST_P(QuorinBlockDownload, KeepsTheChecksumOfTheLastAcceptedBlock) {
   Give(FirstBlock());
   const uint16_t accepted = blocks.crc();
-  // Rejected, though its own checksum would be a fine start for what follows.
+  // Rejected, although the next block would fit its checksum.
   uint16_t bad_crc = 0;
   Give(BlockStream::Make(0x02, 1, TestContent(512), 0x5555, &bad_crc));
   Give(BlockStream::Make(0x02, 1, content.substr(512, 512), bad_crc));
@@ -296,8 +296,8 @@ TEST_P(QuorinBlockDownload, DoesNotCountRejectedBlocks) {
               ElementsAreArray(Why(std::vector<std::string>(kMany, kChecksumText))));
 }
 
-// The number in a block has sixteen bits, the one that is expected goes on.
-TEST_P(QuorinBlockDownload, ExpectsNoSequenceNumberBehind65535) {
+// The number in a block has sixteen bits, but the expected number has more.
+TEST_P(QuorinBlockDownload, ExpectsNoSequenceNumberAfter65535) {
   constexpr uint32_t kNumbers = 0x10000;
   uint32_t accepted = 0;
   uint32_t rejected = 0;
@@ -331,7 +331,7 @@ TEST_P(QuorinBlockDownload, AsksAgainAfterASilence) {
   EXPECT_THAT(report.Lines(), ElementsAre(TimeoutLine()));
 }
 
-// What came of the block is forgotten: it comes again from its beginning.
+// The part that arrived is discarded: the block is sent again from its beginning.
 TEST_P(QuorinBlockDownload, AsksAgainAfterASilenceWithinABlock) {
   Give(FirstBlock().substr(0, link.first_size));
   GiveSilences(1);

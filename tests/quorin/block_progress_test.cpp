@@ -1,5 +1,5 @@
-// How far a block transfer says it is: each block comes when the test says, in milliseconds since the
-// first was asked for.
+// The progress of a block transfer. The test sets when each block arrives, in milliseconds since
+// the first request.
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
@@ -57,7 +57,7 @@ TEST_P(QuorinProgress, IsReportedFromOneToAHundred) {
   EXPECT_THAT(progress.percents, ElementsAre(47, 93, 100));
 }
 
-// A hundred blocks of a file that is said to be ten times as large.
+// A hundred blocks of a file whose announced size is ten times as large.
 TEST_P(QuorinProgress, IsReportedOncePerPercent) {
   for (DWORD i = 1; i <= 100; ++i) GiveDataAt(i * 501);
   GiveLastAt(101 * 501);
@@ -89,14 +89,14 @@ TEST_P(QuorinProgress, IsOneForTheFirstBytesOfAHugeFile) {
   EXPECT_THAT(progress.percents, ElementsAre(1));
 }
 
-// Ninety-nine hundredths of what was delivered, never rounded up.
+// 99 % of the delivered bytes, never rounded up.
 TEST_P(QuorinProgress, IsTruncated) {
   GiveLastAt(501, 199);
   Download(200);  // 199 * 99 / 200 + 1 is 99.505
   EXPECT_THAT(progress.percents, ElementsAre(99));
 }
 
-TEST_P(QuorinProgress, IsAHundredAtMostForMoreThanWasSaid) {
+TEST_P(QuorinProgress, IsAHundredAtMostForALargerFileThanAnnounced) {
   GiveDataAt(501);
   GiveLastAt(1002, 512);
   Download(400);
@@ -114,7 +114,7 @@ TEST_P(QuorinProgress, IsCutToEightBits) {
   EXPECT_THAT(progress.percents, ElementsAre(267 - 256, 534 - 512, 801 - 768));
 }
 
-TEST_P(QuorinProgress, IsCutToEightBitsHoweverLittleWasSaid) {
+TEST_P(QuorinProgress, IsCutToEightBitsForAMuchLargerFileThanAnnounced) {
   GiveDataAt(501);
   GiveDataAt(1002);
   GiveLastAt(1503);
@@ -123,7 +123,7 @@ TEST_P(QuorinProgress, IsCutToEightBitsHoweverLittleWasSaid) {
   EXPECT_THAT(progress.percents, ElementsAre(1));
 }
 
-// Over a serial link every change is told, however soon.
+// Over a serial link every change is reported, however soon.
 class QuorinSerialProgress : public QuorinProgressTest {
  protected:
   QuorinSerialProgress() : QuorinProgressTest(kSerialLink) {}
@@ -137,7 +137,7 @@ TEST_F(QuorinSerialProgress, IsReportedWithEachChange) {
   EXPECT_THAT(progress.percents, ElementsAre(47, 93, 100));
 }
 
-// Over USB it is told twice a second at most.
+// Over USB progress is reported at most twice a second.
 class QuorinUsbProgress : public QuorinProgressTest {
  protected:
   QuorinUsbProgress() : QuorinProgressTest(kUsbLink) {}
@@ -160,18 +160,18 @@ TEST_F(QuorinUsbProgress, IsNotReportedAtJustHalfASecond) {
 
 TEST_F(QuorinUsbProgress, IsReportedAgainMoreThanHalfASecondAfterTheLastReport) {
   GiveDataAt(700);   // 10
-  GiveDataAt(1200);  // 20, dropped
+  GiveDataAt(1200);  // 20, skipped
   GiveDataAt(1201);  // 30
-  GiveDataAt(1300);  // 40, dropped
-  GiveDataAt(1701);  // 50, dropped
+  GiveDataAt(1300);  // 40, skipped
+  GiveDataAt(1701);  // 50, skipped
   GiveDataAt(9999);  // 60
   GiveLastAt(9999);
   Download(512 * 11);
   EXPECT_THAT(progress.percents, ElementsAre(10, 28, 55));
 }
 
-// A percent that was not told in time is not made up for while it stays.
-TEST_F(QuorinUsbProgress, IsDroppedNotDeferred) {
+// A percent that was skipped is not reported later while it does not change.
+TEST_F(QuorinUsbProgress, IsSkippedNotDeferred) {
   GiveDataAt(100);   // 1.1: changed, too early
   GiveDataAt(600);   // 1.2: not changed
   GiveDataAt(1100);  // 1.3
@@ -182,7 +182,7 @@ TEST_F(QuorinUsbProgress, IsDroppedNotDeferred) {
   EXPECT_THAT(progress.percents, ElementsAre(2));
 }
 
-// Neither moves the time of the last report.
+// Neither changes the time of the last report.
 TEST_F(QuorinUsbProgress, IsPacedByReportsAlone) {
   GiveDataAt(300);  // dropped
   GiveDataAt(501);
@@ -203,8 +203,8 @@ TEST_F(QuorinUsbProgress, IsPacedByChangesAlone) {
 
 TEST_F(QuorinUsbProgress, IsPacedThoughTheTicksWrap) {
   clock.now = 0xFFFFFF00;
-  GiveDataAt(100);  // ahead of it: 10, dropped
-  GiveDataAt(500);  // behind it: 20, dropped
+  GiveDataAt(100);  // before it: 10, skipped
+  GiveDataAt(500);  // after it: 20, skipped
   GiveDataAt(501);  // 30
   GiveLastAt(501);
   Download(512 * 11);

@@ -46,14 +46,14 @@ TEST(QuorinBlock, OfDataCountsWhole) {
   EXPECT_EQ(BlockOf(BlockStream::Make(0x02, 0xFFFF, "", 0)).PayloadLength(), 512U);
 }
 
-TEST(QuorinBlock, ThatIsTheLastSaysHowMuchCounts) {
+TEST(QuorinBlock, ThatIsTheLastHasItsLength) {
   EXPECT_EQ(LastBlock(0).PayloadLength(), 0U);
   EXPECT_EQ(LastBlock(1).PayloadLength(), 1U);
   EXPECT_EQ(LastBlock(0x0102).PayloadLength(), 258U);
   EXPECT_EQ(LastBlock(512).PayloadLength(), 512U);
 }
 
-TEST(QuorinBlock, ThatIsTheLastCannotSayMoreThanItHoldsOrLessThanNothing) {
+TEST(QuorinBlock, ThatIsTheLastHasNoNegativeOrTooLargeLength) {
   EXPECT_FALSE(LastBlock(513).PayloadLength());
   EXPECT_FALSE(LastBlock(0x7FFF).PayloadLength());
   EXPECT_FALSE(LastBlock(0x8000).PayloadLength());
@@ -74,7 +74,7 @@ TEST(QuorinBlock, IsChainedToTheChecksumBefore) {
 }
 
 // Every byte of the header and the payload counts, and both of the checksum; the end byte does not.
-TEST(QuorinBlock, IsUnchainedByAnyDamage) {
+TEST(QuorinBlock, FailsItsChecksumAfterAnyDamage) {
   const std::string good = BlockStream::Make(0x02, 1, TestContent(512), 0xABCD);
   for (size_t i = 0; i < good.size() - 1; ++i) {
     std::string damaged = good;

@@ -37,7 +37,7 @@ TEST_F(QuorinConnectionLock, IsTracedWithItsHandle) {
           "CQuorinProtocol::UnlockConnection - connection is unlocked " + driver.LockText()));
 }
 
-TEST_F(QuorinConnectionLock, IsTakenWithAnEventThatNobodySignals) {
+TEST_F(QuorinConnectionLock, IsTakenWithAnEventThatIsNotSignalled) {
   EXPECT_EQ(driver.LockConnection(event.get()), S_OK);
   EXPECT_FALSE(IsFreeForOthers(driver));
   driver.UnlockConnection();
@@ -68,7 +68,7 @@ TEST_F(QuorinConnectionLock, CountsHowOftenItIsTaken) {
   EXPECT_EQ(driver.UnlockConnection(), 0);
 }
 
-TEST_F(QuorinConnectionLock, CannotBeReleasedByWhoDoesNotHoldIt) {
+TEST_F(QuorinConnectionLock, CannotBeReleasedByAnotherThread) {
   EXPECT_EQ(driver.UnlockConnection(), 0);
   driver.LockConnection(nullptr);
   HRESULT result = E_FAIL;

@@ -130,7 +130,7 @@ TEST(QuorinDirectoryMessage, WithoutATimeIsOfTheReceiversZero) {
   }
 }
 
-TEST(QuorinDirectoryMessage, HasItsTimeOneCharacterBehindTheSize) {
+TEST(QuorinDirectoryMessage, HasItsTimeOneCharacterAfterTheSize) {
   EXPECT_EQ(Text(Parse("{n,12;86400}").entry.time), "1988 1 2 6 0 0 0 0 ");
   EXPECT_EQ(Text(Parse("{n,12, 86400}").entry.time), "1988 1 2 6 0 0 0 0 ");
   EXPECT_EQ(Text(Parse("{n,12;;86400}").entry.time), kZeroTime);
@@ -155,7 +155,7 @@ TEST(QuorinDirectoryMessage, EndsAtAZeroByte) {
   EXPECT_FALSE(message.last);
 }
 
-TEST(QuorinDirectoryMessage, WithATimeThatCannotBeSaidHasNone) {
+TEST(QuorinDirectoryMessage, WithATimeThatCannotBeConvertedHasNone) {
   for (const char* const time : {"-9000000000", "99999999999999", "9223372036854775807"}) {
     const DirectoryMessage message = Parse("{n,5," + std::string(time) + "}");
     EXPECT_EQ(message.kind, Kind::kEntry) << time;
@@ -188,7 +188,7 @@ class QuorinFileTime : public testing::TestWithParam<const char*> {
     return time ? Text(*time) : "none";
   }
 
-  // The same through the runtime library alone.
+  // The same with the runtime library alone.
   static std::string ExpectedText(int64_t seconds) {
     std::tm start{};
     start.tm_year = 88;
@@ -222,14 +222,14 @@ TEST_P(QuorinFileTime, KnowsLeapDays) {
   EXPECT_EQ(TimeText(366 * kDay), "1989 1 1 0 0 0 0 0 ");
 }
 
-TEST_P(QuorinFileTime, IsWhatTheRuntimeLibraryMakesOfIt) {
+TEST_P(QuorinFileTime, MatchesTheRuntimeLibrary) {
   // Every eleven days and a bit: all seasons, both sides of each change of the clock.
   for (int64_t seconds = 0; seconds < 60 * 365 * kDay; seconds += 11 * kDay + 12345) {
     ASSERT_EQ(TimeText(seconds), ExpectedText(seconds)) << seconds;
   }
 }
 
-TEST_P(QuorinFileTime, CannotSayTimesOutOfTheLibrarysRange) {
+TEST_P(QuorinFileTime, DoesNotConvertTimesOutOfTheLibrarysRange) {
   EXPECT_EQ(TimeText(-100 * 365 * kDay), "none");
   EXPECT_EQ(TimeText(2000 * 365 * kDay), "none");
   EXPECT_EQ(TimeText(INT64_MAX), "none");

@@ -55,8 +55,7 @@ bool IsControl(const std::string& line) {
   return line == "> \\x06" || line == "> \\x15" || line == "> #";
 }
 
-// Whether nothing of the transfer is left open: the last control byte ends it, and comes before
-// the speed is put back.
+// Whether the transfer was closed: the last control byte ends it, before the speed is put back.
 void ExpectTransferEnded(const Bench& bench) {
   std::string last_control = "> #";
   for (const std::string& line : bench.Lines()) {
@@ -74,7 +73,7 @@ class QuorinDownloadAbort
   CancelledWrite HowWritesAreCancelled() const { return std::get<0>(GetParam()); }
   DWORD HostSpeed() const { return std::get<2>(GetParam()); }
 
-  // How many calls a download has when nothing comes between.
+  // How many calls an undisturbed download makes.
   size_t CountCalls() const {
     Bench bench(HowWritesAreCancelled(), HostSpeed());
     EXPECT_EQ(bench.Download(), S_OK);
@@ -96,7 +95,7 @@ TEST_P(QuorinDownloadAbort, EndsItInOrderAtAnyCall) {
     EXPECT_EQ(bench.receiver.speed(), 9600U);
     EXPECT_EQ(bench.connection->Speed(), HostSpeed());
     EXPECT_TRUE(IsFreeForOthers(bench.driver));
-    // Whatever came is the file's beginning.
+    // The received bytes are the beginning of the file.
     EXPECT_TRUE(TestContent(kSize).starts_with(bench.stream.bytes));
     if (testing::Test::HasFailure()) FAIL() << bench.log.str();
   }

@@ -46,7 +46,7 @@ std::function<void(sim::QuorinOptions&)> ReplyFault(ReplyFaultKind kind,
   };
 }
 
-// Faults that a download overcomes.
+// Faults after which a download still succeeds.
 class QuorinOvercomes : public testing::TestWithParam<FaultCase> {};
 
 TEST_P(QuorinOvercomes, WithTheWholeFile) {
@@ -73,7 +73,7 @@ TEST_P(QuorinOvercomes, WithTheWholeFileOverUsb) {
   if (HasFailure()) FAIL() << download.Log();
 }
 
-// Whether the fault was there at all: the transcript differs from that of a good download.
+// Whether the fault happened: the transcript differs from that of a download without faults.
 TEST_P(QuorinOvercomes, WhatIsReallyThere) {
   sim::QuorinOptions options;
   GetParam().make(options);
@@ -203,7 +203,7 @@ struct FatalCase {
   std::string name;
   std::function<void(sim::QuorinOptions&)> make;
   HRESULT result;
-  size_t bytes;  // of the file, that came nevertheless
+  size_t bytes;  // of the file that arrived
   bool speed_is_back = true;
 };
 
@@ -280,13 +280,13 @@ INSTANTIATE_TEST_SUITE_P(
     OfTheSpeed,
     QuorinFailsOn,
     testing::Values(
-        // The receiver does not follow, and nobody hears the other.
+        // The receiver does not follow, so neither side hears the other.
         FatalCase{"Kept",
                   [](sim::QuorinOptions& options) { options.faults.keeps_speed = true; },
                   kTimedOut,
                   0,
                   false},
-        // "/dev/ser" is taken for port d, which is not the one that is talked on.
+        // "/dev/ser" is taken for port d, which is not the port in use.
         FatalCase{"OfAnotherPort",
                   ReplyFault(ReplyFaultKind::kWrongLength, "print,/cur/term", 1, -2),
                   kTimedOut,
@@ -304,8 +304,8 @@ INSTANTIATE_TEST_SUITE_P(
                   false}),
     FatalCaseName);
 
-// Sizes that are not true serve the progress only.
-TEST(QuorinSimulatedDownload, TakesAllOfAFileThatIsLargerThanTold) {
+// A wrong size affects the progress only.
+TEST(QuorinSimulatedDownload, DownloadsAllOfAFileThatIsLargerThanItsSize) {
   sim::QuorinOptions options;
   options.faults.sizes = {{"A0101.log", 700}};
   SimulatedDownload download(options);
@@ -317,7 +317,7 @@ TEST(QuorinSimulatedDownload, TakesAllOfAFileThatIsLargerThanTold) {
   EXPECT_THAT(progress.percents, testing::ElementsAre(0, 1, 73, 100, 100));
 }
 
-TEST(QuorinSimulatedDownload, TakesAllOfAFileThatIsSmallerThanTold) {
+TEST(QuorinSimulatedDownload, DownloadsAllOfAFileThatIsSmallerThanItsSize) {
   sim::QuorinOptions options;
   options.faults.sizes = {{"A0101.log", 13000}};
   SimulatedDownload download(options);

@@ -20,7 +20,7 @@ inline constexpr char kGetSize[] = "print,/log/A0101.log&size\r\n";
 inline constexpr char kGetFile[] = "get,\"A0101.log\":{500,512}\r\n";
 inline constexpr char kPutBack[] = "set,cur/term/rate,9600\r\n";
 
-// What is said in each part of a download of two blocks.
+// The commands in each part of a download of two blocks.
 inline const std::vector<std::string> kSpeedUp = {"%%print,/cur/term\r\n", kRaise, "speed 115200"};
 inline const std::vector<std::string> kStart = {
     "%%\n", "%%print,/log/A0101.log&size\r\n", "%%get,\"A0101.log\":{500,512}\r\n", "\x15"};
@@ -42,7 +42,7 @@ class QuorinDownloadTest : public QuorinDriverTest {
     });
   }
 
-  // Instead of the serial link. A speed of 0 would be one to raise.
+  // Replaces the serial link. A speed of 0 would be raised.
   void UseUsb() {
     connection->instance_type = eInstanceUSB;
     connection->speed = 0;

@@ -1,4 +1,4 @@
-// A whole download on a scripted connection: what is said around the block transfer.
+// A whole download on a scripted connection: the commands around the block transfer.
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
@@ -110,7 +110,7 @@ TEST_F(QuorinDownload, GoesOnSlowlyWhenTheReceiverRefusesItsPort) {
       report.Has("CQuorinProtocol::DownloadFile - receiver speed up is failed [0x8007048F]"));
 }
 
-TEST_F(QuorinDownload, GoesOnSlowlyWhenTheReceiverCannotBeTold) {
+TEST_F(QuorinDownload, GoesOnSlowlyWhenTheCommandCannotBeSent) {
   receiver.FailWriteOf(kRaise, E_HANDLE);
   EXPECT_EQ(Download(), S_OK);
   ExpectSaid({{"%%print,/cur/term\r\n", kRaise}, kStart, kBlocks});
@@ -135,7 +135,7 @@ TEST_F(QuorinDownload, SlowsTheReceiverDownAgainWhenTheHostCannotFollow) {
   EXPECT_TRUE(report.Has("CQuorinProtocol::DownloadFile - host speed up is failed [0x80070006]"));
 }
 
-// A receiver that no longer answers is asked for its port once, not again and again.
+// A receiver that no longer answers is asked for its port only once.
 TEST_F(QuorinDownload, SlowsTheReceiverDownOnce) {
   connection->set_speed_result = E_HANDLE;
   int asked = 0;
@@ -146,7 +146,7 @@ TEST_F(QuorinDownload, SlowsTheReceiverDownOnce) {
   EXPECT_EQ(asked, 2) << "to raise it, and to slow it down";
 }
 
-// But an abort cuts off only what it came for.
+// But an abort interrupts only one command.
 TEST_F(QuorinDownload, SlowsTheReceiverDownThoughAnAbortCutsTheFirstTryOff) {
   connection->set_speed_result = E_HANDLE;
   int asked = 0;
@@ -165,7 +165,8 @@ TEST_F(QuorinDownload, TakesAHostThatHadNothingToChange) {
   ExpectSaid({kSpeedUp, kStart, kBlocks, kRestore});
 }
 
-// Over both links. What is said is told without the speed, which is raised and put back on a serial one.
+// Over both links. The expected commands leave out the speed, which is raised and put back on a
+// serial link.
 class QuorinDownloadOverBoth : public QuorinDownload, public testing::WithParamInterface<bool> {
  protected:
   QuorinDownloadOverBoth() {
@@ -256,7 +257,7 @@ TEST_P(QuorinFailedDownload, OfATransferThatStaysSilent) {
 TEST_P(QuorinFailedDownload, OfALastBlockOfNegativeLength) {
   receiver.On("\x15", [this](const std::string&) {
     const std::string block = BlockStream::Make(0x04, 0xFFFF, "", 0);
-    connection->GiveRead(is_usb ? block : block.substr(0, 3));  // as much as is read of it
+    connection->GiveRead(is_usb ? block : block.substr(0, 3));  // the part that is read
   });
   ExpectFailure(kNotConnected, {kStart, {"#"}});
 }
@@ -339,14 +340,14 @@ TEST_F(QuorinDownload, FailsWhenTheHostCannotGoBack) {
   EXPECT_TRUE(IsFreeForOthers(driver));
 }
 
-TEST_F(QuorinDownload, FailsWithTheWayBackRatherThanWithTheTransfer) {
+TEST_F(QuorinDownload, ReturnsAFailedPutBackRatherThanAFailedTransfer) {
   receiver.Reply(kGetSize, "0");
   receiver.FailWriteOf(kPutBack, E_HANDLE);
   EXPECT_EQ(Download(), E_HANDLE);
 }
 
-// Half a line would stand in front of the command that puts the speed back.
-TEST_F(QuorinDownload, SaysAllWholeAtTheRaisedSpeed) {
+// Half a line would come before the command that puts the speed back.
+TEST_F(QuorinDownload, SendsEverythingWholeAtTheRaisedSpeed) {
   std::vector<std::string> cut;
   const auto answer = connection->on_write;
   bool raised = false;
@@ -360,7 +361,7 @@ TEST_F(QuorinDownload, SaysAllWholeAtTheRaisedSpeed) {
   EXPECT_THAT(cut, testing::IsEmpty());
 }
 
-TEST_F(QuorinDownload, SaysTheOldSpeedWhole) {
+TEST_F(QuorinDownload, SendsTheOldSpeedWhole) {
   bool shielded = false;
   receiver.on_hear = [&](const std::string& command) {
     if (command == kPutBack) shielded = connection->wait_rule.shielded;
@@ -370,7 +371,7 @@ TEST_F(QuorinDownload, SaysTheOldSpeedWhole) {
   EXPECT_FALSE(connection->wait_rule.shielded);
 }
 
-// Aborts at points of their own; every other point has its sweep.
+// Aborts at particular points. A sweep tests all other points.
 TEST_F(QuorinDownload, DoesNothingAfterAnAbort) {
   driver.Abort();
   EXPECT_EQ(Download(), S_FALSE);

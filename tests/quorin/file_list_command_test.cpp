@@ -97,7 +97,7 @@ TEST_F(QuorinFileList, EndsWithABraceInAMessageOfItsOwn) {
   EXPECT_THAT(Names(), ElementsAre(L"A"));
 }
 
-TEST_F(QuorinFileList, TakesNothingBehindItsEnd) {
+TEST_F(QuorinFileList, TakesNothingAfterItsEnd) {
   Answer({"{{A,1,0}}", "{B,2,0}}"}, true);
   EXPECT_EQ(Execute(), S_OK);
   EXPECT_THAT(Names(), ElementsAre(L"A"));
@@ -140,7 +140,7 @@ TEST_F(QuorinFileList, IsNotReadFromABlankMessage) {
   EXPECT_THAT(Names(), IsEmpty());
 }
 
-TEST_F(QuorinFileList, KeepsAnEntryWithATimeThatCannotBeSaid) {
+TEST_F(QuorinFileList, KeepsAnEntryWithATimeThatCannotBeConverted) {
   Answer({"{{A,1,99999999999999}}"});
   EXPECT_EQ(Execute(), S_OK);
   ASSERT_THAT(Names(), ElementsAre(L"A"));
@@ -191,7 +191,7 @@ TEST_F(QuorinFileList, MayFillTheBufferAlmost) {
   EXPECT_EQ(command.Entries().back().name, L"last");
 }
 
-TEST_F(QuorinFileList, EndsAsTheBaseDoesWhenAReadGivesNothing) {
+TEST_F(QuorinFileList, EndsWithABlankReplyWhenAReadGivesNothing) {
   connection.GiveRead("");
   EXPECT_EQ(Execute(), S_OK);
   EXPECT_EQ(command.Kind(), ReplyKind::kBlank);
@@ -228,7 +228,7 @@ TEST(QuorinFileListMessage, IsDoneAtTheEndOfTheList) {
   EXPECT_TRUE(done);
 }
 
-TEST(QuorinFileListMessage, TakesOnlyAsMuchOfTheBodyAsItIsTold) {
+TEST(QuorinFileListMessage, TakesOnlyTheGivenLengthOfTheBody) {
   CGetFileListCmd list(kFlags);
   bool done = false;
   list.ParseReply("{A,123,0}}", 5, ReplyKind::kReply, &done);

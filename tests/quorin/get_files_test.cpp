@@ -157,7 +157,7 @@ TEST_F(QuorinGetFiles, IsAbortedThoughTheListCame) {
   ExpectNothing();
 }
 
-TEST_F(QuorinGetFiles, SaysTheSameTimesAsTheReceiver) {
+TEST_F(QuorinGetFiles, HasTheSameTimesAsTheReceiver) {
   Answer({"{{A,1,1000000000}}"});
   driver.GetFiles(&files);
   ASSERT_EQ(files.Count(), 1);

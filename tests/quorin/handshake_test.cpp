@@ -36,7 +36,7 @@ class QuorinHandshake : public QuorinDriverTest {
     EXPECT_TRUE(IsFreeForOthers(driver));
     return answer;
   }
-  // The part of the handshake that comes first.
+  // The first part of the handshake.
   static std::vector<std::string> First(size_t count) {
     return {kWholeHandshake.begin(), kWholeHandshake.begin() + static_cast<std::ptrdiff_t>(count)};
   }
@@ -88,7 +88,7 @@ TEST_F(QuorinHandshake, FindsNothingWhenThePortIsRefused) {
   EXPECT_THAT(Said(), ElementsAreArray(First(5)));
 }
 
-TEST_F(QuorinHandshake, FindsNothingWhenThePortIsNotTold) {
+TEST_F(QuorinHandshake, FindsNothingWhenThePortIsNotAnswered) {
   receiver.On(kGetPort, [](const std::string&) {});
   EXPECT_EQ(Check(), 0);
   EXPECT_THAT(Said(), ElementsAreArray(First(5)));
@@ -144,14 +144,14 @@ TEST_F(QuorinHandshake, ReportsARefusal) {
   EXPECT_TRUE(report.Has("CQuorinProtocol::DumpInvalidResponse - [0x8007048F] [{denied}] [COM7]"));
 }
 
-TEST_F(QuorinHandshake, LooksOverWhatIsNoAnswer) {
+TEST_F(QuorinHandshake, IgnoresWhatIsNotAnAnswer) {
   receiver.On(kPing, [this](const std::string& tag) {
     connection->GiveRead("$GPGGA,RE1 ER\x80\r\n" + Message("RE", "%0%old") + Message("RE", tag));
   });
   EXPECT_EQ(Check(), -1);
 }
 
-// Each step fails, or is the one during which the event is signalled.
+// Each step fails, or the event is signalled during it.
 class QuorinHandshakeStep : public QuorinHandshake, public testing::WithParamInterface<size_t> {
  protected:
   static std::string Command(size_t step) {
@@ -178,23 +178,23 @@ TEST_P(QuorinHandshakeStep, IsTheLastOnceTheEventIsSignalled) {
   receiver.on_hear = [&](const std::string&) {
     if (heard++ == GetParam()) SetEvent(event.get());
   };
-  // Behind the last step nobody looks.
+  // The event is not checked after the last step.
   const bool last = GetParam() + 1 == kWholeHandshake.size();
   EXPECT_EQ(Check(), last ? -1 : 0);
   EXPECT_THAT(Said(), ElementsAreArray(First(GetParam() + 1)));
-  // Nobody looks behind the first either, until the next has emptied the line.
+  // Nor after the first step: the next one clears the line first.
   EXPECT_EQ(connection->calls.back(), GetParam() == 0 ? "flush" : "write " + Command(GetParam()));
 }
 
 INSTANTIATE_TEST_SUITE_P(All, QuorinHandshakeStep, testing::Range(size_t{0}, size_t{6}));
 
-TEST_F(QuorinHandshake, SaysNothingOnceTheEventIsSignalled) {
+TEST_F(QuorinHandshake, SendsNothingOnceTheEventIsSignalled) {
   SetEvent(event.get());
   EXPECT_EQ(Check(), 0);
   EXPECT_TRUE(Said().empty());
 }
 
-// The event comes with the answer, so the command itself is not stopped by it.
+// The event is signalled with the answer, so it does not stop the command itself.
 TEST_F(QuorinHandshake, LooksAtTheEventAfterThePing) {
   receiver.On(kPing, [this](const std::string& tag) {
     connection->Give({S_OK, Message("RE", tag), [this] { SetEvent(event.get()); }});
@@ -220,7 +220,7 @@ TEST_F(QuorinHandshake, LooksAtTheEventAfterThePortQuery) {
   EXPECT_THAT(Said(), ElementsAreArray(First(5)));
 }
 
-// The abort itself is not looked for: what it cuts off tells of it.
+// The abort flag is not checked: the interrupted write shows it.
 TEST_F(QuorinHandshake, EndsWithAWriteThatAnAbortCutOff) {
   connection->on_write = [](std::string_view) { return S_FALSE; };
   short answer = 99;

@@ -1,4 +1,4 @@
-// What a block transfer does its own way over a serial link, and over USB.
+// How a block transfer differs over a serial link and over USB.
 #include "quorin/link_policy.h"
 
 #include <gmock/gmock.h>
@@ -36,7 +36,7 @@ TEST_F(QuorinSerialBlocks, AreEndedByAHeaderAlone) {
   EXPECT_THAT(connection->calls, ElementsAre(link.first_read));
 }
 
-// Less than a header says nothing, not even the end; the rest is not waited for.
+// Fewer bytes than a header are ignored, even the end. The rest is not read.
 class QuorinShortHeader : public QuorinSerialBlocks,
                           public testing::WithParamInterface<std::string> {};
 
@@ -59,7 +59,7 @@ INSTANTIATE_TEST_SUITE_P(Headers,
                                          std::string("\x04\x01", 2),
                                          std::string("#")));
 
-// As much of a second block as comes in the second read.
+// The part of a second block that comes with the second read.
 class QuorinShortRest : public QuorinSerialBlocks, public testing::WithParamInterface<size_t> {};
 
 TEST_P(QuorinShortRest, IsAskedForAgain) {
@@ -87,7 +87,7 @@ TEST_F(QuorinSerialBlocks, AreAskedForAgainWhenTheReadOfTheRestWasInterrupted) {
   EXPECT_EQ(Controls(), "\x15\x06\x06#");
 }
 
-TEST_F(QuorinSerialBlocks, AreTakenHoweverTheReadsEnded) {
+TEST_F(QuorinSerialBlocks, AreAcceptedWhateverTheReadsReturned) {
   connection->Give({kPositive, blocks.Last("x"), {}});
   EXPECT_EQ(Download(), S_OK);
   EXPECT_EQ(stream.bytes, "x");
@@ -105,15 +105,15 @@ TEST_F(QuorinSerialBlocks, AllowThreeSilencesEach) {
   EXPECT_EQ(Controls(), "\x15\x15\x15\x06\x15\x15\x15\x06\x15\x15\x15#");
 }
 
-// The host knows of it already.
-TEST_F(QuorinSerialBlocks, KeepAFailureOfTheStreamToThemselves) {
+// The stream is the host's own, so the host already knows of the failure.
+TEST_F(QuorinSerialBlocks, DoNotReturnAFailureOfTheStream) {
   GiveFile();
   stream.fail_at_write = 1;
   EXPECT_EQ(Download(), S_OK);
   EXPECT_THAT(report.Lines(), IsEmpty());
 }
 
-TEST_F(QuorinSerialBlocks, KeepAFailureOfTheStreamToThemselvesAtAnEmptyLastOne) {
+TEST_F(QuorinSerialBlocks, DoNotReturnAFailureOfTheStreamAtAnEmptyLastOne) {
   Give(blocks.Last(""));
   stream.fail_at_write = 0;
   EXPECT_EQ(Download(), S_OK);
@@ -121,7 +121,7 @@ TEST_F(QuorinSerialBlocks, KeepAFailureOfTheStreamToThemselvesAtAnEmptyLastOne) 
   EXPECT_EQ(Controls(), "#");
 }
 
-TEST_F(QuorinSerialBlocks, KeepToThemselvesHowTheStreamTookTheLastOne) {
+TEST_F(QuorinSerialBlocks, DoNotReturnTheStreamsResultForTheLastOne) {
   GiveFile();
   stream.fail_at_write = 2;
   stream.failure = kPositive;
@@ -139,8 +139,8 @@ TEST_F(QuorinSerialBlocks, EndWithoutAFailureWhenTheAckWasInterrupted) {
   EXPECT_EQ(Controls(), "\x06\x06");
 }
 
-// The abort is seen once the failed read is dealt with.
-TEST_F(QuorinSerialBlocks, AreAbortedBehindASilence) {
+// The failed read has priority over the abort.
+TEST_F(QuorinSerialBlocks, AreAbortedAfterASilence) {
   connection->Give({kTimedOut, "", [this] { driver.Abort(); }});
   EXPECT_EQ(Download(), S_FALSE);
   EXPECT_EQ(Controls(), "\x15#");
@@ -154,7 +154,7 @@ TEST_F(QuorinSerialBlocks, EndWithAFailedReadThoughTheAbortCameWithIt) {
   EXPECT_THAT(report.Lines(), IsEmpty());
 }
 
-TEST_F(QuorinSerialBlocks, AreTakenThoughTheAbortCameWithTheRest) {
+TEST_F(QuorinSerialBlocks, AreAcceptedThoughTheAbortCameWithTheRest) {
   GiveInTwo(FirstBlock(), [this] { driver.Abort(); });
   EXPECT_EQ(Download(), S_FALSE);
   EXPECT_EQ(Controls(), "#");
@@ -168,7 +168,7 @@ TEST_F(QuorinSerialBlocks, AreCompleteThoughTheAbortCameWithTheLast) {
   EXPECT_EQ(stream.bytes, content.substr(0, 100));
 }
 
-// In 32 bits: a file is larger than that when it is told to be.
+// The arithmetic is in 32 bits, so larger files wrap.
 TEST(QuorinSerialPolicy, CountsThePercentInArithmeticThatWraps) {
   const SerialPolicy policy(nullptr);
   constexpr uint32_t kLargestProduct = 43383508;  // times 99
@@ -190,8 +190,8 @@ TEST_F(QuorinUsbBlocks, AreOfOneLength) {
   EXPECT_THAT(connection->calls, IsEmpty());
 }
 
-// How long a read is waited for is the user's to say.
-TEST(QuorinUsbBlocksSettings, SayHowLongAReadMayTake) {
+// The user can set the time-out of a read.
+TEST(QuorinUsbBlocksSettings, LimitTheTimeOfARead) {
   UserSettings settings;
   const DWORD timeout_ms = 1234;
   settings.SetValue(L"DownloadReadTimeout", REG_DWORD, &timeout_ms, sizeof(timeout_ms));
@@ -206,8 +206,8 @@ TEST(QuorinUsbBlocksSettings, SayHowLongAReadMayTake) {
 }
 
 struct Pieces {
-  std::vector<size_t> sizes;  // how the block comes
-  std::vector<size_t> asked;  // how it is asked for
+  std::vector<size_t> sizes;  // the parts in which the block arrives
+  std::vector<size_t> asked;  // the sizes of the reads
 };
 
 class QuorinUsbPieces : public QuorinUsbBlocks, public testing::WithParamInterface<Pieces> {
@@ -248,7 +248,7 @@ INSTANTIATE_TEST_SUITE_P(Sizes,
                                          Pieces{{64, 64, 390}, {512, 454, 390}},
                                          Pieces{{0, 512, 0, 0, 6}, {512, 512, 6, 6, 6}}));
 
-TEST_F(QuorinUsbBlocks, AreTakenByteByByte) {
+TEST_F(QuorinUsbBlocks, AreAcceptedByteByByte) {
   for (const char byte : blocks.Last(content.substr(0, 512))) Give(std::string(1, byte));
   EXPECT_EQ(Download(512), S_OK);
   EXPECT_EQ(stream.bytes, content.substr(0, 512));
@@ -268,7 +268,7 @@ TEST_F(QuorinUsbBlocks, AreNotEndedByLessThanABlock) {
   EXPECT_THAT(report.Lines(), ElementsAre(TimeoutLine()));
 }
 
-// What came of the block is forgotten: it comes again from its beginning.
+// The part that arrived is discarded: the block is sent again from its beginning.
 class QuorinUsbSilence : public QuorinUsbBlocks, public testing::WithParamInterface<size_t> {};
 
 TEST_P(QuorinUsbSilence, WithinABlockIsAskedAgain) {
@@ -281,7 +281,7 @@ TEST_P(QuorinUsbSilence, WithinABlockIsAskedAgain) {
   EXPECT_THAT(report.Lines(), ElementsAre(TimeoutLine()));
 }
 
-INSTANTIATE_TEST_SUITE_P(Behind, QuorinUsbSilence, testing::Values(1, 300, 517));
+INSTANTIATE_TEST_SUITE_P(After, QuorinUsbSilence, testing::Values(1, 300, 517));
 
 TEST_F(QuorinUsbBlocks, EndWithTheFourthSilenceWhereverItIs) {
   GiveSilences(2);
@@ -297,7 +297,7 @@ TEST_F(QuorinUsbBlocks, EndWithTheFourthSilenceWhereverItIs) {
   EXPECT_EQ(connection->AnswersLeft(), 1U);
 }
 
-TEST_F(QuorinUsbBlocks, EndAsTheAckDid) {
+TEST_F(QuorinUsbBlocks, EndWithTheResultOfTheAck) {
   for (const HRESULT result : {S_FALSE, kPositive}) {
     blocks = BlockStream();
     connection->DropAnswers();
@@ -309,8 +309,8 @@ TEST_F(QuorinUsbBlocks, EndAsTheAckDid) {
   EXPECT_THAT(report.Lines(), IsEmpty());
 }
 
-// Reads that end without a failure, but not well.
-TEST_F(QuorinUsbBlocks, EndAsTheReadDid) {
+// Reads that end with a success code other than S_OK.
+TEST_F(QuorinUsbBlocks, EndWithTheResultOfTheRead) {
   connection->Give({kPositive, FirstBlock().substr(0, 512), {}});
   EXPECT_EQ(Download(), kPositive);
   EXPECT_THAT(connection->calls, ElementsAre(link.first_read));
@@ -318,7 +318,7 @@ TEST_F(QuorinUsbBlocks, EndAsTheReadDid) {
   EXPECT_THAT(report.Lines(), IsEmpty());
 }
 
-TEST_F(QuorinUsbBlocks, EndAsTheReadOfTheRestDidWhateverIsWrongWithThem) {
+TEST_F(QuorinUsbBlocks, EndWithTheResultOfTheReadOfTheRestWhateverIsWrongWithThem) {
   Give(FirstBlock().substr(0, 512));
   connection->Give({kPositive, std::string(6, '?'), {}});
   EXPECT_EQ(Download(), kPositive);
@@ -327,15 +327,15 @@ TEST_F(QuorinUsbBlocks, EndAsTheReadOfTheRestDidWhateverIsWrongWithThem) {
   EXPECT_THAT(report.Lines(), IsEmpty());
 }
 
-// The abort that ended the read is gone when another call has taken it.
-TEST_F(QuorinUsbBlocks, EndForTheReceiverTooWhenTheReadOfTheRestWasInterrupted) {
+// The abort that ended the read may have been cleared by another call.
+TEST_F(QuorinUsbBlocks, EndTheReceiversTransferTooWhenTheReadOfTheRestWasInterrupted) {
   Give(FirstBlock().substr(0, 512));
   connection->GiveResult(S_FALSE);
   EXPECT_EQ(Download(), S_FALSE);
   EXPECT_EQ(Controls(), "#");
 }
 
-// What the header says comes first.
+// The header is checked first.
 TEST_F(QuorinUsbBlocks, AreEndedByTheReceiverHoweverTheReadEnded) {
   connection->Give({kPositive, "#", {}});
   EXPECT_EQ(Download(), S_FALSE);
@@ -378,7 +378,7 @@ TEST_F(QuorinUsbBlocks, PassAFailureOfTheStreamOnThoughTheEndCannotBeWritten) {
   EXPECT_EQ(Download(), STG_E_MEDIUMFULL);
 }
 
-TEST_F(QuorinUsbBlocks, EndAsTheStreamTookTheLastOne) {
+TEST_F(QuorinUsbBlocks, EndWithTheStreamsResultForTheLastOne) {
   GiveFile();
   stream.fail_at_write = 2;
   stream.failure = kPositive;
@@ -386,7 +386,7 @@ TEST_F(QuorinUsbBlocks, EndAsTheStreamTookTheLastOne) {
   EXPECT_EQ(Controls(), "\x06\x06#");
 }
 
-TEST_F(QuorinUsbBlocks, GoOnWithAStreamThatIsNotQuiteContent) {
+TEST_F(QuorinUsbBlocks, GoOnAfterAStreamResultThatIsNoFailure) {
   GiveFile();
   stream.fail_at_write = 0;
   stream.failure = S_FALSE;
@@ -395,7 +395,7 @@ TEST_F(QuorinUsbBlocks, GoOnWithAStreamThatIsNotQuiteContent) {
   EXPECT_EQ(Controls(), "\x06\x06#");
 }
 
-// The abort counts more than how the read ended, and than what it brought.
+// The abort has priority over the result of the read and over its data.
 TEST_F(QuorinUsbBlocks, AreAbortedThoughTheReadFailed) {
   for (const HRESULT failure : {kTimedOut, E_HANDLE}) {
     connection->Give({failure, "", [this] { driver.Abort(); }});
@@ -405,7 +405,7 @@ TEST_F(QuorinUsbBlocks, AreAbortedThoughTheReadFailed) {
   EXPECT_THAT(report.Lines(), ElementsAre(CancelLine(), CancelLine()));
 }
 
-TEST_F(QuorinUsbBlocks, AreNotTakenWhenTheAbortCameWithTheRest) {
+TEST_F(QuorinUsbBlocks, AreNotAcceptedWhenTheAbortCameWithTheRest) {
   GiveInTwo(FirstBlock(), [this] { driver.Abort(); });
   EXPECT_EQ(Download(), S_FALSE);
   EXPECT_EQ(Controls(), "#");
@@ -427,7 +427,7 @@ TEST(QuorinUsbPolicy, CountsThePercentOfFilesOfAnySize) {
   EXPECT_EQ(policy.Percent(0x7FFFFFFF, 0x7FFFFFFF), 100);
 }
 
-// The sequence numbers end there.
+// The largest sequence number.
 TEST(QuorinLinkPolicies, CountUpThroughTheLargestTransfer) {
   AbortSwitch abort(nullptr);
   const SerialPolicy serial(nullptr);

@@ -90,7 +90,7 @@ TEST_F(QuorinCommandSending, GoesOnWhenThereWasNothingToFlush) {
   EXPECT_EQ(connection.Written(), "dm\r\n");
 }
 
-TEST_F(QuorinCommandSending, DropsAnEarlierReplyFirst) {
+TEST_F(QuorinCommandSending, DiscardsAnEarlierReplyFirst) {
   connection.on_flush = [] { return E_HANDLE; };
   CQuorinCommand command("print\r\n", kTagged);
   command.SetReply("old");
@@ -173,7 +173,7 @@ TEST_F(QuorinCommandSending, ReadsNothingAfterACancelDuringTheText) {
   EXPECT_THAT(connection.calls, ElementsAre("flush", "write print\r\n"));
 }
 
-// What is sent whole reaches the receiver, whatever comes.
+// What is sent whole reaches the receiver in spite of cancels.
 class QuorinCommandSentWhole : public QuorinCommandSending {};
 
 TEST_F(QuorinCommandSentWhole, IsWrittenThoughCancelled) {
@@ -184,7 +184,7 @@ TEST_F(QuorinCommandSentWhole, IsWrittenThoughCancelled) {
   EXPECT_EQ(connection.Writes().back(), "set\r\n");
 }
 
-TEST_F(QuorinCommandSentWhole, IsWrittenBehindAShield) {
+TEST_F(QuorinCommandSentWhole, IsWrittenWithAShield) {
   std::vector<bool> shielded;
   connection.on_write = [&](std::string_view) {
     shielded.push_back(connection.wait_rule.shielded);
@@ -214,7 +214,7 @@ TEST_F(QuorinCommandSentWhole, DoesNotWaitForItsReplyOnceCancelled) {
   EXPECT_THAT(connection.calls, ElementsAre("flush", "write set\r\n"));
 }
 
-TEST_F(QuorinCommandSentWhole, LeavesNoShieldBehindAFailedWrite) {
+TEST_F(QuorinCommandSentWhole, LeavesNoShieldAfterAFailedWrite) {
   connection.on_write = [](std::string_view) { return E_HANDLE; };
   CQuorinCommand command("set\r\n", kNoReply);
   command.SendWhole();

@@ -1,4 +1,4 @@
-// A driver on a scripted connection, with a receiver that answers as it is told.
+// A driver on a scripted connection, with a receiver whose answers the test sets.
 #ifndef RCVLINK_TESTS_QUORIN_QUORIN_DRIVER_H_
 #define RCVLINK_TESTS_QUORIN_QUORIN_DRIVER_H_
 

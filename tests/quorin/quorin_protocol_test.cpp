@@ -1,4 +1,4 @@
-// The driver without a download: its arguments, its lock, its abort and what it leaves to others.
+// The driver without downloads: arguments, lock, abort, and operations that it does not support.
 #include "quorin/quorin_protocol.h"
 
 #include <gmock/gmock.h>
@@ -141,7 +141,7 @@ TEST_F(QuorinProtocol, GivesNothingOfACommandThatWasCancelled) {
   EXPECT_EQ(command.Kind(), ReplyKind::kNone);
 }
 
-// The report on replies that were failures.
+// What the report says of failed replies.
 TEST_F(QuorinProtocol, ReportsARefusalWithItsTextAndTheName) {
   const ReportCapture report;
   receiver.Reply("ask\r\n", "{4,no 100%s}", "ER");
@@ -226,7 +226,7 @@ TEST_F(QuorinProtocol, AbortEndsOneOperationOnly) {
 // Removing a file.
 class QuorinDeleteFile : public QuorinDriverTest {};
 
-TEST_F(QuorinDeleteFile, SaysWhichAndWaitsForTheReply) {
+TEST_F(QuorinDeleteFile, SendsTheNameAndWaitsForTheReply) {
   const ReportCapture report;
   receiver.Reply("remove,A0101.log\r\n", "");
   EXPECT_EQ(driver.DeleteFile(L"A0101.log"), S_OK);

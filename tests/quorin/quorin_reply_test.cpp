@@ -80,10 +80,10 @@ TEST_F(QuorinReply, HasTheLongestLength) {
   EXPECT_EQ(untagged.ReplyText(), longest);
 }
 
-// What may come ahead of a reply.
-class QuorinReplyBehind : public QuorinReply, public testing::WithParamInterface<std::string> {};
+// What may come before a reply.
+class QuorinReplyAfter : public QuorinReply, public testing::WithParamInterface<std::string> {};
 
-TEST_P(QuorinReplyBehind, IsTheSameHoweverItIsCut) {
+TEST_P(QuorinReplyAfter, IsTheSameHoweverItIsCut) {
   const size_t whole = GetParam().size() + Message("RE", "%999999%body").size();
   for (size_t cut = 1; cut < whole; ++cut) {
     AnswerWithTag([&](const std::string& tag) {
@@ -103,7 +103,7 @@ TEST_P(QuorinReplyBehind, IsTheSameHoweverItIsCut) {
   }
 }
 
-TEST_P(QuorinReplyBehind, MayComeByteByByte) {
+TEST_P(QuorinReplyAfter, MayComeByteByByte) {
   AnswerWithTag([&](const std::string& tag) {
     std::vector<std::string> reads;
     for (const char byte : GetParam() + Message("RE", tag + "body")) reads.emplace_back(1, byte);
@@ -116,7 +116,7 @@ TEST_P(QuorinReplyBehind, MayComeByteByByte) {
 }
 
 INSTANTIATE_TEST_SUITE_P(Garbage,
-                         QuorinReplyBehind,
+                         QuorinReplyAfter,
                          testing::Values("",
                                          "\r\n",
                                          "*$\xFF\x01",
@@ -137,7 +137,7 @@ INSTANTIATE_TEST_SUITE_P(Garbage,
                                          "print,/cur/term\r\n"));
 
 INSTANTIATE_TEST_SUITE_P(OtherMessages,
-                         QuorinReplyBehind,
+                         QuorinReplyAfter,
                          testing::Values("RE003%0%\r\n",
                                          "RE00A%0%another",
                                          "ER003%0%",
@@ -167,7 +167,7 @@ TEST_F(QuorinReply, TakesTheFirstOfTwoMessagesInARow) {
   EXPECT_EQ(Reads(), 1U);
 }
 
-TEST_F(QuorinReply, IsFoundBehindAnotherTagInTheSameRead) {
+TEST_F(QuorinReply, IsFoundAfterAnotherTagInTheSameRead) {
   AnswerWithTag([](const std::string& tag) {
     return std::vector<std::string>{Message("RE", "%0%other") + Message("RE", tag + "mine")};
   });
@@ -177,7 +177,7 @@ TEST_F(QuorinReply, IsFoundBehindAnotherTagInTheSameRead) {
   EXPECT_EQ(Reads(), 1U);
 }
 
-TEST_F(QuorinReply, IsFoundBehindAnotherTagInAnEarlierRead) {
+TEST_F(QuorinReply, IsFoundAfterAnotherTagInAnEarlierRead) {
   AnswerWithTag([](const std::string& tag) {
     return std::vector<std::string>{Message("RE", "%0%other"), Message("RE", tag + "mine")};
   });
@@ -276,7 +276,7 @@ TEST_F(QuorinReply, IsTakenThoughACancelCameDuringItsRead) {
   EXPECT_EQ(command.ReplyText(), "x");
 }
 
-// A command that wants several messages, or whose memory runs out.
+// A command that expects several messages, or that runs out of memory.
 class PatientCommand : public AskCommand {
  public:
   explicit PatientCommand(size_t wanted) : AskCommand(kTagged), wanted_(wanted) {}

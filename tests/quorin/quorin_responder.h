@@ -1,5 +1,5 @@
-// The receiver's end of a scripted connection: it takes the tag off each command and answers with
-// messages that carry it.
+// The receiver's end of a scripted connection: it removes the tag from each command and answers
+// with messages that carry this tag.
 #ifndef RCVLINK_TESTS_QUORIN_QUORIN_RESPONDER_H_
 #define RCVLINK_TESTS_QUORIN_QUORIN_RESPONDER_H_
 
@@ -37,7 +37,7 @@ class QuorinResponder {
   QuorinResponder(const QuorinResponder&) = delete;
   QuorinResponder& operator=(const QuorinResponder&) = delete;
 
-  // Each time it hears the command (without a tag), it sends one message.
+  // Sends one message each time it receives the command (without a tag).
   void Reply(const std::string& command,
              const std::string& body,
              const std::string& identifier = "RE") {
@@ -48,10 +48,10 @@ class QuorinResponder {
   void On(const std::string& command, std::function<void(const std::string& tag)> act) {
     answers_[command] = std::move(act);
   }
-  // The write of the command gives this, and nothing is sent.
+  // The write of the command returns this, and nothing is sent.
   void FailWriteOf(const std::string& command, HRESULT result) { failures_[command] = result; }
 
-  // Runs ahead of whatever is done about a command.
+  // Runs before a command is answered.
   std::function<void(const std::string& command)> on_hear;
 
  private:
@@ -75,8 +75,8 @@ class QuorinResponder {
   std::string next_tag_;
 };
 
-// What the host did that the receiver or the line notices: each command, "%%" in place of its tag,
-// each control byte, each "speed <rate>".
+// What the host sent: each command with "%%" in place of its tag, each control byte, and each
+// change of speed as "speed <rate>".
 inline std::vector<std::string> Conversation(const std::vector<std::string>& calls) {
   constexpr std::string_view kWrite = "write ";
   std::vector<std::string> conversation;

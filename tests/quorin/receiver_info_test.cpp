@@ -28,7 +28,7 @@ class QuorinReceiverInfo : public QuorinDriverTest {
   }
 
   HRESULT Get() { return driver.GetReceiverInfo(nullptr, &info); }
-  // After a failure: no strings, and the connection still held.
+  // After a failure there are no strings, and the connection is still locked.
   void ExpectNothingButTheLock() {
     EXPECT_EQ(info.bstrReceiverId, nullptr);
     EXPECT_EQ(info.bstrModel, nullptr);
@@ -60,7 +60,7 @@ TEST_F(QuorinReceiverInfo, AsksForIdentityThenModel) {
   EXPECT_THAT(progress.percents, ElementsAre(0, 50, 100));
 }
 
-TEST_F(QuorinReceiverInfo, AsksForTheModelBehindTheHalf) {
+TEST_F(QuorinReceiverInfo, AsksForTheModelAfterFiftyPercent) {
   std::vector<std::string> heard_at_half;
   progress.on_progress = [&](BYTE percent) {
     if (percent == 50) heard_at_half = Said();
@@ -158,7 +158,7 @@ TEST_F(QuorinReceiverInfo, IsAbortedBetweenTheTwo) {
   ExpectNothingButTheLock();
 }
 
-TEST_F(QuorinReceiverInfo, IsAbortedBehindTheModel) {
+TEST_F(QuorinReceiverInfo, IsAbortedAfterTheModel) {
   receiver.On(kGetModel, [this](const std::string& tag) {
     connection->Give({S_OK, Message("RE", tag + "M"), [this] { driver.Abort(); }});
   });

@@ -21,8 +21,7 @@ class AskCommand : public QuorinCommands::CQuorinCommand {
 
 class QuorinReplyTest : public testing::Test {
  protected:
-  // What the receiver sends once it has heard the command; each string is one read. "%" stands for
-  // the tag.
+  // What the receiver sends after the command; each string is one read. "%" stands for the tag.
   void Answer(std::vector<std::string> reads) {
     receiver.On("ask\r\n", [this, reads](const std::string&) {
       for (const std::string& read : reads) connection.GiveRead(read);

@@ -52,15 +52,15 @@ INSTANTIATE_TEST_SUITE_P(Lengths,
                                          HeaderCase{"RE00D%7%/dev/ser/a", 0, ReplyKind::kReply, 13},
                                          HeaderCase{"REFFF", 0, ReplyKind::kReply, 4095},
                                          HeaderCase{"REFFF!", 0, ReplyKind::kReply, 4095},
-                                         // Three characters are wanted, not three digits.
+                                         // Any three characters are accepted, not only digits.
                                          HeaderCase{"RE1zz", 0, ReplyKind::kReply, 1},
                                          HeaderCase{"RE12x", 0, ReplyKind::kReply, 0x12},
                                          HeaderCase{"RE0x7", 0, ReplyKind::kReply, 7},
-                                         // Digits of the body count as long as there are any.
+                                         // Digits of the body belong to the length.
                                          HeaderCase{"RE0034.", 0, ReplyKind::kReply, 0x34},
                                          HeaderCase{"RE000000FFF.", 0, ReplyKind::kReply, 4095}));
 
-INSTANTIATE_TEST_SUITE_P(BehindWhatIsNone,
+INSTANTIATE_TEST_SUITE_P(AfterWhatIsNoHeader,
                          QuorinHeader,
                          testing::Values(HeaderCase{"*$\xFF RE003%1%", 4, ReplyKind::kReply, 3},
                                          HeaderCase{"RRE003%1%", 1, ReplyKind::kReply, 3},
@@ -73,7 +73,7 @@ INSTANTIATE_TEST_SUITE_P(BehindWhatIsNone,
                                          HeaderCase{"   RE003%1%", 3, ReplyKind::kReply, 3},
                                          HeaderCase{"RE1000!RE003%1%", 7, ReplyKind::kReply, 3},
                                          HeaderCase{"RE003ABCRE003%1%", 8, ReplyKind::kReply, 3},
-                                         // The second begins in the first one's digits.
+                                         // The second header begins inside the first one's digits.
                                          HeaderCase{"REEEEER003%1%", 5, ReplyKind::kError, 3}));
 
 class QuorinNoHeader : public testing::TestWithParam<std::string_view> {};
@@ -116,13 +116,13 @@ INSTANTIATE_TEST_SUITE_P(TooShort,
                          QuorinNoHeader,
                          testing::Values("", "R", "RE", "RE0", "RE00", " ", "  ", "  00", "E"));
 
-TEST(QuorinHeaderSearch, StartsWhereItIsTold) {
+TEST(QuorinHeaderSearch, StartsAtTheGivenPosition) {
   EXPECT_EQ(Find("RE001aER001b", 1)->position, 6U);
   EXPECT_EQ(Find("RE001aER001b", 6)->position, 6U);
   EXPECT_FALSE(Find("RE001aER001b", 7));
 }
 
-TEST(QuorinHeaderSearch, FromBehindTheEndFindsNothing) {
+TEST(QuorinHeaderSearch, StartingAfterTheEndFindsNothing) {
   EXPECT_FALSE(Find("RE000", 5));
   EXPECT_FALSE(Find("RE000", 9));
 }
@@ -144,13 +144,13 @@ TEST(QuorinHeaderSearch, KeepsAHeaderThatIsCutOff) {
   }
 }
 
-TEST(QuorinHeaderSearch, PassesOverWhatIsNoneForGood) {
+TEST(QuorinHeaderSearch, SkipsBytesThatAreNoHeader) {
   size_t scan_from = 0;
   EXPECT_FALSE(FindReplyHeader(std::string(1000, '*'), scan_from));
   EXPECT_EQ(scan_from, 996U);
 }
 
-TEST(QuorinHeaderSearch, ReadsNothingBehindTheBytes) {
+TEST(QuorinHeaderSearch, ReadsNothingAfterTheBytes) {
   const std::string bytes = "RERE   ER0REFFF0x RE0x";
   for (size_t end = 0; end <= bytes.size(); ++end) {
     for (size_t from = 0; from <= end; ++from) {
@@ -162,7 +162,7 @@ TEST(QuorinHeaderSearch, ReadsNothingBehindTheBytes) {
   }
 }
 
-// The same search in the plainest way.
+// The same search in the simplest way.
 std::optional<ReplyHeader> FindSlowly(const std::string& bytes) {
   for (size_t p = 0; p + 5 <= bytes.size(); ++p) {
     const std::string identifier = bytes.substr(p, 2);
@@ -186,7 +186,7 @@ std::optional<ReplyHeader> FindSlowly(const std::string& bytes) {
 
 TEST(QuorinHeaderSearch, AgreesWithASlowOneOnGarbage) {
   constexpr std::string_view kAlphabet = "RERE  019AFg%";
-  std::mt19937 random(20240607);  // the same every time
+  std::mt19937 random(20240607);  // the same in each run
   size_t found = 0;
   for (int round = 0; round < 20000; ++round) {
     std::string bytes(random() % 24, '\0');

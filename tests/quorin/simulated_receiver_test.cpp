@@ -48,7 +48,7 @@ TEST(QuorinSimulatedReceiver, IsNotFoundAtAnotherSpeed) {
   }
 }
 
-TEST(QuorinSimulatedReceiver, TellsWhatItIs) {
+TEST(QuorinSimulatedReceiver, ReportsItsIdentity) {
   sim::QuorinOptions options;
   options.identity.id = "  ID 7";
   options.identity.model = "HVB5-X";

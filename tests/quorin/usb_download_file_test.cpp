@@ -1,4 +1,4 @@
-// A whole download over USB: what is said around the block transfer.
+// A whole download over USB: the commands around the block transfer.
 #include <gtest/gtest.h>
 
 #include <cstdint>
@@ -35,7 +35,7 @@ TEST_F(QuorinDownloadFileOverUsb, ReportsItsStartAtOnce) {
   EXPECT_EQ(progress.percents[1], 1);
 }
 
-// Both the transfer and what is around it say that it is over.
+// Both the transfer and the driver send the end.
 TEST_F(QuorinDownloadFileOverUsb, FailsWithTheStream) {
   stream.fail_at_write = 0;
   EXPECT_EQ(Download(), STG_E_MEDIUMFULL);

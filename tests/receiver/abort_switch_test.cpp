@@ -1,4 +1,4 @@
-// The two halves of an abort, and who clears which.
+// The two parts of an abort, and what clears each of them.
 #include "receiver/abort_switch.h"
 
 #include <gtest/gtest.h>
@@ -10,7 +10,7 @@ namespace {
 
 class AbortSwitchTest : public testing::Test {
  protected:
-  // Whether the next wait would be ended.
+  // Whether an abort would end the next wait.
   bool IsCancelPending() const { return connection.is_cancelled; }
 
   ScriptedConnection connection;
@@ -48,14 +48,14 @@ TEST_F(AbortSwitchTest, ClearingTheCancelKeepsTheFlag) {
   EXPECT_TRUE(abort.Take());
 }
 
-// What nobody aborted is nobody's to clear: the connection cancels itself as it is closed.
+// Without an abort nothing must be cleared: the connection cancels itself when it is closed.
 TEST_F(AbortSwitchTest, TakingNothingClearsNothing) {
   connection.Cancel();
   EXPECT_FALSE(abort.Take());
   EXPECT_TRUE(IsCancelPending());
 }
 
-TEST_F(AbortSwitchTest, MarksTheCommandThatIsExecuted) {
+TEST_F(AbortSwitchTest, CancelsTheCommandThatIsExecuted) {
   {
     const AbortSwitch::CurrentCommand current(abort, command);
     abort.Abort();
@@ -63,7 +63,7 @@ TEST_F(AbortSwitchTest, MarksTheCommandThatIsExecuted) {
   EXPECT_TRUE(command.IsCancelled(nullptr));
 }
 
-TEST_F(AbortSwitchTest, DoesNotMarkACommandThatIsDone) {
+TEST_F(AbortSwitchTest, DoesNotCancelACommandThatIsDone) {
   { const AbortSwitch::CurrentCommand current(abort, command); }
   abort.Abort();
   EXPECT_FALSE(command.IsCancelled(nullptr));

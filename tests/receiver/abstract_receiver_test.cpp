@@ -122,7 +122,7 @@ TEST_F(Receiver, LocksWithoutALine) {
   EXPECT_TRUE(report.Lines().empty());
 }
 
-TEST_F(Receiver, UnlockSucceedsWhateverTheDriverSays) {
+TEST_F(Receiver, UnlockSucceedsWhateverTheDriverReturns) {
   EXPECT_CALL(*driver, UnlockConnection()).WillOnce(Return(0)).WillOnce(Return(1));
   EXPECT_EQ(receiver->UnlockConnection(), S_OK);
   EXPECT_EQ(receiver->UnlockConnection(), S_OK);

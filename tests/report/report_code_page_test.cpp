@@ -15,14 +15,14 @@ namespace {
 constexpr LCID kJapanese = 0x0411;
 constexpr UINT kCodePage = 932;
 
-// The code page that the thread converts in.
+// The code page of the thread.
 std::optional<UINT> ThreadCodePage() {
   CPINFOEXW info{};
   if (!GetCPInfoExW(CP_THREAD_ACP, 0, &info)) return std::nullopt;
   return info.CodePage;
 }
 
-// What is in the report behind the stamp of its only line.
+// The text after the stamp of the report's only line.
 std::string Entry(const ReportCapture& report) {
   constexpr size_t kStampTime = 14;  // "hh:mm:ss.mmmm ", then the thread in six columns or more
   const std::string text = report.Text();
@@ -50,7 +50,7 @@ class ReportInJapanese : public testing::Test {
     OnThreadOf(kJapanese, [&] { code_page = ThreadCodePage(); });
     if (code_page != kCodePage) GTEST_SKIP() << "this system has no threads in code page 932";
   }
-  // The line that a wide and a narrow entry leave.
+  // The line of a wide and of a narrow entry.
   static std::string Wide(const std::wstring& text) {
     const ReportCapture report;
     OnThreadOf(kJapanese, [&] { Trace(L"%s", text.c_str()); });
@@ -63,14 +63,14 @@ class ReportInJapanese : public testing::Test {
   }
 };
 
-// As many bytes as the text has characters, so that the tail is cut, with the line's end.
+// As many bytes are written as the text has characters, so the rest and the line end are cut.
 TEST_F(ReportInJapanese, AWideEntryIsCutToAsManyBytesAsItHasCharacters) {
   EXPECT_EQ(Wide(kNihongo + L" [COM7]\r\n"), kNihongoIn932 + " [COM7");
   EXPECT_EQ(Wide(L"[" + kNihongo + L"]"), "[" + kNihongoIn932.substr(0, 4));
   EXPECT_EQ(Wide(kNihongo), kNihongoIn932.substr(0, 3)) << "in the middle of a character";
 }
 
-// In this code page they are single bytes.
+// These characters are single bytes in this code page.
 TEST_F(ReportInJapanese, AWideEntryOfLettersAndHalfWidthKanaIsWhole) {
   EXPECT_EQ(Wide(L"\uFF76\uFF85 [COM7]\r\n"), "\xB6\xC5 [COM7]\r\n");
 }
@@ -90,7 +90,7 @@ TEST_F(ReportInJapanese, ANarrowEntryIsWhole) {
   EXPECT_EQ(Narrow(kNihongoIn932), kNihongoIn932);
 }
 
-// A report's narrow name is converted in it as well.
+// The narrow name of a report is converted in this code page, too.
 TEST_F(ReportInJapanese, ANarrowNameIsOfTheThreadsCodePage) {
   std::array<wchar_t, MAX_PATH> folder{};
   GetTempPathW(MAX_PATH, folder.data());
@@ -102,7 +102,7 @@ TEST_F(ReportInJapanese, ANarrowNameIsOfTheThreadsCodePage) {
   EXPECT_TRUE(DeleteFileW(path.c_str()));
 }
 
-// Each thread writes in its own.
+// Each thread writes in its own code page.
 TEST(ReportOfThreads, EachWritesInItsCodePage) {
   constexpr LCID kGerman = 0x0407;
   constexpr LCID kRussian = 0x0419;

@@ -28,7 +28,7 @@ bool Exists(const std::wstring& path) {
   return GetFileAttributesW(path.c_str()) != INVALID_FILE_ATTRIBUTES;
 }
 
-// The host's way in: its own variadic function hands its list on.
+// As hosts call it: from a variadic function of their own.
 void HostLine(const wchar_t* format, ...) {
   va_list arguments;
   va_start(arguments, format);
@@ -147,7 +147,7 @@ TEST(Report, AnotherReportClosesTheFirst) {
   const ReportCapture second;
   Trace(L"to the second\r\n");
   EXPECT_EQ(first.Text(), "");
-  EXPECT_TRUE(DeleteFileW(first.Path().c_str()));  // nobody holds it any more
+  EXPECT_TRUE(DeleteFileW(first.Path().c_str()));  // it is no longer open
   EXPECT_TRUE(second.Has("to the second"));
 }
 
@@ -207,11 +207,12 @@ TEST(Report, ANullFormatIsRaisedAndTheLockLeft) {
   EXPECT_EQ(
       CodeOf([] { dump_hlp::DumpReportString(static_cast<const wchar_t*>(nullptr), nullptr); }),
       E_INVALIDARG);
-  // Another thread would wait for ever if the lock were still held.
+  // If the lock were still held, another thread would wait for ever.
   std::thread([] { Trace(L"x\r\n"); }).join();
 }
 
-// The count of bytes written is that of the characters: in single-byte code pages that is the line.
+// As many bytes are written as the text has characters: in a single-byte code page that is the
+// whole line.
 TEST(Report, WritesAsManyBytesAsTheTextHasCharacters) {
   const ReportCapture report;
   const std::wstring text = L"\u00E4\u00F6\u00FC\r\n";

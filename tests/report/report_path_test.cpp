@@ -20,7 +20,7 @@ std::wstring TempFolder() {
   return folder.data();
 }
 
-// The files of the folder whose names begin so.
+// The files of the folder whose names begin with this text.
 std::vector<std::wstring> FilesWith(const std::wstring& start) {
   std::vector<std::wstring> names;
   WIN32_FIND_DATAW found{};
@@ -40,14 +40,14 @@ class ReportPath : public testing::Test {
     for (const std::wstring& name : FilesWith(start_)) DeleteFileW((TempFolder() + name).c_str());
   }
 
-  // A name that makes the whole path so long, without its ending zero.
+  // A name that gives the path this length, without its ending zero.
   std::wstring NameForPathOf(size_t length) const {
     std::wstring name = start_;
     name.resize(length - TempFolder().size(), L'p');
     return name;
   }
   std::vector<std::wstring> Files() const { return FilesWith(start_); }
-  // What is in a report after one line was written, which is then closed.
+  // The content of a report after one line was written and the report was closed.
   static std::string Written(const std::wstring& name) {
     Trace(L"line\r\n");
     dump_hlp::CloseReportFile();
@@ -89,7 +89,7 @@ INSTANTIATE_TEST_SUITE_P(Lengths,
 
 class ReportPathThatDoesNotFit : public ReportPath, public testing::WithParamInterface<size_t> {};
 
-// Nothing is made, not under a shortened name either.
+// No file is made, not even under a shortened name.
 TEST_P(ReportPathThatDoesNotFit, LeavesReportingOff) {
   const std::wstring name = NameForPathOf(GetParam());
   dump_hlp::CreateReportFile(name.c_str());

@@ -113,7 +113,7 @@ TEST(BlockFaultsTest, AnEndByteEndsTheTransfer) {
   EXPECT_EQ(session.Ask("#%2%\r\n"), "RE003%2%\r\n");
 }
 
-TEST(BlockFaultsTest, AFaultHappensAsOftenAsTold) {
+TEST(BlockFaultsTest, AFaultHappensAsOftenAsAskedFor) {
   Session session(WithFault(BlockFaultKind::kDamagedCrc, 3));
   session.StartTransfer();
   EXPECT_NE(session.NextBlock(kAck), GoodBlock());
@@ -141,7 +141,7 @@ TEST(BlockFaultsTest, FaultsOfOneBlockComeOneAfterTheOther) {
   EXPECT_EQ(session.NextBlock(kNak), GoodBlock());
 }
 
-TEST(BlockFaultsTest, SilenceSwallowsTheNaksHeardMeanwhile) {
+TEST(BlockFaultsTest, NaksDuringSilenceAreIgnored) {
   QuorinOptions options;
   options.faults.blocks = {{BlockFaultKind::kSilence, 1, kOnce, 10'000}};
   Session session(options);
@@ -152,7 +152,7 @@ TEST(BlockFaultsTest, SilenceSwallowsTheNaksHeardMeanwhile) {
   EXPECT_TRUE(session.NextBlock(kNak, 3000).empty());
   EXPECT_EQ(session.NextBlock(kNak, 3000), GoodBlock());
   EXPECT_EQ(session.port.Now() - start_ms, 10'000U);
-  // The next thing is the next block: none of the NAKs has brought a second copy.
+  // The next block follows: no NAK has brought a second copy.
   EXPECT_EQ(SeenBlock(session.NextBlock(kAck)).type, 0x04U);
   EXPECT_EQ(session.Ask("#"), "");
 }

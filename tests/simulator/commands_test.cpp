@@ -77,7 +77,7 @@ TEST(CommandsTest, ACommandMayComeByteByByte) {
   EXPECT_EQ(session.Ask("\n"), "RE00A%1%QR00421\r\n");
 }
 
-TEST(CommandsTest, AnEndlessLineIsRefusedAndForgotten) {
+TEST(CommandsTest, AnEndlessLineIsRefusedAndDiscarded) {
   Session session;
   EXPECT_EQ(session.Ask(std::string(100'000, 'x') + "\r\n"), "ER011{unknown command}\r\n");
   EXPECT_EQ(session.Ask("%1%\r\n"), "RE003%1%\r\n");
@@ -153,8 +153,8 @@ class ListTest : public testing::TestWithParam<std::string> {
   }
 };
 
-TEST_P(ListTest, TellsNameSizeAndLocalTimeFileByFile) {
-  // 1988-01-02 00:00:05 by the clock on the wall is a day and five seconds after the zero.
+TEST_P(ListTest, HasNameSizeAndLocalTimeOfEachFile) {
+  // 1988-01-02 00:00:05 in local time is a day and five seconds after the zero.
   tm wall{};
   wall.tm_year = 88;
   wall.tm_mday = 2;
@@ -190,7 +190,7 @@ TEST(DirectoryTest, LongNamesExceedTheHostsField) {
   EXPECT_NE(reply.find("{{A0101.log" + std::string(31, '_') + ",1100,"), std::string::npos);
 }
 
-TEST(DirectoryTest, ALieAboutASizeIsToldEverywhere) {
+TEST(DirectoryTest, AWrongSizeIsReportedEverywhere) {
   QuorinOptions options;
   options.faults.sizes = {{"A0101.log", 99}};
   Session session(options);

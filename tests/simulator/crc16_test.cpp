@@ -18,7 +18,7 @@ TEST(Crc16Test, ChainedPartsGiveTheValueOfTheWhole) {
   EXPECT_EQ(Crc16(ToBytes("56789"), Crc16(ToBytes("1234"), 0)), 0x31C3);
 }
 
-TEST(Crc16Test, NothingLeavesTheStartValue) { EXPECT_EQ(Crc16({}, 0xABCD), 0xABCD); }
+TEST(Crc16Test, NoBytesGiveTheStartValue) { EXPECT_EQ(Crc16({}, 0xABCD), 0xABCD); }
 
 }  // namespace
 }  // namespace sim

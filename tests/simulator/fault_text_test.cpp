@@ -7,7 +7,7 @@
 namespace sim {
 namespace {
 
-TEST(FaultTextTest, ABlockFaultHappensOnceUnlessTold) {
+TEST(FaultTextTest, ABlockFaultHappensOnceByDefault) {
   const BlockFault fault = ParseBlockFault(BlockFaultKind::kWrongEnd, "12");
   EXPECT_EQ(fault.kind, BlockFaultKind::kWrongEnd);
   EXPECT_EQ(fault.block, 12U);
@@ -16,14 +16,14 @@ TEST(FaultTextTest, ABlockFaultHappensOnceUnlessTold) {
   EXPECT_EQ(ParseBlockFault(BlockFaultKind::kWrongEnd, "0@always").times, kAlways);
 }
 
-TEST(FaultTextTest, SilenceIsToldInSeconds) {
+TEST(FaultTextTest, SilenceIsGivenInSeconds) {
   const BlockFault fault = ParseBlockFault(BlockFaultKind::kSilence, "3:2.5@2");
   EXPECT_EQ(fault.block, 3U);
   EXPECT_EQ(fault.silence_ms, 2500U);
   EXPECT_EQ(fault.times, 2U);
 }
 
-TEST(FaultTextTest, AReplyFaultHappensAlwaysUnlessTold) {
+TEST(FaultTextTest, AReplyFaultHappensAlwaysByDefault) {
   const ReplyFault fault = ParseReplyFault(ReplyFaultKind::kRefused, "print,/log/&[name,size");
   EXPECT_EQ(fault.command, "print,/log/&[name,size");
   EXPECT_EQ(fault.times, kAlways);
@@ -41,7 +41,7 @@ TEST(FaultTextTest, AnAmountMayBeForAnyCommand) {
   EXPECT_EQ(one.times, 7U);
 }
 
-TEST(FaultTextTest, ASizeLieNamesAFile) {
+TEST(FaultTextTest, AWrongSizeIsForAFile) {
   const SizeLie lie = ParseSizeLie("a=b=77");
   EXPECT_EQ(lie.file, "a=b");
   EXPECT_EQ(lie.size, 77U);

@@ -45,7 +45,7 @@ TEST_F(FolderTest, ListsPlainFilesByName) {
   EXPECT_EQ(list[1].name, "B.log");
 }
 
-TEST_F(FolderTest, TellsTheTimeOfTheFile) {
+TEST_F(FolderTest, HasTheTimeOfTheFile) {
   const auto time = std::chrono::sys_seconds(std::chrono::seconds(1'600'000'000));
   fs::last_write_time(folder_ / "A.log", std::chrono::file_clock::from_sys(time));
   EXPECT_EQ(FileStore::FromFolder(folder_).Find("A.log")->modified, 1'600'000'000);
@@ -82,7 +82,7 @@ TEST_F(FolderTest, RenamingChangesTheNameThatIsServed) {
   EXPECT_FALSE(fs::exists(folder_ / "C.log"));
 }
 
-TEST_F(FolderTest, ARenamingThatCannotBeChangesNothing) {
+TEST_F(FolderTest, AFailedRenamingChangesNothing) {
   FileStore store = FileStore::FromFolder(folder_);
   EXPECT_FALSE(store.Rename("C.log", "D.log"));
   EXPECT_FALSE(store.Rename("A.log", "B.log"));

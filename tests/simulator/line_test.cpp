@@ -32,7 +32,7 @@ TEST(LineTest, APacedLineHandsOutWhatHasArrivedByNow) {
   EXPECT_EQ(session.port.Read(SIZE_MAX, 0).size(), 115U);
 }
 
-TEST(LineTest, AnIdleLineSavesUpNoTime) {
+TEST(LineTest, AnIdleLineDoesNotSendFasterLater) {
   QuorinOptions options;
   options.line.paced = true;
   Session session(options);
@@ -131,7 +131,7 @@ TEST(MemoryPortTest, ReadWaitsNoLongerThanItMust) {
   EXPECT_EQ(session.port.Now(), 1250U);
 }
 
-TEST(MemoryPortTest, PurgeDropsWhatHasComeButNotWhatIsToCome) {
+TEST(MemoryPortTest, PurgeDiscardsReceivedBytesButNotLaterOnes) {
   QuorinOptions options;
   options.line.piece_size = 4;
   Session session(options);

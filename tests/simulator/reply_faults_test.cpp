@@ -31,7 +31,7 @@ TEST(ReplyFaultsTest, ARefusalMayHappenOnce) {
   EXPECT_EQ(session.Ask(kAskId), kId);
 }
 
-TEST(ReplyFaultsTest, AMuteReceiverTakesNoNotice) {
+TEST(ReplyFaultsTest, AMuteReceiverIgnoresACommand) {
   Session session(WithFault({ReplyFaultKind::kMute, "remove,"}));
   EXPECT_EQ(session.Ask("%1%remove,A0101.log\r\n", 60'000), "");
   EXPECT_TRUE(session.receiver.files().Find("A0101.log").has_value());
@@ -40,7 +40,7 @@ TEST(ReplyFaultsTest, AMuteReceiverTakesNoNotice) {
 
 TEST(ReplyFaultsTest, ThePingHasAName) {
   Session session(WithFault({ReplyFaultKind::kMute, std::string(kPingCommand), kOnce}));
-  // Lines that are not answered anyway use nothing up.
+  // Lines that are never answered do not count.
   EXPECT_EQ(session.Ask("\r\n"), "");
   EXPECT_EQ(session.Ask("%1%\r\n"), "");
   EXPECT_EQ(session.Ask("%2%\r\n"), "RE003%2%\r\n");
@@ -70,7 +70,7 @@ TEST(ReplyFaultsTest, ALateReplyComesWhenItIsDue) {
   EXPECT_EQ(session.Ask(kAskModel), kModel);
 }
 
-TEST(ReplyFaultsTest, StopMeansThatALateReplyNeverComes) {
+TEST(ReplyFaultsTest, ALateReplyIsDiscardedByDm) {
   Session session(WithFault({ReplyFaultKind::kSilence, std::string(kAnyCommand), kOnce, 8'000}));
   session.Say(kAskId);
   EXPECT_EQ(session.Ask("dm\r\n", 20'000), "");
@@ -95,7 +95,7 @@ TEST(ReplyFaultsTest, TheReplyMayCarryAnotherTag) {
   EXPECT_EQ(session.Ask(kAskId), "RE00B%19%QR00421\r\n");
 }
 
-TEST(ReplyFaultsTest, TheHeaderMayTellTooMuchOrTooLittle) {
+TEST(ReplyFaultsTest, TheHeaderMayHaveATooLargeOrTooSmallLength) {
   Session more(WithFault({ReplyFaultKind::kWrongLength, "print,", kAlways, 0x20}));
   EXPECT_EQ(more.Ask(kAskId), "RE02A%1%QR00421\r\n");
   EXPECT_EQ(more.Ask("%1%\r\n"), "RE003%1%\r\n");

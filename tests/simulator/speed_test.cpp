@@ -40,7 +40,7 @@ TEST(SpeedTest, AGarbledCommandIsNotUnderstoodAndItsAnswerNotReadable) {
   EXPECT_EQ(session.Ask("%1%\r\n"), "RE003%1%\r\n");
 }
 
-// What the host sends right may still come back wrong, if it changes its speed too early.
+// When the host changes its speed too early, the command is right but the reply is damaged.
 TEST(SpeedTest, AReplyIsLostOnAHostThatHasAlreadyChanged) {
   QuorinOptions options;
   options.faults.replies = {{ReplyFaultKind::kSilence, std::string(kAnyCommand), kAlways, 1000}};
@@ -98,7 +98,7 @@ TEST(SpeedTest, TheSpeedChangesOnlyWhenTheReplyHasLeft) {
   EXPECT_EQ(session.receiver.speed(), 115200U);
 }
 
-TEST(SpeedTest, AReplyTakenBackStillChangesTheSpeed) {
+TEST(SpeedTest, AReplyThatIsDiscardedStillChangesTheSpeed) {
   QuorinOptions options;
   options.faults.replies = {{ReplyFaultKind::kSilence, "set,", kAlways, 1000}};
   Session session(options);

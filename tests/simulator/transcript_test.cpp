@@ -63,7 +63,7 @@ std::string Record(size_t step, size_t piece_size) {
   return session.log.str();
 }
 
-TEST(TranscriptTest, TellsASessionInOrder) { EXPECT_EQ(Record(1000, 0), kExpected); }
+TEST(TranscriptTest, RecordsASessionInOrder) { EXPECT_EQ(Record(1000, 0), kExpected); }
 
 TEST(TranscriptTest, DoesNotDependOnReadsAndPieces) {
   EXPECT_EQ(Record(1, 0), kExpected);
@@ -75,7 +75,7 @@ TEST(TranscriptTest, EscapesWhatCannotBePrinted) {
             "a\\\\\\r\\n\\x09\\x00\\x7F\\xFF~ ");
 }
 
-TEST(TranscriptTest, AnEchoIsTellingLineByLine) {
+TEST(TranscriptTest, AnEchoIsRecordedLineByLine) {
   QuorinOptions options;
   options.echo = true;
   Session session(options);
@@ -84,7 +84,7 @@ TEST(TranscriptTest, AnEchoIsTellingLineByLine) {
   EXPECT_EQ(session.log.str(), "> #OFF#\\r\\n\n= echo off\n< echo #OFF#\\r\\n\n");
 }
 
-TEST(TranscriptTest, AnUnfinishedLineIsToldAtTheEnd) {
+TEST(TranscriptTest, AnUnfinishedLineIsRecordedAtTheEnd) {
   std::ostringstream log;
   Transcript transcript(log);
   {
@@ -96,7 +96,7 @@ TEST(TranscriptTest, AnUnfinishedLineIsToldAtTheEnd) {
   EXPECT_EQ(log.str(), "> %7%\n");
 }
 
-TEST(TranscriptTest, AnAbandonedTransferIsRemarked) {
+TEST(TranscriptTest, AnAbandonedTransferGetsARemark) {
   Session session;
   session.StartTransfer();
   session.Ask("%5%\r\n");

@@ -30,7 +30,7 @@ TEST(UsbFaultsTest, TextsThatDoNotFitAreRefused) {
   EXPECT_THROW(ParseWriteError("0x1E0000001"), std::invalid_argument);
 }
 
-TEST(UsbFaultsTest, RefusalsLastUnlessToldOtherwise) {
+TEST(UsbFaultsTest, RefusalsLastUnlessACountIsGiven) {
   std::vector<EndpointRefusal> refusals = {ParseEndpointRefusal("0x81"),
                                            ParseEndpointRefusal("2@2")};
   for (int i = 0; i < 3; ++i) {

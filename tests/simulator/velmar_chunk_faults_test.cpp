@@ -28,7 +28,7 @@ TEST(VelmarChunkFaultsTest, ADamagedCrcIsTheOnlyDamage) {
   EXPECT_TRUE(ReadChunks(session.FetchFile()).at(1).good_crc);
 }
 
-TEST(VelmarChunkFaultsTest, AFlippedBitLeavesTheCrcBehind) {
+TEST(VelmarChunkFaultsTest, AFlippedBitDoesNotFitTheCrc) {
   const auto chunks = ReadChunks(FetchWith({Kind::kFlippedBit, 1}));
   ASSERT_EQ(chunks.size(), 3U);
   EXPECT_FALSE(chunks[1].good_crc);
@@ -52,7 +52,7 @@ TEST(VelmarChunkFaultsTest, SyncBytesMayBeWrongButForTheFirst) {
   EXPECT_TRUE(chunks.at(1).good_crc);
 }
 
-TEST(VelmarChunkFaultsTest, ALyingMessageLengthLeavesTheBodyAlone) {
+TEST(VelmarChunkFaultsTest, AWrongMessageLengthDoesNotChangeTheBody) {
   for (const uint32_t length : {0U, 4U, 7U, 2000U, 65535U}) {
     const Bytes bytes = FetchWith({Kind::kMessageLength, 1, kOnce, length});
     const auto all = ReadChunks(Bytes(bytes.begin(), bytes.begin() + 2 * 1064), kFullBody);
@@ -82,7 +82,7 @@ TEST(VelmarChunkFaultsTest, AnotherBodyLengthIsTrue) {
   EXPECT_EQ(crc[0] + crc[1] * 0x100U + crc[2] * 0x10000U + crc[3] * 0x1000000U, expected);
 }
 
-TEST(VelmarChunkFaultsTest, TheHeaderLengthMayLie) {
+TEST(VelmarChunkFaultsTest, TheHeaderLengthMayBeWrong) {
   for (const uint32_t length : {0U, 255U}) {
     const auto chunks = ReadChunks(FetchWith({Kind::kHeaderLength, 1, kOnce, length}));
     ASSERT_EQ(chunks.size(), 3U);
@@ -128,7 +128,7 @@ TEST(VelmarChunkFaultsTest, SilenceOnAPacedLineBeginsWhenTheLineIsFree) {
   EXPECT_NEAR(static_cast<double>(session.port.Now() - start_ms), 9000.0 + 1108.0, 2.0);
 }
 
-TEST(VelmarChunkFaultsTest, APieceEndsAheadOfTheSilence) {
+TEST(VelmarChunkFaultsTest, APieceEndsBeforeTheSilence) {
   VelmarOptions options = WithChunkFault({Kind::kSilence, 1, kOnce, 9000});
   options.line.piece_size = 5000;
   VelmarSession session(options);
@@ -167,7 +167,7 @@ TEST(VelmarChunkFaultsTest, TheSequenceMayNotReachZero) {
   EXPECT_EQ(session.Ask("unlogall"), kOk);
 }
 
-TEST(VelmarChunkFaultsTest, AReceiverMayVanishBehindAChunk) {
+TEST(VelmarChunkFaultsTest, AReceiverMayVanishAfterAChunk) {
   VelmarOptions options;
   options.faults.vanish_after_chunk = 1;
   VelmarSession session(options);
@@ -178,7 +178,7 @@ TEST(VelmarChunkFaultsTest, AReceiverMayVanishBehindAChunk) {
   EXPECT_EQ(session.Ask("unlogall", 60'000), "");
 }
 
-TEST(VelmarChunkFaultsTest, AReceiverVanishesBehindTheLastChunkToo) {
+TEST(VelmarChunkFaultsTest, AReceiverVanishesAfterTheLastChunkToo) {
   VelmarOptions options;
   options.faults.vanish_after_chunk = 2;
   VelmarSession session(options);

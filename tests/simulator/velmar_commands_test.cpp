@@ -47,7 +47,7 @@ TEST(VelmarCommandsTest, BlanksMayBeMore) {
   EXPECT_EQ(session.Ask("  unlogall   thisport"), kOk);
 }
 
-TEST(VelmarCommandsTest, ALineFeedBehindTheEndIsDropped) {
+TEST(VelmarCommandsTest, ALineFeedAfterTheEndIsDiscarded) {
   VelmarSession session;
   session.port.Write("unlogall\r\nunlogall\r\n", session.host_speed);
   EXPECT_EQ(ToText(session.port.ReadFull(100, 100)), std::string(kOk) + kOk);
@@ -56,7 +56,7 @@ TEST(VelmarCommandsTest, ALineFeedBehindTheEndIsDropped) {
             "< \\r\\n<OK\\r\\n[COM1]\n< \\r\\n<OK\\r\\n[COM1]\n");
 }
 
-TEST(VelmarCommandsTest, ALineFeedElsewhereIsNot) {
+TEST(VelmarCommandsTest, ALineFeedElsewhereIsKept) {
   VelmarSession session;
   EXPECT_EQ(session.Ask("\nunlogall"), Error("Unknown command"));
 }
@@ -103,7 +103,7 @@ TEST(VelmarCommandsTest, AnEndlessCommandIsCutOff) {
   EXPECT_LT(session.log.str().size(), 2000U);
 }
 
-TEST(VelmarCommandsTest, DeletingTakesTheFileOut) {
+TEST(VelmarCommandsTest, DeletingRemovesTheFile) {
   VelmarSession session;
   EXPECT_EQ(session.Ask("del file A0101.log"), kOk);
   EXPECT_FALSE(session.receiver.files().Find("A0101.log").has_value());
@@ -148,7 +148,7 @@ TEST(VelmarCommandsTest, LogsOfAFileNeedACurrentOne) {
   EXPECT_EQ(ReadLogs(session.Ask("log filehdra")).size(), 1U);
 }
 
-TEST(VelmarCommandsTest, TheCurrentFileCanBeLetGo) {
+TEST(VelmarCommandsTest, TheCurrentFileCanBeCleared) {
   VelmarSession session;
   session.Ask("currentfile A0101.log all");
   EXPECT_EQ(session.Ask("currentfile"), kOk);

@@ -10,7 +10,7 @@ namespace {
 using ChunkKind = VelmarChunkFaultKind;
 using ReplyKind = VelmarReplyFaultKind;
 
-TEST(VelmarFaultTextTest, AChunkFaultHappensOnceUnlessTold) {
+TEST(VelmarFaultTextTest, AChunkFaultHappensOnceByDefault) {
   const VelmarChunkFault fault = ParseChunkFault(ChunkKind::kWrongSync, "12");
   EXPECT_EQ(fault.kind, ChunkKind::kWrongSync);
   EXPECT_EQ(fault.chunk, 12U);
@@ -28,7 +28,7 @@ TEST(VelmarFaultTextTest, AChunkFaultMayHaveAnAmount) {
   EXPECT_EQ(ParseChunkFault(ChunkKind::kBodyLength, "1:65535").amount, 65535U);
 }
 
-TEST(VelmarFaultTextTest, AReplyFaultHappensAlwaysUnlessTold) {
+TEST(VelmarFaultTextTest, AReplyFaultHappensAlwaysByDefault) {
   const VelmarReplyFault fault = ParseReplyFault(ReplyKind::kRefused, "log direnta");
   EXPECT_EQ(fault.command, "log direnta");
   EXPECT_EQ(fault.times, kAlways);

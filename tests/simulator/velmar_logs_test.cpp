@@ -32,8 +32,8 @@ TEST(VelmarLogsTest, TheHeaderHasTenFields) {
   EXPECT_TRUE(logs[0].good_crc);
 }
 
-// The whole reply to the byte; its CRC has been worked out with another implementation.
-TEST(VelmarLogsTest, AReplyIsExactlyThis) {
+// The whole reply to the byte; its CRC was computed with another implementation.
+TEST(VelmarLogsTest, AReplyHasExactlyTheseBytes) {
   FileStore files;
   files.Add("A0101.log", ToBytes("0123456789abcdefghij"), 1'700'000'000);
   VelmarSession session({}, files);
@@ -59,7 +59,7 @@ TEST(VelmarLogsTest, TheVersionHasEightFieldsAComponent) {
   EXPECT_NE(body[10].find(','), std::string::npos);
 }
 
-TEST(VelmarLogsTest, ComponentsAreToldInTheOrderOfTheOptions) {
+TEST(VelmarLogsTest, ComponentsAreReportedInTheOrderOfTheOptions) {
   VelmarOptions options;
   options.identity.components = {
       {"ENCLOSURE", "Box, red"}, {"DB_USERAPPAUTO"}, {"RADIO"}, {kReceiverCard}};
@@ -77,7 +77,7 @@ TEST(VelmarLogsTest, ComponentsAreToldInTheOrderOfTheOptions) {
   EXPECT_TRUE(logs.at(0).good_crc);
 }
 
-TEST(VelmarLogsTest, AReceiverWithoutComponentsSaysSo) {
+TEST(VelmarLogsTest, AReceiverWithoutComponentsReportsNone) {
   VelmarOptions options;
   options.identity.components.clear();
   VelmarSession session(options);
@@ -117,7 +117,7 @@ TEST(VelmarLogsTest, ADirectoryCountsDownToZero) {
   }
 }
 
-TEST(VelmarLogsTest, DatesAreToldInUniversalTime) {
+TEST(VelmarLogsTest, DatesAreReportedInUniversalTime) {
   FileStore files;
   files.Add("x", {}, 1'356'998'399);
   files.Add("y", {}, 951'782'400);

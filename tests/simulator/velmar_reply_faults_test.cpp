@@ -57,7 +57,7 @@ TEST(VelmarReplyFaultsTest, ARefusedChangeOfSpeedIsNone) {
   EXPECT_EQ(session.receiver.speed(), 9600U);
 }
 
-TEST(VelmarReplyFaultsTest, AMuteReceiverTakesNoNotice) {
+TEST(VelmarReplyFaultsTest, AMuteReceiverIgnoresACommand) {
   VelmarSession session(WithReplyFault({Kind::kMute, "del", 2}));
   EXPECT_EQ(session.Ask("del file A0101.log", 60'000), "");
   EXPECT_EQ(session.Ask("unlogall"), kOk);
@@ -75,7 +75,7 @@ TEST(VelmarReplyFaultsTest, AMutedUnlogallDoesNotEndATransfer) {
   EXPECT_TRUE(session.receiver.in_transfer());
 }
 
-TEST(VelmarReplyFaultsTest, AnEmptyLineUsesNothingUp) {
+TEST(VelmarReplyFaultsTest, AnEmptyLineDoesNotCountForAFault) {
   VelmarSession session(WithReplyFault({Kind::kMute, std::string(kAnyVelmarCommand), kOnce}));
   EXPECT_EQ(session.Ask(""), "");
   EXPECT_EQ(session.Ask("unlogall"), "");
@@ -89,7 +89,7 @@ TEST(VelmarReplyFaultsTest, ALateReplyComesWhenItIsDue) {
   EXPECT_EQ(ToText(session.port.Read(100, 1)), kOk);
 }
 
-TEST(VelmarReplyFaultsTest, ALatePromptComesBehindTheAcknowledgement) {
+TEST(VelmarReplyFaultsTest, ALatePromptComesAfterTheAcknowledgement) {
   VelmarSession session(WithReplyFault(ForAll(Kind::kLatePrompt, 700)));
   session.Say("unlogall");
   EXPECT_EQ(ToText(session.port.Read(100, 0)), "\r\n<OK\r\n");
@@ -149,7 +149,7 @@ TEST(VelmarReplyFaultsTest, APromptMayHaveNoEnd) {
   EXPECT_LT(session.log.str().size(), 200U);
 }
 
-TEST(VelmarReplyFaultsTest, BehindAnEndlessPromptNoTransferStarts) {
+TEST(VelmarReplyFaultsTest, AfterAPromptWithoutEndNoTransferStarts) {
   VelmarSession session(WithReplyFault({Kind::kEndlessPrompt, "log", kAlways, 5}));
   session.Ask("currentfile A0101.log all");
   EXPECT_EQ(session.Ask("log filetransferb"), "\r\n<OK\r\n[XXXXX");
@@ -238,7 +238,7 @@ TEST(VelmarReplyFaultsTest, ABodyMayHaveNoFieldsOrAllOfThem) {
   EXPECT_EQ(ReadLogs(all.Ask(kAskVersion)).at(0).body.size(), 17U);
 }
 
-TEST(VelmarReplyFaultsTest, CountsMayLie) {
+TEST(VelmarReplyFaultsTest, CountsMayBeWrong) {
   VelmarSession huge(WithReplyFault(ForAll(Kind::kCount, 2'147'483'647)));
   EXPECT_EQ(ReadLogs(huge.Ask(kAskVersion)).at(0).body.at(0), "2147483647");
   const auto ports = ReadLogs(huge.Ask(kAskPorts));
@@ -265,7 +265,7 @@ TEST(VelmarReplyFaultsTest, TheNumbersMayNotReachZero) {
   EXPECT_EQ(Sequences(ReadLogs(session.Ask(kAskFiles))), (std::vector<int>{4, 3, 2, 1}));
 }
 
-TEST(VelmarReplyFaultsTest, SizesMayLie) {
+TEST(VelmarReplyFaultsTest, SizesMayBeWrong) {
   VelmarOptions options;
   options.faults.sizes = {{"A0101.log", 0}};
   VelmarSession session(options);

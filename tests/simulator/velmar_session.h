@@ -44,7 +44,7 @@ class VelmarSession {
 VelmarOptions WithReplyFault(const VelmarReplyFault& fault);
 VelmarOptions WithChunkFault(const VelmarChunkFault& fault);
 
-// The CRC-32 of a log as a host works it out, bit by bit.
+// The CRC-32 of a log as a host computes it, bit by bit.
 uint32_t HostCrc32(std::span<const uint8_t> bytes);
 
 // What a host reads from an ASCII log.
@@ -56,8 +56,8 @@ struct SeenLog {
   int sequence() const { return std::stoi(header.at(2)); }
 };
 
-// Takes a reply apart: an acknowledgement, the prompt and nothing but ASCII logs. A reply that is
-// none fails the test and gives what was read of it.
+// Parses a reply: an acknowledgement, the prompt and only ASCII logs. Any other reply fails the
+// test and gives what was read of it.
 std::vector<SeenLog> ReadLogs(const std::string& reply);
 
 // What a host reads from a binary log of the usual header length.
@@ -72,8 +72,8 @@ struct SeenChunk {
   bool good_crc = false;
 };
 
-// Takes binary logs apart that follow each other, their bodies being as long as `body_length` or,
-// if that is 0, as their headers say.
+// Parses consecutive binary logs. Their bodies have `body_length` bytes or, if that is 0, the
+// length in their headers.
 std::vector<SeenChunk> ReadChunks(const Bytes& bytes, size_t body_length = 0);
 
 // The bytes of all chunks.

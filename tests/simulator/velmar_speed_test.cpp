@@ -7,7 +7,7 @@
 namespace sim {
 namespace {
 
-TEST(VelmarSpeedTest, TheSpeedChangesBehindTheReply) {
+TEST(VelmarSpeedTest, TheSpeedChangesAfterTheReply) {
   VelmarSession session;
   EXPECT_EQ(session.Ask("COM 115200 N 8 1 N"), kOk);
   EXPECT_EQ(session.receiver.speed(), 115200U);
@@ -17,7 +17,7 @@ TEST(VelmarSpeedTest, TheSpeedChangesBehindTheReply) {
   EXPECT_EQ(ReadLogs(session.Ask("log comconfiga once")).at(0).body.at(2), "115200");
 }
 
-TEST(VelmarSpeedTest, TheTranscriptTellsWhenTheSpeedChanges) {
+TEST(VelmarSpeedTest, TheTranscriptShowsWhenTheSpeedChanges) {
   VelmarSession session;
   session.Ask("COM 115200 N 8 1 N");
   session.Ask("unlogall");
@@ -77,7 +77,7 @@ TEST(VelmarSpeedTest, WrongSettingsChangeNothing) {
   EXPECT_EQ(session.receiver.port_settings().parity, "N");
 }
 
-TEST(VelmarSpeedTest, WhatIsNotToldIsAsOnANewPort) {
+TEST(VelmarSpeedTest, MissingSettingsAreThoseOfANewPort) {
   VelmarSession session;
   session.Ask("COM 9600 E 7 2 CTS");
   session.Ask("COM 9600 O");
@@ -87,7 +87,7 @@ TEST(VelmarSpeedTest, WhatIsNotToldIsAsOnANewPort) {
   EXPECT_EQ(session.receiver.port_settings().handshake, "N");
 }
 
-TEST(VelmarSpeedTest, AReceiverMayKeepItsSpeedAndSayOtherwise) {
+TEST(VelmarSpeedTest, AReceiverMayKeepItsSpeedAndReportAnother) {
   VelmarOptions options;
   options.faults.keeps_speed = true;
   VelmarSession session(options);
@@ -129,7 +129,7 @@ TEST(VelmarSpeedTest, TheEndOfASpeedCommandIsFound) {
   EXPECT_EQ(end(""), 0U);
 }
 
-TEST(VelmarSpeedTest, TheEndOfASpeedCommandIsFoundBehindItsBeginning) {
+TEST(VelmarSpeedTest, TheEndOfASpeedCommandIsFoundAfterItsBeginning) {
   VelmarSession session;
   session.port.Write("CO", session.host_speed);
   EXPECT_EQ(session.receiver.EndOfSpeedCommand(ToBytes("M 9600\runlogall\r")), 7U);

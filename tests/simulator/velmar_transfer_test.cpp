@@ -53,8 +53,8 @@ INSTANTIATE_TEST_SUITE_P(Sizes,
                                          std::pair(5000, 1992),
                                          std::pair(200'000, 65527)));
 
-// The whole log to the byte; its CRC has been worked out with another implementation.
-TEST(VelmarTransferTest, ALogIsExactlyThis) {
+// The whole log to the byte; its CRC was computed with another implementation.
+TEST(VelmarTransferTest, ALogHasExactlyTheseBytes) {
   FileStore files;
   files.Add("A0101.log", ToBytes("0123456789abcdefghij"), 0);
   VelmarSession session({}, files);
@@ -89,7 +89,7 @@ TEST(VelmarTransferTest, APiecewiseTransferIsTheSame) {
   }
 }
 
-TEST(VelmarTransferTest, APieceTakesInWhatFollows) {
+TEST(VelmarTransferTest, APieceContinuesIntoTheNextLog) {
   VelmarOptions options = InChunksOf(10);
   options.line.piece_size = 20;
   VelmarSession session(options, OneFile(30));
@@ -137,7 +137,7 @@ class VelmarBusyTest : public testing::Test {
   std::optional<VelmarSession> session_;
 };
 
-TEST_F(VelmarBusyTest, UnlogallEndsATransferBehindTheLogThatIsOnItsWay) {
+TEST_F(VelmarBusyTest, UnlogallEndsATransferAfterTheCurrentLog) {
   const std::string rest = session_->Ask("unlogall thisport", 60'000);
   EXPECT_FALSE(session_->receiver.in_transfer());
   EXPECT_EQ(rest.size(), 13U + 1064U + 13U);
@@ -162,7 +162,7 @@ TEST_F(VelmarBusyTest, AnyCommandMayEndATransfer) {
   EXPECT_EQ(ReadLogs(rest.substr(13 + 1064)).size(), 1U);
 }
 
-TEST_F(VelmarBusyTest, ASecondTransferTakesThePlaceOfTheFirst) {
+TEST_F(VelmarBusyTest, ASecondTransferReplacesTheFirst) {
   const std::string rest = session_->Ask("log filetransferb", 60'000);
   const auto chunks = ReadChunks(ToBytes(rest.substr(13 + 1064 + 13)));
   EXPECT_EQ(Contents(chunks), TestPayload(10'000));
@@ -175,7 +175,7 @@ TEST_F(VelmarBusyTest, AFileThatIsDeletedEndsItsTransfer) {
   EXPECT_EQ(session_->Ask("unlogall", 1000), kOk);
 }
 
-TEST(VelmarTransferTest, TheTranscriptTellsLogsInWords) {
+TEST(VelmarTransferTest, TheTranscriptDescribesLogs) {
   VelmarSession session({}, OneFile(1100));
   session.FetchFile();
   EXPECT_EQ(session.log.str(),

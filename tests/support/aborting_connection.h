@@ -1,5 +1,5 @@
-// A simulated receiver's connection that lets an abort come at any of its calls, and cancels one
-// wait as a device does.
+// A connection to a simulated receiver with an abort at any of its calls. A cancel ends one wait,
+// as with a device.
 #ifndef RCVLINK_TESTS_SUPPORT_ABORTING_CONNECTION_H_
 #define RCVLINK_TESTS_SUPPORT_ABORTING_CONNECTION_H_
 
@@ -12,9 +12,9 @@
 
 // What a cancel makes of a write.
 enum class CancelledWrite {
-  kCompletes,        // it was through at once and did not wait
+  kCompletes,        // it completed at once and did not wait
   kIsLost,           // it waited, and nothing was sent
-  kIsSentAllTheSame  // it waited, and everything had left already
+  kIsSentAllTheSame  // it waited, and everything was already sent
 };
 
 class AbortingConnection : public CIConnection {
@@ -24,7 +24,7 @@ class AbortingConnection : public CIConnection {
                      DWORD host_speed = 9600)
       : inner_(receiver, host_speed), cancelled_write_(cancelled_write) {}
 
-  // The abort comes as the call of this number begins, or as it ends.
+  // The abort comes at the beginning or at the end of the call with this number.
   std::function<void()> abort;
   size_t abort_at = SIZE_MAX;
   bool at_end = false;

@@ -1,4 +1,4 @@
-// The lock of a driver, for tests: its handle in the report's lines, and whether somebody has it.
+// The lock of a driver, for tests: its handle as in the report, and whether it is held.
 #ifndef RCVLINK_TESTS_SUPPORT_DRIVER_LOCK_H_
 #define RCVLINK_TESTS_SUPPORT_DRIVER_LOCK_H_
 
@@ -10,7 +10,7 @@
 #include "platform/handle.h"
 #include "receiver/protocol.h"
 
-// A driver that tells the handle of its lock.
+// A driver that gives access to the handle of its lock.
 template <typename Driver>
 class WithLockText : public Driver {
  public:

@@ -6,7 +6,7 @@
 
 namespace {
 
-// Something real to own and close.
+// A real handle that can be closed.
 HANDLE OpenNothing() {
   return CreateFileW(L"NUL", GENERIC_READ | GENERIC_WRITE, 0, nullptr, OPEN_EXISTING, 0, nullptr);
 }

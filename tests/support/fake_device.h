@@ -14,7 +14,7 @@ class FakeDevice : public DeviceCalls {
  public:
   FakeDevice() { state.DCBlength = sizeof(DCB); }
 
-  // Names of the calls in order, with the arguments that matter.
+  // The names of the calls in order, with the relevant arguments.
   std::vector<std::string> calls;
 
   DWORD open_error = ERROR_SUCCESS;
@@ -32,7 +32,7 @@ class FakeDevice : public DeviceCalls {
   };
   std::vector<Opening> openings;
   std::function<void()> on_open;
-  std::deque<DWORD> open_errors;  // of the next openings, ahead of open_error
+  std::deque<DWORD> open_errors;  // of the next openings, used before open_error
 
   // Transfers: 0 completes at once; ERROR_IO_PENDING is waited for; any other fails.
   DWORD transfer_error = ERROR_SUCCESS;
@@ -41,23 +41,23 @@ class FakeDevice : public DeviceCalls {
     DWORD error;
     DWORD count;
   };
-  std::deque<TransferAnswer> transfers;  // how the next ones start, ahead of the two above
+  std::deque<TransferAnswer> transfers;  // how the next ones start, used before the two above
   struct Transfer {
     std::string call;
     HANDLE device;
     DWORD size;  // 0 for a call that has none
   };
-  std::vector<Transfer> transfer_calls;  // all calls of transfers, with the handle they were for
-  // What the wait gives (its index, WAIT_TIMEOUT, WAIT_FAILED; kDone is the transfer's own event, the
-  // last of the handles), and runs first.
+  std::vector<Transfer> transfer_calls;  // all calls of transfers, with their handles
+  // What the wait returns: an index, WAIT_TIMEOUT, WAIT_FAILED, or kDone for the transfer's own
+  // event, which is the last of the handles. `on_wait` runs first.
   static constexpr DWORD kDone = MAXIMUM_WAIT_OBJECTS;
   DWORD wait_answer = kDone;
   std::function<void(DWORD count, const HANDLE* handles)> on_wait;
   DWORD wait_timeout = 0;
   DWORD overlapped_error = ERROR_SUCCESS;  // of GetOverlappedResult without waiting
 
-  // Requests to the driver: what it answers to each code, one after the other; then a success
-  // without output. Their names in `calls` carry the code.
+  // Requests to the driver: its answers to each code, in order; after that, success without output.
+  // The names in `calls` contain the code.
   struct RequestAnswer {
     DWORD error = ERROR_SUCCESS;
     std::string output = {};
@@ -82,7 +82,8 @@ class FakeDevice : public DeviceCalls {
     DWORD errors;
     DWORD queued;
   };
-  std::deque<LineStatus> line;  // what ClearCommError says, one after the other; then all clear
+  // What ClearCommError returns, in order; after that, no errors and an empty queue.
+  std::deque<LineStatus> line;
   std::function<void()> on_clear;
   DWORD purge_flags = 0;
   DWORD event_mask = 0;

@@ -1,4 +1,5 @@
-// A copy of some bytes with an unreadable page right behind them: reading on ends the program.
+// A copy of some bytes with an unreadable page directly after them: reading beyond the end crashes
+// the program.
 #ifndef RCVLINK_TESTS_SUPPORT_GUARDED_BYTES_H_
 #define RCVLINK_TESTS_SUPPORT_GUARDED_BYTES_H_
 

@@ -16,7 +16,7 @@ class ManualClock : public Clock {
   DWORD paused = 0;  // all pauses together
 
  private:
-  ClockOverride override_{*this};  // in force while this lives
+  ClockOverride override_{*this};  // used while this lives
 };
 
 #endif  // RCVLINK_TESTS_SUPPORT_MANUAL_CLOCK_H_

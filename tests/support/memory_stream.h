@@ -1,4 +1,4 @@
-// A COM stream that keeps what is written to it, and can be told to fail.
+// A COM stream that keeps what is written to it, and fails when the test says so.
 #ifndef RCVLINK_TESTS_SUPPORT_MEMORY_STREAM_H_
 #define RCVLINK_TESTS_SUPPORT_MEMORY_STREAM_H_
 
@@ -9,7 +9,7 @@
 
 #include <objidl.h>
 
-// Lives on the stack of a test: its reference count is only counted, to be compared.
+// Lives on the stack of a test: the reference count is only compared, it frees nothing.
 class MemoryStream : public IStream {
  public:
   std::string bytes;                   // what came so far

@@ -1,4 +1,4 @@
-// Opens a report for the length of a test and gives its lines, the stamps stripped.
+// Opens a report during a test and gives its lines without stamps.
 #ifndef RCVLINK_TESTS_SUPPORT_REPORT_CAPTURE_H_
 #define RCVLINK_TESTS_SUPPORT_REPORT_CAPTURE_H_
 

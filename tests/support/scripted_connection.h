@@ -1,6 +1,6 @@
 // A connection whose other end is a script: it records every call in order and answers reads from a
 // queue. Nothing waits: a read that finds the queue empty times out at once. A Cancel ends the next
-// read; one that comes during a read comes as its bytes do, and is too late for it.
+// read; a Cancel during a read is too late for this read.
 #ifndef RCVLINK_TESTS_SUPPORT_SCRIPTED_CONNECTION_H_
 #define RCVLINK_TESTS_SUPPORT_SCRIPTED_CONNECTION_H_
 
@@ -16,7 +16,7 @@
 
 class ScriptedConnection : public CIConnection {
  public:
-  // What one Read gives. Bytes beyond what the reader asked for stay for the next Read.
+  // What one Read gives. Bytes that were not asked for stay for the next Read.
   struct Answer {
     HRESULT result = S_OK;
     std::string bytes;
@@ -28,7 +28,7 @@ class ScriptedConnection : public CIConnection {
   void GiveResult(HRESULT result) { answers_.push_back({result, {}, {}}); }
   void Give(Answer answer) { answers_.push_back(std::move(answer)); }
   void DropAnswers() { answers_.clear(); }
-  // Called with all bytes of each write; what it gives is the write's result. May call GiveRead.
+  // Called with all bytes of each write; it returns the result of the write. May call GiveRead.
   std::function<HRESULT(std::string_view)> on_write;
   std::function<HRESULT()> on_flush;
   std::function<void()> on_cancel;

@@ -18,7 +18,7 @@ HANDLE SimulatedComPort::CreateFile(const wchar_t* name, DWORD, DWORD, DWORD) {
   if (openings++ == 0) first_state_ = state;
   if (forgets) state = first_state_;
   port_.SetHostSpeed(state.BaudRate);
-  // Something real to own and close.
+  // A real handle that can be closed.
   return CreateFileW(L"NUL", GENERIC_READ | GENERIC_WRITE, 0, nullptr, OPEN_EXISTING, 0, nullptr);
 }
 
@@ -46,8 +46,7 @@ BOOL SimulatedComPort::WriteFile(
   return TRUE;
 }
 
-// A read ends when it has all it asked for, when the line was quiet for the interval, or at its
-// limit.
+// A read ends when it is complete, when the line was quiet for the interval, or at its limit.
 DWORD SimulatedComPort::WaitForMultipleObjects(DWORD count,
                                                const HANDLE* handles,
                                                DWORD timeout_ms) {

@@ -1,5 +1,6 @@
-// A COM port with a simulated receiver at its other end, in memory: the Win32 calls of a connection
-// that is as real as the discovery above it. Waits move the test's clock, and nothing sleeps.
+// A COM port in memory with a simulated receiver at its other end. It replaces the Win32 calls, so
+// the real connection and the real discovery run on it. Waits move the test's clock; nothing
+// sleeps.
 #ifndef RCVLINK_TESTS_SUPPORT_SIMULATED_COM_PORT_H_
 #define RCVLINK_TESTS_SUPPORT_SIMULATED_COM_PORT_H_
 
@@ -19,8 +20,8 @@ class SimulatedComPort : public DeviceCalls {
 
   std::wstring path = L"\\\\.\\COM7";  // no other can be opened
   DCB state{};                         // as it was set last
-  // Whether every opening begins with the state that the port had at first, as after a reset. Other
-  // ports remember what was set by whoever had them before.
+  // Whether every opening starts with the port's first state, as after a reset. Other ports keep
+  // the state of the previous opening.
   bool forgets = false;
   // Whether the line carries anything while the port is in this state; empty for always. Speeds are
   // the receiver's business.

@@ -1,4 +1,4 @@
-// A simulated receiver behind a connection, in memory: time is virtual, nothing waits.
+// A connection to a simulated receiver in memory: time is virtual, nothing waits.
 #ifndef RCVLINK_TESTS_SUPPORT_SIMULATED_CONNECTION_H_
 #define RCVLINK_TESTS_SUPPORT_SIMULATED_CONNECTION_H_
 
@@ -11,7 +11,7 @@
 
 // Behaves as a serial connection to the receiver: reads end when as many bytes came as were asked
 // for, or once the line was quiet for a while, as a COM port's do. At a speed of 0 it is one over
-// USB: reads end with whatever is there.
+// USB: reads end with the available bytes.
 class SimulatedConnection : public CIConnection {
  public:
   explicit SimulatedConnection(sim::Receiver& receiver, DWORD host_speed = 9600)

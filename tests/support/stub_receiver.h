@@ -1,4 +1,4 @@
-// A receiver without hardware for tests of the exported functions: it answers what it is told.
+// A receiver without hardware for tests of the exported functions, with answers that the test sets.
 #ifndef RCVLINK_TESTS_SUPPORT_STUB_RECEIVER_H_
 #define RCVLINK_TESTS_SUPPORT_STUB_RECEIVER_H_
 

@@ -54,7 +54,7 @@ void UsbPipes::Serve() {
   }
 }
 
-// Takes what has come and waits for the next; false when the host has closed its end.
+// Takes the received bytes and waits for more; false when the host has closed its end.
 bool UsbPipes::Advance(End& end, End& other) {
   DWORD count = 0;
   end.pending = false;

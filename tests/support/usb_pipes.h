@@ -1,5 +1,5 @@
 // A simulated receiver behind a path that is opened twice, once for each direction, as a USB device
-// is: two ends of a named pipe. They know nothing of requests to a driver.
+// is: two ends of a named pipe. They do not understand requests to a driver.
 #ifndef RCVLINK_TESTS_SUPPORT_USB_PIPES_H_
 #define RCVLINK_TESTS_SUPPORT_USB_PIPES_H_
 
@@ -14,7 +14,7 @@
 
 class UsbPipes {
  public:
-  // `receiver` must outlive the pipes, and is theirs alone until nobody has them open.
+  // `receiver` must outlive the pipes. Only they may use it while they are open.
   explicit UsbPipes(sim::Receiver& receiver);
   UsbPipes(const UsbPipes&) = delete;
   UsbPipes& operator=(const UsbPipes&) = delete;
@@ -24,7 +24,7 @@ class UsbPipes {
   void WaitUntilClosed();
 
  private:
-  // Which one the host writes to is known once something comes.
+  // The first write shows which pipe the host writes to.
   struct End {
     FileHandle pipe;
     KernelHandle event;
@@ -42,7 +42,7 @@ class UsbPipes {
   std::wstring path_;
   std::array<End, 2> ends_;
   KernelHandle stop_;
-  uint64_t now_ms_ = 0;  // moves to whatever the receiver has to say next
+  uint64_t now_ms_ = 0;  // advances to the receiver's next bytes
   std::thread thread_;
 };
 

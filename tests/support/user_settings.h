@@ -1,4 +1,4 @@
-// The current user's settings, made for the length of a test: the real ones are out of sight.
+// Temporary settings of the current user during a test; the real ones are hidden.
 #ifndef RCVLINK_TESTS_SUPPORT_USER_SETTINGS_H_
 #define RCVLINK_TESTS_SUPPORT_USER_SETTINGS_H_
 

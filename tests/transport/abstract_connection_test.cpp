@@ -14,7 +14,7 @@ namespace {
 
 using testing::ElementsAre;
 
-// The shared part of a connection, opened on a fake device.
+// The common part of all connections, opened on a fake device.
 class TestConnection : public CAbstractConnection {
  public:
   explicit TestConnection(DeviceCalls& calls) : CAbstractConnection(calls) {}
@@ -225,7 +225,7 @@ TEST_F(AbstractConnection, CancelSignalsTheAbortEventOnce) {
   EXPECT_EQ(WaitForSingleObject(connection.GetAbortEvent(), 0), WAIT_TIMEOUT);
 }
 
-TEST_F(AbstractConnection, AnOutsideAbortEventTakesThePlaceOfCancel) {
+TEST_F(AbstractConnection, AnOutsideAbortEventReplacesCancel) {
   Open();
   const HANDLE own = connection.GetAbortEvent();
   const KernelHandle outside(CreateEventW(nullptr, TRUE, FALSE, nullptr));
@@ -248,7 +248,7 @@ TEST_F(AbstractConnection, DisconnectTwiceWritesDisconnectedOnce) {
   EXPECT_EQ(lines, 1);
 }
 
-TEST_F(AbstractConnection, DisconnectForgetsACancel) {
+TEST_F(AbstractConnection, DisconnectClearsACancel) {
   Open();
   connection.Cancel();
   connection.Disconnect();

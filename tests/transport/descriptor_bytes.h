@@ -17,7 +17,7 @@ inline std::string Bytes(std::initializer_list<unsigned> values) {
   return bytes;
 }
 
-// With padding behind its nine bytes, or cut, when `length` says so.
+// With padding after its nine bytes, or cut, according to `length`.
 inline std::string InterfaceBytes(size_t endpoints, size_t length = 9) {
   std::string bytes = Bytes(
       {static_cast<unsigned>(length), 0x04, 0, 0, static_cast<unsigned>(endpoints), 0xFF, 0, 0, 0});
@@ -29,7 +29,7 @@ inline std::string EndpointBytes(uint8_t address, uint8_t attributes, uint8_t le
   return Bytes({length, 0x05, address, attributes, 0x00, 0x02, 0x00});
 }
 
-// A configuration descriptor in front of what belongs to it. The total length is the true one.
+// A configuration descriptor before its parts. The total length is right.
 inline std::string ConfigurationBytes(const std::string& rest, size_t length = 9) {
   const size_t total = length + rest.size();
   std::string bytes = Bytes({static_cast<unsigned>(length),

@@ -30,8 +30,8 @@ struct Mode {
 const std::array<Mode, 3> kModes = {{{0, "disable"}, {1, "enable"}, {2, "handshake"}}};
 constexpr int kTries = 15;
 
-// A state in which every field that a try sets is set otherwise, and the others have values that
-// can be told.
+// A state in which every field that a try sets has another value, and the other fields have values
+// that can be recognised.
 DCB StrangeState() {
   DCB state{};
   state.DCBlength = sizeof(DCB);
@@ -100,7 +100,7 @@ class SerialConnect : public testing::Test {
     return {
         "CreateFile", "SetCommMask", "SetupComm", "SetCommTimeouts", "ClearCommError", "PurgeComm"};
   }
-  // The calls of so many tries, without the probes of the last when it is not asked.
+  // The calls of a number of tries; the last one without its probes if it is not asked.
   static std::vector<std::string> CallsOf(int tries) {
     std::vector<std::string> calls;
     for (int i = 0; i < tries; ++i) {
@@ -111,7 +111,7 @@ class SerialConnect : public testing::Test {
     }
     return calls;
   }
-  // The lines of so many tries in which nothing fails, from the first on a port that was closed.
+  // The lines of a number of tries without failures, from the first one on a closed port.
   static std::vector<std::string> LinesOf(int tries) {
     std::vector<std::string> lines = {"CSerialConnection::Connect"};
     for (int i = 0; i < tries; ++i) {
@@ -161,7 +161,7 @@ TEST_F(SerialConnect, MakesItsCallsInOrder) {
   EXPECT_THAT(device.calls, ElementsAreArray(CallsOf(kTries)));
 }
 
-TEST_F(SerialConnect, TellsEachStepInOrder) {
+TEST_F(SerialConnect, TracesEachStepInOrder) {
   EXPECT_EQ(Connect(), S_FALSE);
   EXPECT_THAT(report.Lines(), ElementsAreArray(LinesOf(kTries)));
 }
@@ -235,7 +235,7 @@ TEST_F(SerialConnect, NeedsNoEvent) {
   EXPECT_TRUE(IsOpen());
 }
 
-TEST_F(SerialConnect, TellsThatItWasAskedBeforeItRefusesANullName) {
+TEST_F(SerialConnect, TracesTheCallBeforeItRefusesANullName) {
   EXPECT_EQ(connection.Connect(nullptr, nullptr, nullptr), E_INVALIDARG);
   EXPECT_THAT(report.Lines(), ElementsAre("CSerialConnection::Connect"));
   EXPECT_THAT(device.calls, IsEmpty());
@@ -265,7 +265,7 @@ TEST_P(SerialConnectAtTry, KeepsTheBlockForLaterChangesOfSpeed) {
   EXPECT_EQ(connection.SetSpeed(expected.BaudRate), S_FALSE);
   EXPECT_THAT(device.set_states, SizeIs(static_cast<size_t>(GetParam()) + 1));
 
-  // The port's own state counts no more.
+  // The port's own state is no longer used.
   device.state = {};
   EXPECT_EQ(connection.SetSpeed(4800), S_OK);
   expected.BaudRate = 4800;
@@ -327,7 +327,8 @@ TEST_F(SerialConnect, AnEventSignalledBeforeEndsItAtTheFirstTry) {
   EXPECT_THAT(report.Lines(), ElementsAreArray(LinesOf(1)));
 }
 
-// The event is looked at once a try has set the port, so the next one is set and not asked.
+// The event is checked after a try has set the port, so the next try sets the port but does not
+// ask.
 class SerialConnectAbortedAtTry : public SerialConnect, public testing::WithParamInterface<int> {};
 
 TEST_P(SerialConnectAbortedAtTry, EndsAtTheNext) {
@@ -345,7 +346,7 @@ TEST_P(SerialConnectAbortedAtTry, EndsAtTheNext) {
 
 INSTANTIATE_TEST_SUITE_P(All, SerialConnectAbortedAtTry, testing::Range(0, kTries - 1));
 
-TEST_F(SerialConnect, AReceiverThatAnsweredCountsMoreThanTheEvent) {
+TEST_F(SerialConnect, AReceiverThatAnsweredHasPriorityOverTheEvent) {
   answer_at = 4;
   on_probe = [&](int number) {
     if (number == 4) SetEvent(abort_event.get());
@@ -387,7 +388,7 @@ TEST_P(SerialConnectReopening, ThatFailsEndsItWithThePortClosed) {
 
 INSTANTIATE_TEST_SUITE_P(All, SerialConnectReopening, testing::Range(1, 5));
 
-// Other than Open, it does not even tell of a setting that fails.
+// Unlike Open, it does not trace a setting that fails.
 class SerialConnectWhereOneFails : public SerialConnect,
                                    public testing::WithParamInterface<const char*> {};
 
@@ -411,7 +412,7 @@ INSTANTIATE_TEST_SUITE_P(
     testing::Values("SetCommMask", "SetupComm", "SetCommTimeouts", "GetCommState", "SetCommState"),
     [](const auto& call) { return std::string(call.param); });
 
-// What is not the try's own is then zero.
+// The fields that a try does not set are then zero.
 TEST_F(SerialConnect, AStateThatCannotBeReadIsTakenAsEmpty) {
   device.state = StrangeState();
   device.failing_call = "GetCommState";
@@ -427,7 +428,7 @@ TEST_F(SerialConnect, AStateThatCannotBeReadIsTakenAsEmpty) {
 class SerialConnectWhereTheFlushFails : public SerialConnect,
                                         public testing::WithParamInterface<const char*> {};
 
-TEST_P(SerialConnectWhereTheFlushFails, TellsItOncePerOpeningAndGoesOn) {
+TEST_P(SerialConnectWhereTheFlushFails, TracesItOncePerOpeningAndGoesOn) {
   device.failing_call = GetParam();
   device.failure = ERROR_GEN_FAILURE;
   EXPECT_EQ(Connect(), S_FALSE);

@@ -90,7 +90,7 @@ TEST_F(SerialConnection, NullNameIsRefused) {
   EXPECT_TRUE(device.calls.empty());
 }
 
-TEST_F(SerialConnection, FailingSettingsAreReportedAndPassedOver) {
+TEST_F(SerialConnection, FailingSettingsAreReportedAndIgnored) {
   for (const char* call :
        {"SetCommMask", "SetupComm", "GetCommState", "SetCommState", "SetCommTimeouts"}) {
     device.failing_call = call;
@@ -211,7 +211,7 @@ TEST_F(SerialConnection, SetSpeedChangesTheSpeedOnly) {
   EXPECT_TRUE(report.Has("CSerialConnection::SetSpeed - changing of baudrate [9600 -> 115200]"));
 }
 
-TEST_F(SerialConnection, SetSpeedThatFailsKeepsTheNewSpeedInMind) {
+TEST_F(SerialConnection, SetSpeedThatFailsRemembersTheNewSpeed) {
   Open(9600);
   device.failing_call = "SetCommState";
   EXPECT_EQ(connection.SetSpeed(115200), HResultFromError(ERROR_INVALID_FUNCTION));
@@ -239,7 +239,7 @@ TEST_F(SerialConnection, FlushWaitsUntilTheQueueIsEmpty) {
   EXPECT_TRUE(report.Has("CSerialConnection::Flush"));
 }
 
-TEST_F(SerialConnection, FlushGivesUpAQueueThatStandsStill) {
+TEST_F(SerialConnection, FlushGivesUpWhenTheQueueDoesNotMove) {
   ManualClock clock;
   Open(9600);
   device.calls.clear();
@@ -252,7 +252,7 @@ TEST_F(SerialConnection, FlushGivesUpAQueueThatStandsStill) {
   EXPECT_GT(clock.now, 3000u);
 }
 
-TEST_F(SerialConnection, FlushHasPatienceWithAQueueThatMoves) {
+TEST_F(SerialConnection, FlushWaitsWhileTheQueueMoves) {
   ManualClock clock;
   Open(9600);
   DWORD queued = 100;
@@ -265,7 +265,7 @@ TEST_F(SerialConnection, FlushHasPatienceWithAQueueThatMoves) {
   EXPECT_FALSE(report.HasStart("CSerialConnection::Flush - output queue"));
 }
 
-TEST_F(SerialConnection, FlushThatCannotAskPurges) {
+TEST_F(SerialConnection, FlushThatCannotReadTheStatusPurges) {
   Open(9600);
   device.failing_call = "ClearCommError";
   EXPECT_EQ(connection.Flush(), S_OK);

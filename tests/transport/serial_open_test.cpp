@@ -1,4 +1,4 @@
-// What CSerialConnection::Open does, and tells, when it cannot empty the port.
+// What CSerialConnection::Open does and traces when it cannot clear the port.
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
@@ -30,7 +30,7 @@ class SerialOpenWhoseFlushFails : public testing::TestWithParam<const char*> {
   DCB settings{};
 };
 
-TEST_P(SerialOpenWhoseFlushFails, TellsItAndGoesOn) {
+TEST_P(SerialOpenWhoseFlushFails, TracesItAndGoesOn) {
   EXPECT_EQ(Open(), S_OK);
   EXPECT_THAT(
       report.Lines(),
@@ -40,7 +40,7 @@ TEST_P(SerialOpenWhoseFlushFails, TellsItAndGoesOn) {
                   "CSerialConnection::Open - OK [COM12]"));
 }
 
-TEST_P(SerialOpenWhoseFlushFails, MakesEveryCallAllTheSame) {
+TEST_P(SerialOpenWhoseFlushFails, StillMakesEveryCall) {
   Open();
   EXPECT_THAT(device.calls,
               ElementsAre("CreateFile",
@@ -70,8 +70,8 @@ INSTANTIATE_TEST_SUITE_P(Calls,
                          testing::Values("ClearCommError", "PurgeComm"),
                          [](const auto& call) { return std::string(call.param); });
 
-// Errors of the line that were there before are told and then forgotten.
-TEST(SerialOpen, TellsErrorsOfTheLineAndGoesOn) {
+// Earlier errors of the line are traced and then cleared.
+TEST(SerialOpen, TracesErrorsOfTheLineAndGoesOn) {
   const ReportCapture report;
   FakeDevice device;
   device.line = {{CE_FRAME | CE_RXPARITY, 0}};

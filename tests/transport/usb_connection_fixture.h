@@ -59,7 +59,7 @@ class UsbConnectionTest : public testing::Test {
   }
 
   HRESULT Open() { return connection->Open(kPath); }
-  // Ready for transfers, what came before forgotten.
+  // Ready for transfers, with earlier calls cleared.
   void OpenForTransfers() {
     ASSERT_EQ(Open(), S_OK);
     device.calls.clear();
@@ -74,7 +74,7 @@ class UsbConnectionTest : public testing::Test {
 
   HANDLE WriteHandle() const { return device.openings.at(0).handle; }
   HANDLE ReadHandle() const { return device.openings.at(1).handle; }
-  // Which request went out on which handle, in order.
+  // The requests with their handles, in order.
   std::vector<std::string> Requests() const {
     const std::vector<std::pair<DWORD, std::string>> names = {{kGetDescriptor, "get descriptor"},
                                                               {kSetConfiguration, "configure"},

@@ -138,7 +138,7 @@ TEST_F(UsbConnection, StaysOpenWhenOpenedWithoutAPath) {
   EXPECT_TRUE(IsOpen(ReadHandle()));
 }
 
-// What an opening passes over.
+// Failures that an opening ignores.
 TEST_F(UsbConnection, GoesOnWithoutTheHandles) {
   device.open_errors = {ERROR_FILE_NOT_FOUND, ERROR_ACCESS_DENIED};
   EXPECT_EQ(Open(), S_OK);
@@ -183,7 +183,7 @@ TEST_F(UsbConnection, GoesOnWithADeviceThatCannotBeConfigured) {
   EXPECT_EQ(device.requests.size(), 7U);
 }
 
-// What ends one. The report says nothing about it.
+// Failures that end an opening. The report has no line for them.
 class UsbConnectionFailure : public UsbConnection {
  protected:
   void ExpectEnd(HRESULT result, size_t requests) {
@@ -255,7 +255,7 @@ TEST_F(UsbConnectionFailure, ToResetTheInputIsAResult) {
   EXPECT_EQ(Requests().back(), "reset reader");
 }
 
-// Layouts: a success that leaves the pipes unbound.
+// Other layouts of the device: opening succeeds, but the pipes stay unbound.
 TEST_F(UsbConnectionFailure, OfAClassDescriptorIsNoFailure) {
   GiveDescriptors(ConfigurationBytes(InterfaceBytes(2) + Bytes({5, 0x24, 0, 0x10, 0x01}) +
                                      EndpointBytes(0x02, kBulk) + EndpointBytes(0x83, kBulk)));
@@ -275,7 +275,7 @@ TEST_F(UsbConnectionFailure, OfASingleEndpointIsNoFailure) {
 class UsbConnectionTotalLength : public UsbConnectionFailure,
                                  public testing::WithParamInterface<uint16_t> {};
 
-// The device gives all that it has, whatever it said.
+// The device sends its whole descriptor, whatever length it announced.
 TEST_P(UsbConnectionTotalLength, ThatIsWrongIsNoFailure) {
   std::string bytes = UsualDevice();
   bytes[2] = static_cast<char>(GetParam() & 0xFF);
@@ -294,7 +294,7 @@ TEST_F(UsbConnectionFailure, OfADescriptorThatComesIncompleteTheSecondTimeIsNoFa
   ExpectEnd(S_FALSE, 3);
 }
 
-TEST_F(UsbConnectionFailure, IsSaidWithoutANameWhenItIsClosed) {
+TEST_F(UsbConnectionFailure, IsTracedWithoutANameWhenItIsClosed) {
   GiveDescriptors("");
   Open();
   EXPECT_EQ(connection->Disconnect(), S_OK);
@@ -400,7 +400,7 @@ TEST_F(UsbConnection, IsClosedWhenItGoes) {
   EXPECT_FALSE(IsOpen(ReadHandle()));
 }
 
-TEST_F(UsbConnection, ForgetsACancelWhenItIsClosed) {
+TEST_F(UsbConnection, ClearsACancelWhenItIsClosed) {
   OpenForTransfers();
   connection->Cancel();
   connection->Disconnect();
@@ -489,7 +489,7 @@ TEST_F(UsbConnection, HasEventsOfTheirKinds) {
   EXPECT_THAT(manual, ElementsAre(false, true, false, false));
 }
 
-// What it is.
+// The kind of connection.
 TEST_F(UsbConnection, IsOfUsb) {
   EInstanceType type = eInstanceAny;
   EXPECT_EQ(connection->GetInstanceType(&type), S_OK);

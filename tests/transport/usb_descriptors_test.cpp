@@ -20,7 +20,7 @@ constexpr Found kDefaults = BulkEndpoints{0x01, 0x81};
 
 Found Endpoints(uint8_t out, uint8_t in) { return BulkEndpoints{out, in}; }
 
-// Behind the bytes is a page that cannot be read.
+// After the bytes is a page that cannot be read.
 Found Find(const std::string& descriptors) {
   const GuardedBytes guarded(descriptors);
   const std::string_view bytes = guarded.View();
@@ -49,7 +49,7 @@ TEST(UsbDescriptors, MayNameTheInputFirst) {
             Endpoints(0x04, 0x85));
 }
 
-TEST(UsbDescriptors, TellTheDirectionByTheTopBitAlone) {
+TEST(UsbDescriptors, HaveTheDirectionInTheTopBitAlone) {
   EXPECT_EQ(Find(DeviceBytes({EndpointBytes(0x7F, kBulk), EndpointBytes(0x80, kBulk)})),
             Endpoints(0x7F, 0x80));
   EXPECT_EQ(Find(DeviceBytes({EndpointBytes(0xFF, kBulk), EndpointBytes(0x00, kBulk)})),
@@ -67,7 +67,7 @@ TEST(UsbDescriptors, MayHaveEndpointsOfOtherKinds) {
             Endpoints(0x02, 0x86));
 }
 
-TEST(UsbDescriptors, TellTheKindByTheTwoLowestBits) {
+TEST(UsbDescriptors, HaveTheKindInTheTwoLowestBits) {
   EXPECT_EQ(Find(DeviceBytes({EndpointBytes(0x81, 0xFF),
                               EndpointBytes(0x01, 0xFD),
                               EndpointBytes(0x03, 0xFC),
@@ -89,8 +89,8 @@ TEST(UsbDescriptors, AreReadUntilBothEndpointsAreFound) {
             Endpoints(0x02, 0x83));
 }
 
-// Each bulk endpoint takes the place of the one before until the other direction has its own.
-TEST(UsbDescriptors, MayNameMoreEndpointsOfOneDirectionAhead) {
+// Each bulk endpoint replaces the previous one until both directions have one.
+TEST(UsbDescriptors, MayNameMoreEndpointsOfOneDirectionBefore) {
   EXPECT_EQ(Find(DeviceBytes({EndpointBytes(0x81, kBulk),
                               EndpointBytes(0x82, kBulk),
                               EndpointBytes(0x03, kBulk),
@@ -103,7 +103,7 @@ TEST(UsbDescriptors, MayNameMoreEndpointsOfOneDirectionAhead) {
             Endpoints(0x06, 0x87));
 }
 
-TEST(UsbDescriptors, AreNotReadBehindTheSecondEndpoint) {
+TEST(UsbDescriptors, AreNotReadAfterTheSecondEndpoint) {
   for (const uint8_t length : std::initializer_list<uint8_t>{0, 1, 6, 8, 255}) {
     EXPECT_EQ(Find(DeviceBytes({EndpointBytes(0x02, kBulk),
                                 EndpointBytes(0x83, kBulk),
@@ -130,7 +130,7 @@ TEST(UsbDescriptors, NeedTwoEndpoints) {
   EXPECT_EQ(Find(DeviceBytes({})), kNone);
 }
 
-TEST(UsbDescriptors, MayHaveAsManyEndpointsAsTheCountCanTell) {
+TEST(UsbDescriptors, MayHaveAsManyEndpointsAsTheCountCanHold) {
   std::string rest = InterfaceBytes(255);
   for (int i = 0; i < 253; ++i) rest += EndpointBytes(0x81, kInterrupt);
   rest += EndpointBytes(0x02, kBulk) + EndpointBytes(0x83, kBulk);
@@ -178,7 +178,7 @@ TEST(UsbDescriptors, OfASecondInterfaceAreOfAnotherLayout) {
   EXPECT_EQ(Find(ConfigurationBytes(one + one)), kNone);
 }
 
-TEST(UsbDescriptors, TellTheLengthsOfConfigurationAndInterface) {
+TEST(UsbDescriptors, HaveTheLengthsOfConfigurationAndInterface) {
   const std::string endpoints = EndpointBytes(0x02, kBulk) + EndpointBytes(0x83, kBulk);
   for (const size_t length : std::initializer_list<size_t>{5, 8, 9, 10, 11, 16, 255}) {
     EXPECT_EQ(Find(ConfigurationBytes(InterfaceBytes(2, length) + endpoints)),
@@ -212,7 +212,7 @@ TEST(UsbDescriptors, WithAWrongLengthOfTheConfigurationAreOfAnotherLayout) {
   }
 }
 
-// An usb_interface of no length would be its own first endpoint, though the sum is right.
+// A usb_interface of length 0 would be its own first endpoint, although the total length is right.
 TEST(UsbDescriptors, OfAnInterfaceWithoutLengthAreOfAnotherLayout) {
   const std::string usb_interface = Bytes({0, 0x04, 0x02, kBulk, 2, 0, 0});
   const std::string in = EndpointBytes(0x83, kBulk);
@@ -233,8 +233,8 @@ TEST(UsbDescriptors, ThatGoOnAreOfAnotherLayout) {
   }
 }
 
-// The usb_interface's count may be the last byte there is.
-TEST(UsbDescriptors, AreNotReadBehindTheirEnd) {
+// The usb_interface's count may be the last byte.
+TEST(UsbDescriptors, AreNotReadAfterTheirEnd) {
   for (size_t size = 1; size <= 20; ++size) {
     for (unsigned first = 0; first < 256; ++first) {
       std::string bytes(size, '\x07');
@@ -244,7 +244,7 @@ TEST(UsbDescriptors, AreNotReadBehindTheirEnd) {
   }
 }
 
-// Whatever one byte of a good descriptor becomes, nothing is read outside, and nothing is made up.
+// With any damaged byte, nothing outside the descriptor is read, and no endpoint is invented.
 TEST(UsbDescriptors, WithADamagedByteGiveNoOtherEndpointsThanTheirs) {
   const std::string good = Good();
   for (size_t at = 0; at < good.size(); ++at) {

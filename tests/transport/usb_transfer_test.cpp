@@ -152,7 +152,7 @@ class UsbFlush : public UsbTransfer {
   size_t Reads() const { return static_cast<size_t>(std::ranges::count(device.calls, "ReadFile")); }
 };
 
-TEST_F(UsbFlush, ReadsAwayByteByByteWhatIsWaiting) {
+TEST_F(UsbFlush, DiscardsWaitingBytesOneByOne) {
   device.transfers = {{0, 1}, {0, 1}, {0, 1}, {ERROR_IO_PENDING, 0}};
   device.wait_answer = WAIT_TIMEOUT;
   device.wait_timeout = 99;
@@ -188,7 +188,7 @@ TEST_F(UsbFlush, EndsWithAnEmptyRead) {
   EXPECT_EQ(Reads(), 2U);
 }
 
-TEST_F(UsbFlush, EndsWithAFailureThatIsNotIts) {
+TEST_F(UsbFlush, EndsWithAFailedReadButSucceeds) {
   device.transfers = {{0, 1}, {kDriverNotBound, 0}, {0, 1}};
   EXPECT_EQ(connection->Flush(), S_OK);
   EXPECT_EQ(Reads(), 2U);
@@ -197,7 +197,7 @@ TEST_F(UsbFlush, EndsWithAFailureThatIsNotIts) {
                           Line("CAbstractConnection::Read - read failed [3758100489] [~]")));
 }
 
-// It is meant for the wait of the command that follows, and ends that as well.
+// The cancel also ends the wait of the next command, for which it is meant.
 TEST_F(UsbFlush, EndsWithACancelAndKeepsIt) {
   device.transfers = {{0, 1}, {ERROR_IO_PENDING, 0}, {ERROR_IO_PENDING, 0}};
   device.transferred = 1;
@@ -220,7 +220,7 @@ TEST_F(UsbFlush, EndsWithACancelAndKeepsIt) {
   EXPECT_EQ(first, WAIT_OBJECT_0);
 }
 
-TEST(UsbFlushUnopened, IsSoonDone) {
+TEST(UsbFlushUnopened, EndsAtOnce) {
   const ReportCapture report;
   FakeDevice device;
   CUSBConnection connection(device);

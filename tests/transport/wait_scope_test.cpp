@@ -31,7 +31,7 @@ class WaitScopeTest : public testing::Test {
     connection.Open(L"COM7", &settings);
     device.transfer_error = ERROR_IO_PENDING;
     device.on_wait = [this](DWORD count, const HANDLE* handles) {
-      waited_for.assign(handles, handles + count - 1);  // but for the transfer's own event
+      waited_for.assign(handles, handles + count - 1);  // without the transfer's own event
     };
   }
 
@@ -63,7 +63,7 @@ TEST_F(WaitScopeTest, NothingEndsTheWaitsInAShield) {
   EXPECT_THAT(WaitedForByRead(), ElementsAre(cancel));
 }
 
-TEST_F(WaitScopeTest, TheWatchedEventEndsReadsBesideTheCancel) {
+TEST_F(WaitScopeTest, TheWatchedEventEndsReadsAsTheCancelDoes) {
   const HANDLE cancel = connection.GetAbortEvent();
   {
     const WaitScope watching = WaitScope::Watching(&connection, event.get());
@@ -77,8 +77,8 @@ TEST_F(WaitScopeTest, TheWatchedEventEndsReadsBesideTheCancel) {
   EXPECT_THAT(WaitedForByRead(), ElementsAre(cancel));
 }
 
-// Half a line would stand in front of the next command.
-TEST_F(WaitScopeTest, TheWatchedEventDoesNotCutWrites) {
+// Half a line would come before the next command.
+TEST_F(WaitScopeTest, TheWatchedEventDoesNotEndWrites) {
   const WaitScope watching = WaitScope::Watching(&connection, event.get());
   EXPECT_THAT(WaitedForByWrite(), ElementsAre(connection.GetAbortEvent()));
 }
@@ -92,14 +92,14 @@ TEST_F(WaitScopeTest, AShieldInsideKeepsWhatIsWatchedForAfterIt) {
   EXPECT_THAT(WaitedForByRead(), ElementsAre(connection.GetAbortEvent(), IsHandleOf(event.get())));
 }
 
-TEST_F(WaitScopeTest, AnOutsideAbortEventStillTakesThePlaceOfTheCancel) {
+TEST_F(WaitScopeTest, AnOutsideAbortEventStillReplacesTheCancel) {
   const KernelHandle outside = MakeEvent();
   connection.SetAbortEvent(outside.get());
   const WaitScope watching = WaitScope::Watching(&connection, event.get());
   EXPECT_THAT(WaitedForByRead(), ElementsAre(outside.get(), IsHandleOf(event.get())));
 }
 
-// Looking at an event that resets itself would clear it.
+// Testing an event that resets itself would clear it.
 TEST_F(WaitScopeTest, ASignalledEventStaysSignalled) {
   const KernelHandle own(CreateEventW(nullptr, FALSE, TRUE, nullptr));
   const WaitScope watching = WaitScope::Watching(&connection, own.get());

@@ -1,4 +1,4 @@
-// Reads and writes that really wait, on one end of a named pipe in the place of a serial port.
+// Reads and writes that really wait, on a named pipe that replaces a serial port.
 #include <gtest/gtest.h>
 
 #include <array>
@@ -18,7 +18,7 @@ namespace {
 constexpr DWORD kBufferBytes = 4096;
 constexpr DWORD kPatienceMs = 20000;  // of a test that fails
 
-// The system's own calls but for those that only a serial port understands.
+// The system's own calls, except those that only a serial port supports.
 class PipeCalls : public DeviceCalls {
  public:
   std::function<void(const HANDLE* handles)> on_wait;  // runs first
@@ -65,7 +65,7 @@ class WaitingTransfer : public testing::Test {
   }
   void SetUp() override { ASSERT_EQ(opened, S_OK); }
 
-  // Does something on another thread once the transfer waits.
+  // Executes a function on another thread when the transfer waits.
   std::thread WhenItWaits(std::function<void()> action) {
     ResetEvent(waiting.get());
     return std::thread([this, action = std::move(action)] {
@@ -105,7 +105,7 @@ TEST_F(WaitingTransfer, AnOutsideEventEndsARead) {
   EXPECT_EQ(count, 0u);
   EXPECT_EQ(calls.waits, 1);
 
-  // It has left nothing behind that takes what comes later.
+  // No pending read is left that would take later bytes.
   ResetEvent(outside.get());
   Say("later");
   EXPECT_EQ(Read(), S_OK);
@@ -161,7 +161,7 @@ TEST_F(WaitingTransfer, AnEventThatWasRemovedEndsNothing) {
   EXPECT_EQ(Received(), "data");
 }
 
-TEST_F(WaitingTransfer, AnotherEventTakesThePlaceOfTheFirst) {
+TEST_F(WaitingTransfer, AnotherEventReplacesTheFirst) {
   const KernelHandle second = NewEvent();
   connection.SetAbortEvent(outside.get());
   connection.SetAbortEvent(second.get());
@@ -177,7 +177,7 @@ TEST_F(WaitingTransfer, AnotherEventTakesThePlaceOfTheFirst) {
   sender.join();
 }
 
-// Both before the wait looks at them: the read is complete, and the abort still counts more.
+// Both happen before the wait: the read is complete, but the abort has priority.
 class WaitingTransferWithBoth : public WaitingTransfer {
  protected:
   void SayAndWaitForIt(HANDLE read_event) {
@@ -224,7 +224,7 @@ TEST_F(WaitingTransfer, CancelEndsAWriteOnlyWithoutAnOutsideEvent) {
   EXPECT_EQ(WriteMuch(), S_FALSE);
   other.join();
 
-  // The cancel was not what ended it: it is still there.
+  // The cancel did not end it: it is still set.
   connection.SetAbortEvent(nullptr);
   EXPECT_EQ(WriteMuch(), S_FALSE);
   EXPECT_EQ(calls.waits, 2);

@@ -1,4 +1,4 @@
-// The bus driver, as the program that plays a device uses it, and as it should not be used.
+// The bus driver, as the simulator of a device uses it, and with wrong requests.
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
@@ -33,7 +33,7 @@ constexpr DWORD kUnknownCode = 0x00223000;
 // A code of the host's that returns bytes through an MDL, and one through a buffer.
 constexpr DWORD kDirectCode = 0x80942006;
 constexpr DWORD kBufferedCode = 0x80942024;
-// Its output is not for the driver to write.
+// The driver must not write its output.
 constexpr DWORD kInDirectCode = 0x80942005;
 constexpr uint32_t kRefused = 0xC0000001;
 
@@ -114,7 +114,7 @@ class UsbBus : public testing::Test {
   File bus = OpenBus();
 };
 
-TEST_F(UsbBus, TellsOfRequests) {
+TEST_F(UsbBus, ReportsRequests) {
   PlugIn();
   const File host = OpenDevice();
   Pending control = host.StartControl(kBufferedCode, {1, 2, 3}, 20);
@@ -202,7 +202,7 @@ TEST_F(UsbBus, RefusesActionsThatAreCutOff) {
   EXPECT_EQ(Act(whole), kDone);
 }
 
-TEST_F(UsbBus, PassesOverAnswersToCancelledRequests) {
+TEST_F(UsbBus, IgnoresAnswersToCancelledRequests) {
   PlugIn();
   const File host = OpenDevice();
   Pending read = host.StartRead(4);
@@ -212,7 +212,7 @@ TEST_F(UsbBus, PassesOverAnswersToCancelledRequests) {
   EXPECT_EQ(Act(Actions({{Answer(id, 0, 4), "abcd"}, {Answer(12345, 0), ""}})), kDone);
 }
 
-TEST_F(UsbBus, DoesNotTellOfRequestsThatWereCancelledBefore) {
+TEST_F(UsbBus, DoesNotReportRequestsThatWereCancelledBefore) {
   PlugIn();
   const File host = OpenDevice();
   Pending read = host.StartRead(4);
@@ -222,7 +222,7 @@ TEST_F(UsbBus, DoesNotTellOfRequestsThatWereCancelledBefore) {
   EXPECT_EQ(Next().request.kind, RequestKind::kWrite);
 }
 
-TEST_F(UsbBus, TellsOfAHandleThatIsClosed) {
+TEST_F(UsbBus, ReportsAHandleThatIsClosed) {
   PlugIn();
   File host = OpenDevice();
   Pending write = host.StartWrite("x");
@@ -246,7 +246,7 @@ TEST_F(UsbBus, EndsRequestsOfAHandleThatIsClosed) {
   EXPECT_TRUE(untold.Ended());
 }
 
-// Reads get transfers from when the program says so until it takes that back.
+// Reads get transfers only while the program allows it.
 TEST_F(UsbBus, SendsToReads) {
   PlugIn();
   const File host = OpenDevice();
@@ -268,7 +268,7 @@ TEST_F(UsbBus, SendsToReads) {
   EXPECT_EQ(Next().request.kind, RequestKind::kRead);
 }
 
-TEST_F(UsbBus, HasOneCallThatWaits) {
+TEST_F(UsbBus, AllowsOneWaitingCall) {
   PlugIn();
   Pending first = StartWait();
   EXPECT_EQ(StartWait().Finish().error, kWrongState);
@@ -279,13 +279,13 @@ TEST_F(UsbBus, HasOneCallThatWaits) {
   EXPECT_FALSE(again.Ended());
 }
 
-TEST_F(UsbBus, WantsRoomForTheLargestRequest) {
+TEST_F(UsbBus, NeedsRoomForTheLargestRequest) {
   PlugIn();
   EXPECT_EQ(bus.Control(usb_bus::kActAndWait, {}, usb_bus::kRequestBufferSize - 1).error,
             DWORD{ERROR_INSUFFICIENT_BUFFER});
 }
 
-TEST_F(UsbBus, TakesOnlyNames) {
+TEST_F(UsbBus, AcceptsOnlyNames) {
   const Bytes good = BytesOf(name);
   const Bytes odd(good.begin(), good.end() - 1);
   EXPECT_EQ(bus.Control(usb_bus::kPlugIn, odd).error, kInvalid);
@@ -300,7 +300,7 @@ TEST_F(UsbBus, TakesOnlyNames) {
   PlugIn();
 }
 
-TEST_F(UsbBus, TakesTheLongestName) {
+TEST_F(UsbBus, AcceptsTheLongestName) {
   const std::wstring longest = name + std::wstring(usb_bus::kMaxNameLength - name.size(), L'x');
   EXPECT_EQ(bus.Control(usb_bus::kPlugIn, BytesOf(longest)).error, kDone);
   EXPECT_TRUE(File(L"\\\\.\\" + longest, GENERIC_READ).open());
@@ -319,7 +319,7 @@ TEST_F(UsbBus, PlugsInOneDevicePerHandle) {
   EXPECT_EQ(bus.Control(usb_bus::kPlugIn, BytesOf(DeviceName())).error, kWrongState);
 }
 
-TEST_F(UsbBus, IsOfNoUseWithoutADevice) {
+TEST_F(UsbBus, FailsWithoutADevice) {
   EXPECT_EQ(Act({}), kWrongState);
   EXPECT_EQ(StartWait().Finish().error, kWrongState);
   EXPECT_EQ(bus.Control(usb_bus::kUnplug).error, kWrongState);
@@ -351,7 +351,7 @@ TEST_F(UsbBus, EndsTheWaitWhenTheDeviceIsUnplugged) {
   EXPECT_EQ(waiting.Finish().error, kGone);
 }
 
-// The driver uses its device objects again, but not while a handle of an unplugged device is open.
+// The driver reuses its device objects, but not while a handle of an unplugged device is open.
 TEST_F(UsbBus, KeepsOldHandlesFromNewDevices) {
   constexpr int kNewDevices = 50;
   PlugIn();

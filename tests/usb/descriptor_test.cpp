@@ -75,7 +75,7 @@ TEST_F(UsbDescriptor, IsCutToTheRoom) {
               HasSubstr("- descriptor 9\n- descriptor 1\n- descriptor 32\n- descriptor 32\n"));
 }
 
-TEST_F(UsbDescriptor, IsAskedForRightly) {
+TEST_F(UsbDescriptor, RefusesWrongRequests) {
   Plug();
   const Bytes right = DescriptorRequest();
   Bytes long_request = right;
@@ -130,7 +130,7 @@ TEST_F(UsbDescriptor, HasLongEndpoints) {
                     {9, 5, 0x02, 2, 64, 0, 0, 0, 0}}));
 }
 
-TEST_F(UsbDescriptor, TellsEndpointsThatHaveNoLength) {
+TEST_F(UsbDescriptor, MayHaveEndpointsWithoutLength) {
   Plug({"--endpoint-length", "0"});
   EXPECT_EQ(Descriptor(),
             Joined({kConfigurationPart,
@@ -139,7 +139,7 @@ TEST_F(UsbDescriptor, TellsEndpointsThatHaveNoLength) {
                     {0, 5, 0x02, 2, 64, 0, 0}}));
 }
 
-TEST_F(UsbDescriptor, LiesAboutItsLength) {
+TEST_F(UsbDescriptor, MayHaveAWrongTotalLength) {
   Plug({"--total-length", "770"});
   EXPECT_EQ(Descriptor(),
             Joined({{9, 2, 2, 3, 1, 1, 0, 0x80, 50}, kInterfacePart, kInPart, kOutPart}));
@@ -188,7 +188,7 @@ TEST_F(UsbDescriptor, IsConfiguredFromTheStart) {
   EXPECT_EQ(file_->Bind(0x81), kDone);
 }
 
-TEST_F(UsbDescriptor, IsConfiguredRightly) {
+TEST_F(UsbDescriptor, RefusesWrongConfigurations) {
   Plug();
   const Bytes right = Configuration();
   Bytes long_input = right;

@@ -96,7 +96,7 @@ TEST_F(UsbPipe, IsFreeWhenItsHandleIsClosed) {
             "= bind 0x81\n= bind 0x02\n= close 0x81\n= close 0x02\n= bind 0x81\n= bind 0x02\n");
 }
 
-TEST_F(UsbPipe, TellsOfHandlesThatWereNotBound) {
+TEST_F(UsbPipe, ReportsHandlesThatWereNotBound) {
   Plug();
   reader_.reset();
   usb_->WaitForTranscript("= close\n");
@@ -153,7 +153,7 @@ TEST_F(UsbPipe, GoesOneWay) {
   EXPECT_EQ(writer_->Write("x").error, DWORD{ERROR_INVALID_FUNCTION});
 }
 
-TEST_F(UsbPipe, KnowsNoOtherRequests) {
+TEST_F(UsbPipe, RefusesOtherRequests) {
   Plug();
   constexpr DWORD kUnknown = 0x80942200;
   constexpr DWORD kMethods = 4;
@@ -161,13 +161,13 @@ TEST_F(UsbPipe, KnowsNoOtherRequests) {
     const auto result = reader_->Control(kUnknown + method, Bytes(10), 10);
     EXPECT_EQ(result.error, DWORD{ERROR_INVALID_FUNCTION}) << method;
   }
-  // Of the last one, whose buffers are the caller's memory, the driver does not even tell.
+  // The driver does not even report the last one, whose buffers are the caller's memory.
   EXPECT_EQ(usb_->Transcript(),
             "- refused request 0x80942200\n- refused request 0x80942201\n"
             "- refused request 0x80942202\n");
 }
 
-// The receiver is on the first bulk endpoints; an interrupt endpoint never has anything to say.
+// The receiver is on the first bulk endpoints; an interrupt endpoint never sends anything.
 TEST_F(UsbPipe, CanBeOneThatIsSilent) {
   Plug({"--endpoints", "0x84:interrupt,0x02,0x83"});
   const File silent(usb_->device(), GENERIC_READ);

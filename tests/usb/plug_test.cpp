@@ -95,7 +95,7 @@ TEST(UsbPlug, IsPluggedInAgain) {
   EXPECT_THAT(usb.Transcript(), testing::Not(HasSubstr("close")));
 }
 
-// The driver uses the system's objects again.
+// The driver reuses the system's objects.
 TEST(UsbPlug, IsPluggedInManyTimes) {
   bed::SimulatedUsb usb({"quorin"});
   for (int round = 0; round < 5; ++round) {
@@ -123,7 +123,7 @@ TEST(UsbPlug, HasNeighbours) {
   EXPECT_THAT(read.Finish().text(), HasSubstr("/dev/two"));
 }
 
-TEST(UsbPlug, TellsWhyItDoesNotStart) {
+TEST(UsbPlug, SaysWhyItDoesNotStart) {
   try {
     const bed::SimulatedUsb usb({"no-such-family"});
     FAIL() << "it has started";
@@ -148,7 +148,7 @@ TEST(UsbPlug, RefusesSwitchesThatDoNotFit) {
 constexpr time_t kModified = 1714566600;
 constexpr ULONGLONG kModifiedFileTime = 133590402000000000;
 
-// A receiver tells seconds since 1988, local time.
+// A receiver sends seconds since 1988, in local time.
 std::string ModifiedText() {
   tm start{};
   start.tm_year = 88;

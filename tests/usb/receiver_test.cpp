@@ -70,7 +70,7 @@ TEST(UsbReceiver, AnswersACommand) {
               HasSubstr("> %1%print,/par/rcvid\\r\\n\n< RE00A%1%USB0042\\r\\n\n"));
 }
 
-TEST(UsbReceiver, CallsItsPortUsb) {
+TEST(UsbReceiver, NamesItsPortUsb) {
   const bed::SimulatedUsb usb({"quorin"});
   const Connected host(usb.device());
   Say(host, "%1%print,/cur/term\r\n");
@@ -123,7 +123,7 @@ TEST(UsbReceiver, AnswersLate) {
   EXPECT_GE(GetTickCount64() - start, ULONGLONG{45});
 }
 
-// The block is answered, and that write still goes well.
+// The block is answered, and that write still succeeds.
 TEST(UsbReceiver, VanishesInTheMiddleOfAFile) {
   const bed::SimulatedUsb usb({"quorin", "--vanish-after", "1"}, {{"A0101.log", Content(5000)}});
   const Connected host(usb.device());

@@ -50,21 +50,21 @@ class UsbTransfer : public testing::Test {
   std::optional<Connected> host_;
 };
 
-TEST_F(UsbTransfer, TellsHowManyBytesWereWritten) {
+TEST_F(UsbTransfer, ReturnsHowManyBytesWereWritten) {
   Plug();
   const Result result = host_->writer.Write(kPing);
   EXPECT_EQ(result.error, kDone);
   EXPECT_EQ(result.bytes.size(), 5U);
 }
 
-// What a write does has been done when it has ended.
+// When a write has ended, its effect is complete.
 TEST_F(UsbTransfer, IsInTheTranscriptAtOnce) {
   Plug();
   Ping();
   EXPECT_THAT(usb_->Transcript(), HasSubstr("> %1%\\r\\n\n"));
 }
 
-TEST_F(UsbTransfer, GivesAReadWhatIsThere) {
+TEST_F(UsbTransfer, GivesAReadTheAvailableBytes) {
   Plug();
   Ping();
   EXPECT_EQ(Read().text(), kReply);
@@ -85,7 +85,7 @@ TEST_F(UsbTransfer, DoesNotJoinMessages) {
   EXPECT_EQ(Lengths(2 * kReplyLength), (std::vector<size_t>{10, 10}));
 }
 
-TEST_F(UsbTransfer, IsCutAsTold) {
+TEST_F(UsbTransfer, IsCutToTheGivenSize) {
   Plug({"--transfer", "4"});
   Ping();
   EXPECT_EQ(Lengths(kReplyLength), (std::vector<size_t>{4, 4, 2}));
@@ -97,7 +97,7 @@ TEST_F(UsbTransfer, IsCutAndReadInSmallerParts) {
   EXPECT_EQ(Lengths(kReplyLength, 3), (std::vector<size_t>{3, 1, 3, 1, 2}));
 }
 
-TEST_F(UsbTransfer, HoldsAtMost512BytesUnlessTold) {
+TEST_F(UsbTransfer, HoldsAtMost512BytesByDefault) {
   Plug({"--garbage", "600"});
   Ping();
   EXPECT_EQ(Lengths(600 + kReplyLength), (std::vector<size_t>{512, 88, 10}));
@@ -155,7 +155,7 @@ TEST_F(UsbTransfer, EndsWhenTheHandleIsUnbound) {
   EXPECT_EQ(read.Finish().error, kAborted);
 }
 
-TEST_F(UsbTransfer, KeepsWhatNobodyHasRead) {
+TEST_F(UsbTransfer, KeepsBytesThatWereNotRead) {
   Plug();
   Ping();
   EXPECT_EQ(host_->reader.Unbind(), kDone);
@@ -164,7 +164,7 @@ TEST_F(UsbTransfer, KeepsWhatNobodyHasRead) {
   EXPECT_EQ(Read().text(), kReply);
 }
 
-TEST_F(UsbTransfer, TakesAWriteApart) {
+TEST_F(UsbTransfer, AcceptsACommandInTwoWrites) {
   Plug();
   EXPECT_EQ(host_->writer.Write("%1%").error, kDone);
   EXPECT_EQ(host_->writer.Write("\r\n").error, kDone);

@@ -38,22 +38,22 @@ class Pending {
   Pending(HANDLE file, size_t room);
   Pending(Pending&&) = default;
   Pending& operator=(Pending&&) = delete;
-  // Takes it back.
+  // Cancels it.
   ~Pending();
 
-  // Waits for the end; a read that nothing ends fails the test after a while.
+  // Waits for the end. A read that does not end fails the test after a while.
   Result Finish();
   bool Ended() const;
 
-  // The request itself is made by these.
+  // These make the request itself.
   OVERLAPPED* overlapped() { return &state_->overlapped; }
   uint8_t* buffer() { return state_->buffer.data(); }
   DWORD room() const { return static_cast<DWORD>(state_->buffer.size()); }
-  // `result` is what the function that makes the request gave.
+  // `result` is what the function that makes the request returned.
   void Made(BOOL result);
 
  private:
-  // Where it is must not change while the request is on its way.
+  // Must not move while the request is pending.
   struct State {
     OVERLAPPED overlapped{};
     Bytes buffer;
@@ -68,7 +68,7 @@ class Pending {
 // A handle of a device, opened as hosts do.
 class File {
  public:
-  // It is not open when that fails.
+  // It stays closed when that fails.
   File(const std::wstring& path, DWORD access);
 
   bool open() const { return handle_.get() != INVALID_HANDLE_VALUE; }

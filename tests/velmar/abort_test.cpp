@@ -43,7 +43,7 @@ struct Bench {
   }
 
   HRESULT Download() { return driver.DownloadFile(kName, &stream, nullptr); }
-  // Host and receiver are where they were, and understand each other.
+  // Host and receiver are at the old speed and understand each other.
   void ExpectLinkAtOldSpeed() {
     EXPECT_EQ(receiver.speed(), kSpeed);
     EXPECT_EQ(connection->Speed(), kSpeed);
@@ -70,7 +70,7 @@ class VelmarDownloadAbort
     return options;
   }
 
-  // How many calls a download has when nothing comes between.
+  // How many calls an undisturbed download makes.
   size_t CountCalls() const {
     Bench bench(HowWritesAreCancelled(), Options());
     EXPECT_EQ(bench.Download(), S_OK);
@@ -78,7 +78,7 @@ class VelmarDownloadAbort
     bench.ExpectLinkAtOldSpeed();
     return bench.connection->calls;
   }
-  // Downloads with an abort at this call, then whatever the test wants; until one fails.
+  // Downloads with an abort at this call, then executes the rest of the test; until one fails.
   template <typename Check>
   void AbortAtEachCall(Check check) const {
     const size_t calls = CountCalls();
@@ -103,7 +103,7 @@ TEST_P(VelmarDownloadAbort, LeavesBothEndsAtTheOldSpeed) {
   });
 }
 
-// The flag is left to the first operation that looks for it; that one still sends its command.
+// The flag stays set for the first operation that checks it; this one still sends its command.
 TEST_P(VelmarDownloadAbort, EndsTheNextDeletionAfterItsCommand) {
   AbortAtEachCall([](Bench& bench, HRESULT) {
     EXPECT_EQ(bench.driver.DeleteFile(L"other.pdc"), S_FALSE);
@@ -112,7 +112,7 @@ TEST_P(VelmarDownloadAbort, EndsTheNextDeletionAfterItsCommand) {
   });
 }
 
-// A download does not look for the flag, and the cancel was its predecessor's.
+// A download does not check the flag, and the cancel ended the previous one.
 TEST_P(VelmarDownloadAbort, DoesNotDisturbTheNextDownload) {
   AbortAtEachCall([](Bench& bench, HRESULT) {
     bench.stream.bytes.clear();
@@ -130,14 +130,14 @@ TEST_P(VelmarDownloadAbort, DoesNotDisturbACheck) {
   });
 }
 
-// Until the receiver is told of the new speed, an abort ends the download: at 9600 bit/s it would
-// take minutes.
-TEST_P(VelmarDownloadAbort, BringsNothingOnceFoundAheadOfTheTransfer) {
+// An abort ends the download until the receiver is sent the new speed: at 9600 bit/s it would take
+// minutes.
+TEST_P(VelmarDownloadAbort, DownloadsNothingWhenFoundBeforeTheTransfer) {
   AbortAtEachCall([](Bench& bench, HRESULT) {
     if (bench.log.str().find("> log filetransferb") == std::string::npos) {
       EXPECT_TRUE(bench.stream.bytes.empty());
     }
-    // Aborted ahead of the speed-up, it has not even asked for the file.
+    // Aborted before the speed-up, it has not even requested the file.
     if (bench.log.str().find("> COM 115200") == std::string::npos) {
       EXPECT_EQ(bench.log.str().find("> currentfile"), std::string::npos);
     }
@@ -152,8 +152,7 @@ INSTANTIATE_TEST_SUITE_P(All,
                                           testing::Bool(),
                                           testing::Bool()));
 
-// A receiver that went silent may go on when nobody expects it: it is stopped ahead of the
-// put-back.
+// A receiver that stopped sending may go on later: it is stopped before the speed is put back.
 TEST(VelmarBrokenDownload, StopsAReceiverThatWentSilent) {
   sim::VelmarOptions options;
   options.faults.chunks = {{sim::VelmarChunkFaultKind::kSilence, /*chunk=*/1, /*times=*/1, 45000}};
@@ -166,7 +165,7 @@ TEST(VelmarBrokenDownload, StopsAReceiverThatWentSilent) {
 
 class VelmarAbortBetweenOperations : public testing::TestWithParam<CancelledWrite> {};
 
-// Each that looks for the flag sends its command all the same, and ends with S_FALSE then.
+// Each operation that checks the flag still sends its command, and then ends with S_FALSE.
 TEST_P(VelmarAbortBetweenOperations, EndsTheNextAfterItsCommand) {
   Bench bench(GetParam());
   CVelmarProtocol& driver = bench.driver;

@@ -131,7 +131,7 @@ std::string Directory(int files) {
   return reply;
 }
 
-// Runs a command once for each place at which its reply may be cut in two.
+// Executes a command for each place at which its reply can be cut in two.
 template <typename Command, typename Check>
 void AtEverySplit(const std::string& reply, Check check) {
   for (size_t cut = 1; cut < reply.size(); ++cut) {
@@ -142,7 +142,7 @@ void AtEverySplit(const std::string& reply, Check check) {
     Command command;
     EXPECT_EQ(command.Execute(&connection, nullptr), S_OK);
     check(command);
-    // What was held when the second part came stands in the kept reply once more.
+    // The kept reply repeats the bytes that were held when the second part came.
     const std::string kept(command.GetReply(), command.GetReply() + command.GetReplyLength());
     const bool both = connection.AnswersLeft() == 0;
     EXPECT_EQ(kept, both ? reply.substr(0, cut) + reply : reply.substr(0, cut));
@@ -200,14 +200,14 @@ TEST_F(VelmarExchange, AVersionWithoutComponentsIsCompleteAndEmpty) {
   CGetReceiverInfoCmd command;
   EXPECT_EQ(Run(command, {Version("0")}), S_OK);
   EXPECT_EQ(command.Response(), RESPONSE_DATA);
-  EXPECT_EQ(connection.calls.size(), 3u);  // nothing more is waited for
+  EXPECT_EQ(connection.calls.size(), 3u);  // it does not wait for more
   EXPECT_EQ(command.Version().model, L"");
   EXPECT_EQ(command.Version().serial_number, L"");
   EXPECT_EQ(command.Version().hardware_version, L"");
   EXPECT_EQ(command.Version().software_version, L"");
 }
 
-// The type says data as soon as any has come; that it is not whole shows in the fields alone.
+// The type is data as soon as some has arrived; only the fields show that it is incomplete.
 TEST_F(VelmarExchange, ALogThatStaysIncompleteEndsWithTheTimeOut) {
   const auto run = [&](CVelmarCommand& command, const std::string& reply) {
     connection.calls.clear();
@@ -235,7 +235,7 @@ TEST_F(VelmarExchange, ALogThatStaysIncompleteEndsWithTheTimeOut) {
   EXPECT_EQ(config.Config().port_name, L"");
 }
 
-TEST_F(VelmarExchange, ADirectoryTellsALogThatIsCutOffFromOneThatIsNotTheLast) {
+TEST_F(VelmarExchange, ADirectoryDistinguishesALogThatIsCutOffFromOneThatIsNotTheLast) {
   CGetFileListCmd command;
   const std::string log = AsciiLog("DIRENTA", "a,1,0,1,1", 1);
   const auto parse = [&](const std::string& text) {
@@ -272,8 +272,8 @@ TEST_F(VelmarExchange, StrayBytesEndTheWaitForALog) {
   EXPECT_EQ(connection.calls.size(), 3u);
 }
 
-// A log behind a line end is not looked for, however long it is waited.
-TEST_F(VelmarExchange, ALogBehindALineEndIsNotSeen) {
+// A log after a line end is not found, however long the command waits.
+TEST_F(VelmarExchange, ALogAfterALineEndIsIgnored) {
   CGetReceiverInfoCmd command;
   const std::string log = AsciiLog("VERSIONA", kVersionBody);
   EXPECT_EQ(Run(command, {kOkPrompt + "\r\n", log}), S_OK);
@@ -327,7 +327,7 @@ TEST_F(VelmarExchange, AGapInTheDirectoryIsAnError) {
   EXPECT_EQ(command.Entries().size(), 2u);
 }
 
-// A directory that is larger than the receive buffer ends with what fitted in, whatever the reads.
+// A directory that is larger than the receive buffer ends with what fits into it.
 TEST_F(VelmarExchange, ADirectoryLargerThanTheBufferIsCut) {
   constexpr size_t kBuffer = 8192;
   const std::string reply = Directory(200);
@@ -404,7 +404,7 @@ TEST_F(VelmarExchange, TheCurrentFileIsNotSetBeforeThePromptHasEnded) {
   }
 }
 
-// Of a command that reads a log behind its acknowledgement and is not done with it.
+// For a command that reads a log after its acknowledgement and needs more.
 TEST_F(VelmarExchange, TheCurrentFileIsSetOnceDataHasCome) {
   struct WithData : CSetCurrentFileCmd {
     using CSetCurrentFileCmd::CSetCurrentFileCmd;
@@ -459,7 +459,7 @@ TEST_F(FileTransfer, ChunksArriveInOrderWhateverThePieces) {
     EXPECT_EQ(read.Execute(&pieces, nullptr), S_OK);
     EXPECT_EQ(read.Response(), RESPONSE_DATA);
     EXPECT_THAT(got.chunks, ElementsAre(std::string(1024, 'a'), std::string(1024, 'b'), "the end"));
-    EXPECT_EQ(read.GetReplyLength(), 0u);  // a streamed reply is not kept
+    EXPECT_EQ(read.GetReplyLength(), 0u);  // a streamed reply is not stored
   }
 }
 
@@ -476,7 +476,7 @@ TEST_F(FileTransfer, MessageLengthsOutsideTheirRangeMeanAFullChunk) {
   }
 }
 
-TEST_F(FileTransfer, MessageLengthsInTheirRangeTellTheChunk) {
+TEST_F(FileTransfer, MessageLengthsInTheirRangeGiveTheChunk) {
   for (const int length : {8, 9, 1031, 1032}) {
     ScriptedConnection once;
     once.GiveRead(kOkPrompt + BinaryLog{std::string(3000, 'x'), 0, length}.Bytes());
@@ -489,8 +489,8 @@ TEST_F(FileTransfer, MessageLengthsInTheirRangeTellTheChunk) {
   }
 }
 
-// Whatever the lengths claim, the exchange ends and nothing outside the buffer is touched.
-TEST_F(FileTransfer, LyingLengthsEnd) {
+// Whatever the lengths are, the exchange ends and nothing outside the buffer is used.
+TEST_F(FileTransfer, WrongLengthsEndTheTransfer) {
   for (const uint8_t header : std::vector<uint8_t>{0, 1, 28, 255}) {
     for (const int length : {0, 8, 1032, 9000, 65535}) {
       for (const uint16_t sequence : std::vector<uint16_t>{0, 1, 65535}) {
@@ -539,9 +539,9 @@ TEST_F(FileTransfer, AFileManyTimesTheBufferPassesThrough) {
   EXPECT_TRUE(chunks.chunks == expected);
 }
 
-// Only the first of the three sync bytes is looked at, and that only ahead of the first chunk; the
-// checksum never.
-TEST_F(FileTransfer, SyncBytesAndChecksumsAreNotLookedAt) {
+// Only the first of the three sync bytes is checked, and only before the first chunk; the checksum
+// never.
+TEST_F(FileTransfer, SyncBytesAndChecksumsAreNotChecked) {
   std::string first = BinaryLog{"one..", 2}.Bytes();
   first[1] = 'x';
   first[2] = 'y';
@@ -552,7 +552,7 @@ TEST_F(FileTransfer, SyncBytesAndChecksumsAreNotLookedAt) {
   EXPECT_THAT(chunks.chunks, ElementsAre("one..", "two..", "three"));
 }
 
-TEST_F(FileTransfer, OtherBytesThanALogBehindThePromptEndIt) {
+TEST_F(FileTransfer, OtherBytesThanALogAfterThePromptEndIt) {
   EXPECT_EQ(Transfer({kOkPrompt + "x" + BinaryLog{"chunk", 0}.Bytes()}), S_OK);
   EXPECT_EQ(command.Response(), RESPONSE_UNKNOWN);
   EXPECT_TRUE(chunks.chunks.empty());
@@ -565,8 +565,8 @@ TEST_F(FileTransfer, ARefusalEndsIt) {
   EXPECT_TRUE(chunks.chunks.empty());
 }
 
-// The whole of a log goes by its own lengths, whatever was taken of it.
-TEST_F(FileTransfer, LongMessagesAreCutAndPassedOver) {
+// A log is consumed by its own lengths, whatever was used of it.
+TEST_F(FileTransfer, LongMessagesAreCutAndSkipped) {
   const std::string longer(1992, 'a');
   EXPECT_EQ(Transfer({kOkPrompt + BinaryLog{longer, 1}.Bytes() + BinaryLog{"the end", 0}.Bytes()}),
             S_OK);
@@ -581,7 +581,7 @@ TEST_F(FileTransfer, AMessageLargerThanTheBufferEndsIt) {
   EXPECT_GT(connection.AnswersLeft(), 0u);
 }
 
-// The header's own length counts for where the next log begins, not for where the body does.
+// The length of the header decides where the next log begins, not where the body begins.
 TEST_F(FileTransfer, LongHeadersMoveTheNextLogOnly) {
   const std::string log = BinaryLog{"first chunk", 1, -1, 32}.Bytes() + "four";
   EXPECT_EQ(Transfer({kOkPrompt + log + BinaryLog{"the end", 0}.Bytes()}), S_OK);
@@ -589,14 +589,14 @@ TEST_F(FileTransfer, LongHeadersMoveTheNextLogOnly) {
   EXPECT_THAT(chunks.chunks, ElementsAre("first chunk", "the end"));
 }
 
-// A chunk without bytes is handed on when there are enough behind it to be looked at.
+// An empty chunk is delivered when enough bytes have arrived after it.
 TEST_F(FileTransfer, AChunkMayBeEmpty) {
   EXPECT_EQ(Transfer({kOkPrompt + BinaryLog{"", 1}.Bytes() + BinaryLog{"data", 0}.Bytes()}), S_OK);
   EXPECT_EQ(command.Response(), RESPONSE_DATA);
   EXPECT_THAT(chunks.chunks, ElementsAre("", "data"));
 }
 
-// Nothing behind the bytes that have come is read, whatever the lengths say.
+// Nothing after the received bytes is read, whatever the lengths say.
 TEST_F(FileTransfer, NothingIsReadBeyondWhatCame) {
   for (const uint8_t header : std::vector<uint8_t>{0, 28, 255}) {
     for (const int length : {0, 7, 8, 50, 1032, 1033}) {
@@ -609,7 +609,8 @@ TEST_F(FileTransfer, NothingIsReadBeyondWhatCame) {
         uint32_t consumed = 0;
         const HRESULT result = read.ParseBinaryLog(
             guarded.View().data(), static_cast<uint32_t>(size), &done, &consumed);
-        // The log as long as it says, and 36 bytes with a body of 8 and of the chunk behind them.
+        // The log with the length that it says, and 36 bytes with a body of 8 bytes and the chunk
+        // after them.
         const size_t needed = std::max<size_t>(static_cast<size_t>(length) + 4 + header,
                                                36 + static_cast<size_t>(std::max(8, usual)));
         ASSERT_EQ(result, size < needed ? S_FALSE : S_OK) << header << " " << length << " " << size;
@@ -641,16 +642,16 @@ TEST_F(FileTransfer, WithoutACallbackTheLastChunkStays) {
   EXPECT_EQ(std::string(read.GetData(), read.GetData() + read.GetDataSize()), "efghi");
 }
 
-// With its checksum such a chunk is shorter than the 8 bytes that are waited for.
-TEST_F(FileTransfer, ALastChunkOfLessThanFourBytesIsWaitedForInVain) {
+// With its checksum such a chunk is shorter than the 8 bytes that the parser needs.
+TEST_F(FileTransfer, ALastChunkOfLessThanFourBytesIsNotDelivered) {
   EXPECT_EQ(Transfer({kOkPrompt + BinaryLog{"data", 1}.Bytes() + BinaryLog{"abc", 0}.Bytes()}),
             S_OK);
   EXPECT_EQ(command.Response(), RESPONSE_OK);
   EXPECT_THAT(chunks.chunks, ElementsAre("data"));
 }
 
-// Success of any kind goes on.
-TEST_F(FileTransfer, AHostThatIsContentGoesOn) {
+// Any success code goes on.
+TEST_F(FileTransfer, AHostResultThatIsNoFailureGoesOn) {
   struct Content : Chunks {
     HRESULT OnDataReceived(void* context) override {
       Chunks::OnDataReceived(context);
@@ -665,7 +666,7 @@ TEST_F(FileTransfer, AHostThatIsContentGoesOn) {
   EXPECT_THAT(content.chunks, ElementsAre("data", "more"));
 }
 
-TEST_F(FileTransfer, ALogThatWasNotAcknowledgedIsNone) {
+TEST_F(FileTransfer, ALogThatWasNotAcknowledgedIsIgnored) {
   EXPECT_EQ(Transfer({BinaryLog{"data", 0}.Bytes()}), S_OK);
   EXPECT_EQ(command.Response(), RESPONSE_UNKNOWN);
   EXPECT_TRUE(chunks.chunks.empty());

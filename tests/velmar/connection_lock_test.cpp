@@ -75,7 +75,7 @@ TEST_F(VelmarConnectionLock, AWaitForItEndsWithItsRelease) {
   EXPECT_EQ(result, S_OK);
 }
 
-// Whether it waits already or is about to, when the event comes.
+// Whether it already waits or is about to when the event comes.
 TEST_F(VelmarConnectionLock, ACheckThatWaitsForItEndsWithTheEvent) {
   driver.LockConnection(nullptr);
   short answer = 99;
@@ -86,7 +86,7 @@ TEST_F(VelmarConnectionLock, ACheckThatWaitsForItEndsWithTheEvent) {
   EXPECT_EQ(result, S_FALSE);
   EXPECT_EQ(answer, 99);
   EXPECT_THAT(connection->calls, IsEmpty());
-  EXPECT_EQ(driver.UnlockConnection(), 1);  // the check has not released it
+  EXPECT_EQ(driver.UnlockConnection(), 1);  // the check did not release it
   EXPECT_EQ(driver.UnlockConnection(), 0);
 }
 
@@ -105,7 +105,7 @@ TEST_F(VelmarConnectionLock, AnInquiryThatWaitsForItEndsWithTheEvent) {
   EXPECT_EQ(info.bstrModel, nullptr);
   EXPECT_THAT(connection->calls, IsEmpty());
   EXPECT_THAT(percents, IsEmpty());
-  EXPECT_EQ(driver.UnlockConnection(), 1);  // what it said of unlocking was not so
+  EXPECT_EQ(driver.UnlockConnection(), 1);  // it has not really unlocked it
 }
 
 TEST_F(VelmarConnectionLock, IsAFailureWhenItsHolderEndedWithoutRelease) {
@@ -143,7 +143,7 @@ TEST_F(VelmarConnectionLock, LetsItsHolderWork) {
   EXPECT_TRUE(IsFreeForOthers(driver));
 }
 
-// An abort does not wait for it, or it could not end what holds it.
+// An abort does not wait for it, because it must be able to end the holder.
 TEST_F(VelmarConnectionLock, IsNotNeededForAnAbort) {
   driver.LockConnection(nullptr);
   std::thread([&] { driver.Abort(); }).join();

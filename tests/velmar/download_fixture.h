@@ -8,7 +8,7 @@
 #include "tests/support/memory_stream.h"
 #include "tests/velmar/velmar_driver.h"
 
-// The log that tells the size of the file.
+// The log with the size of the file.
 inline std::string HeaderReply(const std::string& size) {
   std::string body = "\"a.pdc\"," + size;
   for (int i = 2; i < 23; ++i) body += ",0";

@@ -1,4 +1,4 @@
-// The download of a Velmar receiver: what is said and done around the transfer of the file.
+// The download of a Velmar receiver: the steps around the transfer of the file.
 #include <algorithm>
 #include <string>
 #include <utility>
@@ -77,7 +77,7 @@ TEST_F(VelmarDownload, AReceiverThatRefusesTheSpeedStaysSlow) {
         report.Has("CVelmarProtocol::DownloadFile - receiver speed up is failed [0x00000001]"));
     EXPECT_THAT(connection->calls, testing::Not(testing::Contains("speed 115200")));
     EXPECT_EQ(stream.bytes.size(), 100u);
-    EXPECT_EQ(connection->Writes().back(), kRead);  // and nothing is put back
+    EXPECT_EQ(connection->Writes().back(), kRead);  // and no speed is put back
   }
 }
 
@@ -93,9 +93,9 @@ TEST_F(VelmarDownload, AnySlowerLinkIsRaised) {
   }
 }
 
-// A host that knows no speed of its own, or one that is negative as a number, is raised, and
-// nothing is put back.
-TEST_F(VelmarDownload, StrangeSpeedsAreNotPutBack) {
+// A host that knows no speed of its own, or one that is negative as a number, is raised, and no
+// speed is put back.
+TEST_F(VelmarDownload, UnusualSpeedsAreNotPutBack) {
   for (const DWORD speed : {0ul, 0x80000000ul, 0xFFFFFFFFul}) {
     ScriptedConnection* const link = connection;
     const size_t before = link->Writes().size();
@@ -110,7 +110,7 @@ TEST_F(VelmarDownload, StrangeSpeedsAreNotPutBack) {
   }
 }
 
-TEST_F(VelmarDownload, ASpeedBelowTheSignIsFastEnough) {
+TEST_F(VelmarDownload, TheLargestPositiveSpeedIsFastEnough) {
   Serve(1);
   connection->speed = 0x7FFFFFFF;
   EXPECT_EQ(Download(), S_OK);
@@ -159,8 +159,8 @@ TEST_F(VelmarDownload, AHostThatCannotFollowPutsTheReceiverBackAtOnce) {
   EXPECT_EQ(stream.bytes.size(), 100u);
 }
 
-// The put-back that is made at once may fail without anybody knowing.
-TEST_F(VelmarDownload, AHostThatCannotFollowDoesNotLookAtThePutBack) {
+// When the speed is put back at once, a failure of that is not reported.
+TEST_F(VelmarDownload, AHostThatCannotFollowIgnoresTheResultOfThePutBack) {
   Serve(1);
   connection->speed = 9600;
   connection->set_speed_result = E_ACCESSDENIED;
@@ -169,12 +169,12 @@ TEST_F(VelmarDownload, AHostThatCannotFollowDoesNotLookAtThePutBack) {
   EXPECT_EQ(stream.bytes.size(), 100u);
 }
 
-// A host that was at full speed already, as it says itself.
+// A host that reports that it already has the full speed.
 TEST_F(VelmarDownload, AHostThatHasNothingToChangeHasFollowed) {
   Serve(1);
   connection->speed = 9600;
   connection->set_speed_result = S_FALSE;
-  EXPECT_EQ(Download(), S_FALSE);  // the put-back's
+  EXPECT_EQ(Download(), S_FALSE);  // the result of putting the speed back
   EXPECT_THAT(connection->Writes(),
               ElementsAre(kConfig, kRaise, kCurrent, kHeader, kRead, kConfig, kRestore));
 }
@@ -182,7 +182,7 @@ TEST_F(VelmarDownload, AHostThatHasNothingToChangeHasFollowed) {
 TEST_F(VelmarDownload, UsbHasNoSpeed) {
   Serve(1);
   connection->instance_type = eInstanceUSB;
-  connection->speed_result = E_HANDLE;  // nobody asks
+  connection->speed_result = E_HANDLE;  // it is never read
   EXPECT_EQ(Download(), S_OK);
   EXPECT_THAT(connection->Writes(), ElementsAre(kCurrent, kHeader, kRead));
 }
@@ -213,7 +213,7 @@ TEST_F(VelmarDownload, AFileThatIsRefusedWithATextIsAnEmptySuccess) {
   EXPECT_THAT(percents, ElementsAre(0, 100));
 }
 
-// Where something follows the prompt it is no plain acknowledgement.
+// With bytes after the prompt it is not a plain acknowledgement.
 TEST_F(VelmarDownload, AFileThatIsAnsweredWithALogIsAnEmptySuccess) {
   answers[kCurrent] = kOkPrompt + AsciiLog("A", "body");
   EXPECT_EQ(Download(), S_OK);
@@ -229,13 +229,13 @@ TEST_F(VelmarDownload, ARefusalAtRaisedSpeedIsPutBackToo) {
   EXPECT_THAT(percents, ElementsAre(0, 100));
 }
 
-TEST_F(VelmarDownload, AFailingCommandEndsItWithoutALastReport) {
+TEST_F(VelmarDownload, AFailingCommandEndsItWithoutALastProgress) {
   Serve(1);
   for (const std::string& failing : {kCurrent, kHeader, kRead}) {
     const std::string answer = std::exchange(answers[failing], kOkPrompt + "<");
     percents.clear();
     EXPECT_EQ(Download(), E_NOTIMPL) << failing;
-    // Once it may have begun to send, it is stopped.
+    // When it may have begun to send, it is stopped.
     EXPECT_EQ(connection->Writes().back(), failing == kRead ? kStop : failing);
     EXPECT_THAT(percents, ElementsAre(0));
     EXPECT_TRUE(report.Has("CVelmarProtocol::DumpInvalidResponse - [0x80004001] [] [COM7]"));
@@ -246,7 +246,7 @@ TEST_F(VelmarDownload, AFailingCommandEndsItWithoutALastReport) {
   EXPECT_EQ(stream.writes, 0u);
 }
 
-// The size of a header that is not whole is not known yet.
+// The size is not known while the header is incomplete.
 TEST_F(VelmarDownload, AHeaderThatStopsInBetweenCountsAsASizeOfNothing) {
   Serve(1);
   answers[kHeader] = kOkPrompt + AsciiLog("FILEHDRA", "\"a.pdc\",100,0");
@@ -262,8 +262,8 @@ TEST_F(VelmarDownload, WithoutAHeaderNothingIsRead) {
   EXPECT_THAT(percents, ElementsAre(0, 100));
 }
 
-// The put-back's result takes the place of the transfer's.
-TEST_F(VelmarDownload, AtRaisedSpeedAFailureIsCoveredByThePutBack) {
+// The result of putting the speed back replaces that of the transfer.
+TEST_F(VelmarDownload, AtRaisedSpeedTheResultOfThePutBackReplacesAFailure) {
   Serve(3);
   connection->speed = 9600;
   stream.fail_at_write = 1;
@@ -271,7 +271,8 @@ TEST_F(VelmarDownload, AtRaisedSpeedAFailureIsCoveredByThePutBack) {
   EXPECT_EQ(connection->speed, 9600u);
 }
 
-// And where the put-back fails itself, its code is the download's; the host stays where it is.
+// When putting the speed back fails itself, the download returns its code; the host keeps its
+// speed.
 TEST_F(VelmarDownload, APutBackThatCannotBeAskedForGivesItsCode) {
   for (const std::string& failing : {kConfig, kRestore}) {
     Serve(1);
@@ -292,8 +293,8 @@ TEST_F(VelmarDownload, APutBackThatCannotBeAskedForGivesItsCode) {
   }
 }
 
-// A receiver that stays where it is, or does not say on which port, is not waited for.
-TEST_F(VelmarDownload, TheHostGoesBackWhateverTheReceiverSays) {
+// A receiver that keeps its speed, or does not name its port, is not waited for.
+TEST_F(VelmarDownload, TheHostGoesBackWhateverTheReceiverAnswers) {
   for (const auto& [command, answer] : {std::pair(kRestore, kErrorPrompt),
                                         std::pair(kRestore, kErrorTextPrompt),
                                         std::pair(kRestore, std::string()),
@@ -353,7 +354,8 @@ TEST_F(VelmarDownload, AnAbortAtRaisedSpeedPutsTheSpeedBack) {
   EXPECT_EQ(driver.DeleteFile(L"a"), S_FALSE);
 }
 
-// Nobody knows whether the receiver took the higher speed: it is told the old one at the higher one.
+// It is not known whether the receiver took the higher speed, so it is sent the old one at the
+// higher one.
 TEST_F(VelmarDownload, AnAbortWhileTheReceiverConfirmsItsSpeedPutsItBackAtOnce) {
   Serve(3);
   connection->speed = 9600;
@@ -372,8 +374,8 @@ TEST_F(VelmarDownload, AnAbortWhileTheReceiverConfirmsItsSpeedPutsItBackAtOnce) 
   EXPECT_FALSE(report.Has("CVelmarCommand::Execute - read failed [0x800705B4]"));
 }
 
-// An abort while the link is put in order ends its waits, and the receiver is told its old speed all
-// the same: with the settings that it had before.
+// An abort while the speed is put back ends the waits, but the receiver is still sent its old
+// speed, with the settings that it had before.
 class VelmarAbortedPutBack : public VelmarDownload {
  protected:
   VelmarAbortedPutBack() {
@@ -384,7 +386,8 @@ class VelmarAbortedPutBack : public VelmarDownload {
     Serve(3);
     stream.fail_at_write = 1;
   }
-  // The abort comes as this command is sent at the raised speed, and nobody answers from then on.
+  // The abort comes when this command is sent at the raised speed, and the receiver no longer
+  // answers.
   std::vector<std::string> DownloadAndAbortAt(const std::string& fatal) {
     before_command = [this, fatal](const std::string& command) {
       if (connection->speed != 115200 || command != fatal) return;
@@ -423,7 +426,7 @@ TEST_F(VelmarAbortedPutBack, WhileItConfirmsItsSpeed) {
   EXPECT_EQ(connection->speed, 9600u);
 }
 
-// Just before the line is written, when a command would be ended without being sent.
+// Just before the line is written, when a cancel would end a command before it is sent.
 TEST_F(VelmarAbortedPutBack, AsTheLineIsAboutToBeSent) {
   const auto discard = connection->on_flush;
   bool asked = false;
@@ -439,8 +442,8 @@ TEST_F(VelmarAbortedPutBack, AsTheLineIsAboutToBeSent) {
   EXPECT_EQ(connection->speed, 9600u);
 }
 
-// The line has left before the host changes its own speed.
-TEST_F(VelmarAbortedPutBack, LetsTheLineLeave) {
+// The line is sent before the host changes its own speed.
+TEST_F(VelmarAbortedPutBack, DoesNotInterruptTheLine) {
   DownloadAndAbortAt(kConfig);
   const auto told = std::ranges::find(connection->calls, "write " + kRestoreEven);
   ASSERT_NE(told, connection->calls.end());
@@ -448,7 +451,7 @@ TEST_F(VelmarAbortedPutBack, LetsTheLineLeave) {
               ElementsAre("flush", "speed 9600"));
 }
 
-TEST_F(VelmarDownload, AnAbortThatEndedItDisturbsNothingOfThePutBack) {
+TEST_F(VelmarDownload, AnAbortThatEndedItDoesNotDisturbThePutBack) {
   Serve(3);
   connection->speed = 9600;
   before_command = [&](const std::string& command) {
@@ -462,8 +465,8 @@ TEST_F(VelmarDownload, AnAbortThatEndedItDisturbsNothingOfThePutBack) {
   EXPECT_FALSE(report.Has("CVelmarCommand::Execute - read failed [0x800705B4]"));
 }
 
-// The answer of what was cut off would be taken for that of the next command.
-TEST_F(VelmarDownload, WhatFollowsACutOffCommandWaitsForItsLateAnswer) {
+// The answer to the interrupted command would be taken for that of the next one.
+TEST_F(VelmarDownload, TheCommandAfterAnInterruptedOneWaitsForItsLateAnswer) {
   Serve(3);
   before_command = [&](const std::string& command) {
     if (command == kCurrent) driver.Abort();

@@ -71,7 +71,7 @@ TEST(Fields, IntegersAreTheirLeadingDigits) {
   EXPECT_EQ(ToInteger(L""), 0);
   EXPECT_EQ(ToInteger(L"-2147483648"), -2147483647 - 1);
   EXPECT_EQ(ToInteger(L"2147483647"), 2147483647);
-  EXPECT_EQ(ToInteger(L"4000000000"), 2147483647);  // it ends there
+  EXPECT_EQ(ToInteger(L"4000000000"), 2147483647);  // the largest number
   EXPECT_EQ(ToInteger(L"\"7\""), 0);
 }
 

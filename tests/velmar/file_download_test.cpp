@@ -26,9 +26,9 @@ TEST_F(VelmarFileDownload, BringsTheFileAndReportsEachPercentOnce) {
   EXPECT_TRUE(report.HasStart("CVelmarProtocol::DownloadFile - connection is locked [0x"));
 }
 
-// Each chunk is in the stream before its percent is told, and the last percent is told while the
-// link is still fast.
-TEST_F(VelmarFileDownload, TellsThePercentOfWhatIsWritten) {
+// Each chunk is in the stream before its percent is reported, and the last percent is reported
+// while the link is still fast.
+TEST_F(VelmarFileDownload, ReportsThePercentOfWhatIsWritten) {
   Serve(2);
   connection->speed = 9600;
   std::vector<size_t> written;
@@ -43,7 +43,7 @@ TEST_F(VelmarFileDownload, TellsThePercentOfWhatIsWritten) {
   EXPECT_THAT(speeds, ElementsAre(9600u, 115200u, 115200u, 115200u));
 }
 
-// What came is there, and nothing tells that it is not all.
+// The received bytes are in the stream, and no result shows that some are missing.
 TEST_F(VelmarFileDownload, ATransferThatStopsInBetweenIsASuccess) {
   Serve(4);
   const std::string reply = answers[kRead];
@@ -53,7 +53,7 @@ TEST_F(VelmarFileDownload, ATransferThatStopsInBetweenIsASuccess) {
   EXPECT_THAT(percents, ElementsAre(0, 25, 50, 75, 100));
 }
 
-TEST_F(VelmarFileDownload, AFileSaidToBeEmptyIsCompleteAtOnce) {
+TEST_F(VelmarFileDownload, AFileOfSizeZeroIsCompleteAtOnce) {
   Serve(2);
   answers[kHeader] = HeaderReply("0");
   EXPECT_EQ(Download(), S_OK);
@@ -73,24 +73,24 @@ TEST_F(VelmarFileDownload, AFailingStreamEndsIt) {
   EXPECT_TRUE(report.Has("CVelmarProtocol::DumpInvalidResponse - [0x80030070] [] [COM7]"));
 }
 
-// A file that turns out longer than its header said: the percent is kept in a byte, and told as 100
+// A file that turns out longer than its header said: the percent is a byte, and is reported as 100
 // at the most.
-TEST_F(VelmarFileDownload, ThePercentOfAFileThatIsLongerThanSaid) {
+TEST_F(VelmarFileDownload, ThePercentOfAFileThatIsLongerThanItsSize) {
   Serve(3);
   answers[kHeader] = HeaderReply("100");
   EXPECT_EQ(Download(), S_OK);
   EXPECT_THAT(percents, ElementsAre(0, 100, 100, 300 - 256, 100));
 }
 
-TEST_F(VelmarFileDownload, APercentThatDoesNotChangeIsNotTold) {
+TEST_F(VelmarFileDownload, APercentThatDoesNotChangeIsNotReported) {
   Serve(4);
   answers[kHeader] = HeaderReply("20000");
   EXPECT_EQ(Download(), S_OK);
   EXPECT_THAT(percents, ElementsAre(0, 1, 2, 100));
 }
 
-// Sizes of 2 GB and more do not fit the number of the header, which ends at its largest; a negative
-// one is a very large one.
+// Sizes of 2 GB and more do not fit the number in the header, which is limited to its maximum; a
+// negative size is a very large one.
 TEST_F(VelmarFileDownload, SizesBeyondTheNumberAreTakenAsTheyCome) {
   for (const char* size : {"4000000000", "-1"}) {
     Serve(1);
@@ -101,7 +101,7 @@ TEST_F(VelmarFileDownload, SizesBeyondTheNumberAreTakenAsTheyCome) {
   }
 }
 
-// In 32-bit arithmetic the product of a large file wraps, as hosts have always seen it.
+// In 32-bit arithmetic the product of a large file wraps.
 TEST_F(VelmarFileDownload, ThePercentOfALargeFileWraps) {
   constexpr size_t kChunk = 1024;
   constexpr size_t kChunksUntilItWraps = 42949672 / kChunk + 1;
@@ -126,7 +126,7 @@ TEST_F(VelmarFileDownload, ThePercentOfALargeFileWraps) {
   EXPECT_EQ(percents, expected);
 }
 
-// What may still be sending is told to stop, at any speed; what has not begun is not.
+// A receiver that may still be sending is stopped, at any speed; one that has not begun is not.
 class VelmarUnfinishedDownload : public VelmarDownload {
  protected:
   size_t TimesStopped() const {

@@ -74,7 +74,7 @@ TEST(VersionLog, TypesCompareExactly) {
   }
 }
 
-TEST(VersionLog, QuotesGoAtBothEndsAndOnlyThere) {
+TEST(VersionLog, QuotesAreRemovedAtBothEndsOnly) {
   VersionLog log;
   DecodeVersion("1,GPSCARD,\"\"M\"\",S\"1\"N,\"\",plain,B,D,T", log);
   EXPECT_EQ(log.model, L"M");
@@ -92,8 +92,8 @@ TEST(VersionLog, NoComponentIsCompleteAndEmpty) {
   EXPECT_EQ(log.software_version, L"");
 }
 
-// The components behind the count are not there.
-TEST(VersionLog, TheCountTellsHowManyComponentsThereAre) {
+// The components after the count are missing.
+TEST(VersionLog, TheCountGivesTheNumberOfComponents) {
   VersionLog log;
   EXPECT_EQ(DecodeVersion("1" + Component("GPSCARD", "card") + Component("ENCLOSURE", "box"), log),
             Progress::kComplete);
@@ -179,16 +179,16 @@ TEST(DirectoryLogs, QuotesProtectCommasOfNames) {
   EXPECT_EQ(entries[0].size, 5u);
 }
 
-// What stands between the logs is passed over; only the whole name opens one.
+// Bytes between the logs are skipped; only the whole name begins a log.
 TEST(DirectoryLogs, AreFoundAmongOtherFields) {
   std::vector<FileEntry> entries;
   const std::string text = "#DIRENTB,x;#direnta*" + Entry("a", 1) + "[COM1],;*\r\n,\r" + "," +
                            Entry("b", 0) + Entry("c", 0);
   EXPECT_EQ(DecodeDirectory(text, entries), Progress::kComplete);
-  EXPECT_THAT(Names(entries), testing::ElementsAre(L"a", L"b"));  // behind the last is nothing
+  EXPECT_THAT(Names(entries), testing::ElementsAre(L"a", L"b"));  // nothing after the last
 }
 
-// A file may be called like the log.
+// A file may have the name of the log.
 TEST(DirectoryLogs, NoLogBeginsInsideAnother) {
   std::vector<FileEntry> entries;
   const std::string text = AsciiLog("DIRENTA", "#DIRENTA,1,0,20121231,235959", 1) + Entry("b", 0);
@@ -202,7 +202,7 @@ TEST(DirectoryLogs, WithoutALogWaitForMore) {
   EXPECT_EQ(DecodeDirectory("\"#DIRENTA", entries), Progress::kNothing);
 }
 
-// A log that is cut off is told from a whole one that is not the last.
+// A log that is cut off is distinguished from a complete one that is not the last.
 TEST(DirectoryLogs, WaitForTheRestOfALogOrForTheNext) {
   std::vector<FileEntry> entries;
   const std::string whole = Entry("a", 1);
@@ -218,7 +218,7 @@ TEST(DirectoryLogs, CountDownToTheLast) {
   EXPECT_THAT(Names(entries), testing::ElementsAre(L"a", L"b", L"c", L"d"));
 }
 
-TEST(DirectoryLogs, AGapContradictsAndKeepsWhatWasRead) {
+TEST(DirectoryLogs, AGapIsAnErrorAndKeepsWhatWasRead) {
   std::vector<FileEntry> entries;
   EXPECT_EQ(DecodeDirectory(Entry("a", 3) + Entry("b", 1), entries), Progress::kContradiction);
   EXPECT_THAT(Names(entries), testing::ElementsAre(L"a", L"b"));
@@ -230,7 +230,7 @@ TEST(DirectoryLogs, SequencesAtTheEndOfTheirRangeDoNotOverflow) {
             Progress::kContradiction);
 }
 
-// Each beginning of the text waits, and holds the logs that are whole.
+// Each beginning of the text waits for more, and holds the complete logs.
 TEST(DirectoryLogs, EveryBeginningWaitsForMore) {
   const std::string text = Entry("a", 1) + Entry("b", 0);
   const size_t first = Entry("a", 1).size();
@@ -244,21 +244,21 @@ TEST(DirectoryLogs, EveryBeginningWaitsForMore) {
   EXPECT_EQ(DecodeDirectory(text, entries), Progress::kComplete);
 }
 
-TEST(DirectoryLogs, TheSameNumberTwiceContradicts) {
+TEST(DirectoryLogs, TheSameNumberTwiceIsAnError) {
   std::vector<FileEntry> entries;
   EXPECT_EQ(DecodeDirectory(Entry("a", 1) + Entry("b", 1), entries), Progress::kContradiction);
   EXPECT_EQ(DecodeDirectory(Entry("a", 1) + Entry("b", 2), entries), Progress::kContradiction);
   EXPECT_EQ(DecodeDirectory(Entry("a", 1) + Entry("b", -1), entries), Progress::kContradiction);
 }
 
-// A number below 0 is no last one.
+// A number below 0 is not that of the last log.
 TEST(DirectoryLogs, CountOnBelowZero) {
   std::vector<FileEntry> entries;
   EXPECT_EQ(DecodeDirectory(Entry("a", -1) + Entry("b", -2), entries), Progress::kMoreLogs);
   EXPECT_EQ(entries.size(), 2u);
 }
 
-TEST(DirectoryLogs, StartAfresh) {
+TEST(DirectoryLogs, StartAgainFromTheFirstByte) {
   std::vector<FileEntry> entries(5);
   DecodeDirectory(Entry("a", 0), entries);
   EXPECT_EQ(entries.size(), 1u);
@@ -301,7 +301,7 @@ std::string PortFields(const std::string& settings) {
   return "," + settings + ",ON,OFF,NOVATEL,NOVATEL,ON";
 }
 
-TEST(PortConfig, TakesThePortThatIsTalkedOn) {
+TEST(PortConfig, TakesThePortThatIsUsed) {
   PortConfigLog log;
   const std::string body =
       "2" + PortFields("COM1,9600,N,8,1,N") + PortFields("COM2,115200,O,7,2,CTS");
@@ -331,11 +331,11 @@ TEST(PortConfig, OfAPortThatIsListedTwiceIsTheLast) {
       "2" + PortFields("COM1,9600,E,8,1,XON") + PortFields("COM1,19200,x,7,2,x");
   EXPECT_EQ(DecodePortConfig(body, L"COM1", log), Progress::kComplete);
   EXPECT_EQ(log.baud, 19200);
-  EXPECT_EQ(log.parity, 1);  // words that are none leave what was there
+  EXPECT_EQ(log.parity, 1);  // unknown words change nothing
   EXPECT_EQ(log.handshake, 1);
 }
 
-TEST(PortConfig, TheCountTellsHowManyPortsThereAre) {
+TEST(PortConfig, TheCountGivesTheNumberOfPorts) {
   PortConfigLog log;
   const std::string two = PortFields("COM1,1,N,8,1,N") + PortFields("COM2,2,N,8,1,N");
   EXPECT_EQ(DecodePortConfig("1" + two, L"COM2", log), Progress::kComplete);
@@ -394,7 +394,7 @@ TEST(PortConfig, CountsOfAnyKindEnd) {
   EXPECT_EQ(DecodePortConfig("", L"COM1", log), Progress::kNothing);
   EXPECT_EQ(DecodePortConfig("0", L"COM1", log), Progress::kComplete);
   EXPECT_EQ(DecodePortConfig("-5", L"COM1", log), Progress::kComplete);
-  for (const char* count : {"2147483647", "390451573", "2"}) {  // the second wraps to few fields
+  for (const char* count : {"2147483647", "390451573", "2"}) {  // the second one wraps
     EXPECT_EQ(DecodePortConfig(count + PortFields("COM1,1,N,8,1,N"), L"COM1", log), Progress::kMore)
         << count;
   }

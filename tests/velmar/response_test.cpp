@@ -12,7 +12,7 @@ using namespace VelmarCommands;
 
 ResponseType TypeOf(std::string_view bytes) { return RecogniseResponse(bytes).type; }
 
-TEST(VelmarResponse, AnAcknowledgementEndsBehindThePrompt) {
+TEST(VelmarResponse, AnAcknowledgementEndsAfterThePrompt) {
   const Response response = RecogniseResponse(kOkPrompt);
   EXPECT_EQ(response.type, RESPONSE_OK);
   EXPECT_EQ(response.prompt_end, kOkPrompt.size());
@@ -25,12 +25,12 @@ TEST(VelmarResponse, ARefusalWithoutTextIsAnError) {
   EXPECT_EQ(response.prompt_end, kErrorPrompt.size());
 }
 
-// The text ahead of the prompt is not skipped.
+// The text before the prompt is not skipped.
 TEST(VelmarResponse, ARefusalWithTextIsUnknown) {
   EXPECT_EQ(TypeOf(kErrorTextPrompt), RESPONSE_UNKNOWN);
 }
 
-// Every beginning of a reply waits for more; none is taken for something else.
+// Every beginning of a reply waits for more bytes; none is taken for another reply.
 TEST(VelmarResponse, BeginningsAreIncomplete) {
   for (const std::string& reply : {kOkPrompt, kErrorPrompt}) {
     for (size_t length = 0; length < reply.size(); ++length) {
@@ -48,7 +48,7 @@ TEST(VelmarResponse, AnythingElseIsUnknownAtItsFirstByte) {
   }
 }
 
-// How many bytes are waited for before an opening is told from another.
+// How many bytes are needed to recognise the kind of a reply.
 TEST(VelmarResponse, IsTakenForUnknownOnceEnoughHasCome) {
   EXPECT_EQ(TypeOf("\r\n<OK\r\nx"), RESPONSE_UNKNOWN);
   const std::string other = "\r\n<NOTHING";

@@ -21,7 +21,7 @@ using testing::ElementsAreArray;
 using testing::IsEmpty;
 using testing::SizeIs;
 
-// The speed that a port is left at, which nobody speaks.
+// The speed at which a port was left; no receiver uses it.
 constexpr DWORD kLeftAt = 4800;
 
 struct Try {
@@ -51,7 +51,7 @@ class VelmarSearch : public testing::Test {
       : receiver_(Options(receiver_speed), {}, &transcript_) {
     port_.state.BaudRate = kLeftAt;
     port_.forgets = true;
-    // Whoever holds RTS up drives the line alone: the two get at each other only while it is down.
+    // A side that holds RTS high blocks the line: data passes only while RTS is low.
     port_.carries = [](const DCB& state) { return state.fRtsControl == RTS_CONTROL_DISABLE; };
   }
   ~VelmarSearch() override {
@@ -67,7 +67,7 @@ class VelmarSearch : public testing::Test {
     return SearchReceiverOnSerial(name_.data(), protocol, nullptr, &handle_);
   }
 
-  // What the report says of one try in which no receiver answers, or one does.
+  // The report's lines of one try without or with an answer.
   static std::vector<std::string> LinesOf(const Try& one, EProtocol protocol, bool found) {
     std::vector<std::string> lines = {
         "SearchReceiverOnSerial - try " + one.speed + " [COM7]",
@@ -86,7 +86,7 @@ class VelmarSearch : public testing::Test {
     }
     return lines;
   }
-  // The lines of discovery, and those that tell when the port is open.
+  // The lines of discovery, and those that show when the port is open.
   std::vector<std::string> Told() const {
     std::vector<std::string> told;
     for (const std::string& line : report_.Lines()) {
@@ -128,7 +128,7 @@ class VelmarSearch : public testing::Test {
       EXPECT_EQ(set.StopBits, 0);
     }
   }
-  // That the handle is a receiver which is heard.
+  // The handle is that of a receiver that answers.
   void ExpectReceiver() {
     ASSERT_NE(handle_, nullptr);
     CReceiverInfo info{};
@@ -157,9 +157,9 @@ TEST_F(VelmarSearch, FindsTheLastSpeedInTheLastMode) {
   ExpectReceiver();
 }
 
-// Each silent try takes the answer's time-out and the pause behind an exchange, and the last one
+// Each try without an answer takes the time-out and the pause after an exchange, and the last one
 // the quiet second that ends a read.
-TEST_F(VelmarSearch, OfThisFamilyAloneSaysNothingElseOnTheLine) {
+TEST_F(VelmarSearch, OfThisFamilyAloneSendsNothingElse) {
   EXPECT_EQ(Search(eProtocolVelmar), S_OK);
   ExpectTries(AllTries(kLeftAt), eProtocolVelmar, true);
   EXPECT_EQ(clock_.paused, 18u * 500);
@@ -173,8 +173,7 @@ TEST_F(VelmarSearch, OfThisFamilyAloneSaysNothingElseOnTheLine) {
   ExpectReceiver();
 }
 
-// A port that keeps what was set last has the right speed as its current one once the mode is
-// right.
+// A port that keeps its last settings has the right current speed when the mode is right.
 TEST_F(VelmarSearch, APortThatRemembersIsTriedAtTheSpeedThatWasTriedLast) {
   port_.forgets = false;
   EXPECT_EQ(Search(eProtocolVelmar), S_OK);
@@ -219,7 +218,8 @@ TEST_F(VelmarSearch, EndsWithoutAReceiverWhereNothingPasses) {
   EXPECT_THAT(log_.str(), IsEmpty());
 }
 
-// It is a Velmar receiver that is there: who wants the other family finds none at the right speed.
+// The receiver is a Velmar receiver: a search for the other family finds nothing at the right
+// speed.
 TEST_F(VelmarSearch, IsNoReceiverOfTheOtherFamily) {
   EXPECT_EQ(Search(eProtocolQuorin), S_FALSE);
   EXPECT_EQ(handle_, nullptr);

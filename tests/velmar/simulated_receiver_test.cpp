@@ -1,4 +1,4 @@
-// The driver with the simulated receiver, which answers as a real one does: in pieces, late, or
+// The driver with the simulated receiver, which answers like a real one: in pieces, late, or
 // wrongly.
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -137,7 +137,7 @@ TEST(VelmarSimulatedReceiver, IsFoundInTheMiddleOfATransfer) {
   constexpr std::string_view kStart = "currentfile A.log all\rlog filetransferb\r";
   bench.connection->Write(kStart.data(), static_cast<DWORD>(kStart.size()), 500);
   ASSERT_TRUE(bench.receiver.in_transfer());
-  // Bytes of the log are ahead of the answer, the first time.
+  // Bytes of the log come before the answer, the first time.
   bench.IsFound();
   EXPECT_FALSE(bench.receiver.in_transfer());
   EXPECT_TRUE(bench.IsFound());
@@ -200,7 +200,7 @@ TEST(VelmarSimulatedReceiver, WhoseVersionIsSpoiled) {
                                Answer{Kind::kSilence, 31000, S_FALSE},
                                Answer{Kind::kLatePrompt, 29000, S_OK},
                                Answer{Kind::kLateLog, 29000, S_OK},
-                               Answer{Kind::kLateLog, 30900, S_OK},  // from the last byte on
+                               Answer{Kind::kLateLog, 30900, S_OK},  // after the last byte
                                Answer{Kind::kLateLog, 31100, S_FALSE},
                                Answer{Kind::kGarbageBefore, 1, S_FALSE},
                                Answer{Kind::kGarbageBefore, 20000, S_FALSE},
@@ -221,12 +221,12 @@ TEST(VelmarSimulatedReceiver, WhoseVersionIsSpoiled) {
     const UniqueBstr id(info.bstrReceiverId);
     const UniqueBstr model(info.bstrModel);
     EXPECT_EQ(info.bstrModel != nullptr, answer.result == S_OK);
-    bench.IsFound();  // what comes too late may be taken for its answer, but only once
+    bench.IsFound();  // a late answer may be taken for its own, but only once
     EXPECT_TRUE(bench.IsFound());
   }
 }
 
-// What is not there yet is no reason for another answer: the fields are empty, and that counts.
+// Missing fields do not change the result: they are empty.
 TEST(VelmarSimulatedReceiver, WhoseVersionIsCutHasAnEmptyIdentity) {
   using Kind = sim::VelmarReplyFaultKind;
   for (const Answer& answer : {Answer{Kind::kOpenQuotes, 0, S_OK},
@@ -256,7 +256,8 @@ TEST(VelmarSimulatedReceiver, SendsAFileAtFullSpeed) {
   EXPECT_LT(bench.connection->Now(), 15000u);
 }
 
-// Of each length: some end in a chunk too short to be taken, and nothing tells that it is missing.
+// Files of each length: some end in a chunk that is too short to be accepted, and no result shows
+// that it is missing.
 TEST(VelmarSimulatedReceiver, FilesOfAnyLength) {
   for (const size_t size : std::initializer_list<size_t>{
            0, 1, 3, 4, 5, 1023, 1024, 1025, 1027, 1028, 2048, 8192, 9000}) {
@@ -273,7 +274,7 @@ TEST(VelmarSimulatedReceiver, FilesOfAnyLength) {
   }
 }
 
-TEST(VelmarSimulatedReceiver, WhoseSizeIsALieSendsTheFileAllTheSame) {
+TEST(VelmarSimulatedReceiver, WithAWrongSizeStillSendsTheFile) {
   for (const uint32_t told : {0u, 1u, 1000000u}) {
     sim::VelmarOptions options;
     options.faults.sizes = {{"A.log", told}};
@@ -283,7 +284,7 @@ TEST(VelmarSimulatedReceiver, WhoseSizeIsALieSendsTheFileAllTheSame) {
   }
 }
 
-// Nothing but its first byte, its lengths and its number are looked at.
+// Only its first byte, its lengths and its number are checked.
 TEST(VelmarSimulatedReceiver, DamagedChunksAreTakenAsTheyAre) {
   using Kind = sim::VelmarChunkFaultKind;
   for (const Kind kind : {Kind::kDamagedCrc, Kind::kWrongSync}) {
@@ -295,9 +296,9 @@ TEST(VelmarSimulatedReceiver, DamagedChunksAreTakenAsTheyAre) {
   }
 }
 
-// Whatever its lengths tell, the download ends, the speed is the old one, and the next one is
-// whole.
-TEST(VelmarSimulatedReceiver, WhoseLengthsLieIsLeftInOrder) {
+// Whatever its lengths are, the download ends, the speed is the old one, and the next download is
+// complete.
+TEST(VelmarSimulatedReceiver, WithWrongLengthsIsLeftInOrder) {
   using Kind = sim::VelmarChunkFaultKind;
   for (const Kind kind : {Kind::kMessageLength, Kind::kBodyLength, Kind::kHeaderLength}) {
     for (const uint32_t amount : {0u, 1u, 7u, 8u, 255u, 1033u, 65535u}) {
@@ -351,7 +352,7 @@ TEST(VelmarSimulatedReceiver, ThatKeepsItsSpeedIsLost) {
   options.faults.keeps_speed = true;
   Bench bench(options);
   EXPECT_EQ(bench.Download(), S_OK);
-  EXPECT_TRUE(bench.stream.bytes.empty());  // it acknowledged, so the host went where it is not
+  EXPECT_TRUE(bench.stream.bytes.empty());  // it acknowledged, so the host changed its speed alone
   EXPECT_EQ(bench.HostSpeed(), 9600u);
   EXPECT_TRUE(bench.IsFound());
 }

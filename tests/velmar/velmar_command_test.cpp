@@ -91,7 +91,7 @@ TEST_F(VelmarCommand, GivesTheFailureOfEachStep) {
   EXPECT_EQ(clock.paused, 0u);
 }
 
-// Half a line would stand in front of the next command.
+// Half a line would come before the next command.
 TEST_F(VelmarCommand, IsSentWhole) {
   std::vector<bool> shielded;
   connection.on_write = [&](std::string_view) {
@@ -122,7 +122,7 @@ TEST_F(VelmarCommand, AFailedReadEndsItWithoutAReply) {
   EXPECT_EQ(clock.paused, 0u);
 }
 
-TEST_F(VelmarCommand, ATimeOutEndsItInPeace) {
+TEST_F(VelmarCommand, ATimeOutEndsItWithoutAFailure) {
   CVelmarCommand command("x", 0);
   command.SetReply("before");
   EXPECT_EQ(command.Execute(&connection, nullptr), S_OK);
@@ -147,7 +147,7 @@ TEST_F(VelmarCommand, AnEmptyReadEndsIt) {
   EXPECT_EQ(connection.calls.back(), "read 8192 30000");
 }
 
-// Whatever ended it: a read that gives nothing ends the exchange with what had come, once.
+// Whatever ended it, a read that gives nothing ends the exchange with the bytes received so far.
 TEST_F(VelmarCommand, AnEmptyReadInBetweenEndsIt) {
   for (const HRESULT result : {S_OK, kTimedOut}) {
     connection.DropAnswers();
@@ -162,7 +162,7 @@ TEST_F(VelmarCommand, AnEmptyReadInBetweenEndsIt) {
   }
 }
 
-// The cancel may have come ahead of the command, which does not know of it then.
+// The cancel may have come before the command, which then does not know of it.
 TEST_F(VelmarCommand, AReadThatACancelEndedEndsItAtOnce) {
   connection.GiveRead("\r\n<OK\r");
   connection.GiveResult(S_FALSE);
@@ -172,7 +172,7 @@ TEST_F(VelmarCommand, AReadThatACancelEndedEndsItAtOnce) {
   EXPECT_EQ(clock.paused, 0u);
 }
 
-// A link that has nothing to flush says so.
+// A link without a flush returns S_FALSE.
 TEST_F(VelmarCommand, AFlushThatDoesNothingIsNoFailure) {
   connection.on_flush = [] { return S_FALSE; };
   connection.GiveRead(kOkPrompt);
@@ -181,7 +181,7 @@ TEST_F(VelmarCommand, AFlushThatDoesNothingIsNoFailure) {
   EXPECT_EQ(command.Response(), RESPONSE_OK);
 }
 
-// Reports have always shown what stood in the buffer at each read, so the beginning stands twice.
+// The report shows the whole buffer after each read, so the beginning appears twice.
 TEST_F(VelmarCommand, TheKeptReplyRepeatsWhatWasHeld) {
   connection.GiveRead("\r\n<OK\r");
   connection.GiveRead("\n[COM1]");
@@ -250,7 +250,7 @@ TEST_F(VelmarCommand, AnAbbreviatedLogIsNotOffered) {
   EXPECT_EQ(clock.paused, 0u);
 }
 
-TEST_F(VelmarCommand, ALineEndBehindThePromptEndsIt) {
+TEST_F(VelmarCommand, ALineEndAfterThePromptEndsIt) {
   for (const std::string& prompt : {kOkPrompt, kErrorPrompt}) {
     connection.calls.clear();
     connection.GiveRead(prompt + "\r\n");
@@ -261,7 +261,7 @@ TEST_F(VelmarCommand, ALineEndBehindThePromptEndsIt) {
   }
 }
 
-TEST_F(VelmarCommand, OtherBytesBehindThePromptAreUnknown) {
+TEST_F(VelmarCommand, OtherBytesAfterThePromptAreUnknown) {
   connection.GiveRead(kOkPrompt + "?");
   CVelmarCommand command("x", 0);
   command.Execute(&connection, nullptr);
@@ -326,8 +326,8 @@ TEST_F(VelmarCommand, ACancelEndsItAtEachCheckpoint) {
   EXPECT_EQ(clock.paused, 0u);
 }
 
-// A command without a reply has been sent when the cancel comes.
-TEST_F(VelmarCommand, ACancelBehindASendOnlyCommandIsTooLate) {
+// A command without a reply is already sent when the cancel comes.
+TEST_F(VelmarCommand, ACancelAfterASendOnlyCommandIsTooLate) {
   CVelmarCommand command("x", kSendOnly);
   connection.on_write = [&](std::string_view) {
     command.Cancel();
@@ -360,7 +360,7 @@ TEST_F(VelmarCommand, IsCancelledAtEachCheckpoint) {
 
 // --- Parsers that consume
 
-// Takes bytes off the front, as many at each call as it was told, and keeps what it saw.
+// Consumes a given number of bytes at each call, and keeps what it was given.
 class Eater : public CVelmarCommand {
  public:
   Eater(std::vector<uint32_t> bites, uint32_t flags)
@@ -378,7 +378,7 @@ class Eater : public CVelmarCommand {
 
   std::vector<std::string> seen;
   ResponseType response = RESPONSE_INCOMPLETE;
-  size_t done_at = 0;  // calls count from 1
+  size_t done_at = 0;  // the number of the call, from 1
   size_t fail_at = 0;
 
  private:
@@ -433,7 +433,7 @@ TEST_F(VelmarCommand, AFullBufferThatIsConsumedGoesOn) {
   EXPECT_EQ(command.seen.back(), "b");
 }
 
-// It is the parser's failure that counts, not what it set beside it.
+// The parser's failure has priority over the other values that it set.
 TEST_F(VelmarCommand, AFailingParserEndsIt) {
   connection.GiveRead("abc");
   Eater command({}, 0);
@@ -461,7 +461,7 @@ class Bodies : public CVelmarCommand {
   HRESULT ParseLogBody(const char* bytes, uint32_t length, bool* done, uint32_t*) override {
     body = std::string(bytes, length);
     *done = true;
-    return E_PENDING;  // something to be handed on
+    return E_PENDING;  // a result to be returned
   }
   std::string body = "none";
 };
@@ -476,7 +476,7 @@ TEST_F(VelmarCommand, ParsesNothingOfNothing) {
   done = true;
   EXPECT_EQ(command.ParseReply("\r", 0, &done, &consumed), S_FALSE);
   EXPECT_FALSE(done);
-  EXPECT_EQ(command.Response(), RESPONSE_OK);  // as it was
+  EXPECT_EQ(command.Response(), RESPONSE_OK);  // unchanged
   EXPECT_EQ(command.ParseReply("x", 1, &done, &consumed), S_FALSE);
   EXPECT_EQ(command.Response(), RESPONSE_UNKNOWN);
 }
@@ -532,7 +532,7 @@ TEST_F(VelmarCommand, AsciiLogsAreHeaderAndBody) {
   EXPECT_EQ(command.Header().gps_seconds, 405078.5);
 }
 
-// As long as its three lengths say, with a body that begins behind 36 bytes whatever they say.
+// As long as its three lengths say. The body always begins after 36 bytes.
 TEST_F(VelmarCommand, BinaryLogsAreWaitedForByTheirLengths) {
   for (const uint8_t header : std::vector<uint8_t>{0, 28, 36, 255}) {
     for (const int message : {0, 8, 11, 60, 300}) {
@@ -557,7 +557,7 @@ TEST_F(VelmarCommand, BinaryLogsAreWaitedForByTheirLengths) {
   }
 }
 
-TEST_F(VelmarCommand, ALogThatNobodyReadsIsDone) {
+TEST_F(VelmarCommand, ALogThatIsNotParsedIsDone) {
   for (const std::string& log : {AsciiLog("A", "body"), BinaryLog{"chunk"}.Bytes()}) {
     connection.GiveRead(kOkPrompt + log);
     CVelmarCommand command("x", 0);
@@ -569,7 +569,7 @@ TEST_F(VelmarCommand, ALogThatNobodyReadsIsDone) {
       ElementsAre("flush", "write x", "read 8192 30000", "flush", "write x", "read 8192 30000"));
 }
 
-TEST_F(VelmarCommand, AcknowledgementsAsText) {
+TEST_F(VelmarCommand, AcknowledgementsAreParsedAsText) {
   const auto parse = [](const char* text) {
     CVelmarCommand command("x", 0);
     const int answer = command.ParseAcknowledgement(text);
@@ -595,7 +595,7 @@ TEST_F(VelmarCommand, AcknowledgementsAsText) {
   EXPECT_EQ(parse("text"), std::tuple(1, 4, ""));
 }
 
-TEST_F(VelmarCommand, AsciiMessages) {
+TEST_F(VelmarCommand, AsciiMessagesAreHeaderAndBody) {
   CVelmarCommand command("x", 0);
   bool done = true;
   EXPECT_EQ(command.ParseAsciiMessage("no separator", &done), S_FALSE);
@@ -607,11 +607,11 @@ TEST_F(VelmarCommand, AsciiMessages) {
   EXPECT_EQ(command.Port(), L"COM3");
   EXPECT_EQ(command.Header().gps_week, 1888);
   EXPECT_EQ(command.Header().gps_seconds, 405078.5);
-  EXPECT_EQ(command.Header().sequence, 0);  // this way does not read it
+  EXPECT_EQ(command.Header().sequence, 0);  // this function does not read it
   EXPECT_EQ(command.ParseAsciiHeader("a,b,c", 5), S_FALSE);
 }
 
-// What the two halves of a message give.
+// The results for the two halves of a message.
 class Halves : public CVelmarCommand {
  public:
   Halves() : CVelmarCommand("x", 0) {}

@@ -47,7 +47,7 @@ class VelmarDriver : public testing::Test, public CIProtocolCallback {
   ReportCapture report;
   ScriptedConnection* connection;  // the driver's
   WithLockText<CVelmarProtocol> driver;
-  std::map<std::string, std::string> answers;  // by command; silence for the others
+  std::map<std::string, std::string> answers;  // by command; other commands are not answered
   std::function<void(const std::string& command)> before_command;
   std::vector<int> percents;
   std::function<void(int percent)> on_percent;  // may be empty

@@ -64,7 +64,7 @@ TEST_F(VelmarDriver, ASignalledEventEndsTheProbeButNotTheLock) {
   EXPECT_TRUE(report.HasStart("CVelmarProtocol::LockConnection - connection is locked [0x"));
 }
 
-TEST_F(VelmarDriver, TheEventIsLookedAtBehindTheFirstCommand) {
+TEST_F(VelmarDriver, TheEventIsCheckedAfterTheFirstCommand) {
   const Event event(false);
   before_command = [&](const std::string&) { SetEvent(event.get()); };
   short answer = 99;
@@ -73,8 +73,8 @@ TEST_F(VelmarDriver, TheEventIsLookedAtBehindTheFirstCommand) {
   EXPECT_THAT(connection->Writes(), ElementsAre(kInterfaceMode));
 }
 
-// Only that the first of the two commands could be sent counts.
-TEST_F(VelmarDriver, TheAnswerToTheFirstProbeCommandIsNotLookedAt) {
+// It only matters that the first of the two commands could be sent.
+TEST_F(VelmarDriver, TheAnswerToTheFirstProbeCommandIsIgnored) {
   answers = {{kInterfaceMode, kErrorPrompt}, {kUnlogAll, kOkPrompt}};
   short answer = 0;
   EXPECT_EQ(driver.CheckConnection(nullptr, &answer), S_OK);
@@ -86,7 +86,7 @@ TEST_F(VelmarDriver, TheAnswerToTheFirstProbeCommandIsNotLookedAt) {
   EXPECT_EQ(clock.paused, 500u);
 }
 
-// Whatever an answer is but an acknowledgement alone.
+// Any answer other than a single acknowledgement.
 TEST_F(VelmarDriver, ALogIsNoAnswerToTheProbe) {
   answers = {{kUnlogAll, kOkPrompt + AsciiLog("A", "body")}};
   short answer = 99;
@@ -94,8 +94,8 @@ TEST_F(VelmarDriver, ALogIsNoAnswerToTheProbe) {
   EXPECT_EQ(answer, 0);
 }
 
-// An answer that comes after the check has given up is discarded by what follows.
-TEST_F(VelmarDriver, WhatFollowsACheckInVainWaitsForALateAnswer) {
+// An answer that comes after the check has timed out is discarded by the next command.
+TEST_F(VelmarDriver, TheCommandAfterAFailedCheckWaitsForALateAnswer) {
   short answer = 99;
   EXPECT_EQ(driver.CheckConnection(nullptr, &answer), S_OK);
   EXPECT_EQ(answer, 0);
@@ -178,7 +178,7 @@ TEST_F(VelmarDriver, HoldsTheConnectionFromTheFirstToTheLastReportOfTheIdentity)
   EXPECT_THAT(free, ElementsAre(false, true));
 }
 
-// A receiver without components has an identity, an empty one.
+// A receiver without components has an empty identity.
 TEST_F(VelmarDriver, ReadsAnIdentityOfNothing) {
   answers = {{kVersion, kOkPrompt + AsciiLog("VERSIONA", "0")}};
   CReceiverInfo info{};
@@ -201,7 +201,7 @@ TEST_F(VelmarDriver, AnIdentityThatFailsGivesItsCode) {
   EXPECT_FALSE(report.Has("CVelmarProtocol::GetReceiverInfo - OK"));
 }
 
-TEST_F(VelmarDriver, AnAbortEndsTheIdentityAndIsUsedUp) {
+TEST_F(VelmarDriver, AnAbortEndsTheIdentityAndIsCleared) {
   answers = {{kVersion, VersionReply()}};
   driver.Abort();
   CReceiverInfo info{};
@@ -223,10 +223,10 @@ TEST_F(VelmarDriver, WithoutVersionDataThereIsNoIdentity) {
   EXPECT_EQ(driver.GetReceiverInfo(nullptr, &info), S_FALSE);
   EXPECT_EQ(info.bstrReceiverId, nullptr);
   EXPECT_EQ(info.bstrModel, nullptr);
-  EXPECT_TRUE(IsFreeForOthers(driver));  // this family lets go after a failure
+  EXPECT_TRUE(IsFreeForOthers(driver));  // this family unlocks after a failure
 }
 
-// It is unlocked whether or not it was locked, and the report shows it.
+// It is unlocked even if it was not locked, and the report shows it.
 TEST_F(VelmarDriver, UnlocksWithoutALock) {
   driver.LockConnection(nullptr);
   std::thread([&] {
@@ -274,7 +274,7 @@ TEST_F(VelmarDriver, FillsTheRecordOfAFile) {
   }
 }
 
-// The list is the host's: what is in it stays.
+// The list belongs to the host: its entries stay.
 TEST_F(VelmarDriver, AppendsToTheList) {
   answers = {{kDirectory, kOkPrompt + AsciiLog("DIRENTA", "a,1,0,20121231,235959")}};
   CFileList files;
@@ -283,7 +283,7 @@ TEST_F(VelmarDriver, AppendsToTheList) {
   EXPECT_EQ(files.Count(), 2);
 }
 
-// What had come when the logs stopped following each other is listed all the same.
+// The logs before a gap in their numbers are still listed.
 TEST_F(VelmarDriver, ADirectoryWithAGapIsListedAsFarAsItWent) {
   answers = {{kDirectory,
               kOkPrompt + AsciiLog("DIRENTA", "a,1,0,20121231,235959", 3) +
@@ -372,7 +372,7 @@ TEST_F(VelmarDriver, HoldsTheConnectionWhileItChangesAFile) {
   EXPECT_TRUE(IsFreeForOthers(driver));
 }
 
-// Names go out in the code page of the thread, as they are.
+// Names are sent unchanged in the code page of the thread.
 TEST_F(VelmarDriver, NamesAreInTheCodePageOfTheThread) {
   constexpr LCID kGreek = 0x0408;
   const LCID before = GetThreadLocale();
@@ -433,7 +433,7 @@ TEST_F(VelmarDriver, AnAbortEndsAPortSettingBeforeItIsSent) {
   EXPECT_THAT(connection->Writes(), ElementsAre(kConfig));
 }
 
-TEST_F(VelmarDriver, APortSettingUsesTheAbortUp) {
+TEST_F(VelmarDriver, APortSettingClearsTheAbort) {
   answers = {{kConfig, ConfigReply()}};
   driver.Abort();
   EXPECT_EQ(driver.DCSetRcvBaudrate(57600), S_FALSE);
@@ -442,8 +442,8 @@ TEST_F(VelmarDriver, APortSettingUsesTheAbortUp) {
   EXPECT_THAT(connection->Writes(), ElementsAre(kConfig, kConfig, "COM 57600 E 7 2 XON\r"));
 }
 
-// It is looked for between the two commands only: one that comes with the second stays for the next
-// operation.
+// The abort is checked only between the two commands: one that comes with the second stays set for
+// the next operation.
 TEST_F(VelmarDriver, AnAbortWithTheSettingItselfOutlivesIt) {
   answers = {{kConfig, ConfigReply()}};
   before_command = [&](const std::string& command) {
@@ -498,8 +498,8 @@ TEST_F(VelmarDriver, SendsItsSettingsAsTheyAre) {
                           "COM 9600 E 7 255 XON\r"));
 }
 
-// The port that the receiver is talked to on is in the header of its log.
-TEST_F(VelmarDriver, ChangesThePortThatItTalksOn) {
+// The header of the log names the port in use.
+TEST_F(VelmarDriver, ChangesThePortThatItUses) {
   const std::string ports =
       "2,COM1,9600,N,8,1,N,ON,OFF,NOVATEL,NOVATEL,ON,COM2,38400,O,7,2,CTS,ON,OFF,NOVATEL,NOVATEL,"
       "ON";
@@ -527,7 +527,7 @@ TEST_F(VelmarDriver, PortSettingsHoldTheConnection) {
 
 // --- One command
 
-// Ends as it is told, with a reply of its own.
+// Ends with a given result and a reply of its own.
 class Ending : public VelmarCommands::CVelmarCommand {
  public:
   explicit Ending(HRESULT result) : CVelmarCommand("x", 0), result_(result) {}
@@ -568,7 +568,7 @@ TEST_F(VelmarDriver, AConnectionWithoutANameHasAnEmptyOne) {
               ElementsAre("CVelmarProtocol::DumpInvalidResponse - [0x80070005] [] []"));
 }
 
-TEST_F(VelmarDriver, AReplyThatIsNotThereCannotBeWritten) {
+TEST_F(VelmarDriver, AMissingReplyIsNotTraced) {
   Ending command(E_ACCESSDENIED);
   command.SetReply("text");
   command.FreeReply();
@@ -595,7 +595,7 @@ TEST_F(VelmarDriver, AnAbortReachesTheCommandThatRuns) {
   EXPECT_FALSE(next.IsCancelled(nullptr));
 }
 
-TEST_F(VelmarDriver, WithoutACallbackNobodyIsTold) {
+TEST_F(VelmarDriver, WithoutACallbackThereIsNoProgress) {
   driver.SetCallback(nullptr);
   EXPECT_EQ(driver.DeleteFile(L"a"), S_OK);
   EXPECT_THAT(percents, IsEmpty());

@@ -10,7 +10,7 @@ inline const std::string kOkPrompt = "\r\n<OK\r\n[COM1]";
 inline const std::string kErrorPrompt = "\r\n<ERROR:[COM1]";
 inline const std::string kErrorTextPrompt = "\r\n<ERROR:Invalid message\r\n[COM1]";
 
-// An ASCII log: ten header fields, the body, a checksum that nobody checks.
+// An ASCII log: ten header fields, the body, a checksum that is not checked.
 inline std::string AsciiLog(const std::string& name,
                             const std::string& body,
                             int sequence = 0,
@@ -19,7 +19,7 @@ inline std::string AsciiLog(const std::string& name,
          ",55.0,FINESTEERING,1888,405078.5,00000000,0000,1111;" + body + "*12345678\r\n";
 }
 
-// A binary FILETRANSFER log around a chunk. The lengths may lie.
+// A binary FILETRANSFER log around a chunk. The lengths may be wrong.
 struct BinaryLog {
   std::string chunk;
   uint16_t sequence = 0;

@@ -11,7 +11,7 @@ namespace {
 
 constexpr WORD kWinsockVersion = 0x0202;
 
-// Winsock counts its users.
+// Each user must start and clean up Winsock.
 class WinsockUser {
  public:
   WinsockUser() {
@@ -25,10 +25,12 @@ class WinsockUser {
 
 sockaddr_in ServerAddress() {
   const char* const value = std::getenv("RCVLINK_BED");
-  if (value == nullptr) throw Error("RCVLINK_BED is not set: start the tests with ./test");
+  if (value == nullptr) {
+    throw Error("RCVLINK_BED is not set: start the tests with ./test, or see tests/README.md");
+  }
   const std::string text = value;
   const size_t colon = text.find(':');
-  if (colon == std::string::npos) throw Error("RCVLINK_BED is no address: " + text);
+  if (colon == std::string::npos) throw Error("RCVLINK_BED is not HOST:PORT: " + text);
   sockaddr_in address{};
   address.sin_family = AF_INET;
   address.sin_addr.s_addr = inet_addr(text.substr(0, colon).c_str());

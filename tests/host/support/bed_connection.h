@@ -1,5 +1,5 @@
-// A client of the bed server (tests/bed/bed.py), which does on the Unix side what a test under Wine
-// cannot do itself. The server's address is in the environment variable RCVLINK_BED.
+// A client of the bed server (tests/bed/bed.py), which does on Linux what a test under Wine cannot
+// do itself. The server's address is in the environment variable RCVLINK_BED.
 #ifndef RCVLINK_TESTS_HOST_SUPPORT_BED_CONNECTION_H_
 #define RCVLINK_TESTS_HOST_SUPPORT_BED_CONNECTION_H_
 
@@ -10,7 +10,7 @@
 
 namespace bed {
 
-// The bed is not there, or refused a request.
+// The bed server does not answer, or refused a request.
 class Error : public std::runtime_error {
  public:
   using std::runtime_error::runtime_error;
@@ -32,7 +32,7 @@ class Connection {
   void Send(const std::string& text);
   std::string ReceiveLine();
 
-  // A SOCKET. Winsock's header, which wants to come before <windows.h>, stays out of this one.
+  // A SOCKET. Winsock's header must come before <windows.h>, so it is not included here.
   std::uintptr_t socket_;
   std::string received_;
 };

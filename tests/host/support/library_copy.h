@@ -1,5 +1,5 @@
-// A second copy of the library under another name, with a state of its own, that a test loads and
-// unloads while it looks on.
+// A second copy of the library under another name, with its own state, which a test loads and
+// unloads.
 #ifndef RCVLINK_TESTS_HOST_SUPPORT_LIBRARY_COPY_H_
 #define RCVLINK_TESTS_HOST_SUPPORT_LIBRARY_COPY_H_
 
@@ -28,8 +28,8 @@ class LibraryCopy {
   void CreateReport(const std::wstring& name) const;
   long CreateReceiver(const std::wstring& port, void** handle) const;
 
-  // Raises an exception inside the library, which ends there: opens a port that is not there. False
-  // when that gives another result than it should.
+  // Raises an exception that the library catches: opens a port that does not exist. False when the
+  // result is not the expected one.
   bool FailToOpen(const std::wstring& missing_port) const;
 
  private:

@@ -7,7 +7,7 @@
 
 namespace host {
 
-// What another thread gets at once: S_OK where the lock was free, which it is again then, or
+// What another thread gets at once: S_OK if the lock was free (it is released again), otherwise
 // S_FALSE.
 inline long TryLockElsewhere(void* receiver) {
   return OnThread([receiver] {

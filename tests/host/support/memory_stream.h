@@ -1,4 +1,4 @@
-// A COM stream that keeps what is written to it, and can be told to fail.
+// A COM stream that keeps what is written to it, and fails when the test says so.
 #ifndef RCVLINK_TESTS_HOST_SUPPORT_MEMORY_STREAM_H_
 #define RCVLINK_TESTS_HOST_SUPPORT_MEMORY_STREAM_H_
 
@@ -12,7 +12,7 @@
 
 namespace host {
 
-// Lives on the stack of a test: nobody frees it by counting references.
+// Lives on the stack of a test: its reference count frees nothing.
 class MemoryStream : public IStream {
  public:
   std::string bytes;                // what came so far

@@ -19,11 +19,11 @@ enum class Output {
 
 struct ProgramResult {
   int status = 0;
-  // On a console, what stands on the screen at the end. Lines end in \n.
+  // On a console, the screen at the end. Lines end in \n.
   std::string output;
-  // What went to the standard error; empty on a console, which does not tell them apart.
+  // The standard error; empty on a console, which does not separate it.
   std::string errors;
-  // On a console, every text that a line has shown in turn: the steps of a progress bar.
+  // On a console, every text that a line has shown, in order: the steps of a progress bar.
   std::vector<std::string> history;
 };
 
@@ -36,7 +36,7 @@ class Program {
           Output output = Output::kPipe,
           const std::string& unix_folder = {});
 
-  // Waits until the output holds `text`; raises Error when the program ends without it.
+  // Waits until the output contains `text`; raises Error when the program ends without it.
   void Expect(std::string_view text, std::chrono::seconds timeout = std::chrono::seconds(30));
   // Ctrl-C.
   void Interrupt();

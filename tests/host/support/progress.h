@@ -12,7 +12,7 @@
 
 namespace host {
 
-// Keeps the percents that it is told, and calls a function for each.
+// Keeps the reported percents, and calls a function for each.
 class Progress {
  public:
   using Hook = std::function<void(int percent)>;
@@ -36,22 +36,22 @@ class Progress {
   Hook hook_;
 };
 
-// Holds one thread at a place until another has done something there.
+// Stops one thread at a place until another thread opens the gate.
 class Gate {
  public:
   Gate() : arrival_(arrived_.get_future()), permission_(opened_.get_future()) {}
   Gate(const Gate&) = delete;
   Gate& operator=(const Gate&) = delete;
-  // A test that failed in between holds nobody.
+  // A test that failed must not leave a thread waiting.
   ~Gate() { Open(); }
 
-  // On the thread to be held; only the first time.
+  // On the thread to be stopped; only the first time.
   void Pass() {
     if (std::exchange(passed_, true)) return;
     arrived_.set_value();
     permission_.wait();
   }
-  // False when nobody comes for a long time.
+  // False when no thread comes for a long time.
   bool WaitForArrival() {
     return arrival_.wait_for(std::chrono::seconds(60)) == std::future_status::ready;
   }

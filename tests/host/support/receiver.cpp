@@ -7,7 +7,7 @@
 namespace host {
 namespace {
 
-// The last that a host says in its greeting, as the receiver takes it.
+// The last command of the handshake, as in the transcript.
 constexpr const char* kEndOfGreeting = " echo /dev/null\n";
 
 constexpr auto kPatience = std::chrono::seconds(20);
@@ -96,7 +96,7 @@ Identity OpenReceiver::Identify() const {
   CReceiverInfo info{};
   Identity identity;
   identity.result = devapi::GetReceiverInfo(handle_, nullptr, &info);
-  // A failure leaves the receiver locked.
+  // A failed call leaves the receiver locked.
   if (identity.result != S_OK) devapi::UnlockConnection(handle_);
   identity.id = TakeText(info.bstrReceiverId);
   identity.model = TakeText(info.bstrModel);

@@ -67,7 +67,7 @@ class OpenReceiver {
 
   void* get() const { return handle_; }
   void** out() { return &handle_; }
-  // Gives the handle away.
+  // Gives up the ownership of the handle.
   void* Release() { return std::exchange(handle_, nullptr); }
 
   HRESULT Download(const std::wstring& name, IStream& stream, Progress* progress = nullptr) const;
@@ -82,14 +82,14 @@ class OpenReceiver {
 // The receiver on a simulated port.
 class Receiver : public OpenReceiver {
  public:
-  // Raises bed::Error when it does not answer. Returns when the whole greeting has passed.
+  // Raises bed::Error when it does not answer. Returns when the handshake is complete.
   explicit Receiver(const bed::SimulatedPort& port, DWORD speed = CBR_9600);
 
-  // What has passed since the greeting.
+  // The transcript since the handshake.
   Lines WireSince() const { return WireLines(port_.Transcript(), greeting_); }
   Lines SentSince() const { return SentByHost(port_.Transcript(), greeting_); }
-  // Wait until the host has sent so many lines since, or such a line last; raise bed::Error when
-  // that does not come.
+  // Wait until the host has sent this many lines since the handshake, or this line last; raise
+  // bed::Error when that does not happen.
   void WaitForSent(size_t count) const;
   void WaitForLastSent(std::string_view line) const;
 
@@ -97,7 +97,7 @@ class Receiver : public OpenReceiver {
   void WaitUntil(const std::function<bool(const Lines& sent)>& done) const;
 
   const bed::SimulatedPort& port_;
-  size_t greeting_ = 0;  // how many lines of the transcript it took
+  size_t greeting_ = 0;  // how many lines of the transcript the handshake has
 };
 
 // The receiver on a simulated USB device.
@@ -106,7 +106,7 @@ class UsbReceiver : public OpenReceiver {
   // Raises bed::Error when it does not answer.
   explicit UsbReceiver(const bed::SimulatedUsb& usb);
 
-  // What has passed since it was found.
+  // The transcript since it was found.
   Lines WireSince() const { return WireLines(usb_.Transcript(), greeting_); }
   Lines SentSince() const { return SentByHost(usb_.Transcript(), greeting_); }
 
@@ -115,7 +115,7 @@ class UsbReceiver : public OpenReceiver {
   size_t greeting_ = 0;
 };
 
-// Bytes of which no two blocks look alike.
+// Bytes without two equal blocks.
 std::string Content(size_t size);
 
 }  // namespace host

@@ -9,16 +9,16 @@
 
 namespace host {
 
-// A report's name that no other test uses.
+// A name for a report that no other test uses.
 std::wstring NewReportName();
-// Where a report of that name is.
+// The path of a report of this name.
 std::wstring ReportPath(const std::wstring& name);
-// What is in a report; empty when there is none.
+// The content of a report; empty when there is none.
 std::string ReadReport(const std::wstring& path);
 // Its lines without stamps and line ends; kernel handles and addresses read [HANDLE].
 std::vector<std::string> ReportLines(const std::wstring& path);
 
-// Opens a report for the length of a test.
+// Opens a report during a test.
 class Report {
  public:
   Report();
@@ -30,10 +30,10 @@ class Report {
   std::vector<std::string> Lines() const { return ReportLines(path_); }
   // The lines from number `first` on.
   std::vector<std::string> LinesFrom(size_t first) const;
-  // Those that begin so.
+  // The lines that begin with this text.
   std::vector<std::string> LinesWith(std::string_view start) const;
   bool Has(std::string_view line) const;
-  // Waits until one of the lines from number `first` on begins so; raises bed::Error when none
+  // Waits until a line from number `first` on begins with this text; raises bed::Error when none
   // comes.
   void WaitFor(std::string_view start, size_t first = 0) const;
 

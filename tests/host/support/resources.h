@@ -1,4 +1,4 @@
-// How much this process has of what it can run out of.
+// The limited resources that this process uses.
 #ifndef RCVLINK_TESTS_HOST_SUPPORT_RESOURCES_H_
 #define RCVLINK_TESTS_HOST_SUPPORT_RESOURCES_H_
 
@@ -20,7 +20,7 @@ struct Resources {
 
 std::ostream& operator<<(std::ostream& stream, const Resources& resources);
 
-// Takes all free slots and gives them back: nothing else may need one meanwhile.
+// Takes and frees all free slots: no other thread may need one at that moment.
 Resources CountResources();
 
 // The bytes in use on all heaps of the process.

@@ -28,7 +28,7 @@ std::wstring FromUtf8(const std::string& text) {
   return std::filesystem::path(std::u8string(text.begin(), text.end())).wstring();
 }
 
-// The word as a program finds it again in its command line.
+// Quotes a word, so that a program finds it unchanged in its command line.
 std::wstring Quoted(const std::wstring& word) {
   std::wstring quoted = L"\"";
   size_t backslashes = 0;
@@ -124,7 +124,7 @@ Started StartProgram(const std::vector<std::string>& arguments) {
   return {UsbHandle(started.hProcess), std::move(input.write), std::move(output.read)};
 }
 
-// What comes before the end of a line, or of the output; false when it was the latter.
+// The text before the end of a line or of the output; false at the end of the output.
 bool ReadLine(HANDLE output, std::string& line) {
   char character = 0;
   DWORD count = 0;

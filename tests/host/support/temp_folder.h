@@ -9,7 +9,7 @@
 
 namespace bed {
 
-// The same place under its two names: Wine shows the Unix root folder as drive Z.
+// The same folder under two names: Wine shows the Linux root folder as drive Z.
 std::filesystem::path ToWindowsPath(const std::string& unix_path);
 std::string ToUnixPath(const std::filesystem::path& windows_path);
 
@@ -29,7 +29,7 @@ class TempFolder {
   std::string Read(const std::string& name) const;
 
  private:
-  mutable Connection connection_;  // asking changes nothing of the folder
+  mutable Connection connection_;  // a request does not change the folder
   std::string unix_path_;
   std::filesystem::path path_;
 };

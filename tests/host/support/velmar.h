@@ -36,17 +36,17 @@ class Velmar {
   }
 
   void* get() const { return handle_; }
-  // Gives the handle away.
+  // Gives up the ownership of the handle.
   void* Release() { return std::exchange(handle_, nullptr); }
 
-  // What the host said since the greeting.
+  // What the host sent since the handshake.
   Lines Sent() const {
     Lines sent = SentByHost(port.Transcript());
     EXPECT_GE(sent.size(), kQuestionsOfGreeting);
     sent.erase(sent.begin(), sent.begin() + kQuestionsOfGreeting);
     return sent;
   }
-  // The same, with the pieces of files and the speeds that took hold in between.
+  // The same, with the chunks of files and the changes of speed.
   Lines SentAndMoved() const {
     Lines lines;
     size_t questions = 0;
