@@ -5,13 +5,8 @@
 namespace {
 
 constexpr uint8_t kEndOfBlock = 0x03;
-constexpr int kBitsOfByte = 8;
 
 }  // namespace
-
-uint16_t Block::Word(size_t offset) const {
-  return static_cast<uint16_t>(bytes_[offset] | (bytes_[offset + 1] << kBitsOfByte));
-}
 
 std::optional<size_t> Block::PayloadLength() const {
   if (Type() != BlockType::kLast) return kBlockPayload;

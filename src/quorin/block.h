@@ -17,6 +17,8 @@
 #include <optional>
 #include <span>
 
+#include "platform/little_endian.h"
+
 constexpr uint8_t kAck = 0x06;            // accepted, send the next
 constexpr uint8_t kNak = 0x15;            // start; or send the current block again
 constexpr uint8_t kEndOfTransfer = 0x23;  // '#'
@@ -45,7 +47,7 @@ class Block {
   bool IsChainedTo(uint16_t previous_crc) const;
 
  private:
-  uint16_t Word(size_t offset) const;
+  uint16_t Word(size_t offset) const { return rcvlink::ReadUint16(bytes_, offset); }
 
   std::array<uint8_t, kBlockLength> bytes_{};
 };

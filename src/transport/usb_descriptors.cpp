@@ -1,5 +1,7 @@
 #include "transport/usb_descriptors.h"
 
+#include "platform/little_endian.h"
+
 namespace {
 
 // Offsets within descriptors and values of their fields, from the USB 2.0 standard, chapter 9.6.
@@ -16,13 +18,10 @@ constexpr uint8_t kTransferTypeMask = 0x03;
 constexpr uint8_t kBulk = 0x02;
 constexpr uint8_t kDirectionIn = 0x80;
 
-constexpr int kBitsOfByte = 8;
-
 }  // namespace
 
 size_t TotalLength(std::span<const uint8_t, kConfigurationDescriptorLength> configuration) {
-  return static_cast<size_t>(configuration[kTotalLength] |
-                             (configuration[kTotalLength + 1] << kBitsOfByte));
+  return rcvlink::ReadUint16(configuration, kTotalLength);
 }
 
 std::optional<BulkEndpoints> FindBulkEndpoints(std::span<const uint8_t> descriptors) {

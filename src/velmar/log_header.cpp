@@ -23,9 +23,4 @@ void BinaryHeader::Assign(std::string_view log) {
   std::copy_n(log.begin(), kLength, bytes_.begin());
 }
 
-uint16_t BinaryHeader::Word(size_t offset) const {
-  constexpr int kBitsOfByte = 8;
-  return static_cast<uint16_t>(bytes_[offset] | (bytes_[offset + 1] << kBitsOfByte));
-}
-
 }  // namespace VelmarCommands

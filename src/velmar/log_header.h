@@ -8,6 +8,8 @@
 #include <string>
 #include <string_view>
 
+#include "platform/little_endian.h"
+
 namespace VelmarCommands {
 
 // The fields of an ASCII log's header that are read. There are ten of them before the ";".
@@ -40,7 +42,7 @@ class BinaryHeader {
  private:
   static constexpr size_t kCrcLength = 4;
 
-  uint16_t Word(size_t offset) const;
+  uint16_t Word(size_t offset) const { return rcvlink::ReadUint16(bytes_, offset); }
 
   std::array<uint8_t, kLength> bytes_{};
 };
