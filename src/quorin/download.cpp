@@ -12,7 +12,12 @@
 #include "quorin/quorin_protocol.h"
 #include "report/report_file.h"
 
-using namespace QuorinCommands;
+using QuorinCommands::CChangeBaudRateCmd;
+using QuorinCommands::CGetFileCmd;
+using QuorinCommands::CGetFileSizeCmd;
+using QuorinCommands::CGetPortCmd;
+using QuorinCommands::CQuorinCommand;
+using QuorinCommands::CSetBoudRateCmd;
 
 HRESULT CQuorinProtocol::DownloadFile(const wchar_t* name, IStream* stream, CProgressCallback*) {
   if (!name || !stream) return E_INVALIDARG;

@@ -12,7 +12,21 @@
 #include "report/report_file.h"
 #include "transport/wait_scope.h"
 
-using namespace QuorinCommands;
+using QuorinCommands::CChangeBaudRateCmd;
+using QuorinCommands::CChangeParityCmd;
+using QuorinCommands::CChangeRTSSignalCmd;
+using QuorinCommands::CChangeStopbitsCmd;
+using QuorinCommands::CDeleteFileCmd;
+using QuorinCommands::CDisableEchoCmd;
+using QuorinCommands::CEchoOffCmd;
+using QuorinCommands::CGetFileListCmd;
+using QuorinCommands::CGetPortCmd;
+using QuorinCommands::CGetReceiverIDCmd;
+using QuorinCommands::CGetReceiverModelCmd;
+using QuorinCommands::CPingCmd;
+using QuorinCommands::CQuorinCommand;
+using QuorinCommands::ReplyKind;
+using QuorinCommands::kNoReply;
 
 namespace {
 

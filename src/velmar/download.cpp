@@ -9,7 +9,17 @@
 #include "velmar/file_download.h"
 #include "velmar/velmar_protocol.h"
 
-using namespace VelmarCommands;
+using VelmarCommands::CGetFileHeaderCmd;
+using VelmarCommands::CLogConfigCommand;
+using VelmarCommands::CSetCurrentFileCmd;
+using VelmarCommands::CSetPortParamsCmd;
+using VelmarCommands::CUnlogAllCommand;
+using VelmarCommands::CVelmarCommand;
+using VelmarCommands::PortConfigLog;
+using VelmarCommands::RESPONSE_DATA;
+using VelmarCommands::RESPONSE_OK;
+using VelmarCommands::kRefusal;
+using VelmarCommands::kSendOnly;
 
 namespace {
 

@@ -4,7 +4,7 @@
 
 #include "velmar/velmar_protocol.h"
 
-using namespace VelmarCommands;
+using VelmarCommands::RESPONSE_DATA;
 
 namespace {
 

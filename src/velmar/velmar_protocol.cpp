@@ -11,7 +11,18 @@
 #include "report/report_file.h"
 #include "transport/wait_scope.h"
 
-using namespace VelmarCommands;
+using VelmarCommands::CDeleteFileCmd;
+using VelmarCommands::CGetFileListCmd;
+using VelmarCommands::CGetReceiverInfoCmd;
+using VelmarCommands::CLogConfigCommand;
+using VelmarCommands::CRenameFileCmd;
+using VelmarCommands::CSetInterfacemodeCommand;
+using VelmarCommands::CSetPortParamsCmd;
+using VelmarCommands::CUnlogAllCommand;
+using VelmarCommands::CVelmarCommand;
+using VelmarCommands::PortConfigLog;
+using VelmarCommands::RESPONSE_DATA;
+using VelmarCommands::RESPONSE_OK;
 
 namespace {
 
