@@ -25,8 +25,8 @@ using QuorinCommands::CGetReceiverIDCmd;
 using QuorinCommands::CGetReceiverModelCmd;
 using QuorinCommands::CPingCmd;
 using QuorinCommands::CQuorinCommand;
-using QuorinCommands::ReplyKind;
 using QuorinCommands::kNoReply;
+using QuorinCommands::ReplyKind;
 
 namespace {
 

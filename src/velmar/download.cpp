@@ -15,11 +15,11 @@ using VelmarCommands::CSetCurrentFileCmd;
 using VelmarCommands::CSetPortParamsCmd;
 using VelmarCommands::CUnlogAllCommand;
 using VelmarCommands::CVelmarCommand;
+using VelmarCommands::kRefusal;
+using VelmarCommands::kSendOnly;
 using VelmarCommands::PortConfigLog;
 using VelmarCommands::RESPONSE_DATA;
 using VelmarCommands::RESPONSE_OK;
-using VelmarCommands::kRefusal;
-using VelmarCommands::kSendOnly;
 
 namespace {
 
