@@ -3,7 +3,7 @@
 
 usage: run_tests.py [PROGRAM | GTEST_FILTER | --fast]
 
-The name of a program runs only that program; --fast runs those that open no port. Anything else is a
+The name of a program runs only that program; --fast runs the unit tests, which open no port. Anything else is a
 GoogleTest filter; programs that take no filter are then left out. The last line is "N passed, N failed", with
 ", N skipped" if there are any. The exit status is 0 only if something ran and nothing failed.
 """

@@ -1,5 +1,7 @@
 #include "tests/family/plain_command.h"
 
+#include "platform/hresult.h"
+
 namespace {
 
 constexpr std::string_view kEnd = "\n.\n";
@@ -21,7 +23,9 @@ HRESULT CPlainCommand::Execute(CIConnection* connection, HANDLE abort_event) {
     char character = 0;
     DWORD count = 0;
     result = connection->Read(&character, sizeof(character), &count, GetReadTimeout());
-    if (result != S_OK || AppendReply(&character, count) == E_OUTOFMEMORY) break;
+    if (result != S_OK) break;
+    if (count == 0) return kTimedOut;  // how a COM port of Windows tells a silence
+    if (AppendReply(&character, count) != S_OK) return E_OUTOFMEMORY;
     if (std::string_view(reinterpret_cast<const char*>(GetReply()), GetReplyLength())
             .ends_with(kEnd)) {
       return S_OK;

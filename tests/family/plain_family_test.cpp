@@ -6,9 +6,12 @@
 #include <iterator>
 #include <memory>
 #include <string>
+#include <thread>
 #include <vector>
 
 #include "api/discovery.h"
+#include "platform/handle.h"
+#include "platform/hresult.h"
 #include "platform/text.h"
 #include "tests/family/plain_protocol.h"
 #include "tests/host/support/file_list.h"

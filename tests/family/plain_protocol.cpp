@@ -37,17 +37,18 @@ std::string CPlainProtocol::Ask(const std::string& line) {
 
 HRESULT CPlainProtocol::GetReceiverInfo(HANDLE abort_event, CReceiverInfo* info) {
   if (!info) return E_INVALIDARG;
-  return CatchResult([&] {
-    const HRESULT lock_result = LockConnection(abort_event);
-    if (lock_result != S_OK) return lock_result;
+  const HRESULT lock_result = LockConnection(abort_event);
+  if (lock_result != S_OK) return lock_result;
+  const HRESULT result = CatchResult([&] {
     UniqueBstr id = CopyBstr(ToWide(Ask("id")).c_str());
     UniqueBstr model = CopyBstr(L"Plain");
-    UnlockConnection();
     info->dwProtocol = kPlain;
     info->bstrReceiverId = id.release();
     info->bstrModel = model.release();
     return S_OK;
   });
+  UnlockConnection();
+  return result;
 }
 
 // A line for each file: its size, a space, its name.
