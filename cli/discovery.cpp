@@ -218,7 +218,9 @@ FoundReceiver FindReceiverAt(const Context& context,
                              const SearchPlace& place,
                              SearchDisplay& display) {
   const Arguments& arguments = context.arguments;
-  if (!IsComPort(place.port)) RefuseFile(place.port);
+  // The USB link would open a file of that name in the current folder. On the serial link COM7 is
+  // always the port.
+  if (!IsComPort(place.port) || place.link != eInstanceSerial) RefuseFile(place.port);
   const bool any = place.link == eInstanceAny;
   SearchPlace tried{place.port, any ? eInstanceSerial : place.link};
   SearchResult result = tried.link == eInstanceUSB ? SearchUsb(context, place.port)

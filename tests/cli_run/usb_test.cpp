@@ -108,6 +108,16 @@ TEST_F(UsbCli, ADeviceOfAnotherLayoutHasNoReceiver) {
   EXPECT_THAT(result.errors, HasSubstr("no receiver answered"));
 }
 
+// Its name is that of no device, so the USB link would open it.
+TEST_F(UsbCli, AFileNamedAsAPortIsNoPort) {
+  folder.Write("COM77", Content(3000));
+  for (const char* link : {"usb", "any"}) {
+    const auto result = Run({"find", "COM77", "--link", link});
+    EXPECT_EQ(result.status, kUsage) << result.errors;
+    EXPECT_EQ(folder.Read("COM77"), Content(3000));
+  }
+}
+
 TEST_F(UsbCli, AFileOfThisComputerIsNoPort) {
   folder.Write("survey.jps", Content(3000));
   for (const char* link : {"usb", "any"}) {
