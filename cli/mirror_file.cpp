@@ -19,45 +19,26 @@ Failure Difference(const MirrorJob& job, std::string meaning, std::string hint) 
           .hint = std::move(hint)};
 }
 
-/// The temporary file of a download; deleted unless it is renamed.
-class NewFile {
- public:
-  /// @throws Failure when there is a file of that name
-  explicit NewFile(const std::filesystem::path& target) : path_(target.native() + L".new") {
-    if (!Exists(path_)) return;
-    Failure failure = LocalFailure("make " + Printable(path_.native()), ERROR_FILE_EXISTS);
-    failure.hint =
-        "An interrupted mirror left it, or another mirror is running here. If none is running, "
-        "delete it.";
-    throw failure;
-  }
-  ~NewFile() { DeleteFileW(path_.c_str()); }
-  NewFile(const NewFile&) = delete;
-  NewFile& operator=(const NewFile&) = delete;
-
-  const std::filesystem::path& path() const { return path_; }
-
- private:
-  std::filesystem::path path_;
-};
+/// A file of this computer may be replaced when it is the beginning of the receiver's, as of a log that
+/// has grown.
+/// @throws Failure when it is another one
+void CheckBeginning(const MirrorJob& job, bool is_beginning) {
+  if (is_beginning) return;
+  throw Difference(
+      job,
+      "the file of that name on this computer is not the beginning of the receiver's file",
+      "Move that file away, or use --force to replace it.");
+}
 
 std::string DownloadNew(Context& context, Receiver& receiver, const MirrorJob& job, bool verify) {
-  const NewFile file(job.target);
-  std::string sha256;
-  {
-    // What an earlier mirror kept of the file is out of date.
-    PartFile part(file.path(), /*overwrite=*/true);
-    sha256 = Download(context, receiver, job.file, part, {.verify = verify}).sha256;
-  }
-  const bool replaces = Exists(job.target);
-  if (replaces && !context.arguments.force && !BeginsWith(file.path(), job.target)) {
-    throw Difference(
-        job,
-        "the file of that name on this computer is not the beginning of the receiver's file",
-        "Move that file away, or use --force to replace it.");
-  }
-  MoveOver(file.path(), job.target);
-  return sha256;
+  const bool force = context.arguments.force;
+  // A longer file cannot be the beginning: that is known before the download.
+  if (!force) CheckBeginning(job, SizeOf(job.target).value_or(0) <= job.file.size);
+  const auto test = [&](const std::filesystem::path& part) {
+    if (!force && Exists(job.target)) CheckBeginning(job, BeginsWith(part, job.target));
+  };
+  PartFile part(job.target, {.part = force, .target = true}, test);
+  return Download(context, receiver, job.file, part, {.verify = verify}).sha256;
 }
 
 std::string Compare(Context& context, Receiver& receiver, const MirrorJob& job) {

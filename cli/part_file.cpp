@@ -8,15 +8,16 @@
 
 namespace cli {
 
-PartFile::PartFile(std::filesystem::path target, bool overwrite)
+PartFile::PartFile(std::filesystem::path target, Overwrite overwrite, Test test)
     : target_(std::move(target)),
       part_(target_.native() + std::wstring(kPartSuffix)),
-      overwrite_(overwrite) {
+      overwrite_(overwrite),
+      test_(std::move(test)) {
   const HANDLE file = CreateFileW(part_.c_str(),
                                   GENERIC_WRITE | DELETE,
                                   0,
                                   nullptr,
-                                  overwrite ? CREATE_ALWAYS : CREATE_NEW,
+                                  overwrite.part ? CREATE_ALWAYS : CREATE_NEW,
                                   FILE_ATTRIBUTE_NORMAL,
                                   nullptr);
   const DWORD error = GetLastError();
@@ -56,7 +57,12 @@ void PartFile::Complete() {
   const DWORD flush_error = GetLastError();
   KeepIncomplete();
   if (flushed == FALSE) throw KeptFailure(FailureOf(flush_error));
-  const DWORD replace = overwrite_ ? MOVEFILE_REPLACE_EXISTING : 0;
+  try {
+    if (test_) test_(part_);
+  } catch (const Failure& failure) {
+    throw KeptFailure(failure);
+  }
+  const DWORD replace = overwrite_.target ? MOVEFILE_REPLACE_EXISTING : 0;
   if (MoveFileExW(part_.c_str(), target_.c_str(), replace | MOVEFILE_WRITE_THROUGH) == FALSE) {
     const DWORD error = GetLastError();
     Failure failure =

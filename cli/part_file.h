@@ -4,6 +4,7 @@
 #define RCVLINK_CLI_PART_FILE_H_
 
 #include <filesystem>
+#include <functional>
 
 #include "destination.h"
 #include "handle.h"
@@ -14,9 +15,19 @@ namespace cli {
 /// when the process is killed.
 class PartFile : public Destination {
  public:
-  /// @param overwrite whether files of either name may be replaced
+  /// Looks at the complete file before it gets its name.
+  /// @throws Failure when it may not have it
+  using Test = std::function<void(const std::filesystem::path& part)>;
+
+  struct Overwrite {
+    bool part = false;
+    bool target = false;
+  };
+
+  /// @param overwrite which files may be replaced
+  /// @param test may be empty
   /// @throws Failure when it cannot be made
-  PartFile(std::filesystem::path target, bool overwrite);
+  PartFile(std::filesystem::path target, Overwrite overwrite, Test test = {});
   ~PartFile() override;
 
   DWORD Write(const void* data, DWORD size) override;
@@ -34,7 +45,8 @@ class PartFile : public Destination {
 
   std::filesystem::path target_;
   std::filesystem::path part_;
-  bool overwrite_;
+  Overwrite overwrite_;
+  Test test_;
   bool kept_ = false;
   UniqueHandle file_;
 };

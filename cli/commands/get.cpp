@@ -34,6 +34,9 @@ struct GetOptions {
   /// Whether no file of this computer is made.
   bool IsStream() const { return ToStandardOutput() || SameLocalName(output, kNullDevice); }
 
+  /// Whether it is known which files are wanted, whatever the receiver lists.
+  bool NamesInFull() const { return !all && std::none_of(names.begin(), names.end(), IsPattern); }
+
   bool IsOneFile() const { return !all && names.size() == 1 && !IsPattern(names.front()); }
 };
 
@@ -72,7 +75,7 @@ class GetRun {
     if (!options_.IsStream()) CheckRoom(jobs);
     if (!options_.IsStream() && !jobs.empty()) MakeFolder(targets_.folder());
     DownloadAll(receiver, jobs);
-    if (options_.all) report_.SetComplete(directory.doubt);
+    if (!options_.NamesInFull()) report_.SetComplete(directory.doubt);
     if (options_.all && files.empty()) context_.PrintDone("The receiver lists no files.\n");
     return std::move(report_).Finish();
   }
@@ -178,7 +181,9 @@ class GetRun {
   std::unique_ptr<Destination> Open(const Job& job) const {
     if (options_.ToStandardOutput()) return std::make_unique<ToOutput>(context_.out);
     if (options_.IsStream()) return std::make_unique<Nowhere>();
-    return std::make_unique<PartFile>(job.target, context_.arguments.force);
+    const bool force = context_.arguments.force;
+    return std::make_unique<PartFile>(job.target,
+                                      PartFile::Overwrite{.part = force, .target = force});
   }
 
   void DownloadAll(Receiver& receiver, const std::vector<Job>& jobs) {

@@ -11,7 +11,7 @@ namespace {
 class FileStreamTest : public testing::Test {
  protected:
   TemporaryFolder folder_;
-  PartFile part_{folder_.path() / L"a", false};
+  PartFile part_{folder_.path() / L"a", {}};
   std::unique_ptr<FileStream, ComReleaser> stream_ = FileStream::Make(part_);
 };
 

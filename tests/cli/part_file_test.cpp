@@ -17,7 +17,7 @@ class PartFileTest : public testing::Test {
 
 TEST_F(PartFileTest, GetsItsNameWhenItIsComplete) {
   {
-    PartFile part(Target(), false);
+    PartFile part(Target(), {});
     EXPECT_TRUE(folder_.Has(L"a.part"));
     EXPECT_EQ(part.Write("hello", 5), DWORD{ERROR_SUCCESS});
     EXPECT_FALSE(folder_.Has(L"a"));
@@ -29,7 +29,7 @@ TEST_F(PartFileTest, GetsItsNameWhenItIsComplete) {
 
 TEST_F(PartFileTest, VanishesUnlessItIsKept) {
   {
-    PartFile part(Target(), false);
+    PartFile part(Target(), {});
     part.Write("hello", 5);
   }
   EXPECT_FALSE(folder_.Has(L"a"));
@@ -39,7 +39,7 @@ TEST_F(PartFileTest, VanishesUnlessItIsKept) {
 TEST_F(PartFileTest, AnIncompleteFileCanBeKept) {
   std::wstring path;
   {
-    PartFile part(Target(), false);
+    PartFile part(Target(), {});
     part.Write("hel", 3);
     path = part.KeepIncomplete();
   }
@@ -52,7 +52,7 @@ TEST_F(PartFileTest, AnIncompleteFileCanBeKept) {
 TEST_F(PartFileTest, ACompleteFileSurvivesARenameThatFails) {
   folder_.Write(L"a", "precious");
   {
-    PartFile part(Target(), false);
+    PartFile part(Target(), {});
     part.Write("hello", 5);
     try {
       part.Complete();
@@ -69,7 +69,7 @@ TEST_F(PartFileTest, ACompleteFileSurvivesARenameThatFails) {
 TEST_F(PartFileTest, OverwritesWhenItMay) {
   folder_.Write(L"a", "old");
   {
-    PartFile part(Target(), true);
+    PartFile part(Target(), {.part = true, .target = true});
     part.Write("new", 3);
     part.Complete();
   }
@@ -78,18 +78,18 @@ TEST_F(PartFileTest, OverwritesWhenItMay) {
 
 TEST_F(PartFileTest, LeavesAnothersPartAlone) {
   folder_.Write(L"a.part", "another's");
-  EXPECT_THROW(PartFile(Target(), false), Failure);
+  EXPECT_THROW(PartFile(Target(), {}), Failure);
   EXPECT_EQ(folder_.Read(L"a.part"), "another's");
 }
 
 TEST_F(PartFileTest, TwoDownloadsCannotShareAPart) {
-  const PartFile first(Target(), false);
-  EXPECT_THROW(PartFile(Target(), true), Failure);
+  const PartFile first(Target(), {});
+  EXPECT_THROW(PartFile(Target(), {.part = true, .target = true}), Failure);
 }
 
 TEST_F(PartFileTest, ReportsWhyItCannotBeMade) {
   try {
-    const PartFile part(folder_.path() / L"none" / L"a", false);
+    const PartFile part(folder_.path() / L"none" / L"a", {});
     ADD_FAILURE() << "was made";
   } catch (const Failure& failure) {
     EXPECT_EQ(failure.exit, ExitCode::kLocalFile);

@@ -1,4 +1,6 @@
 // rcvlink-cli mirror: what is downloaded, what is kept, what is deleted, and the exit codes.
+#include <windows.h>
+
 #include <chrono>
 #include <nlohmann/json.hpp>
 
@@ -91,7 +93,9 @@ TEST_F(Mirror, AnotherFileOfTheSameNameStays) {
   EXPECT_THAT(result.errors, HasSubstr("is not the beginning of the receiver's file"));
   EXPECT_EQ(folder.Read("out/a.jps"), "yesterday's log");
   EXPECT_EQ(folder.Read("out/b.jps"), Content(30));
-  EXPECT_EQ(Mirrored(), (Names{"a.jps", "b.jps"}));
+  // Nor is the download lost.
+  EXPECT_EQ(folder.Read("out/a.jps.part"), Content(300));
+  EXPECT_EQ(Mirrored(), (Names{"a.jps", "a.jps.part", "b.jps"}));
 
   EXPECT_EQ(RunMirror(receiver, {"--force"}).status, kDone);
   EXPECT_EQ(folder.Read("out/a.jps"), Content(300));
@@ -104,22 +108,24 @@ TEST_F(Mirror, GoesOnAfterAFileThatFailed) {
   EXPECT_EQ(result.status, kFailed);
   EXPECT_EQ(folder.Read("out/b.jps"), Content(30));
   // Its data is kept: it may be a log that is still being recorded.
-  EXPECT_EQ(Mirrored(), (Names{"a.jps.new.part", "b.jps"}));
+  EXPECT_EQ(Mirrored(), (Names{"a.jps.part", "b.jps"}));
   const json document = json::parse(result.output);
   EXPECT_TRUE(FileOf(document, "a.jps").contains("error"));
   EXPECT_EQ(FileOf(document, "b.jps").at("done"), "downloaded");
   EXPECT_EQ(document.at("summary").at("downloaded"), 1);
   EXPECT_EQ(document.at("summary").at("failed"), 1);
 
-  // In the next run it is out of date.
+  // The next run does not touch it.
   const bed::SimulatedPort ready({"quorin"}, {{"a.jps", Content(4000)}, {"b.jps", Content(30)}});
-  EXPECT_EQ(RunMirror(ready).status, kDone);
+  EXPECT_EQ(RunMirror(ready).status, kLocalFile);
+  EXPECT_EQ(folder.Read("out/a.jps.part"), Content(3000));
+  EXPECT_EQ(RunMirror(ready, {"--force"}).status, kDone);
   EXPECT_EQ(Mirrored(), (Names{"a.jps", "b.jps"}));
   EXPECT_EQ(folder.Read("out/a.jps"), Content(4000));
 }
 
 TEST_F(Mirror, TheWorstFailureCounts) {
-  folder.Write("out/b.jps.new", "left");
+  folder.Write("out/b.jps.part", "left");
   const bed::SimulatedPort receiver({"quorin", "--lie-size", "a.jps=4000"},
                                     {{"a.jps", Content(3000)}, {"b.jps", Content(30)}});
   EXPECT_EQ(RunMirror(receiver).status, kFailed);
@@ -135,11 +141,38 @@ TEST_F(Mirror, AFileThatTheProtocolCannotNumberIsLeftOut) {
 }
 
 TEST_F(Mirror, AFileThatIsLeftFromAnEarlierRunStopsOnlyItsOwn) {
-  folder.Write("out/a.jps.new", "left");
+  folder.Write("out/a.jps.part", "left");
   const bed::SimulatedPort receiver({"quorin"}, {{"a.jps", Content(300)}, {"b.jps", Content(30)}});
   EXPECT_EQ(RunMirror(receiver).status, kLocalFile);
-  EXPECT_EQ(folder.Read("out/a.jps.new"), "left");
-  EXPECT_EQ(Mirrored(), (Names{"a.jps.new", "b.jps"}));
+  EXPECT_EQ(folder.Read("out/a.jps.part"), "left");
+  EXPECT_EQ(Mirrored(), (Names{"a.jps.part", "b.jps"}));
+}
+
+TEST_F(Mirror, ADownloadThatCannotGetItsNameIsKept) {
+  folder.Write("out/a.jps", Content(100));
+  const bed::SimulatedPort receiver({"quorin"}, {{"a.jps", Content(3000)}});
+  const HANDLE open = CreateFileW((folder / "out/a.jps").c_str(),
+                                  GENERIC_READ,
+                                  FILE_SHARE_READ,
+                                  nullptr,
+                                  OPEN_EXISTING,
+                                  0,
+                                  nullptr);
+  ASSERT_NE(open, INVALID_HANDLE_VALUE);
+  const auto result = RunMirror(receiver);
+  CloseHandle(open);
+  EXPECT_EQ(result.status, kLocalFile);
+  EXPECT_THAT(result.errors, HasSubstr("a.jps.part"));
+  EXPECT_EQ(folder.Read("out/a.jps.part"), Content(3000));
+  EXPECT_EQ(folder.Read("out/a.jps"), Content(100));
+}
+
+TEST_F(Mirror, ALongerFileHereIsRefusedBeforeTheFirstByte) {
+  folder.Write("out/a.jps", Content(301));
+  const bed::SimulatedPort receiver({"quorin"}, {{"a.jps", Content(300)}});
+  EXPECT_EQ(RunMirror(receiver).status, kFailed);
+  EXPECT_THAT(receiver.Transcript(), Not(HasSubstr("get,")));
+  EXPECT_EQ(folder.Read("out/a.jps"), Content(301));
 }
 
 TEST_F(Mirror, EndsWhenTheReceiverIsGone) {
