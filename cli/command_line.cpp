@@ -209,7 +209,9 @@ void CheckArguments(const Arguments& arguments, bool needs_port) {
   if ((needs_port && arguments.port.empty()) || control) {
     throw UsageError("the port name is empty or contains a control character");
   }
-  if (needs_port && arguments.link == eInstanceUSB && (arguments.speed || arguments.rts)) {
+  // A speed of the environment is about serial ports only, and nobody asked for it here.
+  const bool asked_speed = arguments.speed && std::getenv("RCVLINK_SPEED") == nullptr;
+  if (needs_port && arguments.link == eInstanceUSB && (asked_speed || arguments.rts)) {
     throw UsageError("--speed and --rts apply to serial ports, not to --link usb");
   }
   if (!arguments.report.empty() && !IsPlainFileName(arguments.report)) {
@@ -228,7 +230,9 @@ CommandLine Checked(CLI::App& app, Arguments& arguments, Commands commands) {
     CheckArguments(arguments, port != nullptr && (port->count() > 0 || !arguments.port.empty()));
     command->Check();
   } catch (Failure& failure) {
-    failure.tried = std::string("start `") + command->text().word + "`";
+    const std::string word = command->text().word;
+    failure.tried = "start `" + word + "`";
+    failure.hint = "`rcvlink-cli " + word + " --help` shows its arguments and options.";
     failure.port = Printable(arguments.port);
     throw;
   }
@@ -267,6 +271,7 @@ std::variant<CommandLine, HelpText> ParseCommandLine(const std::vector<std::stri
   app.get_formatter()->column_width(kHelpColumn);
   app.allow_windows_style_options(false);  // a file's name may begin with a slash
   app.fallthrough();
+  app.allow_config_extras(CLI::config_extras_mode::error);
   app.require_subcommand(0, 1);  // none: `TakeChosen` has the better message
   app.set_version_flag("--version", "rcvlink-cli " RCVLINK_VERSION);
   Arguments arguments;

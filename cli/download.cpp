@@ -131,6 +131,14 @@ Failure WhyIncomplete(const Context& context,
   return failure;
 }
 
+/// No protocol transfers a file without bytes.
+Downloaded WithoutBytes(Destination& destination) {
+  const auto stream = FileStream::Make(destination);
+  stream->Detach();
+  destination.Complete();
+  return {.milliseconds = 0, .sha256 = stream->TakeHash()};
+}
+
 }  // namespace
 
 void CheckSize(Receiver& receiver, const RemoteFile& file) {
@@ -154,6 +162,7 @@ Downloaded Download(Context& context,
                     const DownloadOptions& options) {
   const std::string tried = "download " + Printable(file.name);
   receiver.ThrowIfCancelled(tried);
+  if (file.size == 0) return WithoutBytes(destination);
   const std::uint64_t start_ms = GetTickCount64();
   const Transfer transfer = RunTransfer(context, receiver, file, destination);
   if (!transfer.IsComplete(file)) {

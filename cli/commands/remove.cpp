@@ -1,3 +1,4 @@
+#include <algorithm>
 #include <map>
 #include <optional>
 
@@ -89,9 +90,13 @@ class Remove : public Command {
   Outcome Run(Context& context) override {
     Receiver receiver(context);
     const std::vector<RemoteFile> files = receiver.ListFiles().files;
-    for (const std::wstring& name : names_) FindFile(files, name, Tried(name));
+    std::vector<std::wstring> names;
+    for (const std::wstring& name : names_) {
+      FindFile(files, name, Tried(name));
+      if (std::find(names.begin(), names.end(), name) == names.end()) names.push_back(name);
+    }
     FileReport report(context);
-    const std::vector<std::wstring> removed = RemoveAll(context, receiver, names_, report);
+    const std::vector<std::wstring> removed = RemoveAll(context, receiver, names, report);
     Verify(context, receiver, files.size(), removed, report);
     return std::move(report).Finish();
   }

@@ -297,6 +297,18 @@ TEST(CommandLineTest, OptionsAreReadFromAFileToo) {
   EXPECT_EQ(Refusal({"find", "COM7", "--config", path + "none"}).exit, ExitCode::kUsage);
 }
 
+TEST(CommandLineTest, AWordThatTheFileMistypesIsRefused) {
+  const TemporaryFolder folder;
+  folder.Write(L"my.ini", "protcol = velmar\n");
+  const std::string path = (folder.path() / L"my.ini").string();
+  EXPECT_EQ(Refusal({"find", "COM7", "--config", path}).exit, ExitCode::kUsage);
+}
+
+TEST(CommandLineTest, ASpeedOfTheEnvironmentIsNotForUsb) {
+  const Variable speed("RCVLINK_SPEED", "9600");
+  EXPECT_EQ(Parse({"find", R"(\\?\x)", "--link", "usb"}).arguments.link, eInstanceUSB);
+}
+
 TEST(CommandLineTest, CodesToExplainAreNumbers) {
   EXPECT_STREQ(Parse({"explain", "0x8007048F"}).command->text().word, "explain");
   EXPECT_STREQ(Parse({"explain"}).command->text().word, "explain");

@@ -120,6 +120,13 @@ TEST_F(Cli, GetTakesPatterns) {
   EXPECT_EQ(nlohmann::json::parse(result.output).at("files").size(), 2u);
 }
 
+TEST_F(Cli, AnEmptyFileIsMadeWithoutATransfer) {
+  const bed::SimulatedPort receiver({"quorin"}, {{"a.jps", ""}, {"b.jps", Content(30)}});
+  EXPECT_EQ(RunOn(receiver, {"get", "--all"}).status, kDone);
+  EXPECT_EQ(folder.Read("a.jps"), "");
+  EXPECT_EQ(folder.Read("b.jps"), Content(30));
+}
+
 TEST_F(Cli, APatternThatFitsNothingTransfersNothing) {
   const bed::SimulatedPort receiver({"quorin"}, {{"a.jps", Content(30)}});
   const auto result = RunOn(receiver, {"get", "a.jps", "*.log"});

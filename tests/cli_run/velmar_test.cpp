@@ -182,6 +182,16 @@ TEST_F(VelmarCli, AListThatDoesNotFitDoesNotDisturbTheNextCommand) {
   EXPECT_EQ(folder.Read("file103"), Content(30));
 }
 
+TEST_F(VelmarCli, APatternOnAListThatDoesNotFitIsNotDone) {
+  Files files;
+  while (files.size() < 110) files.emplace("file" + std::to_string(100 + files.size()), "a");
+  const bed::SimulatedPort receiver({"velmar"}, files);
+  const auto result = RunOn(receiver, {"get", "*103", "--json"});
+  EXPECT_EQ(result.status, kFailed);
+  EXPECT_EQ(json::parse(result.output).at("complete"), false);
+  EXPECT_TRUE(Has("file103"));
+}
+
 TEST_F(VelmarCli, MoveRenamesTheFile) {
   const bed::SimulatedPort receiver({"velmar"}, {{"a.log", "a"}, {"b.log", "b"}});
   const auto result = RunOn(receiver, {"mv", "a.log", "c.log"});
