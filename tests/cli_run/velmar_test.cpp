@@ -184,7 +184,9 @@ TEST_F(VelmarCli, AListThatDoesNotFitDoesNotDisturbTheNextCommand) {
 
 TEST_F(VelmarCli, APatternOnAListThatDoesNotFitIsNotDone) {
   Files files;
-  while (files.size() < 110) files.emplace("file" + std::to_string(100 + files.size()), "a");
+  while (files.size() < 110) {
+    files.emplace("file" + std::to_string(100 + files.size()), Content(30));
+  }
   const bed::SimulatedPort receiver({"velmar"}, files);
   const auto result = RunOn(receiver, {"get", "*103", "--json"});
   EXPECT_EQ(result.status, kFailed);
