@@ -187,11 +187,14 @@ class Set : public Command {
                       const std::string& tried) {
     const auto before = CurrentSettings(context.arguments.port);
     if (before && AnswersAt(context, family, Changed(*before, change))) return;
+    const bool as_before =
+        before && !context.interrupt.requested() && AnswersAt(context, family, *before);
     Failure failure{.tried = tried, .code = ResultOfWin32(ERROR_DEVICE_NOT_CONNECTED)};
-    if (context.interrupt.requested()) {
+    // A question that Ctrl-C ended says nothing of the receiver.
+    if (!as_before && context.interrupt.requested()) {
       failure.exit = ExitCode::kCancelled;
       failure.meaning = "ended by Ctrl-C before the change was confirmed";
-    } else if (before && AnswersAt(context, family, *before)) {
+    } else if (as_before) {
       failure.meaning = "refused: the receiver still answers with the old setting";
       failure.hint = "Receivers accept only certain values, such as 115200, 57600 or 9600.";
     } else {

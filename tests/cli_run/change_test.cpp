@@ -178,6 +178,20 @@ TEST_F(SetMemory, ALostReceiverIsReportedAndForgotten) {
   EXPECT_THAT(FirstTry(receiver), HasSubstr(": 115200 bit/s, RTS on"));
 }
 
+// Nobody knows then at which speed the receiver is.
+TEST_F(SetMemory, AnInterruptedConfirmationForgetsNothing) {
+  const bed::SimulatedPort receiver({"quorin", "--stray-speed", "19200"});
+  bed::Program program(kProgram,
+                       On(receiver, {"set", "baud", kOtherSpeed, "--protocol", "quorin"}),
+                       bed::Output::kTerminal,
+                       folder.unix_path());
+  receiver.WaitForTranscript("not heard at 57600");
+  program.Interrupt();
+  const auto result = program.Finish();
+  EXPECT_EQ(result.status, kCancelled) << result.output;
+  EXPECT_THAT(FirstTry(receiver), HasSubstr(": 9600 bit/s, RTS on"));
+}
+
 TEST_F(Cli, ASettingThatLosesTheReceiverNeedsTheYesOption) {
   const bed::SimulatedPort receiver({"quorin"});
   for (const std::vector<std::string>& change :
