@@ -1,5 +1,4 @@
-/// @file busy.h
-/// A line on the terminal while the program waits for the receiver.
+// A line on the terminal while the program waits for the receiver.
 #ifndef RCVLINK_CLI_BUSY_H_
 #define RCVLINK_CLI_BUSY_H_
 
@@ -12,8 +11,8 @@
 
 namespace cli {
 
-/// While it lives, a line says what is going on and for how long. It appears after a second, and only
-/// where a bar would be shown.
+// While it lives, a line says what is going on and for how long. It appears after a second, and only
+// where a bar would be shown.
 class Busy {
  public:
   Busy(Context& context, std::string what);
@@ -26,8 +25,8 @@ class Busy {
 
   Context& context_;
   const std::string what_;
-  const std::uint64_t start_ms_;
-  std::size_t drawn_width_ = 0;
+  const uint64_t start_ms_;
+  size_t drawn_width_ = 0;
   std::optional<Ticker> ticker_;
 };
 

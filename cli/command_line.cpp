@@ -18,7 +18,7 @@ constexpr unsigned kDefaultStallTimeoutS = 30;
 constexpr unsigned kLongestStallTimeoutS = 86'400;
 constexpr int kHelpColumn = 28;
 
-/// Shows NAME... where the parser's own help shows NAME(0x).
+// Shows NAME... where the parser's own help shows NAME(0x).
 class HelpFormatter : public CLI::Formatter {
  public:
   std::string make_option_usage(const CLI::Option* option) const override {
@@ -27,7 +27,7 @@ class HelpFormatter : public CLI::Formatter {
     return option->get_required() ? name : "[" + name + "]";
   }
 
-  /// A command's help has the options of all commands too.
+  // A command's help has the options of all commands too.
   std::string make_footer(const CLI::App* app) const override {
     const CLI::App* const all = app->get_parent();
     if (all == nullptr) return Formatter::make_footer(app);
@@ -40,14 +40,14 @@ class HelpFormatter : public CLI::Formatter {
   }
 };
 
-/// The command that is most similar to a word; empty when none is.
+// The command that is most similar to a word; empty when none is.
 std::string MostLike(const std::string& word, const Commands& commands) {
-  constexpr std::size_t kMostChanges = 2;
+  constexpr size_t kMostChanges = 2;
   std::string best;
-  std::size_t least = kMostChanges + 1;
+  size_t least = kMostChanges + 1;
   for (const auto& command : commands) {
     const std::string candidate = command->text().word;
-    const std::size_t changes = ChangesBetween(word, candidate);
+    const size_t changes = ChangesBetween(word, candidate);
     if (changes >= least || changes >= candidate.size()) continue;
     least = changes;
     best = candidate;
@@ -55,7 +55,7 @@ std::string MostLike(const std::string& word, const Commands& commands) {
   return best;
 }
 
-/// Turns `help`, `help get` and `/?` into --help.
+// Turns `help`, `help get` and `/?` into --help.
 std::vector<std::string> WithHelp(std::vector<std::string> words) {
   const auto end = std::find(words.begin(), words.end(), "--");
   std::replace(words.begin(), end, std::string("/?"), std::string("--help"));
@@ -82,12 +82,13 @@ std::string Examples() {
 
 std::map<std::string, EProtocol> FamilyWords() {
   std::map<std::string, EProtocol> words = {{"any", eProtocolAny}};
-  for (const Family& family : kFamilies)
+  for (const Family& family : kFamilies) {
     words.emplace(FamilyWord(family.protocol), family.protocol);
+  }
   return words;
 }
 
-/// "The receiver family: any (default), quorin or velmar"
+// "The receiver family: any (default), quorin or velmar"
 std::string FamilyHelp() {
   std::string help = "The receiver family: any (default)";
   for (const Family& family : kFamilies) {
@@ -125,13 +126,13 @@ void AddLinkOptions(CLI::App& app, Arguments& arguments) {
       app, "--no-memory", "Neither use nor save the setting found last time", arguments.no_memory);
 }
 
-/// The file with the user's own options; it need not exist.
+// The file with the user's own options; it need not exist.
 std::string DefaultConfig() {
   const char* const folder = std::getenv("APPDATA");
   return folder == nullptr ? "" : std::string(folder) + "\\rcvlink\\rcvlink-cli.ini";
 }
 
-/// The options of all commands.
+// The options of all commands.
 void AddOptions(CLI::App& app, Arguments& arguments) {
   AddLinkOptions(app, arguments);
   arguments.stall_timeout_s = kDefaultStallTimeoutS;
@@ -174,17 +175,17 @@ void AddCommands(CLI::App& app, Arguments& arguments, const Commands& commands) 
   }
 }
 
-/// "ports, find or check"
+// "ports, find or check"
 std::string Words(const Commands& commands) {
   std::string words;
-  for (std::size_t i = 0; i < commands.size(); ++i) {
+  for (size_t i = 0; i < commands.size(); ++i) {
     if (i > 0) words += i + 1 == commands.size() ? " or " : ", ";
     words += commands[i]->text().word;
   }
   return words;
 }
 
-/// Why the parser refused the words.
+// Why the parser refused the words.
 Failure ParseFailure(const CLI::App& app, const CLI::ParseError& error, const Commands& commands) {
   const std::vector<std::string> rest = app.remaining();
   if (!app.get_subcommands().empty() || rest.empty() || rest.front().starts_with('-')) {
@@ -220,7 +221,7 @@ void CheckArguments(const Arguments& arguments, bool needs_port) {
   }
 }
 
-/// Checks what the parser itself does not check.
+// Checks what the parser itself does not check.
 CommandLine Checked(CLI::App& app, Arguments& arguments, Commands commands) {
   std::unique_ptr<Command> command = TakeChosen(app, commands);
   arguments.port = PlainPortName(arguments.port);

@@ -1,5 +1,4 @@
-/// @file context.h
-/// The input and the outcome of every command.
+// The input and the outcome of every command.
 #ifndef RCVLINK_CLI_CONTEXT_H_
 #define RCVLINK_CLI_CONTEXT_H_
 
@@ -21,40 +20,40 @@ struct Context {
   Output& out;
   Output& err;
 
-  /// Standard output: the result, unless it is printed as JSON.
+  // Standard output: the result, unless it is printed as JSON.
   void PrintResult(const std::string& text) {
     if (!arguments.json) out.Write(text);
   }
 
-  /// Standard output: that something was done; not with --quiet.
+  // Standard output: that something was done; not with --quiet.
   void PrintDone(const std::string& text) {
     if (!arguments.quiet) PrintResult(text);
   }
 
-  /// Standard error: the current step; not with --quiet or --json.
+  // Standard error: the current step; not with --quiet or --json.
   void PrintStatus(const std::string& text) {
     if (!arguments.quiet && !arguments.json) err.Write(text);
   }
 
-  /// Standard error: what a reader of the result has to know, always.
+  // Standard error: what a reader of the result has to know, always.
   void PrintWarning(const std::string& text) { err.Write(text); }
 
-  /// Standard error: a failure after which the command goes on; JSON has it in its document.
+  // Standard error: a failure after which the command goes on; JSON has it in its document.
   void PrintFailure(const Failure& failure) {
     if (!arguments.json) err.Write(Describe(failure));
   }
 };
 
-/// How progress is to be shown; never `kAuto`.
+// How progress is to be shown; never `kAuto`.
 ProgressMode ProgressModeOf(const Context& context);
 
-/// A command's end. A command that could do nothing throws its `Failure` instead.
+// A command's end. A command that could do nothing throws its `Failure` instead.
 struct Outcome {
   ExitCode exit = ExitCode::kDone;
-  Json document{};  ///< printed for --json
+  Json document{};  // printed for --json
 };
 
-/// {"tried", "port", "code", "meaning", "hint", "exit"}
+// {"tried", "port", "code", "meaning", "hint", "exit"}
 Json ToJson(const Failure& failure);
 
 }  // namespace cli

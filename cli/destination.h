@@ -1,5 +1,4 @@
-/// @file destination.h
-/// Where a download's bytes go.
+// Where a download's bytes go.
 #ifndef RCVLINK_CLI_DESTINATION_H_
 #define RCVLINK_CLI_DESTINATION_H_
 
@@ -19,22 +18,22 @@ class Destination {
   Destination(const Destination&) = delete;
   Destination& operator=(const Destination&) = delete;
 
-  /// @return ERROR_SUCCESS, or the Win32 error
+  // Returns ERROR_SUCCESS, or the Win32 error.
   virtual DWORD Write(const void* data, DWORD size) = 0;
 
-  /// All bytes are there.
-  /// @throws Failure
+  // All bytes are there.
+  // Throws Failure.
   virtual void Complete() {}
 
-  /// Keeps the bytes that were written, although some may be missing.
-  /// @return the path under which they are; empty when there is none
+  // Keeps the bytes that were written, although some may be missing.
+  // Returns the path under which they are; empty when there is none.
   virtual std::wstring KeepIncomplete() { return {}; }
 
-  /// A failure of `Write`.
+  // A failure of `Write`.
   virtual Failure FailureOf(DWORD error) const = 0;
 };
 
-/// The standard output.
+// The standard output.
 class ToOutput : public Destination {
  public:
   explicit ToOutput(Output& out) : out_(out) {}
@@ -51,7 +50,7 @@ class ToOutput : public Destination {
   Output& out_;
 };
 
-/// Keeps nothing.
+// Keeps nothing.
 class Nowhere : public Destination {
  public:
   DWORD Write(const void* /*data*/, DWORD /*size*/) override { return ERROR_SUCCESS; }

@@ -20,8 +20,8 @@ constexpr DWORD kShareAll = FILE_SHARE_READ | FILE_SHARE_WRITE;
 // The prefix of a port's name for `CreateFileW`.
 const std::wstring kDevices = L"\\\\.\\";
 
-/// Why a device cannot be opened; S_OK when it can. A search on USB does not report that: it just
-/// finds no receiver.
+// Why a device cannot be opened; S_OK when it can. A search on USB does not report that: it just
+// finds no receiver.
 long WhyNotOpened(const std::wstring& device) {
   const UniqueHandle handle(
       CreateFileW(device.c_str(), 0, kShareAll, nullptr, OPEN_EXISTING, 0, nullptr));
@@ -30,7 +30,7 @@ long WhyNotOpened(const std::wstring& device) {
 
 bool IsOneTry(const Arguments& arguments) { return arguments.speed || arguments.rts; }
 
-/// The port of a search on a serial port.
+// The port of a search on a serial port.
 class SearchedPort : public SweepPort {
  public:
   SearchedPort(const Context& context, std::wstring port, SearchDisplay& display)
@@ -45,7 +45,7 @@ class SearchedPort : public SweepPort {
     return devapi::CreateReceiverOnSerial(port_.data(), family, &settings, cancel, receiver);
   }
 
-  void Begin(std::size_t number, std::size_t count, const LineSetting& line) override {
+  void Begin(size_t number, size_t count, const LineSetting& line) override {
     // No line for a port that does not exist: the first try ends the search.
     if (there_) display_.Begin(port_, number, count, line);
   }
@@ -72,7 +72,7 @@ std::vector<Try> TriesOn(const std::wstring& port,
   return {{line, FamiliesOf(arguments.protocol)}};
 }
 
-/// The result of a search on one link.
+// The result of a search on one link.
 struct SearchResult {
   long code = S_FALSE;
   FoundReceiver found{};
@@ -111,8 +111,8 @@ std::string SilenceHint(const Arguments& arguments, EInstanceType link) {
          "the ports.";
 }
 
-/// Refuses a file of this computer as a port: commands would be written into it.
-/// @throws Failure
+// Refuses a file of this computer as a port: commands would be written into it.
+// Throws Failure.
 void RefuseFile(const std::wstring& port) {
   for (const std::wstring& path : {port, kDevices + port}) {
     const UniqueHandle handle(
@@ -133,8 +133,8 @@ bool IsMissing(long code) {
          code == ResultOfWin32(ERROR_PATH_NOT_FOUND) || code == ResultOfWin32(ERROR_INVALID_NAME);
 }
 
-/// The family that answers in place of the one that was asked for; empty when none does. Asked for at
-/// known settings only: a sweep takes minutes.
+// The family that answers in place of the one that was asked for; empty when none does. Asked for at
+// known settings only: a sweep takes minutes.
 std::string OtherFamily(const Context& context, std::wstring port) {
   const Arguments& arguments = context.arguments;
   if (arguments.protocol == eProtocolAny || !IsOneTry(arguments)) return {};
@@ -151,7 +151,7 @@ std::string OtherFamily(const Context& context, std::wstring port) {
   return {};
 }
 
-/// What a result of the search on a link means to the user.
+// What a result of the search on a link means to the user.
 Failure SearchFailure(const Arguments& arguments, const SearchPlace& place, long code) {
   const bool on_usb = place.link == eInstanceUSB;
   const std::string port = Printable(place.port);
@@ -196,7 +196,7 @@ std::optional<DCB> CurrentSettings(const std::wstring& port) {
   DCB settings{};
   settings.DCBlength = sizeof(settings);
   if (handle.get() == INVALID_HANDLE_VALUE) return std::nullopt;
-  if (GetCommState(handle.get(), &settings) == FALSE) return std::nullopt;
+  if (!GetCommState(handle.get(), &settings)) return std::nullopt;
   return settings;
 }
 

@@ -10,10 +10,10 @@
 namespace cli {
 namespace {
 
-constexpr std::uint64_t kMsPerSecond = 1000;
+constexpr uint64_t kMsPerSecond = 1000;
 
-/// Watches a transfer on a thread of its own: shows the progress, and aborts the transfer when no
-/// new data arrives or the data cannot be written.
+// Watches a transfer on a thread of its own: shows the progress, and aborts the transfer when no
+// new data arrives or the data cannot be written.
 class TransferWatch {
  public:
   TransferWatch(Context& context,
@@ -31,7 +31,7 @@ class TransferWatch {
 
  private:
   void Tick() {
-    const std::uint64_t elapsed_ms = GetTickCount64() - start_ms_;
+    const uint64_t elapsed_ms = GetTickCount64() - start_ms_;
     if (state_.done != stream_.received()) {
       state_.done = stream_.received();
       last_news_ms_ = elapsed_ms;
@@ -41,22 +41,22 @@ class TransferWatch {
     if (stalled_ || stream_.first_error() != ERROR_SUCCESS) aborter_.Tick();
   }
 
-  const std::uint64_t start_ms_ = GetTickCount64();
-  const std::uint64_t stall_ms_;
+  const uint64_t start_ms_ = GetTickCount64();
+  const uint64_t stall_ms_;
   const FileStream& stream_;
   TransferState state_;
-  std::uint64_t last_news_ms_ = 0;
+  uint64_t last_news_ms_ = 0;
   std::atomic<bool> stalled_{false};
   Progress progress_;
   Aborter aborter_;
   Ticker ticker_;  // ends before all that it uses
 };
 
-/// The result of one transfer.
+// The result of one transfer.
 struct Transfer {
   long code = S_OK;
   bool stalled = false;
-  std::uint64_t received = 0;
+  uint64_t received = 0;
   DWORD write_error = ERROR_SUCCESS;
   std::string sha256{};
 
@@ -84,7 +84,7 @@ Transfer RunTransfer(Context& context,
   return transfer;
 }
 
-/// Whether the receiver ended the transfer in order, but with another size than it had listed.
+// Whether the receiver ended the transfer in order, but with another size than it had listed.
 bool HasOtherSize(const Transfer& transfer, const RemoteFile& file) {
   return transfer.code == S_OK && !transfer.stalled && transfer.received > 0 &&
          transfer.received != file.size;
@@ -107,7 +107,7 @@ std::string MeaningOf(const Context& context, const Transfer& transfer, const Re
   return "";
 }
 
-/// Why a transfer is not complete. Keeps its data where that is useful.
+// Why a transfer is not complete. Keeps its data where that is useful.
 Failure WhyIncomplete(const Context& context,
                       const Receiver& receiver,
                       const Transfer& transfer,
@@ -131,7 +131,7 @@ Failure WhyIncomplete(const Context& context,
   return failure;
 }
 
-/// No protocol transfers a file without bytes.
+// No protocol transfers a file without bytes.
 Downloaded WithoutBytes(Destination& destination) {
   const auto stream = FileStream::Make(destination);
   stream->Detach();
@@ -142,9 +142,9 @@ Downloaded WithoutBytes(Destination& destination) {
 }  // namespace
 
 void CheckSize(Receiver& receiver, const RemoteFile& file) {
-  constexpr std::uint64_t kMostBlocks = 65'536;
-  constexpr std::uint64_t kBlockBytes = 512;
-  constexpr std::uint64_t kMostBytes = kMostBlocks * kBlockBytes;
+  constexpr uint64_t kMostBlocks = 65'536;
+  constexpr uint64_t kBlockBytes = 512;
+  constexpr uint64_t kMostBytes = kMostBlocks * kBlockBytes;
   if (file.size <= kMostBytes || receiver.link() == eInstanceUSB) return;
   if (receiver.Family() != eProtocolQuorin) return;
   throw Failure{.tried = "download " + Printable(file.name),
@@ -163,7 +163,7 @@ Downloaded Download(Context& context,
   const std::string tried = "download " + Printable(file.name);
   receiver.ThrowIfCancelled(tried);
   if (file.size == 0) return WithoutBytes(destination);
-  const std::uint64_t start_ms = GetTickCount64();
+  const uint64_t start_ms = GetTickCount64();
   const Transfer transfer = RunTransfer(context, receiver, file, destination);
   if (!transfer.IsComplete(file)) {
     throw WhyIncomplete(context, receiver, transfer, file, destination, options.keep_partial);

@@ -15,17 +15,17 @@
 namespace cli {
 namespace {
 
-constexpr std::uint32_t kMsPerSecond = 1000;
-constexpr std::uint32_t kMsPerMinute = 60 * kMsPerSecond;
-constexpr std::uint32_t kMsPerHour = 60 * kMsPerMinute;
-constexpr std::uint32_t kMsPerDay = 24 * kMsPerHour;
+constexpr uint32_t kMsPerSecond = 1000;
+constexpr uint32_t kMsPerMinute = 60 * kMsPerSecond;
+constexpr uint32_t kMsPerHour = 60 * kMsPerMinute;
+constexpr uint32_t kMsPerDay = 24 * kMsPerHour;
 
 std::optional<std::wstring> Decoded(const std::string& bytes, UINT code_page, DWORD flags) {
   if (bytes.empty()) return std::wstring();
   const int length = static_cast<int>(bytes.size());
   const int size = MultiByteToWideChar(code_page, flags, bytes.data(), length, nullptr, 0);
   if (size <= 0) return std::nullopt;
-  std::wstring text(static_cast<std::size_t>(size), L'\0');
+  std::wstring text(static_cast<size_t>(size), L'\0');
   MultiByteToWideChar(code_page, flags, bytes.data(), length, text.data(), size);
   return text;
 }
@@ -34,7 +34,7 @@ bool IsBeyondAscii(const std::string& bytes) {
   return std::ranges::any_of(bytes, [](char byte) { return static_cast<signed char>(byte) < 0; });
 }
 
-/// Lines as text, and whether all were UTF-8.
+// Lines as text, and whether all were UTF-8.
 class Decoder {
  public:
   explicit Decoder(UINT code_page) : code_page_(code_page) {}
@@ -55,16 +55,16 @@ class Decoder {
   bool all_utf8_ = true;
 };
 
-/// What a thread is doing, according to its lines so far.
+// What a thread is doing, according to its lines so far.
 struct ThreadState {
   TraceFamily family = TraceFamily::kUnknown;
-  std::optional<std::size_t> command{};    ///< the entry of the command that is not ended
-  std::optional<std::size_t> read{};       ///< the entry of the read that is not ended
-  std::optional<std::size_t> blocks{};     ///< the entry of the transfer that is not ended
-  std::optional<std::uint64_t> sent_ms{};  ///< when the command was sent
-  bool blocks_follow = false;              ///< the receiver has agreed to send blocks
-  bool opening = false;                    ///< a port is being opened
-  std::string last_class{};                ///< of the last command that the report names
+  std::optional<size_t> command{};    // the entry of the command that is not ended
+  std::optional<size_t> read{};       // the entry of the read that is not ended
+  std::optional<size_t> blocks{};     // the entry of the transfer that is not ended
+  std::optional<uint64_t> sent_ms{};  // when the command was sent
+  bool blocks_follow = false;         // the receiver has agreed to send blocks
+  bool opening = false;               // a port is being opened
+  std::string last_class{};           // of the last command that the report names
 };
 
 class Reader {
@@ -79,7 +79,7 @@ class Reader {
   }
 
  private:
-  ExchangeEntry& At(std::size_t index) { return exchange_.entries[index]; }
+  ExchangeEntry& At(size_t index) { return exchange_.entries[index]; }
 
   void Add(const TraceLine& line) {
     ExchangeEntry entry{
@@ -105,10 +105,10 @@ class Reader {
     Push(std::move(entry));
   }
 
-  /// Gives the entry its time. Midnight may have passed, or the clock may have been set.
+  // Gives the entry its time. Midnight may have passed, or the clock may have been set.
   void Advance(ExchangeEntry& entry) {
     if (!exchange_.entries.empty()) {
-      const std::uint32_t before = last_ms_of_day_;
+      const uint32_t before = last_ms_of_day_;
       const bool is_back = entry.ms_of_day < before;
       const bool is_next_day = is_back && before - entry.ms_of_day > kMsPerDay / 2;
       if (is_back && !is_next_day) clock_was_set_ = true;
@@ -127,19 +127,19 @@ class Reader {
     exchange_.entries.push_back(std::move(entry));
   }
 
-  /// How something that began with the entry `begin` ended, by the thread's next line.
-  ExchangeEnd EndBy(const ExchangeEntry& next, std::size_t begin) const {
+  // How something that began with the entry `begin` ended, by the thread's next line.
+  ExchangeEnd EndBy(const ExchangeEntry& next, size_t begin) const {
     if (next.kind == TraceKind::kTimeout) return ExchangeEnd::kTimeout;
     if (next.kind == TraceKind::kFailure) return ExchangeEnd::kFailure;
     if (last_cancel_ && *last_cancel_ > begin) return ExchangeEnd::kCancelled;
     return ExchangeEnd::kReply;
   }
 
-  /// Adds an entry for what has no line in the report: a reply before the thread's next line, or a
-  /// cancelled wait.
+  // Adds an entry for what has no line in the report: a reply before the thread's next line, or a
+  // cancelled wait.
   void PushEnd(ExchangeEnd end,
                const ExchangeEntry& next,
-               std::uint64_t begin_ms,
+               uint64_t begin_ms,
                std::string_view what) {
     const std::string passed = std::to_string(next.elapsed_ms - begin_ms) + " ms";
     ExchangeEntry entry{
@@ -158,9 +158,9 @@ class Reader {
 
   void EndRead(ThreadState& thread, const ExchangeEntry& next) {
     if (!thread.read) return;
-    const std::size_t read = *std::exchange(thread.read, std::nullopt);
+    const size_t read = *std::exchange(thread.read, std::nullopt);
     const ExchangeEnd end = EndBy(next, read);
-    const std::uint64_t begin_ms = At(read).elapsed_ms;
+    const uint64_t begin_ms = At(read).elapsed_ms;
     if (next.kind == TraceKind::kRead) {
       PushEnd(end, next, begin_ms, "part of a reply, or a reply to another command,");
       return;
@@ -178,14 +178,14 @@ class Reader {
     thread.blocks_follow = end == ExchangeEnd::kReply && thread.last_class == "CGetFileCmd";
   }
 
-  /// A command whose reads are not in the report ends with the thread's next line.
+  // A command whose reads are not in the report ends with the thread's next line.
   void EndCommand(ThreadState& thread, const ExchangeEntry& next) {
     if (!thread.command) return;
     const bool is_failure = next.kind == TraceKind::kFailure || next.kind == TraceKind::kTimeout;
     if (!is_failure && (!thread.sent_ms || next.kind == TraceKind::kRead)) return;
     // After a reply of this family the library pauses for 500 ms; timers may be a little early.
-    constexpr std::uint64_t kRestMs = 450;
-    const std::uint64_t sent_ms = thread.sent_ms.value_or(next.elapsed_ms);
+    constexpr uint64_t kRestMs = 450;
+    const uint64_t sent_ms = thread.sent_ms.value_or(next.elapsed_ms);
     const bool is_answered =
         thread.family == TraceFamily::kVelmar && next.elapsed_ms - sent_ms >= kRestMs;
     ExchangeEnd end = EndBy(next, *thread.command);
@@ -204,14 +204,14 @@ class Reader {
     if (IsOfTransfer(next)) return;
     thread.blocks_follow = false;
     if (!thread.blocks) return;
-    const std::size_t index = *std::exchange(thread.blocks, std::nullopt);
+    const size_t index = *std::exchange(thread.blocks, std::nullopt);
     const ExchangeEnd end = EndBy(next, index);
     PushEnd(end, next, At(index).elapsed_ms, "the blocks ended");
     At(index).until_ms = next.elapsed_ms;
     At(index).end = end;
   }
 
-  /// "Flush" comes before every command and before every block that is requested again.
+  // "Flush" comes before every command and before every block that is requested again.
   void TakeSend(ThreadState& thread, ExchangeEntry& entry) {
     if (thread.blocks) {
       entry.kind = TraceKind::kRetry;
@@ -235,7 +235,7 @@ class Reader {
     }
   }
 
-  /// Guesses a command that has no line of its own from the one before it.
+  // Guesses a command that has no line of its own from the one before it.
   static std::string UnnamedCommand(ThreadState& thread) {
     const std::string before = std::exchange(thread.last_class, "");
     if (before == "CEchoOffCmd") return "stop all output: dm";
@@ -249,7 +249,7 @@ class Reader {
   }
 
   void Begin(ThreadState& thread, ExchangeEntry& entry) {
-    const std::size_t index = exchange_.entries.size();
+    const size_t index = exchange_.entries.size();
     if (entry.kind == TraceKind::kRead) {
       thread.read = index;
     } else if (entry.kind == TraceKind::kCommand) {
@@ -291,24 +291,22 @@ class Reader {
 
   Decoder decoder_;
   Exchange exchange_;
-  std::map<std::uint32_t, ThreadState> threads_;
-  std::optional<std::size_t> last_cancel_;
-  std::uint64_t elapsed_ms_ = 0;
-  std::uint64_t last_shown_ms_ = 0;
-  std::uint32_t last_ms_of_day_ = 0;
+  std::map<uint32_t, ThreadState> threads_;
+  std::optional<size_t> last_cancel_;
+  uint64_t elapsed_ms_ = 0;
+  uint64_t last_shown_ms_ = 0;
+  uint32_t last_ms_of_day_ = 0;
   bool clock_was_set_ = false;
 };
 
 }  // namespace
 
-std::size_t Exchange::Count(TraceKind kind) const {
-  return static_cast<std::size_t>(
+size_t Exchange::Count(TraceKind kind) const {
+  return static_cast<size_t>(
       std::ranges::count_if(entries, [kind](const auto& entry) { return entry.kind == kind; }));
 }
 
-std::uint64_t Exchange::DurationMs() const {
-  return entries.empty() ? 0 : entries.back().elapsed_ms;
-}
+uint64_t Exchange::DurationMs() const { return entries.empty() ? 0 : entries.back().elapsed_ms; }
 
 std::vector<long> Exchange::Codes() const {
   std::vector<long> codes;
@@ -318,13 +316,13 @@ std::vector<long> Exchange::Codes() const {
   return codes;
 }
 
-std::string TimeOfDay(std::uint32_t ms_of_day) {
-  const auto digits = [](std::uint32_t value, std::size_t width) {
+std::string TimeOfDay(uint32_t ms_of_day) {
+  const auto digits = [](uint32_t value, size_t width) {
     std::string text = std::to_string(value);
     return std::string(width - std::min(width, text.size()), '0') + text;
   };
-  constexpr std::size_t kTwo = 2;
-  constexpr std::size_t kThree = 3;
+  constexpr size_t kTwo = 2;
+  constexpr size_t kThree = 3;
   return digits(ms_of_day / kMsPerHour, kTwo) + ":" +
          digits(ms_of_day % kMsPerHour / kMsPerMinute, kTwo) + ":" +
          digits(ms_of_day % kMsPerMinute / kMsPerSecond, kTwo) + "." +

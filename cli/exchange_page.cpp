@@ -71,7 +71,7 @@ struct Lane {
   std::string_view name;
   std::string_view color;
 };
-enum LaneIndex : std::size_t {
+enum LaneIndex : size_t {
   kHostLane,
   kCommandLane,
   kReplyLane,
@@ -86,62 +86,62 @@ constexpr std::array kLanes = {Lane{"Host", "host"},
                                Lane{"Retries", "retry"},
                                Lane{"Failures", "failure"}};
 
-constexpr std::uint64_t kWidth = 1000;
-constexpr std::uint64_t kLeft = 80;  // of the lanes; their names stand before
-constexpr std::uint64_t kRight = 985;
-constexpr std::uint64_t kTop = 6;
-constexpr std::uint64_t kLaneHeight = 22;
-constexpr std::uint64_t kBarHeight = 14;
-constexpr std::uint64_t kTextDrop = 11;  // from a bar's top to its text's base line
-constexpr std::uint64_t kAxisDrop = 16;
+constexpr uint64_t kWidth = 1000;
+constexpr uint64_t kLeft = 80;  // of the lanes; their names stand before
+constexpr uint64_t kRight = 985;
+constexpr uint64_t kTop = 6;
+constexpr uint64_t kLaneHeight = 22;
+constexpr uint64_t kBarHeight = 14;
+constexpr uint64_t kTextDrop = 11;  // from a bar's top to its text's base line
+constexpr uint64_t kAxisDrop = 16;
 
-std::string Attribute(std::string_view name, std::uint64_t value) {
+std::string Attribute(std::string_view name, uint64_t value) {
   return " " + std::string(name) + "=\"" + std::to_string(value) + "\"";
 }
 
-/// The time line.
+// The time line.
 class Drawing {
  public:
   explicit Drawing(Entries entries)
-      : entries_(entries), duration_(std::max<std::uint64_t>(entries.back().elapsed_ms, 1)) {}
+      : entries_(entries), duration_(std::max<uint64_t>(entries.back().elapsed_ms, 1)) {}
 
   std::string Draw() {
-    const std::uint64_t bottom = kTop + kLanes.size() * kLaneHeight;
+    const uint64_t bottom = kTop + kLanes.size() * kLaneHeight;
     svg_ = "<svg viewBox=\"0 0 " + std::to_string(kWidth) + " " +
            std::to_string(bottom + kAxisDrop + kTop) +
            "\" role=\"img\" aria-label=\"Time line\">\n";
     DrawAxis(bottom);
-    for (std::size_t i = 0; i < kLanes.size(); ++i) {
+    for (size_t i = 0; i < kLanes.size(); ++i) {
       svg_ += "<text x=\"0\"" + Attribute("y", TopOf(i) + kTextDrop) + ">" +
               std::string(kLanes[i].name) + "</text>\n";
     }
-    for (std::size_t i = 0; i < entries_.size(); ++i) DrawEntry(i);
+    for (size_t i = 0; i < entries_.size(); ++i) DrawEntry(i);
     return svg_ + "</svg>\n";
   }
 
  private:
-  static std::uint64_t TopOf(std::size_t lane) { return kTop + lane * kLaneHeight; }
-  std::uint64_t XOf(std::uint64_t elapsed_ms) const {
+  static uint64_t TopOf(size_t lane) { return kTop + lane * kLaneHeight; }
+  uint64_t XOf(uint64_t elapsed_ms) const {
     return kLeft + elapsed_ms * (kRight - kLeft) / duration_;
   }
 
-  /// 1, 2 or 5 with zeros: a step that makes some ten marks.
-  std::uint64_t Step() const {
-    constexpr std::uint64_t kMostMarks = 12;
-    constexpr std::uint64_t kTen = 10;
-    constexpr std::array<std::uint64_t, 3> kDigits = {1, 2, 5};
-    for (std::uint64_t power = 1;; power *= kTen) {
-      for (const std::uint64_t digit : kDigits) {
+  // 1, 2 or 5 with zeros: a step that makes some ten marks.
+  uint64_t Step() const {
+    constexpr uint64_t kMostMarks = 12;
+    constexpr uint64_t kTen = 10;
+    constexpr std::array<uint64_t, 3> kDigits = {1, 2, 5};
+    for (uint64_t power = 1;; power *= kTen) {
+      for (const uint64_t digit : kDigits) {
         if (duration_ / (digit * power) <= kMostMarks) return digit * power;
       }
     }
   }
 
-  void DrawAxis(std::uint64_t bottom) {
-    constexpr std::uint64_t kMsPerSecond = 1000;
-    const std::uint64_t step = Step();
-    for (std::uint64_t ms = 0; ms <= duration_; ms += step) {
-      const std::uint64_t x = XOf(ms);
+  void DrawAxis(uint64_t bottom) {
+    constexpr uint64_t kMsPerSecond = 1000;
+    const uint64_t step = Step();
+    for (uint64_t ms = 0; ms <= duration_; ms += step) {
+      const uint64_t x = XOf(ms);
       svg_ += "<line class=\"grid\"" + Attribute("x1", x) + Attribute("x2", x) +
               Attribute("y1", kTop) + Attribute("y2", bottom) + "/>";
       const std::string text = step % kMsPerSecond == 0 ? std::to_string(ms / kMsPerSecond) + " s"
@@ -153,11 +153,11 @@ class Drawing {
 
   void DrawBar(LaneIndex lane,
                std::string_view color,
-               std::uint64_t from_ms,
-               std::uint64_t until_ms,
+               uint64_t from_ms,
+               uint64_t until_ms,
                const ExchangeEntry& entry) {
-    constexpr std::uint64_t kThinnest = 3;
-    const std::uint64_t x = XOf(from_ms);
+    constexpr uint64_t kThinnest = 3;
+    const uint64_t x = XOf(from_ms);
     svg_ += "<rect class=\"fill-" + std::string(color) + "\"" + Attribute("x", x) +
             Attribute("y", TopOf(lane)) +
             Attribute("width", std::max(XOf(until_ms) - x, kThinnest)) +
@@ -170,9 +170,9 @@ class Drawing {
     return end == ExchangeEnd::kTimeout || end == ExchangeEnd::kFailure ? "failure" : color;
   }
 
-  /// An operation of the host lasts until the thread's next one.
-  std::uint64_t EndOfOperation(std::size_t index) const {
-    std::uint64_t end = entries_[index].elapsed_ms;
+  // An operation of the host lasts until the thread's next one.
+  uint64_t EndOfOperation(size_t index) const {
+    uint64_t end = entries_[index].elapsed_ms;
     for (const ExchangeEntry& next : entries_.subspan(index + 1)) {
       if (next.thread != entries_[index].thread) continue;
       end = next.elapsed_ms;
@@ -181,10 +181,10 @@ class Drawing {
     return end;
   }
 
-  void DrawEntry(std::size_t index) {
+  void DrawEntry(size_t index) {
     const ExchangeEntry& entry = entries_[index];
-    const std::uint64_t at = entry.elapsed_ms;
-    const std::uint64_t until = entry.until_ms.value_or(at);
+    const uint64_t at = entry.elapsed_ms;
+    const uint64_t until = entry.until_ms.value_or(at);
     switch (entry.kind) {
       case TraceKind::kHost:
         DrawBar(kHostLane, "host", at, EndOfOperation(index), entry);
@@ -215,11 +215,11 @@ class Drawing {
   }
 
   Entries entries_;
-  std::uint64_t duration_;
+  uint64_t duration_;
   std::string svg_;
 };
 
-/// The sign before the meaning: an arrow, or a word for a failure.
+// The sign before the meaning: an arrow, or a word for a failure.
 std::string_view SignOf(TraceKind kind) {
   switch (kind) {
     case TraceKind::kHost:
@@ -241,14 +241,14 @@ std::string_view SignOf(TraceKind kind) {
   }
 }
 
-/// Whether it is between the host and the library, not between the library and the receiver.
+// Whether it is between the host and the library, not between the library and the receiver.
 bool IsOfHost(TraceKind kind) {
   return kind == TraceKind::kHost || kind == TraceKind::kCancel || kind == TraceKind::kDone ||
          kind == TraceKind::kNote || kind == TraceKind::kLock;
 }
 
 std::string Row(const ExchangeEntry& entry) {
-  constexpr std::uint64_t kLongGapMs = 1000;
+  constexpr uint64_t kLongGapMs = 1000;
   const std::string_view sign = SignOf(entry.kind);
   std::string words;
   if (!sign.empty()) words += "<b>" + std::string(sign) + "</b>";

@@ -8,20 +8,20 @@
 namespace cli {
 namespace {
 
-constexpr std::uint64_t kMsPerSecond = 1000;
+constexpr uint64_t kMsPerSecond = 1000;
 
-std::string Seconds(std::uint64_t ms) {
-  constexpr std::uint64_t kMsPerTenth = 100;
+std::string Seconds(uint64_t ms) {
+  constexpr uint64_t kMsPerTenth = 100;
   return std::to_string(ms / kMsPerSecond) + "." + std::to_string(ms % kMsPerSecond / kMsPerTenth) +
          " s";
 }
 
-std::string Counted(std::size_t count, const std::string& one, const std::string& many) {
+std::string Counted(size_t count, const std::string& one, const std::string& many) {
   if (count == 0) return "no " + many;
   return std::to_string(count) + " " + (count == 1 ? one : many);
 }
 
-/// The mark before a line; failures stand out in capitals.
+// The mark before a line; failures stand out in capitals.
 std::string MarkOf(TraceKind kind) {
   switch (kind) {
     case TraceKind::kRetry:
@@ -36,16 +36,16 @@ std::string MarkOf(TraceKind kind) {
 }
 
 bool HasThreads(const Exchange& exchange) {
-  std::set<std::uint32_t> threads;
+  std::set<uint32_t> threads;
   for (const ExchangeEntry& entry : exchange.entries) threads.insert(entry.thread);
   return threads.size() > 1;
 }
 
 std::string LineOf(const ExchangeEntry& entry, bool with_thread) {
-  constexpr std::size_t kGapWidth = 9;
-  constexpr std::size_t kMarkWidth = 8;
-  constexpr std::size_t kPartiesWidth = 21;
-  constexpr std::size_t kThreadWidth = 7;
+  constexpr size_t kGapWidth = 9;
+  constexpr size_t kMarkWidth = 8;
+  constexpr size_t kPartiesWidth = 21;
+  constexpr size_t kThreadWidth = 7;
   std::string line = TimeOfDay(entry.ms_of_day) + PadLeft(Gap(entry.since_ms), kGapWidth) + "  ";
   if (with_thread) line += PadRight(std::to_string(entry.thread), kThreadWidth);
   line += PadRight(MarkOf(entry.kind), kMarkWidth) +
@@ -78,7 +78,7 @@ bool IsTrouble(TraceKind kind) {
   return kind == TraceKind::kRetry || kind == TraceKind::kTimeout || kind == TraceKind::kFailure;
 }
 
-std::string Gap(std::uint64_t ms) {
+std::string Gap(uint64_t ms) {
   if (ms == 0) return "";
   return "+" + (ms < kMsPerSecond ? std::to_string(ms) + " ms" : Seconds(ms));
 }

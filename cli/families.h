@@ -1,5 +1,4 @@
-/// @file families.h
-/// What the program knows of each family of receivers.
+// What the program knows of each family of receivers.
 #ifndef RCVLINK_CLI_FAMILIES_H_
 #define RCVLINK_CLI_FAMILIES_H_
 
@@ -13,18 +12,18 @@ namespace cli {
 
 struct Family {
   EProtocol protocol;
-  const char* name;  ///< in small letters it is the word of --protocol
-  /// The speeds to try first: the factory setting, or that of a download that raised it.
+  const char* name;  // in small letters it is the word of --protocol
+  // The speeds to try first: the factory setting, or that of a download that raised it.
   std::array<unsigned long, 2> usual_speeds;
-  /// What the family's port settings take for odd and even parity and for one stop bit; two stop
-  /// bits are one more.
+  // What the family's port settings take for odd and even parity and for one stop bit; two stop
+  // bits are one more.
   unsigned long odd;
   unsigned long even;
   unsigned long one_stop_bit;
-  bool sets_rts;  ///< offers to control its RTS line
+  bool sets_rts;  // offers to control its RTS line
 };
 
-/// A new family is one more entry.
+// A new family is one more entry.
 inline constexpr std::array kFamilies = {Family{.protocol = eProtocolQuorin,
                                                 .name = "Quorin",
                                                 .usual_speeds = {CBR_115200, CBR_9600},
@@ -40,7 +39,7 @@ inline constexpr std::array kFamilies = {Family{.protocol = eProtocolQuorin,
                                                 .one_stop_bit = 1,
                                                 .sets_rts = false}};
 
-/// Null for a number that belongs to no family.
+// Null for a number that belongs to no family.
 constexpr const Family* FindFamily(unsigned protocol) {
   for (const Family& family : kFamilies) {
     if (family.protocol == static_cast<EProtocol>(protocol)) return &family;

@@ -1,5 +1,4 @@
-/// @file file_stream.h
-/// A download's way from the library to its destination.
+// A download's way from the library to its destination.
 #ifndef RCVLINK_CLI_FILE_STREAM_H_
 #define RCVLINK_CLI_FILE_STREAM_H_
 
@@ -24,22 +23,22 @@ struct ComReleaser {
 #pragma GCC diagnostic push
 #pragma GCC diagnostic ignored "-Wnon-virtual-dtor"
 
-/// A COM stream for writing only. It counts and hashes the bytes, and keeps its first write error,
-/// which the library does not always report. The counts may be read from any thread.
+// A COM stream for writing only. It counts and hashes the bytes, and keeps its first write error,
+// which the library does not always report. The counts may be read from any thread.
 class FileStream final : public IStream {
  public:
-  /// @param destination outlives the stream, or is removed with `Detach`
+  // `destination`: outlives the stream, or is removed with `Detach`.
   static std::unique_ptr<FileStream, ComReleaser> Make(Destination& destination);
 
-  std::uint64_t received() const { return received_; }
+  uint64_t received() const { return received_; }
 
-  /// Win32 error of the first write that failed; ERROR_SUCCESS for none.
+  // Win32 error of the first write that failed; ERROR_SUCCESS for none.
   DWORD first_error() const { return first_error_; }
 
-  /// From now on the stream refuses writes, even if the library still holds it.
+  // From now on the stream refuses writes, even if the library still holds it.
   void Detach() { destination_ = nullptr; }
 
-  /// SHA-256 of what was received, once the transfer is over; to be called once.
+  // SHA-256 of what was received, once the transfer is over; to be called once.
   std::string TakeHash() { return hash_.Finish(); }
 
   STDMETHODIMP QueryInterface(REFIID id, void** object) override;
@@ -67,7 +66,7 @@ class FileStream final : public IStream {
   std::atomic<ULONG> references_{1};
   std::atomic<Destination*> destination_;
   Sha256 hash_;
-  std::atomic<std::uint64_t> received_{0};
+  std::atomic<uint64_t> received_{0};
   std::atomic<DWORD> first_error_{ERROR_SUCCESS};
 };
 

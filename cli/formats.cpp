@@ -9,32 +9,32 @@
 namespace cli {
 namespace {
 
-constexpr std::uint64_t kSecondsPerMinute = 60;
-constexpr std::uint64_t kMinutesPerHour = 60;
-constexpr std::uint64_t kFullPercent = 100;
+constexpr uint64_t kSecondsPerMinute = 60;
+constexpr uint64_t kMinutesPerHour = 60;
+constexpr uint64_t kFullPercent = 100;
 
-std::string Number(std::uint64_t value, std::size_t digits) {
+std::string Number(uint64_t value, size_t digits) {
   std::string text = std::to_string(value);
   return std::string(digits - std::min(digits, text.size()), '0') + text;
 }
 
-std::string TwoDigits(std::uint64_t value) {
-  constexpr std::size_t kDigits = 2;
+std::string TwoDigits(uint64_t value) {
+  constexpr size_t kDigits = 2;
   return Number(value, kDigits);
 }
 
 std::string TimeLeft(const TransferState& state) {
-  const std::uint64_t rate = state.rate;
+  const uint64_t rate = state.rate;
   if (rate == 0) return "--";
-  const std::uint64_t rest = state.total - std::min(state.done, state.total);
+  const uint64_t rest = state.total - std::min(state.done, state.total);
   return FormatDuration((rest + rate - 1) / rate);
 }
 
-/// Fields of fixed width, so that the line does not jump while it changes.
+// Fields of fixed width, so that the line does not jump while it changes.
 std::string Figures(const TransferState& state) {
-  constexpr std::size_t kPercentWidth = 3;
-  constexpr std::size_t kSizeWidth = 8;
-  constexpr std::size_t kLeftWidth = 11;
+  constexpr size_t kPercentWidth = 3;
+  constexpr size_t kSizeWidth = 8;
+  constexpr size_t kLeftWidth = 11;
   return PadLeft(std::to_string(PercentOf(state)), kPercentWidth) + " %  " +
          PadLeft(FormatBytes(state.done), kSizeWidth) + " of " + FormatBytes(state.total) + "  " +
          PadLeft(FormatBytes(state.rate), kSizeWidth) + "/s  " +
@@ -42,19 +42,19 @@ std::string Figures(const TransferState& state) {
 }
 
 std::string Bar(unsigned percent) {
-  constexpr std::size_t kBarWidth = 20;
-  const std::size_t filled = percent * kBarWidth / kFullPercent;
+  constexpr size_t kBarWidth = 20;
+  const size_t filled = percent * kBarWidth / kFullPercent;
   return PadRight(std::string(filled, '#'), kBarWidth);
 }
 
 }  // namespace
 
-std::string FormatBytes(std::uint64_t bytes) {
-  constexpr std::uint64_t kThousand = 1000;
-  constexpr std::uint64_t kTenth = 100;  // of a thousand
+std::string FormatBytes(uint64_t bytes) {
+  constexpr uint64_t kThousand = 1000;
+  constexpr uint64_t kTenth = 100;  // of a thousand
   constexpr std::array<const char*, 3> kUnits = {" kB", " MB", " GB"};
   if (bytes < kThousand) return std::to_string(bytes) + " B";
-  std::size_t unit = 0;
+  size_t unit = 0;
   while (bytes >= kThousand * kThousand && unit + 1 < kUnits.size()) {
     bytes /= kThousand;
     ++unit;
@@ -63,8 +63,8 @@ std::string FormatBytes(std::uint64_t bytes) {
          kUnits[unit];
 }
 
-std::string FormatDuration(std::uint64_t seconds) {
-  const std::uint64_t minutes = seconds / kSecondsPerMinute;
+std::string FormatDuration(uint64_t seconds) {
+  const uint64_t minutes = seconds / kSecondsPerMinute;
   if (minutes == 0) return std::to_string(seconds) + " s";
   if (minutes < kMinutesPerHour) {
     return std::to_string(minutes) + " min " + TwoDigits(seconds % kSecondsPerMinute) + " s";
@@ -74,7 +74,7 @@ std::string FormatDuration(std::uint64_t seconds) {
 }
 
 std::string FormatTime(const SYSTEMTIME& time, char separator) {
-  constexpr std::size_t kYearDigits = 4;
+  constexpr size_t kYearDigits = 4;
   const bool empty = time.wYear == 0 && time.wMonth == 0 && time.wDay == 0 && time.wHour == 0 &&
                      time.wMinute == 0 && time.wSecond == 0;
   if (empty) return "-";
@@ -88,14 +88,14 @@ unsigned PercentOf(const TransferState& state) {
   return static_cast<unsigned>(state.done * kFullPercent / state.total);
 }
 
-std::string ProgressBar(const TransferState& state, std::size_t width) {
+std::string ProgressBar(const TransferState& state, size_t width) {
   const std::string figures = Figures(state);
   std::string line = "[";
   line.append(Bar(PercentOf(state))).append("] ").append(figures);
   if (line.size() > width) return figures.substr(0, width);
   constexpr std::string_view kGap = "  ";
   if (line.size() + kGap.size() >= width) return line;
-  const std::size_t room = width - line.size() - kGap.size();
+  const size_t room = width - line.size() - kGap.size();
   return line.append(kGap) + Printable(std::wstring_view(state.name).substr(0, room));
 }
 

@@ -1,5 +1,4 @@
-/// @file handle.h
-/// Owns the Win32 handles that the program opens.
+// Owns the Win32 handles that the program opens.
 #ifndef RCVLINK_CLI_HANDLE_H_
 #define RCVLINK_CLI_HANDLE_H_
 
@@ -9,7 +8,7 @@
 
 namespace cli {
 
-/// Closes a kernel object. Files are empty at INVALID_HANDLE_VALUE, other objects at null.
+// Closes a kernel object. Files are empty at INVALID_HANDLE_VALUE, other objects at null.
 struct HandleCloser {
   using pointer = HANDLE;
   void operator()(HANDLE handle) const {

@@ -10,7 +10,7 @@ namespace {
 std::atomic<HANDLE> g_event{nullptr};
 std::atomic<const std::string*> g_message{nullptr};
 
-/// Acknowledges Ctrl-C at once: the receiver may need a while to stop.
+// Acknowledges Ctrl-C at once: the receiver may need a while to stop.
 void PrintMessage() {
   const std::string* const message = g_message.exchange(nullptr);
   if (message == nullptr) return;
@@ -25,7 +25,7 @@ void PrintMessage() {
 BOOL WINAPI OnConsoleEvent(DWORD type) {
   constexpr DWORD kTidyUpMs = 10'000;
   const HANDLE event = g_event.load();
-  if (event == nullptr || SetEvent(event) == FALSE) return FALSE;
+  if (event == nullptr || !SetEvent(event)) return FALSE;
   PrintMessage();
   // When the window is closed the process ends as soon as this returns: let it tidy up first.
   if (type != CTRL_C_EVENT && type != CTRL_BREAK_EVENT) Sleep(kTidyUpMs);

@@ -11,9 +11,9 @@
 namespace cli {
 namespace {
 
-constexpr std::size_t kPiece = 65'536;
+constexpr size_t kPiece = 65'536;
 
-/// @throws Failure
+// Throws Failure.
 UniqueHandle Open(const std::filesystem::path& file,
                   DWORD access,
                   DWORD disposition,
@@ -25,17 +25,17 @@ UniqueHandle Open(const std::filesystem::path& file,
   throw LocalFailure(tried + " " + Printable(file.native()), error);
 }
 
-/// Reads a file from its beginning.
+// Reads a file from its beginning.
 class Reader {
  public:
   explicit Reader(const std::filesystem::path& file)
       : file_(file), handle_(Open(file, GENERIC_READ, OPEN_EXISTING, "read")) {}
 
-  /// The next bytes, as many as there is room for; fewer only at the end.
-  template <std::size_t size>
+  // The next bytes, as many as there is room for; fewer only at the end.
+  template <size_t size>
   DWORD Read(std::array<char, size>& bytes) {
     DWORD count = 0;
-    if (ReadFile(handle_.get(), bytes.data(), static_cast<DWORD>(size), &count, nullptr) == FALSE) {
+    if (!ReadFile(handle_.get(), bytes.data(), static_cast<DWORD>(size), &count, nullptr)) {
       const DWORD error = GetLastError();
       throw LocalFailure("read " + Printable(file_.native()), error);
     }
@@ -49,13 +49,13 @@ class Reader {
 
 }  // namespace
 
-std::optional<std::uint64_t> SizeOf(const std::filesystem::path& file) {
+std::optional<uint64_t> SizeOf(const std::filesystem::path& file) {
   constexpr unsigned kHighPart = 32;
   WIN32_FILE_ATTRIBUTE_DATA data{};
-  if (GetFileAttributesExW(file.c_str(), GetFileExInfoStandard, &data) == FALSE) {
+  if (!GetFileAttributesExW(file.c_str(), GetFileExInfoStandard, &data)) {
     return std::nullopt;
   }
-  return std::uint64_t{data.nFileSizeHigh} << kHighPart | data.nFileSizeLow;
+  return uint64_t{data.nFileSizeHigh} << kHighPart | data.nFileSizeLow;
 }
 
 bool BeginsWith(const std::filesystem::path& file, const std::filesystem::path& beginning) {
@@ -87,7 +87,7 @@ void MakeEmpty(const std::filesystem::path& file) {
 
 void MoveOver(const std::filesystem::path& from, const std::filesystem::path& target) {
   constexpr DWORD kHow = MOVEFILE_REPLACE_EXISTING | MOVEFILE_WRITE_THROUGH;
-  if (MoveFileExW(from.c_str(), target.c_str(), kHow) != FALSE) return;
+  if (MoveFileExW(from.c_str(), target.c_str(), kHow)) return;
   const DWORD error = GetLastError();
   throw LocalFailure("replace " + Printable(target.native()), error);
 }
@@ -103,18 +103,18 @@ std::optional<FILETIME> ToFileTime(const SYSTEMTIME& time,
                                    TimeZone zone,
                                    const TIME_ZONE_INFORMATION* local) {
   SYSTEMTIME utc = time;
-  if (zone == TimeZone::kLocal && TzSpecificLocalTimeToSystemTime(local, &time, &utc) == FALSE) {
+  if (zone == TimeZone::kLocal && !TzSpecificLocalTimeToSystemTime(local, &time, &utc)) {
     return std::nullopt;
   }
   FILETIME file_time{};
-  if (SystemTimeToFileTime(&utc, &file_time) == FALSE) return std::nullopt;
+  if (!SystemTimeToFileTime(&utc, &file_time)) return std::nullopt;
   return file_time;
 }
 
 void SetTime(const std::filesystem::path& file, const FILETIME& time) {
   const std::string tried = "set the time of";
   const UniqueHandle handle = Open(file, FILE_WRITE_ATTRIBUTES, OPEN_EXISTING, tried);
-  if (SetFileTime(handle.get(), nullptr, nullptr, &time) != FALSE) return;
+  if (SetFileTime(handle.get(), nullptr, nullptr, &time)) return;
   const DWORD error = GetLastError();
   throw LocalFailure(tried + " " + Printable(file.native()), error);
 }

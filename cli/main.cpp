@@ -28,7 +28,7 @@ struct LocalFreer {
   void operator()(wchar_t** memory) const { LocalFree(memory); }
 };
 
-/// The words after the program's name, in UTF-8.
+// The words after the program's name, in UTF-8.
 std::vector<std::string> CommandLineWords() {
   int count = 0;
   const std::unique_ptr<wchar_t*, LocalFreer> words(CommandLineToArgvW(GetCommandLineW(), &count));
@@ -37,13 +37,13 @@ std::vector<std::string> CommandLineWords() {
   return utf8;
 }
 
-/// Prints a document, with the path of the report if there is one.
+// Prints a document, with the path of the report if there is one.
 void PrintJson(Json document, const std::wstring& report, Output& out) {
   if (!report.empty()) document["report"] = ToUtf8(report);
   out.Write(document.dump(kJsonIndent) + "\n");
 }
 
-/// Prints a failure as text or as JSON.
+// Prints a failure as text or as JSON.
 ExitCode Tell(
     const Failure& failure, bool json, const std::wstring& report, Output& out, Output& err) {
   if (json) {

@@ -19,9 +19,9 @@ Failure Difference(const MirrorJob& job, std::string meaning, std::string hint) 
           .hint = std::move(hint)};
 }
 
-/// A file of this computer may be replaced when it is the beginning of the receiver's, as of a log that
-/// has grown.
-/// @throws Failure when it is another one
+// A file of this computer may be replaced when it is the beginning of the receiver's, as of a log that
+// has grown.
+// Throws Failure when it is another one.
 void CheckBeginning(const MirrorJob& job, bool is_beginning) {
   if (is_beginning) return;
   throw Difference(
@@ -75,8 +75,8 @@ std::string Mirror(Context& context, Receiver& receiver, const MirrorJob& job, b
   return {};
 }
 
-std::uint64_t BytesOf(const MirrorJob& job, bool verify) {
-  constexpr std::uint64_t kTwice = 2;
+uint64_t BytesOf(const MirrorJob& job, bool verify) {
+  constexpr uint64_t kTwice = 2;
   if (job.step == MirrorStep::kNothing) return 0;
   const bool twice = verify && job.step == MirrorStep::kDownload;
   return twice ? kTwice * job.file.size : job.file.size;

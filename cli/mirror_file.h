@@ -1,5 +1,4 @@
-/// @file mirror_file.h
-/// One file of a mirror.
+// One file of a mirror.
 #ifndef RCVLINK_CLI_MIRROR_FILE_H_
 #define RCVLINK_CLI_MIRROR_FILE_H_
 
@@ -18,15 +17,15 @@ struct MirrorJob {
   MirrorStep step = MirrorStep::kNothing;
 };
 
-/// Executes a job. An existing file is kept whatever fails. Without --force it is replaced only by
-/// a file that begins with the same bytes, such as a log that has grown.
-/// @param verify download twice, and keep nothing when the bytes differ
-/// @return the SHA-256 of the file; empty for an empty file
-/// @throws Failure
+// Executes a job. An existing file is kept whatever fails. Without --force it is replaced only by
+// a file that begins with the same bytes, such as a log that has grown.
+// `verify`: download twice, and keep nothing when the bytes differ
+// Returns the SHA-256 of the file; empty for an empty file
+// Throws Failure.
 std::string Mirror(Context& context, Receiver& receiver, const MirrorJob& job, bool verify);
 
-/// The bytes that a job moves.
-std::uint64_t BytesOf(const MirrorJob& job, bool verify);
+// The bytes that a job moves.
+uint64_t BytesOf(const MirrorJob& job, bool verify);
 
 }  // namespace cli
 

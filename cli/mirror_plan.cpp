@@ -8,7 +8,7 @@
 
 namespace cli {
 
-MirrorStep StepFor(std::uint64_t size, std::optional<std::uint64_t> local_size, bool deletes) {
+MirrorStep StepFor(uint64_t size, std::optional<uint64_t> local_size, bool deletes) {
   if (local_size != size) return size == 0 ? MirrorStep::kMakeEmpty : MirrorStep::kDownload;
   return deletes && size > 0 ? MirrorStep::kCompare : MirrorStep::kNothing;
 }
@@ -26,14 +26,13 @@ ExitCode Worse(ExitCode first, ExitCode second) {
   return rank(first) < rank(second) ? second : first;
 }
 
-std::string InWords(const MirrorState& state, const std::wstring& name, std::uint64_t size) {
-  constexpr std::uint64_t kMsPerSecond = 1000;
+std::string InWords(const MirrorState& state, const std::wstring& name, uint64_t size) {
+  constexpr uint64_t kMsPerSecond = 1000;
   std::string text = "File " + std::to_string(state.file) + " of " + std::to_string(state.files) +
                      ": " + Printable(name) + ", " + FormatBytes(size);
-  const std::uint64_t rate =
-      state.elapsed_ms == 0 ? 0 : state.done * kMsPerSecond / state.elapsed_ms;
+  const uint64_t rate = state.elapsed_ms == 0 ? 0 : state.done * kMsPerSecond / state.elapsed_ms;
   if (rate == 0) return text;
-  const std::uint64_t rest = state.total - std::min(state.done, state.total);
+  const uint64_t rest = state.total - std::min(state.done, state.total);
   return text + ", " + FormatDuration((rest + rate - 1) / rate) + " left in total";
 }
 

@@ -11,7 +11,7 @@ namespace cli {
 namespace {
 
 // 255 is the limit of one name on Windows' file systems.
-constexpr std::size_t kLongestName = 255 - kPartSuffix.size();
+constexpr size_t kLongestName = 255 - kPartSuffix.size();
 
 bool IsForbidden(wchar_t character) {
   constexpr std::wstring_view kForbidden = L"<>:\"/\\|?*";
@@ -19,7 +19,7 @@ bool IsForbidden(wchar_t character) {
 }
 
 std::wstring Escaped(wchar_t character) {
-  constexpr std::size_t kDigits = 2;
+  constexpr size_t kDigits = 2;
   return L"%" + ToUtf16(Hex(character, kDigits));
 }
 
@@ -29,14 +29,14 @@ bool IsPortNumber(std::wstring_view text) {
   return text.size() == 1 && kDigits.find(text.front()) != std::wstring_view::npos;
 }
 
-/// Names that reach a device in any folder, whatever follows their first dot.
+// Names that reach a device in any folder, whatever follows their first dot.
 bool IsDeviceName(std::wstring_view name) {
   constexpr std::array<std::wstring_view, 6> kDevices = {
       L"CON", L"PRN", L"AUX", L"NUL", L"CONIN$", L"CONOUT$"};
   std::wstring stem = Capitals(name.substr(0, name.find(L'.')));
   stem.erase(stem.find_last_not_of(L' ') + 1);
   if (std::find(kDevices.begin(), kDevices.end(), stem) != kDevices.end()) return true;
-  constexpr std::size_t kPortPrefix = 3;
+  constexpr size_t kPortPrefix = 3;
   return (stem.starts_with(L"COM") || stem.starts_with(L"LPT")) &&
          IsPortNumber(std::wstring_view(stem).substr(kPortPrefix));
 }
@@ -45,7 +45,7 @@ bool SurvivesAnsi(std::wstring_view name) {
   const int length = static_cast<int>(name.size());
   const int size =
       WideCharToMultiByte(CP_THREAD_ACP, 0, name.data(), length, nullptr, 0, nullptr, nullptr);
-  std::string ansi(static_cast<std::size_t>(size), '\0');
+  std::string ansi(static_cast<size_t>(size), '\0');
   WideCharToMultiByte(CP_THREAD_ACP, 0, name.data(), length, ansi.data(), size, nullptr, nullptr);
   std::wstring back(name.size(), L'\0');
   const int units = MultiByteToWideChar(CP_THREAD_ACP, 0, ansi.data(), size, back.data(), length);
@@ -75,9 +75,9 @@ std::optional<std::string> WhyNotSendable(std::wstring_view name) {
 
 std::optional<std::wstring> SafeLocalName(std::wstring_view name) {
   // Windows drops dots and spaces at the end, which would make two names one, or "..".
-  const std::size_t trailing = name.find_last_not_of(L". ") + 1;
+  const size_t trailing = name.find_last_not_of(L". ") + 1;
   std::wstring local = IsDeviceName(name) ? L"_" : L"";
-  for (std::size_t i = 0; i < name.size(); ++i) {
+  for (size_t i = 0; i < name.size(); ++i) {
     const bool plain = i < trailing && !IsForbidden(name[i]);
     local += plain ? std::wstring(1, name[i]) : Escaped(name[i]);
   }

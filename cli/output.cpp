@@ -16,12 +16,12 @@ bool IsConsole(HANDLE handle) {
 
 Output::Output(DWORD stream) : handle_(GetStdHandle(stream)), is_terminal_(IsConsole(handle_)) {}
 
-std::size_t Output::Width() const {
-  constexpr std::size_t kUsualWidth = 80;
+size_t Output::Width() const {
+  constexpr size_t kUsualWidth = 80;
   CONSOLE_SCREEN_BUFFER_INFO info{};
-  if (GetConsoleScreenBufferInfo(handle_, &info) == FALSE) return kUsualWidth;
+  if (!GetConsoleScreenBufferInfo(handle_, &info)) return kUsualWidth;
   const int width = info.srWindow.Right - info.srWindow.Left + 1;
-  return width > 0 ? static_cast<std::size_t>(width) : kUsualWidth;
+  return width > 0 ? static_cast<size_t>(width) : kUsualWidth;
 }
 
 void Output::Write(std::string_view utf8) {
@@ -44,7 +44,7 @@ void Output::WriteBytes(std::string_view bytes) {
     DWORD written = 0;
     const BOOL ok =
         WriteFile(handle_, bytes.data(), static_cast<DWORD>(bytes.size()), &written, nullptr);
-    if (ok == FALSE) first_error_ = GetLastError();
+    if (!ok) first_error_ = GetLastError();
     bytes.remove_prefix(written);
   }
 }

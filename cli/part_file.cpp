@@ -48,7 +48,7 @@ bool PartFile::SetVanishing(bool vanishing) {
 
 DWORD PartFile::Write(const void* data, DWORD size) {
   DWORD written = 0;
-  if (WriteFile(file_.get(), data, size, &written, nullptr) == FALSE) return GetLastError();
+  if (!WriteFile(file_.get(), data, size, &written, nullptr)) return GetLastError();
   return written == size ? ERROR_SUCCESS : ERROR_DISK_FULL;
 }
 
@@ -56,14 +56,14 @@ void PartFile::Complete() {
   const BOOL flushed = FlushFileBuffers(file_.get());
   const DWORD flush_error = GetLastError();
   KeepIncomplete();
-  if (flushed == FALSE) throw KeptFailure(FailureOf(flush_error));
+  if (!flushed) throw KeptFailure(FailureOf(flush_error));
   try {
     if (test_) test_(part_);
   } catch (const Failure& failure) {
     throw KeptFailure(failure);
   }
   const DWORD replace = overwrite_.target ? MOVEFILE_REPLACE_EXISTING : 0;
-  if (MoveFileExW(part_.c_str(), target_.c_str(), replace | MOVEFILE_WRITE_THROUGH) == FALSE) {
+  if (!MoveFileExW(part_.c_str(), target_.c_str(), replace | MOVEFILE_WRITE_THROUGH)) {
     const DWORD error = GetLastError();
     Failure failure =
         LocalFailure("rename the download to " + Printable(target_.filename().native()), error);

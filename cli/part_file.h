@@ -1,5 +1,4 @@
-/// @file part_file.h
-/// A download's file on this computer.
+// A download's file on this computer.
 #ifndef RCVLINK_CLI_PART_FILE_H_
 #define RCVLINK_CLI_PART_FILE_H_
 
@@ -11,12 +10,12 @@
 
 namespace cli {
 
-/// A file with the name of its target and ".part" after it. It is deleted unless it is kept, even
-/// when the process is killed.
+// A file with the name of its target and ".part" after it. It is deleted unless it is kept, even
+// when the process is killed.
 class PartFile : public Destination {
  public:
-  /// Looks at the complete file before it gets its name.
-  /// @throws Failure when it may not have it
+  // Looks at the complete file before it gets its name.
+  // Throws Failure when it may not have it.
   using Test = std::function<void(const std::filesystem::path& part)>;
 
   struct Overwrite {
@@ -24,16 +23,16 @@ class PartFile : public Destination {
     bool target = false;
   };
 
-  /// @param overwrite which files may be replaced
-  /// @param test may be empty
-  /// @throws Failure when it cannot be made
+  // `overwrite`: which files may be replaced
+  // `test`: may be empty
+  // Throws Failure when it cannot be made.
   PartFile(std::filesystem::path target, Overwrite overwrite, Test test = {});
   ~PartFile() override;
 
   DWORD Write(const void* data, DWORD size) override;
 
-  /// Gives the file its name.
-  /// @throws Failure when that does not work; all bytes are then in the file with ".part"
+  // Gives the file its name.
+  // Throws Failure when that does not work; all bytes are then in the file with ".part".
   void Complete() override;
 
   std::wstring KeepIncomplete() override;

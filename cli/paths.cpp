@@ -19,7 +19,7 @@ void MakeFolder(const std::filesystem::path& folder) {
   if (folder.empty() || IsFolder(folder)) return;
   const std::filesystem::path parent = folder.parent_path();
   if (parent != folder) MakeFolder(parent);
-  if (CreateDirectoryW(folder.c_str(), nullptr) != FALSE) return;
+  if (CreateDirectoryW(folder.c_str(), nullptr)) return;
   const DWORD error = GetLastError();
   if (!IsFolder(folder)) throw LocalFailure("make the folder " + Printable(folder.native()), error);
 }

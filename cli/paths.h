@@ -1,5 +1,4 @@
-/// @file paths.h
-/// Folders and files of this computer.
+// Folders and files of this computer.
 #ifndef RCVLINK_CLI_PATHS_H_
 #define RCVLINK_CLI_PATHS_H_
 
@@ -15,11 +14,11 @@ namespace cli {
 bool Exists(const std::filesystem::path& path);
 bool IsFolder(const std::filesystem::path& path);
 
-/// Makes a folder and its parents.
-/// @throws Failure when that does not work
+// Makes a folder and its parents.
+// Throws Failure when that does not work.
 void MakeFolder(const std::filesystem::path& folder);
 
-/// A failure with a file or folder of this computer.
+// A failure with a file or folder of this computer.
 Failure LocalFailure(std::string tried, DWORD error);
 
 }  // namespace cli

@@ -10,7 +10,7 @@
 namespace cli {
 namespace {
 
-/// Port names in the order of their numbers.
+// Port names in the order of their numbers.
 struct ByNumber {
   bool operator()(const std::wstring& left, const std::wstring& right) const {
     if (left.size() != right.size()) return left.size() < right.size();
@@ -19,22 +19,22 @@ struct ByNumber {
 };
 using FriendlyNames = std::map<std::wstring, std::wstring, ByNumber>;
 
-/// The driver that receivers on USB come with, under whatever name it was installed.
+// The driver that receivers on USB come with, under whatever name it was installed.
 bool IsUsbioDriver(const std::wstring& service) {
   return Capitals(service).find(L"USBIO") != std::wstring::npos;
 }
 
-/// Whether the path is an interface of the hub's driver, which has one for every device. The
-/// device's own driver has another one.
+// Whether the path is an interface of the hub's driver, which has one for every device. The
+// device's own driver has another one.
 bool IsOfHub(const std::wstring& path) {
   constexpr std::wstring_view kHubsClass = L"#{A5DCBF10-6530-11D2-901F-00C04FB951ED}";
   return Capitals(path).ends_with(kHubsClass);
 }
 
-/// The four digits after a mark such as "VID_" in a device's path; empty when there are none.
+// The four digits after a mark such as "VID_" in a device's path; empty when there are none.
 std::string IdAfter(std::wstring_view mark, const std::wstring& path) {
-  constexpr std::size_t kDigits = 4;
-  const std::size_t position = Capitals(path).find(mark);
+  constexpr size_t kDigits = 4;
+  const size_t position = Capitals(path).find(mark);
   if (position == std::wstring::npos) return {};
   const std::wstring id = path.substr(position + mark.size(), kDigits);
   const bool is_number = id.find_first_not_of(L"0123456789abcdefABCDEF") == std::wstring::npos;
@@ -59,7 +59,7 @@ std::vector<Port> ListComPorts(const PortSource& source) {
   return ports;
 }
 
-/// In the order of their paths.
+// In the order of their paths.
 std::vector<Port> ListUsbDevices(const PortSource& source) {
   std::map<std::wstring, Port> devices;
   for (const PortSource::UsbInterface& device : source.UsbInterfaces()) {
@@ -97,7 +97,7 @@ std::string PortsInWords(const std::vector<Port>& ports, EInstanceType link) {
                                 : "This computer has no COM ports.";
   }
   std::string text = "This computer has ";
-  for (std::size_t i = 0; i < words.size(); ++i) {
+  for (size_t i = 0; i < words.size(); ++i) {
     if (i > 0) text += i + 1 == words.size() ? " and " : ", ";
     text += words[i];
   }

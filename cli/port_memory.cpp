@@ -24,7 +24,7 @@ struct MemoryFreer {
   void operator()(wchar_t* text) const { CoTaskMemFree(text); }
 };
 
-/// Locks the memory against other threads and other programs of the user.
+// Locks the memory against other threads and other programs of the user.
 class MemoryLock {
  public:
   MemoryLock() : mutex_(CreateMutexW(nullptr, FALSE, L"Local\\rcvlink-cli port memory")) {
@@ -46,9 +46,9 @@ class MemoryLock {
   bool held_ = false;
 };
 
-/// The ports of a file; none when it is missing, damaged or something else.
+// The ports of a file; none when it is missing, damaged or something else.
 Json PortsIn(const std::filesystem::path& file) {
-  constexpr std::size_t kMostBytes = 1 << 20;
+  constexpr size_t kMostBytes = 1 << 20;
   std::ifstream stream(file, std::ios::binary);
   std::string text;
   for (std::istreambuf_iterator<char> byte(stream), end; byte != end; ++byte) {
@@ -61,7 +61,7 @@ Json PortsIn(const std::filesystem::path& file) {
   return ports.is_object() ? ports : Json::object();
 }
 
-/// A number or text of an entry, whatever the entry is.
+// A number or text of an entry, whatever the entry is.
 template <typename T>
 T ValueOf(const Json& entry, const char* name, const T& otherwise) {
   if (!entry.is_object() || !entry.contains(name)) return otherwise;
@@ -74,7 +74,7 @@ T ValueOf(const Json& entry, const char* name, const T& otherwise) {
 }
 
 std::optional<KnownSetting> SettingOf(const Json& entry) {
-  const auto speed = ValueOf<std::uint64_t>(entry, "speed", 0);
+  const auto speed = ValueOf<uint64_t>(entry, "speed", 0);
   const auto rts = ParseRts(ValueOf<std::string>(entry, "rts", ""));
   const auto family = ParseFamily(ValueOf<std::string>(entry, "protocol", ""));
   if (speed < kSlowestSpeed || speed > kFastestSpeed || !rts || !family) return std::nullopt;
@@ -87,7 +87,7 @@ Json EntryOf(const KnownSetting& setting) {
           {"protocol", FamilyWord(setting.family)}};
 }
 
-/// Replaces the file in one step, so that nobody reads half of it.
+// Replaces the file in one step, so that nobody reads half of it.
 bool Replace(const std::filesystem::path& file, const Json& ports) {
   constexpr int kIndent = 2;
   const std::filesystem::path fresh = file.native() + L".new";
@@ -95,7 +95,7 @@ bool Replace(const std::filesystem::path& file, const Json& ports) {
   stream << Json{{"ports", ports}}.dump(kIndent) << "\n";
   stream.close();
   const bool replaced =
-      stream && MoveFileExW(fresh.c_str(), file.c_str(), MOVEFILE_REPLACE_EXISTING) != FALSE;
+      stream && MoveFileExW(fresh.c_str(), file.c_str(), MOVEFILE_REPLACE_EXISTING);
   if (!replaced) DeleteFileW(fresh.c_str());
   return replaced;
 }

@@ -13,9 +13,9 @@ Progress::Progress(Context& context, const TransferState& start)
   if (mode_ == ProgressMode::kJson) context_.err.Write(ProgressJson(start) + "\n");
 }
 
-void Progress::Show(TransferState state, std::uint64_t elapsed_ms) {
-  constexpr std::uint64_t kLineIntervalMs = 5000;
-  constexpr std::uint64_t kJsonIntervalMs = 1000;
+void Progress::Show(TransferState state, uint64_t elapsed_ms) {
+  constexpr uint64_t kLineIntervalMs = 5000;
+  constexpr uint64_t kJsonIntervalMs = 1000;
   if (mode_ == ProgressMode::kNone || state.done == 0) return;
   rate_.Add(elapsed_ms, state.done);
   state.rate = rate_.BytesPerSecond();
@@ -31,7 +31,7 @@ void Progress::Show(TransferState state, std::uint64_t elapsed_ms) {
 }
 
 void Progress::Draw(const std::string& line) {
-  const std::size_t width = context_.err.Width() - 1;
+  const size_t width = context_.err.Width() - 1;
   const std::string shown = line.substr(0, width);
   context_.err.Write(Redrawn(shown, drawn_width_));
   drawn_width_ = shown.size();

@@ -1,5 +1,4 @@
-/// @file progress.h
-/// A download's progress on standard error.
+// A download's progress on standard error.
 #ifndef RCVLINK_CLI_PROGRESS_H_
 #define RCVLINK_CLI_PROGRESS_H_
 
@@ -9,19 +8,19 @@
 
 namespace cli {
 
-/// A bar, a line now and then, JSON lines, or nothing.
+// A bar, a line now and then, JSON lines, or nothing.
 class Progress {
  public:
   Progress(Context& context, const TransferState& start);
 
-  /// Erases the bar.
+  // Erases the bar.
   ~Progress();
   Progress(const Progress&) = delete;
   Progress& operator=(const Progress&) = delete;
 
-  /// To be called several times a second.
-  /// @param elapsed_ms since the beginning
-  void Show(TransferState state, std::uint64_t elapsed_ms);
+  // To be called several times a second.
+  // `elapsed_ms`: since the beginning.
+  void Show(TransferState state, uint64_t elapsed_ms);
 
  private:
   void Draw(const std::string& line);
@@ -29,8 +28,8 @@ class Progress {
   Context& context_;
   ProgressMode mode_;
   RateMeter rate_;
-  std::size_t drawn_width_ = 0;
-  std::uint64_t last_line_ms_ = 0;
+  size_t drawn_width_ = 0;
+  uint64_t last_line_ms_ = 0;
 };
 
 }  // namespace cli

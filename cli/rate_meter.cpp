@@ -2,17 +2,17 @@
 
 namespace cli {
 
-void RateMeter::Add(std::uint64_t elapsed_ms, std::uint64_t done) {
-  constexpr std::uint64_t kWindowMs = 5000;
-  constexpr std::size_t kLeastSamples = 2;
+void RateMeter::Add(uint64_t elapsed_ms, uint64_t done) {
+  constexpr uint64_t kWindowMs = 5000;
+  constexpr size_t kLeastSamples = 2;
   samples_.push_back({elapsed_ms, done});
   while (samples_.size() > kLeastSamples && samples_[1].elapsed_ms + kWindowMs <= elapsed_ms) {
     samples_.pop_front();
   }
 }
 
-std::uint64_t RateMeter::BytesPerSecond() const {
-  constexpr std::uint64_t kMsPerSecond = 1000;
+uint64_t RateMeter::BytesPerSecond() const {
+  constexpr uint64_t kMsPerSecond = 1000;
   if (samples_.empty()) return 0;
   const Sample& first = samples_.front();
   const Sample& last = samples_.back();

@@ -1,5 +1,4 @@
-/// @file rate_meter.h
-/// How fast a download is right now.
+// How fast a download is right now.
 #ifndef RCVLINK_CLI_RATE_METER_H_
 #define RCVLINK_CLI_RATE_METER_H_
 
@@ -8,20 +7,20 @@
 
 namespace cli {
 
-/// The rate of the last seconds: a slow beginning does not count for ever.
+// The rate of the last seconds: a slow beginning does not count for ever.
 class RateMeter {
  public:
-  /// @param elapsed_ms time since the beginning; never less than before
-  /// @param done bytes that have arrived until then
-  void Add(std::uint64_t elapsed_ms, std::uint64_t done);
+  // `elapsed_ms`: time since the beginning; never less than before
+  // `done`: bytes that have arrived until then.
+  void Add(uint64_t elapsed_ms, uint64_t done);
 
-  /// Bytes per second; 0 while it is not known, or nothing arrives.
-  std::uint64_t BytesPerSecond() const;
+  // Bytes per second; 0 while it is not known, or nothing arrives.
+  uint64_t BytesPerSecond() const;
 
  private:
   struct Sample {
-    std::uint64_t elapsed_ms;
-    std::uint64_t done;
+    uint64_t elapsed_ms;
+    uint64_t done;
   };
   std::deque<Sample> samples_;  // the first is the beginning of the window
 };

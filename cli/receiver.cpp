@@ -26,13 +26,13 @@ struct StringFreer {
   void operator()(wchar_t* string) const { SysFreeString(string); }
 };
 
-/// Takes ownership of a string of the library.
+// Takes ownership of a string of the library.
 std::wstring Take(wchar_t* string) {
   const std::unique_ptr<wchar_t, StringFreer> owner(string);
   return {string, SysStringLen(string)};
 }
 
-/// @returns S_OK or the library's result
+// Returns S_OK or the library's result.
 long ReadEntry(void* list, long index, RemoteFile& file) {
   CFileInfo info{};
   const long result = devapi::GetFileInfo(list, index, &info);
@@ -41,12 +41,12 @@ long ReadEntry(void* list, long index, RemoteFile& file) {
   return S_OK;
 }
 
-/// Whether these files may have filled the library's buffer for a Velmar directory, so that others
-/// are missing. Assumes that each line has its longest form.
+// Whether these files may have filled the library's buffer for a Velmar directory, so that others
+// are missing. Assumes that each line has its longest form.
 bool MayBeCut(const std::vector<RemoteFile>& files) {
-  constexpr std::size_t kBuffer = 8192;
-  constexpr std::size_t kLongestLineBesidesName = 125;
-  std::size_t length = kLongestLineBesidesName;  // of the first that did not fit
+  constexpr size_t kBuffer = 8192;
+  constexpr size_t kLongestLineBesidesName = 125;
+  size_t length = kLongestLineBesidesName;  // of the first that did not fit
   for (const RemoteFile& file : files) length += kLongestLineBesidesName + file.name.size();
   return length >= kBuffer;
 }
@@ -116,16 +116,16 @@ std::vector<RemoteFile> Receiver::ReadDirectory() {
   if (const long counted = devapi::GetFilesCount(list.get(), &count); counted != S_OK) {
     throw FailureOf(kList, counted);
   }
-  std::vector<RemoteFile> files(static_cast<std::size_t>(count));
+  std::vector<RemoteFile> files(static_cast<size_t>(count));
   for (long i = 0; i < count; ++i) {
-    const long read = ReadEntry(list.get(), i, files[static_cast<std::size_t>(i)]);
+    const long read = ReadEntry(list.get(), i, files[static_cast<size_t>(i)]);
     if (read != S_OK) throw FailureOf(kList, read);
   }
   return files;
 }
 
-/// Only for Velmar receivers, which are on serial ports. An empty list is read again: the library
-/// reports a refused or lost command as an empty directory.
+// Only for Velmar receivers, which are on serial ports. An empty list is read again: the library
+// reports a refused or lost command as an empty directory.
 std::string Receiver::DoubtAbout(std::vector<RemoteFile>& files) {
   if (!setting_ || setting_->family != eProtocolVelmar) return {};
   if (MayBeCut(files)) AwaitAnswer(kList);
@@ -145,11 +145,11 @@ bool Receiver::Answers() {
   return code == S_OK && answer != VARIANT_FALSE;
 }
 
-/// The rest of a list that did not fit is still arriving and would disturb the next exchange.
+// The rest of a list that did not fit is still arriving and would disturb the next exchange.
 void Receiver::AwaitAnswer(const std::string& tried) {
-  constexpr std::uint64_t kLongestRestMs = 120'000;
+  constexpr uint64_t kLongestRestMs = 120'000;
   const Busy busy(context_, "Waiting for the end of the list");
-  const std::uint64_t start_ms = GetTickCount64();
+  const uint64_t start_ms = GetTickCount64();
   while (GetTickCount64() - start_ms < kLongestRestMs) {
     ThrowIfCancelled(tried);
     if (Answers()) return;

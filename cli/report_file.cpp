@@ -12,7 +12,7 @@
 namespace cli {
 namespace {
 
-/// Writes one line into the report.
+// Writes one line into the report.
 void WriteLine(const wchar_t* format, ...) {
   va_list arguments;
   va_start(arguments, format);
@@ -20,14 +20,14 @@ void WriteLine(const wchar_t* format, ...) {
   va_end(arguments);
 }
 
-/// "1.0.0.0", from the version resource of a module; "unknown" without one.
+// "1.0.0.0", from the version resource of a module; "unknown" without one.
 std::wstring VersionOf(const wchar_t* module) {
   const DWORD size = GetFileVersionInfoSizeW(module, nullptr);
   std::vector<BYTE> block(size);
   void* value = nullptr;
   UINT length = 0;
-  if (size == 0 || GetFileVersionInfoW(module, 0, size, block.data()) == FALSE ||
-      VerQueryValueW(block.data(), L"\\", &value, &length) == FALSE) {
+  if (size == 0 || !GetFileVersionInfoW(module, 0, size, block.data()) ||
+      !VerQueryValueW(block.data(), L"\\", &value, &length)) {
     return L"unknown";
   }
   const auto& version = *static_cast<const VS_FIXEDFILEINFO*>(value);

@@ -1,5 +1,4 @@
-/// @file report_file.h
-/// The library's trace.
+// The library's trace.
 #ifndef RCVLINK_CLI_REPORT_FILE_H_
 #define RCVLINK_CLI_REPORT_FILE_H_
 
@@ -9,17 +8,17 @@
 
 namespace cli {
 
-/// While it lives, the library writes a trace of what it does, if the command line asks for one.
-/// The report begins with the versions and the command line.
+// While it lives, the library writes a trace of what it does, if the command line asks for one.
+// The report begins with the versions and the command line.
 class ReportFile {
  public:
-  /// @throws Failure when the file exists already and may not be overwritten, or cannot be made
+  // Throws Failure when the file exists already and may not be overwritten, or cannot be made.
   explicit ReportFile(Context& context);
   ~ReportFile();
   ReportFile(const ReportFile&) = delete;
   ReportFile& operator=(const ReportFile&) = delete;
 
-  /// Where it is; empty when none was asked for.
+  // Where it is; empty when none was asked for.
   const std::wstring& path() const { return path_; }
 
  private:

@@ -5,7 +5,7 @@
 
 namespace cli {
 
-SearchDisplay::SearchDisplay(Context& context, std::size_t ports)
+SearchDisplay::SearchDisplay(Context& context, size_t ports)
     : context_(context),
       mode_(ProgressModeOf(context)),
       ports_(ports),
@@ -24,8 +24,8 @@ SearchDisplay::~SearchDisplay() {
 }
 
 void SearchDisplay::Begin(const std::wstring& port,
-                          std::size_t number,
-                          std::size_t count,
+                          size_t number,
+                          size_t count,
                           const LineSetting& line) {
   const std::scoped_lock lock(mutex_);
   const bool one_try = count == 1;
@@ -64,10 +64,10 @@ void SearchDisplay::PrintFailure(const Failure& failure) {
 }
 
 void SearchDisplay::Draw() {
-  constexpr std::uint64_t kMsPerSecond = 1000;
+  constexpr uint64_t kMsPerSecond = 1000;
   const std::string seconds = FormatDuration((GetTickCount64() - start_ms_) / kMsPerSecond);
   // The last column stays free, because a full line would wrap.
-  const std::size_t width = context_.err.Width() - 1;
+  const size_t width = context_.err.Width() - 1;
   const std::string line = (doing_ + ", " + seconds + " (Ctrl-C stops it)").substr(0, width);
   context_.err.Write(Redrawn(line, drawn_width_));
   drawn_width_ = line.size();

@@ -1,5 +1,4 @@
-/// @file search_display.h
-/// What a search for receivers shows while it goes on.
+// What a search for receivers shows while it goes on.
 #ifndef RCVLINK_CLI_SEARCH_DISPLAY_H_
 #define RCVLINK_CLI_SEARCH_DISPLAY_H_
 
@@ -14,25 +13,22 @@
 
 namespace cli {
 
-/// Shows the current try and the time where a bar would be shown, otherwise one line per try, as
-/// --progress says. While it lives, all output of the program goes through it, from any thread.
+// Shows the current try and the time where a bar would be shown, otherwise one line per try, as
+// --progress says. While it lives, all output of the program goes through it, from any thread.
 class SearchDisplay {
  public:
-  /// @param ports how many are searched at the same time
-  SearchDisplay(Context& context, std::size_t ports);
+  // `ports`: how many are searched at the same time.
+  SearchDisplay(Context& context, size_t ports);
 
-  /// Erases the line.
+  // Erases the line.
   ~SearchDisplay();
   SearchDisplay(const SearchDisplay&) = delete;
   SearchDisplay& operator=(const SearchDisplay&) = delete;
 
-  /// A try begins.
-  void Begin(const std::wstring& port,
-             std::size_t number,
-             std::size_t count,
-             const LineSetting& line);
+  // A try begins.
+  void Begin(const std::wstring& port, size_t number, size_t count, const LineSetting& line);
 
-  /// As the functions of `Context`.
+  // As the functions of `Context`.
   void PrintResult(const std::string& text);
   void PrintStatus(const std::string& text);
   void PrintFailure(const Failure& failure);
@@ -45,11 +41,11 @@ class SearchDisplay {
 
   Context& context_;
   const ProgressMode mode_;
-  const std::size_t ports_;
-  const std::uint64_t start_ms_;
+  const size_t ports_;
+  const uint64_t start_ms_;
   std::mutex mutex_;
   std::string doing_;
-  std::size_t drawn_width_ = 0;
+  size_t drawn_width_ = 0;
   std::optional<Ticker> ticker_;  // ends before all that it uses
 };
 

@@ -10,7 +10,7 @@
 namespace cli {
 namespace {
 
-/// A word of the command line and the value that it stands for.
+// A word of the command line and the value that it stands for.
 struct Word {
   Setting setting;
   std::string_view word;

@@ -28,8 +28,8 @@ void Sha256::Add(const void* data, DWORD size) {
 }
 
 std::string Sha256::Finish() {
-  constexpr std::size_t kBytes = 32;
-  constexpr std::size_t kDigitsOfByte = 2;
+  constexpr size_t kBytes = 32;
+  constexpr size_t kDigitsOfByte = 2;
   std::array<UCHAR, kBytes> digest{};
   if (!hash_ || failed_) return {};
   if (!BCRYPT_SUCCESS(BCryptFinishHash(hash_.get(), digest.data(), kBytes, 0))) return {};

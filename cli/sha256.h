@@ -1,5 +1,4 @@
-/// @file sha256.h
-/// The SHA-256 of a stream of bytes, computed by Windows.
+// The SHA-256 of a stream of bytes, computed by Windows.
 #ifndef RCVLINK_CLI_SHA256_H_
 #define RCVLINK_CLI_SHA256_H_
 
@@ -18,8 +17,8 @@ class Sha256 {
 
   void Add(const void* data, DWORD size);
 
-  /// 64 hexadecimal digits in small letters, of all that was added; empty when Windows could not
-  /// compute it. To be called once, at the end.
+  // 64 hexadecimal digits in small letters, of all that was added; empty when Windows could not
+  // compute it. To be called once, at the end.
   std::string Finish();
 
  private:

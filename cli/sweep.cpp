@@ -65,7 +65,7 @@ std::vector<Try> PlanSweep(EProtocol protocol,
 }
 
 SweepResult RunSweep(const std::vector<Try>& tries, SweepPort& port) {
-  for (std::size_t i = 0; i < tries.size(); ++i) {
+  for (size_t i = 0; i < tries.size(); ++i) {
     const LineSetting& line = tries[i].line;
     port.Begin(i + 1, tries.size(), line);
     for (const EProtocol family : tries[i].families) {

@@ -28,7 +28,7 @@ Failure Refusal(const std::wstring& name, DWORD error, std::string meaning, std:
           .hint = std::move(hint)};
 }
 
-/// @throws Failure when no file can be made in the folder
+// Throws Failure when no file can be made in the folder.
 void CheckWritable(const std::filesystem::path& folder) {
   const std::string tried = "create files in " + Printable(folder.native());
   if (!IsFolder(folder)) throw LocalFailure(tried, ERROR_DIRECTORY);
@@ -69,10 +69,10 @@ void Targets::CheckFolder() const {
   CheckWritable(existing);
 }
 
-void Targets::CheckRoom(std::uint64_t bytes) const {
+void Targets::CheckRoom(uint64_t bytes) const {
   ULARGE_INTEGER available{};
   const std::filesystem::path folder = ExistingFolder();
-  if (GetDiskFreeSpaceExW(folder.c_str(), &available, nullptr, nullptr) == FALSE) return;
+  if (!GetDiskFreeSpaceExW(folder.c_str(), &available, nullptr, nullptr)) return;
   if (available.QuadPart >= bytes) return;
   throw Failure{.exit = ExitCode::kLocalFile,
                 .tried = "download into " + Printable(folder.native()),
@@ -82,7 +82,7 @@ void Targets::CheckRoom(std::uint64_t bytes) const {
                 .hint = "Free some space, choose another disk with -o, or download fewer files."};
 }
 
-/// The folder of the targets, or the nearest parent that exists.
+// The folder of the targets, or the nearest parent that exists.
 std::filesystem::path Targets::ExistingFolder() const {
   std::filesystem::path folder = file_.empty() ? folder_ : file_.parent_path();
   folder = std::filesystem::absolute(folder.empty() ? L"." : folder);
@@ -127,7 +127,7 @@ std::optional<std::filesystem::path> Targets::TakeExisting(const std::wstring& n
   return target;
 }
 
-/// Names that differ only in case are one name on this computer.
+// Names that differ only in case are one name on this computer.
 std::filesystem::path Targets::FreePathOf(const std::wstring& name) const {
   const std::filesystem::path target = PathOf(name);
   if (!IsTaken(target)) return target;

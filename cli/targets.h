@@ -1,5 +1,4 @@
-/// @file targets.h
-/// Where downloads go.
+// Where downloads go.
 #ifndef RCVLINK_CLI_TARGETS_H_
 #define RCVLINK_CLI_TARGETS_H_
 
@@ -11,37 +10,37 @@
 
 namespace cli {
 
-/// Where the user wants the downloads.
+// Where the user wants the downloads.
 struct Place {
-  std::wstring output{};  ///< a folder or a file; may be empty
-  bool many = false;      ///< more than one download: `output` is a folder
-  bool force = false;     ///< files may be overwritten
+  std::wstring output{};  // a folder or a file; may be empty
+  bool many = false;      // more than one download: `output` is a folder
+  bool force = false;     // files may be overwritten
 };
 
-/// Chooses the local file of each download, and refuses those that would do harm.
+// Chooses the local file of each download, and refuses those that would do harm.
 class Targets {
  public:
   explicit Targets(const Place& place);
 
-  /// Checks whether files can be made in the folder. Leaves nothing there.
-  /// @throws Failure
+  // Checks whether files can be made in the folder. Leaves nothing there.
+  // Throws Failure.
   void CheckFolder() const;
 
-  /// Checks whether the disk has room for so many bytes.
-  /// @throws Failure
-  void CheckRoom(std::uint64_t bytes) const;
+  // Checks whether the disk has room for so many bytes.
+  // Throws Failure.
+  void CheckRoom(uint64_t bytes) const;
 
-  /// The file for a name of the receiver.
-  /// @throws Failure when the name is impossible, the file or its ".part" exists already and may not
-  ///         be overwritten, or an earlier name has taken it
+  // The file for a name of the receiver.
+  // Throws Failure when the name is impossible, the file or its ".part" exists already and may not
+  //         be overwritten, or an earlier name has taken it.
   std::filesystem::path Choose(const std::wstring& name);
 
-  /// The existing file for a name of the receiver; nothing when there is none. Later names cannot
-  /// use it.
-  /// @throws Failure when the name is impossible, or an earlier name has taken the file
+  // The existing file for a name of the receiver; nothing when there is none. Later names cannot
+  // use it.
+  // Throws Failure when the name is impossible, or an earlier name has taken the file.
   std::optional<std::filesystem::path> TakeExisting(const std::wstring& name);
 
-  /// The folder of all targets; empty for that of a single target named by the user.
+  // The folder of all targets; empty for that of a single target named by the user.
   const std::filesystem::path& folder() const { return folder_; }
 
  private:

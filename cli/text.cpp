@@ -12,7 +12,7 @@ namespace cli {
 namespace {
 
 constexpr int kHexBase = 16;
-constexpr std::size_t kCodeDigits = 8;
+constexpr size_t kCodeDigits = 8;
 
 bool IsBetween(wchar_t character, wchar_t first, wchar_t last) {
   return character >= first && character <= last;
@@ -24,7 +24,7 @@ std::string ToUtf8(std::wstring_view text) {
   const int length = static_cast<int>(text.size());
   const int size =
       WideCharToMultiByte(CP_UTF8, 0, text.data(), length, nullptr, 0, nullptr, nullptr);
-  std::string utf8(static_cast<std::size_t>(size), '\0');
+  std::string utf8(static_cast<size_t>(size), '\0');
   WideCharToMultiByte(CP_UTF8, 0, text.data(), length, utf8.data(), size, nullptr, nullptr);
   return utf8;
 }
@@ -32,7 +32,7 @@ std::string ToUtf8(std::wstring_view text) {
 std::wstring ToUtf16(std::string_view text) {
   const int length = static_cast<int>(text.size());
   const int size = MultiByteToWideChar(CP_UTF8, 0, text.data(), length, nullptr, 0);
-  std::wstring utf16(static_cast<std::size_t>(size), L'\0');
+  std::wstring utf16(static_cast<size_t>(size), L'\0');
   MultiByteToWideChar(CP_UTF8, 0, text.data(), length, utf16.data(), size);
   return utf16;
 }
@@ -45,8 +45,8 @@ bool IsControl(wchar_t character) {
 }
 
 std::string Printable(std::wstring_view text) {
-  constexpr std::size_t kByteDigits = 2;
-  constexpr std::size_t kUnitDigits = 4;
+  constexpr size_t kByteDigits = 2;
+  constexpr size_t kUnitDigits = 4;
   constexpr wchar_t kLastByte = L'\xFF';
   std::wstring shown;
   for (const wchar_t character : text) {
@@ -63,7 +63,7 @@ std::string Printable(std::wstring_view text) {
 
 std::string HexCode(long code) { return "0x" + Hex(static_cast<unsigned long>(code), kCodeDigits); }
 
-std::string Hex(unsigned long value, std::size_t digits) {
+std::string Hex(unsigned long value, size_t digits) {
   char buffer[kCodeDigits];
   const auto end = std::to_chars(buffer, buffer + kCodeDigits, value, kHexBase).ptr;
   std::string text(buffer, end);
@@ -80,14 +80,14 @@ std::string Lowered(std::string text) {
   return text;
 }
 
-std::size_t ChangesBetween(std::string_view first, std::string_view second) {
-  std::vector<std::size_t> row(second.size() + 1);
-  std::iota(row.begin(), row.end(), std::size_t{0});
-  for (std::size_t i = 0; i < first.size(); ++i) {
-    std::size_t diagonal = row[0];
+size_t ChangesBetween(std::string_view first, std::string_view second) {
+  std::vector<size_t> row(second.size() + 1);
+  std::iota(row.begin(), row.end(), size_t{0});
+  for (size_t i = 0; i < first.size(); ++i) {
+    size_t diagonal = row[0];
     row[0] = i + 1;
-    for (std::size_t j = 0; j < second.size(); ++j) {
-      const std::size_t changed = diagonal + (first[i] == second[j] ? 0 : 1);
+    for (size_t j = 0; j < second.size(); ++j) {
+      const size_t changed = diagonal + (first[i] == second[j] ? 0 : 1);
       diagonal = row[j + 1];
       row[j + 1] = std::min({changed, row[j] + 1, row[j + 1] + 1});
     }
@@ -95,20 +95,20 @@ std::size_t ChangesBetween(std::string_view first, std::string_view second) {
   return row.back();
 }
 
-std::string PadLeft(std::string text, std::size_t width) {
+std::string PadLeft(std::string text, size_t width) {
   text.insert(0, width - std::min(width, text.size()), ' ');
   return text;
 }
 
-std::string PadRight(std::string text, std::size_t width) {
+std::string PadRight(std::string text, size_t width) {
   text.append(width - std::min(width, text.size()), ' ');
   return text;
 }
 
-std::string Redrawn(const std::string& line, std::size_t width) {
+std::string Redrawn(const std::string& line, size_t width) {
   return std::string("\r").append(PadRight(line, width));
 }
 
-std::string Erased(std::size_t width) { return Redrawn("", width).append("\r"); }
+std::string Erased(size_t width) { return Redrawn("", width).append("\r"); }
 
 }  // namespace cli

@@ -1,5 +1,4 @@
-/// @file ticker.h
-/// A function that is called periodically while the main thread is inside the library.
+// A function that is called periodically while the main thread is inside the library.
 #ifndef RCVLINK_CLI_TICKER_H_
 #define RCVLINK_CLI_TICKER_H_
 
@@ -11,7 +10,7 @@
 
 namespace cli {
 
-/// Calls a function on a thread of its own, after each interval, until it is destroyed.
+// Calls a function on a thread of its own, after each interval, until it is destroyed.
 class Ticker {
  public:
   Ticker(std::chrono::milliseconds interval, std::function<void()> tick);

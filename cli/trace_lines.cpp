@@ -9,41 +9,41 @@ namespace cli {
 namespace {
 
 constexpr std::string_view kTimePattern = "00:00:00.0000 ";  // a 0 stands for any digit
-constexpr std::size_t kThreadWidth = 6;
+constexpr size_t kThreadWidth = 6;
 
 struct Stamp {
-  std::uint32_t ms_of_day = 0;
-  std::uint32_t thread = 0;
-  std::size_t length = 0;
+  uint32_t ms_of_day = 0;
+  uint32_t thread = 0;
+  size_t length = 0;
 };
 
 bool IsDigit(char character) { return character >= '0' && character <= '9'; }
 
-std::uint32_t NumberAt(std::string_view text, std::size_t position, std::size_t digits) {
-  std::uint32_t number = 0;
+uint32_t NumberAt(std::string_view text, size_t position, size_t digits) {
+  uint32_t number = 0;
   std::from_chars(text.data() + position, text.data() + position + digits, number);
   return number;
 }
 
-std::optional<std::uint32_t> TimeOf(std::string_view text) {
-  constexpr std::size_t kMinuteAt = 3;
-  constexpr std::size_t kSecondAt = 6;
-  constexpr std::size_t kMsAt = 9;
-  constexpr std::size_t kDigits = 2;
-  constexpr std::size_t kMsDigits = 4;
-  constexpr std::uint32_t kHours = 24;
-  constexpr std::uint32_t kSixty = 60;
-  constexpr std::uint32_t kThousand = 1000;
+std::optional<uint32_t> TimeOf(std::string_view text) {
+  constexpr size_t kMinuteAt = 3;
+  constexpr size_t kSecondAt = 6;
+  constexpr size_t kMsAt = 9;
+  constexpr size_t kDigits = 2;
+  constexpr size_t kMsDigits = 4;
+  constexpr uint32_t kHours = 24;
+  constexpr uint32_t kSixty = 60;
+  constexpr uint32_t kThousand = 1000;
   if (text.size() < kTimePattern.size()) return std::nullopt;
-  for (std::size_t i = 0; i < kTimePattern.size(); ++i) {
+  for (size_t i = 0; i < kTimePattern.size(); ++i) {
     if (kTimePattern[i] == '0' ? !IsDigit(text[i]) : text[i] != kTimePattern[i]) {
       return std::nullopt;
     }
   }
-  const std::uint32_t hour = NumberAt(text, 0, kDigits);
-  const std::uint32_t minute = NumberAt(text, kMinuteAt, kDigits);
-  const std::uint32_t second = NumberAt(text, kSecondAt, kDigits);
-  const std::uint32_t ms = NumberAt(text, kMsAt, kMsDigits);
+  const uint32_t hour = NumberAt(text, 0, kDigits);
+  const uint32_t minute = NumberAt(text, kMinuteAt, kDigits);
+  const uint32_t second = NumberAt(text, kSecondAt, kDigits);
+  const uint32_t ms = NumberAt(text, kMsAt, kMsDigits);
   if (hour >= kHours || minute >= kSixty || second >= kSixty || ms >= kThousand) {
     return std::nullopt;
   }
@@ -54,8 +54,8 @@ std::optional<Stamp> StampAt(std::string_view text) {
   const auto ms_of_day = TimeOf(text);
   if (!ms_of_day) return std::nullopt;
   const std::string_view rest = text.substr(kTimePattern.size());
-  const std::size_t digits = std::min(rest.find_first_not_of(' '), rest.size());
-  const std::size_t end = std::min(rest.find(' ', digits), rest.size());
+  const size_t digits = std::min(rest.find_first_not_of(' '), rest.size());
+  const size_t end = std::min(rest.find(' ', digits), rest.size());
   if (end < kThreadWidth || end == rest.size()) return std::nullopt;
   Stamp stamp{.ms_of_day = *ms_of_day, .length = kTimePattern.size() + end + 1};
   const char* const last = rest.data() + end;
@@ -66,7 +66,7 @@ std::optional<Stamp> StampAt(std::string_view text) {
 
 bool IsBeyondAscii(char character) { return static_cast<signed char>(character) < 0; }
 
-/// Removes the line end.
+// Removes the line end.
 bool Trim(std::string& bytes) {
   const bool has_end = bytes.ends_with('\n');
   if (has_end) bytes.pop_back();
@@ -80,7 +80,7 @@ TraceLines SplitTrace(std::string_view report) {
   TraceLines result;
   bool may_begin = true;  // a stamp may begin here
   bool is_cut = false;    // the line has bytes beyond ASCII, so its end may be missing
-  std::size_t position = 0;
+  size_t position = 0;
   while (position < report.size()) {
     const auto stamp = may_begin || is_cut ? StampAt(report.substr(position)) : std::nullopt;
     if (stamp) {

@@ -12,9 +12,9 @@ namespace cli {
 namespace {
 
 struct Pattern {
-  std::string_view line;  ///< a * stands for any text
+  std::string_view line;  // a * stands for any text
   TraceKind kind;
-  std::string_view meaning;  ///< %1 is the text of the first *
+  std::string_view meaning;  // %1 is the text of the first *
 };
 
 // The first one that matches counts.
@@ -181,7 +181,7 @@ constexpr std::array kPatterns = {
 
 struct CommandText {
   std::string_view class_name;
-  TraceFamily family;  ///< unknown: any
+  TraceFamily family;  // unknown: any
   std::string_view meaning;
 };
 
@@ -218,11 +218,11 @@ constexpr std::array kCommands = {
                 "set the language of the port: interfacemode"},
 };
 
-/// The texts that the stars match; nothing when the pattern does not match. The last bracket may be
-/// open: a line with bytes beyond ASCII loses its end.
+// The texts that the stars match; nothing when the pattern does not match. The last bracket may be
+// open: a line with bytes beyond ASCII loses its end.
 std::optional<std::vector<std::string_view>> Match(std::string_view pattern,
                                                    std::string_view line) {
-  const std::size_t head = std::min(pattern.find('*'), pattern.size());
+  const size_t head = std::min(pattern.find('*'), pattern.size());
   if (!line.starts_with(pattern.substr(0, head))) return std::nullopt;
   if (head == pattern.size()) {
     return line.size() == head ? std::optional(std::vector<std::string_view>()) : std::nullopt;
@@ -232,10 +232,10 @@ std::optional<std::vector<std::string_view>> Match(std::string_view pattern,
   pattern.remove_prefix(head);
   while (!pattern.empty()) {
     pattern.remove_prefix(1);
-    const std::size_t length = std::min(pattern.find('*'), pattern.size());
+    const size_t length = std::min(pattern.find('*'), pattern.size());
     const std::string_view literal = pattern.substr(0, length);
     const bool is_last = length == pattern.size();
-    std::size_t found = line.find(literal);
+    size_t found = line.find(literal);
     if (is_last && line.ends_with(literal)) found = line.size() - length;
     if (is_last && !line.ends_with(literal)) {
       if (!literal.starts_with(']')) return std::nullopt;
@@ -250,35 +250,35 @@ std::optional<std::vector<std::string_view>> Match(std::string_view pattern,
   return stars;
 }
 
-/// A name or text of the receiver, not too long for a line.
+// A name or text of the receiver, not too long for a line.
 std::string Shortened(std::string_view text) {
-  constexpr std::size_t kMost = 160;
+  constexpr size_t kMost = 160;
   constexpr unsigned char kContinuation = 0x80;
   constexpr unsigned char kContinuationMask = 0xC0;
   if (text.size() <= kMost) return std::string(text);
-  std::size_t end = kMost;
+  size_t end = kMost;
   while ((static_cast<unsigned char>(text[end]) & kContinuationMask) == kContinuation) --end;
   return std::string(text.substr(0, end)) + "...";
 }
 
 std::string Filled(std::string_view meaning, const std::vector<std::string_view>& stars) {
   std::string filled;
-  for (std::size_t i = 0; i < meaning.size(); ++i) {
+  for (size_t i = 0; i < meaning.size(); ++i) {
     if (meaning[i] != '%') {
       filled += meaning[i];
       continue;
     }
-    const auto star = static_cast<std::size_t>(meaning[++i] - '1');
+    const auto star = static_cast<size_t>(meaning[++i] - '1');
     filled += star < stars.size() ? Shortened(stars[star]) : "?";
   }
   return filled;
 }
 
-/// The code in the brackets that open at `open`. Windows errors are decimal.
-std::optional<long> CodeIn(std::string_view line, std::size_t open) {
-  constexpr std::size_t kHexLength = 10;  // 0x8007048F
-  constexpr std::size_t kLongestError = 5;
-  const std::size_t close = line.find(']', open);
+// The code in the brackets that open at `open`. Windows errors are decimal.
+std::optional<long> CodeIn(std::string_view line, size_t open) {
+  constexpr size_t kHexLength = 10;  // 0x8007048F
+  constexpr size_t kLongestError = 5;
+  const size_t close = line.find(']', open);
   if (open == std::string_view::npos || close == std::string_view::npos) return std::nullopt;
   const std::string_view text = line.substr(open + 1, close - open - 1);
   const bool is_code = text.starts_with("0x") && text.size() == kHexLength;
@@ -289,13 +289,13 @@ std::optional<long> CodeIn(std::string_view line, std::size_t open) {
   return code && is_error ? ResultOfWin32(static_cast<unsigned long>(*code)) : code;
 }
 
-/// The result code of a line that reports a failure. It comes first where a receiver's text
-/// follows, otherwise last or before the port's name.
+// The result code of a line that reports a failure. It comes first where a receiver's text
+// follows, otherwise last or before the port's name.
 std::optional<long> CodeOf(std::string_view line) {
   constexpr std::string_view kResponse = "::DumpInvalidResponse - [";
-  const std::size_t response = line.find(kResponse);
+  const size_t response = line.find(kResponse);
   if (response != std::string_view::npos) return CodeIn(line, response + kResponse.size() - 1);
-  for (std::size_t open = line.rfind('['); open != std::string_view::npos && open > 0;
+  for (size_t open = line.rfind('['); open != std::string_view::npos && open > 0;
        open = line.rfind('[', open - 1)) {
     if (const auto code = CodeIn(line, open)) return code;
   }
@@ -376,7 +376,7 @@ std::string CommandMeaning(std::string_view class_name, TraceFamily family) {
 }
 
 std::string_view CommandClass(std::string_view line) {
-  const std::size_t colons = line.find("::");
+  const size_t colons = line.find("::");
   if (colons == std::string_view::npos) return {};
   const std::string_view name = line.substr(0, colons);
   const bool is_command = name.ends_with("Cmd") || name.ends_with("Command");

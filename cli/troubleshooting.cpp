@@ -22,7 +22,7 @@ std::optional<T> ParseNumber(std::string_view text, int base) {
 
 std::string_view Trimmed(std::string_view text) {
   constexpr std::string_view kBlank = " \r\n";
-  const std::size_t first = std::min(text.find_first_not_of(kBlank), text.size());
+  const size_t first = std::min(text.find_first_not_of(kBlank), text.size());
   return text.substr(first, text.find_last_not_of(kBlank) + 1 - first);
 }
 
@@ -31,12 +31,12 @@ std::string_view Trimmed(std::string_view text) {
 std::vector<TroubleshootingEntry> ReadTroubleshooting(std::string_view page) {
   constexpr std::string_view kHeading = "\n## ";
   std::vector<TroubleshootingEntry> entries;
-  for (std::size_t begin = page.find(kHeading); begin != std::string_view::npos;) {
-    const std::size_t next = page.find(kHeading, begin + 1);
+  for (size_t begin = page.find(kHeading); begin != std::string_view::npos;) {
+    const size_t next = page.find(kHeading, begin + 1);
     const std::string_view section =
         page.substr(begin + kHeading.size(), next - begin - kHeading.size());
     const std::string_view heading = section.substr(0, section.find('\n'));
-    const std::size_t blank = std::min(heading.find(' '), heading.size());
+    const size_t blank = std::min(heading.find(' '), heading.size());
     if (const auto code = ParseCode(heading.substr(0, blank))) {
       entries.push_back({.code = *code,
                          .title = std::string(Trimmed(heading.substr(blank))),
@@ -63,13 +63,13 @@ std::optional<long> ParseCode(std::string_view text) {
   constexpr int kDecimalBase = 10;
   const std::string lowered = Lowered(std::string(text));
   const auto number = lowered.starts_with("0x")
-                          ? ParseNumber<std::int64_t>(std::string_view(lowered).substr(2), kHexBase)
-                          : ParseNumber<std::int64_t>(lowered, kDecimalBase);
-  if (!number || *number < std::numeric_limits<std::int32_t>::min() ||
-      *number > std::numeric_limits<std::uint32_t>::max()) {
+                          ? ParseNumber<int64_t>(std::string_view(lowered).substr(2), kHexBase)
+                          : ParseNumber<int64_t>(lowered, kDecimalBase);
+  if (!number || *number < std::numeric_limits<int32_t>::min() ||
+      *number > std::numeric_limits<uint32_t>::max()) {
     return std::nullopt;
   }
-  return static_cast<long>(static_cast<std::uint32_t>(*number));
+  return static_cast<long>(static_cast<uint32_t>(*number));
 }
 
 }  // namespace cli

@@ -7,12 +7,12 @@
 namespace cli {
 namespace {
 
-/// After a mismatch the last * takes one character more; earlier ones need not change.
+// After a mismatch the last * takes one character more; earlier ones need not change.
 bool Fits(std::wstring_view name, std::wstring_view pattern) {
-  std::size_t at = 0;
-  std::size_t in_pattern = 0;
-  std::size_t star = std::wstring_view::npos;
-  std::size_t taken_by_star = 0;
+  size_t at = 0;
+  size_t in_pattern = 0;
+  size_t star = std::wstring_view::npos;
+  size_t taken_by_star = 0;
   while (at < name.size()) {
     const bool ended = in_pattern == pattern.size();
     if (!ended && pattern[in_pattern] == L'*') {

@@ -33,7 +33,7 @@ struct DeviceSetCloser {
 };
 using UniqueDeviceSet = std::unique_ptr<HDEVINFO, DeviceSetCloser>;
 
-/// A registry string: the size counts bytes, and the zero at the end may be missing.
+// A registry string: the size counts bytes, and the zero at the end may be missing.
 std::wstring TextOf(const wchar_t* buffer, DWORD bytes) {
   std::wstring text(buffer, bytes / sizeof(wchar_t));
   return text.substr(0, text.find(L'\0'));
@@ -63,10 +63,10 @@ std::wstring PropertyOf(HDEVINFO devices, SP_DEVINFO_DATA& device, DWORD propert
   auto* const bytes = reinterpret_cast<BYTE*>(value);
   const BOOL read = SetupDiGetDeviceRegistryPropertyW(
       devices, &device, property, nullptr, bytes, sizeof(value), &size);
-  return read != FALSE ? TextOf(value, size) : std::wstring();
+  return read ? TextOf(value, size) : std::wstring();
 }
 
-/// The name of a device: its own where it has one, otherwise that of its kind.
+// The name of a device: its own where it has one, otherwise that of its kind.
 std::wstring WordsOf(HDEVINFO devices, SP_DEVINFO_DATA& device) {
   const std::wstring name = PropertyOf(devices, device, SPDRP_FRIENDLYNAME);
   return name.empty() ? PropertyOf(devices, device, SPDRP_DEVICEDESC) : name;
@@ -77,7 +77,7 @@ UniqueDeviceSet PresentDevices(const GUID& interface_class) {
       &interface_class, nullptr, nullptr, DIGCF_PRESENT | DIGCF_DEVICEINTERFACE));
 }
 
-/// The path of an interface, and the device that it belongs to.
+// The path of an interface, and the device that it belongs to.
 std::wstring PathOf(HDEVINFO devices,
                     SP_DEVICE_INTERFACE_DATA& interface_data,
                     SP_DEVINFO_DATA& device) {
@@ -87,10 +87,10 @@ std::wstring PathOf(HDEVINFO devices,
   detail->cbSize = sizeof(*detail);
   const BOOL told = SetupDiGetDeviceInterfaceDetailW(
       devices, &interface_data, detail, sizeof(buffer), nullptr, &device);
-  return told != FALSE ? std::wstring(detail->DevicePath) : std::wstring();
+  return told ? std::wstring(detail->DevicePath) : std::wstring();
 }
 
-/// The interface classes that devices have registered.
+// The interface classes that devices have registered.
 std::vector<GUID> InterfaceClasses() {
   std::vector<GUID> classes;
   const UniqueKey key =
@@ -140,9 +140,9 @@ class WindowsPorts : public PortSource {
     }
     names.resize(length);
     std::vector<std::wstring> list;
-    std::size_t begin = 0;
+    size_t begin = 0;
     while (begin < names.size()) {
-      const std::size_t end = std::min(names.find(L'\0', begin), names.size());
+      const size_t end = std::min(names.find(L'\0', begin), names.size());
       list.push_back(names.substr(begin, end - begin));
       begin = end + 1;
     }
@@ -154,7 +154,7 @@ class WindowsPorts : public PortSource {
     const UniqueDeviceSet devices = PresentDevices(kComPortInterface);
     SP_DEVINFO_DATA device{};
     device.cbSize = sizeof(device);
-    for (DWORD i = 0; SetupDiEnumDeviceInfo(devices.get(), i, &device) != FALSE; ++i) {
+    for (DWORD i = 0; SetupDiEnumDeviceInfo(devices.get(), i, &device); ++i) {
       ports.push_back(
           {PortOf(devices.get(), device), PropertyOf(devices.get(), device, SPDRP_FRIENDLYNAME)});
     }
@@ -168,8 +168,8 @@ class WindowsPorts : public PortSource {
       const UniqueDeviceSet devices(PresentDevices(interface_class));
       SP_DEVICE_INTERFACE_DATA found{};
       found.cbSize = sizeof(found);
-      for (DWORD i = 0; SetupDiEnumDeviceInterfaces(
-                            devices.get(), nullptr, &interface_class, i, &found) != FALSE;
+      for (DWORD i = 0;
+           SetupDiEnumDeviceInterfaces(devices.get(), nullptr, &interface_class, i, &found);
            ++i) {
         SP_DEVINFO_DATA device{};
         device.cbSize = sizeof(device);

@@ -1,5 +1,4 @@
-/// @file bytes.h
-/// Bytes as the simulator handles them, and their way to and from text.
+// Bytes as the simulator handles them, and their way to and from text.
 #ifndef SIMULATOR_BYTES_H_
 #define SIMULATOR_BYTES_H_
 

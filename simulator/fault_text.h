@@ -1,6 +1,5 @@
-/// @file fault_text.h
-/// The command-line form of faults, as far as all families share it. Whatever parses throws
-/// std::invalid_argument with a message for the user when the text does not fit.
+// The command-line form of faults, as far as all families share it. Whatever parses throws
+// std::invalid_argument with a message for the user when the text does not fit.
 #ifndef SIMULATOR_FAULT_TEXT_H_
 #define SIMULATOR_FAULT_TEXT_H_
 

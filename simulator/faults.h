@@ -1,5 +1,4 @@
-/// @file faults.h
-/// Faults of a receiver, as far as all families share them: how often they happen.
+// Faults of a receiver, as far as all families share them: how often they happen.
 #ifndef SIMULATOR_FAULTS_H_
 #define SIMULATOR_FAULTS_H_
 

@@ -1,5 +1,4 @@
-/// @file files.h
-/// The files that a receiver serves.
+// The files that a receiver serves.
 #ifndef SIMULATOR_FILES_H_
 #define SIMULATOR_FILES_H_
 

@@ -1,5 +1,4 @@
-/// @file line.h
-/// The receiver's end of a link: its speed, and what it still has to send.
+// The receiver's end of a link: its speed, and what it still has to send.
 #ifndef SIMULATOR_LINE_H_
 #define SIMULATOR_LINE_H_
 

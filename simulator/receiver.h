@@ -1,5 +1,4 @@
-/// @file receiver.h
-/// What a port needs to know of a receiver, of whatever family.
+// What a port needs to know of a receiver, of whatever family.
 #ifndef SIMULATOR_RECEIVER_H_
 #define SIMULATOR_RECEIVER_H_
 

@@ -1,5 +1,4 @@
-/// @file transcript.h
-/// The record of a session between host and receiver.
+// The record of a session between host and receiver.
 #ifndef SIMULATOR_TRANSCRIPT_H_
 #define SIMULATOR_TRANSCRIPT_H_
 

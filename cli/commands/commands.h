@@ -1,5 +1,4 @@
-/// @file commands.h
-/// All subcommands.
+// All subcommands.
 #ifndef RCVLINK_CLI_COMMANDS_COMMANDS_H_
 #define RCVLINK_CLI_COMMANDS_COMMANDS_H_
 
@@ -7,7 +6,7 @@
 
 namespace cli {
 
-/// Makes one of each, in the order of the help.
+// Makes one of each, in the order of the help.
 Commands MakeCommands();
 
 }  // namespace cli

@@ -34,7 +34,7 @@ constexpr std::string_view kEnd =
 }
 )";
 
-/// A literal string of PowerShell.
+// A literal string of PowerShell.
 std::string Quoted(const std::string& text) {
   std::string quoted = "'";
   for (const char character : text) quoted.append(character == '\'' ? 2 : 1, character);

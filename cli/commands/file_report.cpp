@@ -23,7 +23,7 @@ void FileReport::AddFailed(const std::wstring& name, Failure failure) {
   if (!failure_ || failure.exit == ExitCode::kCancelled) failure_ = std::move(failure);
 }
 
-void FileReport::AddUntried(std::size_t count) {
+void FileReport::AddUntried(size_t count) {
   if (count == 0) return;
   const std::string files = count == 1 ? " more file was" : " more files were";
   context_.PrintStatus("  " + std::to_string(count) + files + " not tried.\n");

@@ -1,5 +1,4 @@
-/// @file file_report.h
-/// The end of a command that handles several files, of which some may fail.
+// The end of a command that handles several files, of which some may fail.
 #ifndef RCVLINK_CLI_COMMANDS_FILE_REPORT_H_
 #define RCVLINK_CLI_COMMANDS_FILE_REPORT_H_
 
@@ -14,21 +13,21 @@ class FileReport {
  public:
   explicit FileReport(Context& context);
 
-  /// Records a file that worked.
-  /// @param details what JSON says of it besides its name
+  // Records a file that worked.
+  // `details`: what JSON says of it besides its name.
   void AddDone(const std::wstring& name, const Json& details);
 
-  /// Records a file that failed, and prints the failure.
+  // Records a file that failed, and prints the failure.
   void AddFailed(const std::wstring& name, Failure failure);
 
-  /// Records that the command ended early.
-  void AddUntried(std::size_t count);
+  // Records that the command ended early.
+  void AddUntried(size_t count);
 
-  /// Records whether the receiver's file list was complete.
-  /// @param doubt why not; empty when it was
+  // Records whether the receiver's file list was complete.
+  // `doubt`: why not; empty when it was.
   void SetComplete(const std::string& doubt);
 
-  /// The command's end: that of the first failure, or of the cancellation.
+  // The command's end: that of the first failure, or of the cancellation.
   Outcome Finish() &&;
 
  private:

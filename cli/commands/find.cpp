@@ -21,13 +21,13 @@ std::string InWords(const std::wstring& port, const Receiver& receiver, const Id
          " receiver, model " + Printable(identity.model) + ", id " + Printable(identity.id) + "\n";
 }
 
-/// The result of the search on one of several ports.
+// The result of the search on one of several ports.
 struct Answer {
-  Json receiver{};  ///< null when there is none
+  Json receiver{};  // null when there is none
   std::optional<Failure> failure{};
 };
 
-/// Searches one of several ports, on a thread of its own, and prints the result at once.
+// Searches one of several ports, on a thread of its own, and prints the result at once.
 Answer Ask(Context& context, const SearchPlace& place, SearchDisplay& display) {
   Failure failure;
   try {
@@ -49,14 +49,14 @@ std::vector<Answer> AskAll(Context& context, const std::vector<SearchPlace>& pla
   std::vector<Answer> answers(places.size());
   SearchDisplay display(context, places.size());
   std::vector<std::jthread> threads;
-  for (std::size_t i = 0; i < places.size(); ++i) {
+  for (size_t i = 0; i < places.size(); ++i) {
     threads.emplace_back([&, i] { answers[i] = Ask(context, places[i], display); });
   }
   threads.clear();  // waits for them
   return answers;
 }
 
-/// The outcome of a search on several ports: done when there is a receiver on any of them.
+// The outcome of a search on several ports: done when there is a receiver on any of them.
 Outcome OutcomeOf(const std::vector<Answer>& answers, bool cancelled) {
   Outcome outcome{.exit = ExitCode::kNoReceiver,
                   .document = {{"receivers", Json::array()}, {"failures", Json::array()}}};
@@ -120,7 +120,7 @@ class Find : public Command {
     return places;
   }
 
-  /// A COM port is serial whatever --link says, so that ports of both links can be named together.
+  // A COM port is serial whatever --link says, so that ports of both links can be named together.
   std::vector<SearchPlace> NamedPlaces(const Arguments& arguments) const {
     std::vector<std::wstring> names = {arguments.port};
     std::transform(more_.begin(), more_.end(), std::back_inserter(names), PlainPortName);

@@ -23,7 +23,7 @@ constexpr std::wstring_view kStandardOutput = L"-";
 constexpr std::wstring_view kNullDevice = L"NUL";
 
 struct GetOptions {
-  std::vector<std::wstring> names{};  ///< of files, or patterns of names
+  std::vector<std::wstring> names{};  // of files, or patterns of names
   std::wstring output{};
   bool all = false;
   bool skip_existing = false;
@@ -31,19 +31,19 @@ struct GetOptions {
 
   bool ToStandardOutput() const { return output == kStandardOutput; }
 
-  /// Whether no file of this computer is made.
+  // Whether no file of this computer is made.
   bool IsStream() const { return ToStandardOutput() || SameLocalName(output, kNullDevice); }
 
-  /// Whether it is known which files are wanted, whatever the receiver lists.
+  // Whether it is known which files are wanted, whatever the receiver lists.
   bool NamesInFull() const { return !all && std::none_of(names.begin(), names.end(), IsPattern); }
 
   bool IsOneFile() const { return !all && names.size() == 1 && !IsPattern(names.front()); }
 };
 
-/// Where a file goes.
+// Where a file goes.
 struct Spot {
   std::filesystem::path target{};
-  bool is_taken = false;  ///< by a file that stays, so that there is nothing to download
+  bool is_taken = false;  // by a file that stays, so that there is nothing to download
 };
 
 struct Job {
@@ -51,7 +51,7 @@ struct Job {
   std::filesystem::path target;
 };
 
-/// One execution of `get`. A file that cannot be downloaded or saved does not stop the others.
+// One execution of `get`. A file that cannot be downloaded or saved does not stop the others.
 class GetRun {
  public:
   GetRun(Context& context, const GetOptions& options)
@@ -81,7 +81,7 @@ class GetRun {
   }
 
  private:
-  /// The names and patterns of the command line, without names that cannot be saved here.
+  // The names and patterns of the command line, without names that cannot be saved here.
   std::vector<std::wstring> Wishes() {
     std::vector<std::wstring> wishes;
     for (const std::wstring& name : options_.names) {
@@ -106,8 +106,8 @@ class GetRun {
     return {.target = targets_.Choose(name)};
   }
 
-  /// The receiver's files that were named, each once.
-  /// @throws Failure when there is none for one of the names: nothing is transferred then
+  // The receiver's files that were named, each once.
+  // Throws Failure when there is none for one of the names: nothing is transferred then.
   static std::vector<RemoteFile> Wanted(const std::vector<std::wstring>& wishes,
                                         const std::vector<RemoteFile>& files) {
     std::vector<RemoteFile> wanted;
@@ -133,7 +133,7 @@ class GetRun {
     return wanted;
   }
 
-  /// The files to transfer. Those that cannot be transferred or saved are reported instead.
+  // The files to transfer. Those that cannot be transferred or saved are reported instead.
   std::vector<Job> Plan(Receiver& receiver, const std::vector<RemoteFile>& files) {
     std::vector<Job> jobs;
     for (const RemoteFile& file : files) {
@@ -158,9 +158,9 @@ class GetRun {
     return jobs;
   }
 
-  /// Keeps an existing file as it is. Warns when it has another size.
+  // Keeps an existing file as it is. Warns when it has another size.
   void Skip(const RemoteFile& file, const std::filesystem::path& target) {
-    const std::uint64_t here = SizeOf(target).value_or(0);
+    const uint64_t here = SizeOf(target).value_or(0);
     report_.AddDone(file.name,
                     {{"path", ToUtf8(target.native())}, {"bytes", here}, {"skipped", true}});
     const std::string start = Printable(file.name) + ": already exists";
@@ -173,7 +173,7 @@ class GetRun {
   }
 
   void CheckRoom(const std::vector<Job>& jobs) const {
-    std::uint64_t total = 0;
+    uint64_t total = 0;
     for (const Job& job : jobs) total += job.file.size;
     targets_.CheckRoom(total);
   }
@@ -187,8 +187,8 @@ class GetRun {
   }
 
   void DownloadAll(Receiver& receiver, const std::vector<Job>& jobs) {
-    for (std::size_t i = 0; i < jobs.size(); ++i) {
-      const std::size_t untried = jobs.size() - i - 1;
+    for (size_t i = 0; i < jobs.size(); ++i) {
+      const size_t untried = jobs.size() - i - 1;
       try {
         DownloadOne(receiver, jobs[i]);
       } catch (const Failure& failure) {
@@ -214,7 +214,7 @@ class GetRun {
   }
 
   void PrintDownload(const Job& job, const Downloaded& downloaded) {
-    constexpr std::uint64_t kMsPerSecond = 1000;
+    constexpr uint64_t kMsPerSecond = 1000;
     std::string text = Printable(job.file.name) + ": " + std::to_string(job.file.size) +
                        " bytes in " + FormatDuration(downloaded.milliseconds / kMsPerSecond) +
                        " -> " + Printable(job.target.native()) + "\n";

@@ -1,5 +1,4 @@
-/// @file identity.h
-/// What find and info print about a receiver.
+// What find and info print about a receiver.
 #ifndef RCVLINK_CLI_COMMANDS_IDENTITY_H_
 #define RCVLINK_CLI_COMMANDS_IDENTITY_H_
 
@@ -10,13 +9,13 @@
 
 namespace cli {
 
-/// The link as a word of --link.
+// The link as a word of --link.
 std::string LinkWord(EInstanceType link);
 
-/// "usb", or "serial, 57600 bit/s, RTS on"
+// "usb", or "serial, 57600 bit/s, RTS on"
 std::string LinkInWords(const Receiver& receiver);
 
-/// {"port", "link", "speed", "rts", "protocol", "id", "model"}; speed and rts are null on USB
+// {"port", "link", "speed", "rts", "protocol", "id", "model"}; speed and rts are null on USB
 Json ToJson(const std::wstring& port, const Receiver& receiver, const Identity& identity);
 
 }  // namespace cli

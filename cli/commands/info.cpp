@@ -8,7 +8,7 @@ namespace cli {
 namespace {
 
 std::string Row(const std::string& label, const std::string& value) {
-  constexpr std::size_t kLabelWidth = 10;
+  constexpr size_t kLabelWidth = 10;
   return PadRight(label, kLabelWidth) + value + "\n";
 }
 

@@ -9,10 +9,10 @@
 namespace cli {
 namespace {
 
-constexpr std::size_t kTimeWidth = 19;
+constexpr size_t kTimeWidth = 19;
 
 std::string Row(const std::string& size,
-                std::size_t size_width,
+                size_t size_width,
                 const std::string& time,
                 const std::string& name) {
   return PadLeft(size, size_width) + "  " + PadRight(time, kTimeWidth) + "  " + name + "\n";
@@ -36,7 +36,7 @@ class List : public Command {
     Receiver receiver(context);
     const Directory directory = receiver.ListFiles();
     const std::vector<RemoteFile>& files = directory.files;
-    std::uint64_t total = 0;
+    uint64_t total = 0;
     for (const RemoteFile& file : files) total += file.size;
     PrintTable(context, files);
     context.PrintDone(std::to_string(files.size()) + (files.size() == 1 ? " file" : " files") +
@@ -57,7 +57,7 @@ class List : public Command {
  private:
   static void PrintTable(Context& context, const std::vector<RemoteFile>& files) {
     constexpr std::string_view kSizeTitle = "Size";
-    std::size_t size_width = kSizeTitle.size();
+    size_t size_width = kSizeTitle.size();
     for (const RemoteFile& file : files) {
       size_width = std::max(size_width, std::to_string(file.size).size());
     }

@@ -20,22 +20,22 @@ namespace cli {
 namespace {
 
 struct MirrorOptions {
-  std::vector<std::wstring> patterns{};  ///< empty: all files
+  std::vector<std::wstring> patterns{};  // empty: all files
   std::wstring folder{};
-  std::optional<TimeZone> times{};  ///< nothing: files have the time of their download
+  std::optional<TimeZone> times{};  // nothing: files have the time of their download
   bool verify = false;
   bool deletes = false;
 };
 
-/// The local files of a mirror. Existing ones may be replaced, by the rules of `Mirror`.
-/// @throws Failure when the folder cannot be used: checked before a search that may take minutes
+// The local files of a mirror. Existing ones may be replaced, by the rules of `Mirror`.
+// Throws Failure when the folder cannot be used: checked before a search that may take minutes.
 Targets TargetsIn(const std::wstring& folder) {
   Targets targets({.output = folder, .many = true, .force = true});
   targets.CheckFolder();
   return targets;
 }
 
-/// The mirror of a receiver: goes on after a file that failed, and ends by the worst of all.
+// The mirror of a receiver: goes on after a file that failed, and ends by the worst of all.
 class MirrorRun {
  public:
   MirrorRun(Context& context, const MirrorOptions& options)
@@ -62,11 +62,11 @@ class MirrorRun {
 
  private:
   struct Summary {
-    std::size_t downloaded = 0;
-    std::size_t present = 0;
-    std::size_t failed = 0;
-    std::size_t deleted = 0;
-    std::size_t untried = 0;
+    size_t downloaded = 0;
+    size_t present = 0;
+    size_t failed = 0;
+    size_t deleted = 0;
+    size_t untried = 0;
   };
 
   bool IsWanted(const std::wstring& name) const {
@@ -109,15 +109,15 @@ class MirrorRun {
   }
 
   void MirrorAll(const std::vector<MirrorJob>& jobs) {
-    const std::uint64_t start_ms = GetTickCount64();
-    for (std::size_t i = 0; i < jobs.size(); ++i) {
+    const uint64_t start_ms = GetTickCount64();
+    for (size_t i = 0; i < jobs.size(); ++i) {
       const MirrorJob& job = jobs[i];
       total_.elapsed_ms = GetTickCount64() - start_ms;
       try {
         MirrorOne(job);
       } catch (const Failure& failure) {
         AddFailed(job.file.name, failure);
-        const std::size_t untried = jobs.size() - i - 1;
+        const size_t untried = jobs.size() - i - 1;
         if (untried > 0 && !MayGoOn(receiver_, failure)) {
           summary_.untried = untried;
           report_.AddUntried(summary_.untried);
@@ -167,8 +167,8 @@ class MirrorRun {
     asked_to_delete_.push_back(name);
   }
 
-  /// The library may not notice a refusal, so the directory is read again.
-  void CheckDeleted(std::size_t listed_before) {
+  // The library may not notice a refusal, so the directory is read again.
+  void CheckDeleted(size_t listed_before) {
     std::vector<RemoteFile> files;
     std::optional<Failure> unread;
     try {
@@ -206,7 +206,7 @@ class MirrorRun {
   }
 
   void PrintSummary() {
-    constexpr std::uint64_t kMsPerSecond = 1000;
+    constexpr uint64_t kMsPerSecond = 1000;
     std::string text = std::to_string(summary_.downloaded) + " downloaded, " +
                        std::to_string(summary_.present) + " already here, " +
                        std::to_string(summary_.failed) + " failed";
@@ -235,7 +235,7 @@ class MirrorRun {
   FileReport report_;
   std::string doubt_;
   MirrorState total_;
-  std::uint64_t new_bytes_ = 0;  // that the disk needs room for
+  uint64_t new_bytes_ = 0;  // that the disk needs room for
   Summary summary_;
   ExitCode worst_ = ExitCode::kDone;
   std::vector<std::pair<std::wstring, Json>> done_;

@@ -8,7 +8,7 @@
 namespace cli {
 namespace {
 
-/// What is known of a port besides its name.
+// What is known of a port besides its name.
 std::string Details(const Port& port) {
   std::string details = Printable(port.friendly_name);
   if (port.vendor.empty()) return details;
@@ -36,12 +36,12 @@ class Ports : public Command {
   void AddOptions(CLI::App& /*app*/, Arguments& /*arguments*/) override {}
 
   Outcome Run(Context& context) override {
-    constexpr std::size_t kGap = 2;
+    constexpr size_t kGap = 2;
     const std::vector<Port> ports = ListPorts();
     if (ports.empty()) {
       context.PrintDone("This computer has no COM port and no USB device with the USBIO driver.\n");
     }
-    std::size_t width = 0;
+    size_t width = 0;
     for (const Port& port : ports) width = std::max(width, Printable(port.name).size() + kGap);
     Json list = Json::array();
     for (const Port& port : ports) {

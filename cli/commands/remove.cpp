@@ -13,7 +13,7 @@ namespace {
 
 std::string Tried(const std::wstring& name) { return "delete " + Printable(name); }
 
-/// The library may not notice a refusal, so the directory is read again.
+// The library may not notice a refusal, so the directory is read again.
 std::optional<Failure> WhyStillThere(const std::vector<RemoteFile>& files,
                                      const std::wstring& name) {
   if (!HasFile(files, name)) return std::nullopt;
@@ -22,14 +22,14 @@ std::optional<Failure> WhyStillThere(const std::vector<RemoteFile>& files,
                  .meaning = "the command was sent, but the receiver still has the file"};
 }
 
-/// Asks for each file; stops when cancelled.
-/// @return the names that were asked for with success
+// Asks for each file; stops when cancelled.
+// Returns the names that were asked for with success.
 std::vector<std::wstring> RemoveAll(Context& context,
                                     Receiver& receiver,
                                     const std::vector<std::wstring>& names,
                                     FileReport& report) {
   std::vector<std::wstring> removed;
-  for (std::size_t i = 0; i < names.size(); ++i) {
+  for (size_t i = 0; i < names.size(); ++i) {
     std::wstring name = names[i];
     const bool cancelled = context.interrupt.requested();
     const long code = cancelled ? ResultOfWin32(ERROR_CANCELLED)
@@ -49,7 +49,7 @@ std::vector<std::wstring> RemoveAll(Context& context,
 
 void Verify(Context& context,
             Receiver& receiver,
-            std::size_t listed_before,
+            size_t listed_before,
             const std::vector<std::wstring>& removed,
             FileReport& report) {
   if (removed.empty()) return;

@@ -16,15 +16,15 @@
 namespace cli {
 namespace {
 
-/// Reports of long sessions have some 100 kB; a larger part would be of no use.
-constexpr std::size_t kMostBytes = 16'777'216;
+// Reports of long sessions have some 100 kB; a larger part would be of no use.
+constexpr size_t kMostBytes = 16'777'216;
 
 struct Content {
   std::string bytes{};
   bool is_whole = true;
 };
 
-/// @throws Failure
+// Throws Failure.
 Content ReadFileContent(const std::filesystem::path& path) {
   const std::string tried = "read the report " + Printable(path.native());
   const HANDLE opened = CreateFileW(path.c_str(),
@@ -37,14 +37,14 @@ Content ReadFileContent(const std::filesystem::path& path) {
   if (opened == INVALID_HANDLE_VALUE) throw LocalFailure(tried, GetLastError());
   const UniqueHandle file(opened);
   Content content{.bytes = std::string(kMostBytes + 1, '\0')};
-  std::size_t size = 0;
+  size_t size = 0;
   DWORD count = 0;
   do {
-    if (ReadFile(file.get(),
-                 content.bytes.data() + size,
-                 static_cast<DWORD>(content.bytes.size() - size),
-                 &count,
-                 nullptr) == FALSE) {
+    if (!ReadFile(file.get(),
+                  content.bytes.data() + size,
+                  static_cast<DWORD>(content.bytes.size() - size),
+                  &count,
+                  nullptr)) {
       throw LocalFailure(tried, GetLastError());
     }
     size += count;
@@ -54,7 +54,7 @@ Content ReadFileContent(const std::filesystem::path& path) {
   return content;
 }
 
-/// @throws Failure when the page exists and may not be replaced, or cannot be written
+// Throws Failure when the page exists and may not be replaced, or cannot be written.
 void WritePage(const std::filesystem::path& path, const std::string& page, bool force) {
   const std::string tried = "write the page " + Printable(path.native());
   const HANDLE opened = CreateFileW(path.c_str(),

@@ -9,10 +9,10 @@
 namespace cli {
 namespace {
 
-/// Locks the receiver for this thread.
+// Locks the receiver for this thread.
 class ReceiverLock {
  public:
-  /// @throws Failure when it cannot be locked
+  // Throws Failure when it cannot be locked.
   ReceiverLock(const Context& context, Receiver& receiver, const std::string& tried)
       : receiver_(receiver.handle()) {
     const long code = devapi::LockConnection(receiver_, context.interrupt.event());
@@ -41,7 +41,7 @@ long Send(void* receiver, Setting setting, unsigned long number) {
   return E_UNEXPECTED;
 }
 
-/// The port's settings with which a receiver answers after the change.
+// The port's settings with which a receiver answers after the change.
 DCB Changed(DCB settings, const SettingChange& change) {
   switch (change.setting) {
     case Setting::kBaud:
@@ -70,7 +70,7 @@ bool AnswersAt(const Context& context, EProtocol family, const DCB& settings) {
   return true;
 }
 
-/// Saves this setting for the next command. Nothing deletes the saved one.
+// Saves this setting for the next command. Nothing deletes the saved one.
 void Remember(Context& context, const std::optional<KnownSetting>& setting) {
   const Arguments& arguments = context.arguments;
   const PortMemory memory = MemoryOf(arguments);
@@ -79,10 +79,11 @@ void Remember(Context& context, const std::optional<KnownSetting>& setting) {
   if (!written && arguments.verbose) context.PrintStatus(UnwrittenMemory(arguments.port));
 }
 
-/// Whether this program looks for receivers with that setting.
+// Whether this program looks for receivers with that setting.
 bool IsFoundAgain(const SettingChange& change) {
-  if (change.setting == Setting::kParity)
+  if (change.setting == Setting::kParity) {
     return change.value == static_cast<unsigned long>(Parity::kNone);
+  }
   return change.setting != Setting::kStopBits || change.value == 1;
 }
 
@@ -94,8 +95,8 @@ std::string Advice(const SettingChange& change) {
   return "  This program cannot find the receiver again: it uses no parity and one stop bit.\n";
 }
 
-/// Parses setting and value.
-/// @throws Failure when they are invalid
+// Parses setting and value.
+// Throws Failure when they are invalid.
 SettingChange CheckedChange(const std::wstring& setting, const std::wstring& value) {
   const auto change = ParseSetting(Lowered(ToUtf8(setting)), Lowered(ToUtf8(value)));
   if (!change) {
@@ -157,9 +158,9 @@ class Set : public Command {
   }
 
  private:
-  /// Sends the change and closes the receiver.
-  /// @return where it was found, on a serial port
-  /// @throws Failure
+  // Sends the change and closes the receiver.
+  // Returns where it was found, on a serial port
+  // Throws Failure.
   static std::optional<KnownSetting> Change(Context& context,
                                             const SettingChange& change,
                                             const std::string& tried) {
@@ -179,8 +180,8 @@ class Set : public Command {
     return receiver.setting();
   }
 
-  /// Asks the receiver at its new setting, and when it does not answer there, at the old one.
-  /// @throws Failure when it was not changed, or is lost
+  // Asks the receiver at its new setting, and when it does not answer there, at the old one.
+  // Throws Failure when it was not changed, or is lost.
   static void Confirm(Context& context,
                       EProtocol family,
                       const SettingChange& change,

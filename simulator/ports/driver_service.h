@@ -1,5 +1,4 @@
-/// @file driver_service.h
-/// Starting the driver of the simulated USB bus.
+// Starting the driver of the simulated USB bus.
 #ifndef SIMULATOR_PORTS_DRIVER_SERVICE_H_
 #define SIMULATOR_PORTS_DRIVER_SERVICE_H_
 

@@ -1,5 +1,4 @@
-/// @file handle.h
-/// The owner of a Win32 handle.
+// The owner of a Win32 handle.
 #ifndef SIMULATOR_PORTS_HANDLE_H_
 #define SIMULATOR_PORTS_HANDLE_H_
 

@@ -1,5 +1,4 @@
-/// @file host_speed.h
-/// The speed that the host has set on its end of a pseudo-terminal.
+// The speed that the host has set on its end of a pseudo-terminal.
 #ifndef SIMULATOR_PORTS_HOST_SPEED_H_
 #define SIMULATOR_PORTS_HOST_SPEED_H_
 

@@ -1,5 +1,4 @@
-/// @file memory.h
-/// A receiver in memory, for tests: no port, no waiting.
+// A receiver in memory, for tests: no port, no waiting.
 #ifndef SIMULATOR_PORTS_MEMORY_H_
 #define SIMULATOR_PORTS_MEMORY_H_
 

@@ -1,5 +1,4 @@
-/// @file pty.h
-/// A receiver on a pseudo-terminal, which a host opens like a serial port (Linux).
+// A receiver on a pseudo-terminal, which a host opens like a serial port (Linux).
 #ifndef SIMULATOR_PORTS_PTY_H_
 #define SIMULATOR_PORTS_PTY_H_
 

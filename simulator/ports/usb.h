@@ -1,5 +1,4 @@
-/// @file usb.h
-/// A receiver on the bus of simulated USB devices (Windows).
+// A receiver on the bus of simulated USB devices (Windows).
 #ifndef SIMULATOR_PORTS_USB_H_
 #define SIMULATOR_PORTS_USB_H_
 

@@ -1,5 +1,4 @@
-/// @file port_options.h
-/// What the two programs have in common, whatever the family and the port.
+// What the two programs have in common, whatever the family and the port.
 #ifndef SIMULATOR_PROGRAM_PORT_OPTIONS_H_
 #define SIMULATOR_PROGRAM_PORT_OPTIONS_H_
 

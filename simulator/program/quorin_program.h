@@ -1,5 +1,4 @@
-/// @file quorin_program.h
-/// The command line of a Quorin receiver.
+// The command line of a Quorin receiver.
 #ifndef SIMULATOR_PROGRAM_QUORIN_PROGRAM_H_
 #define SIMULATOR_PROGRAM_QUORIN_PROGRAM_H_
 

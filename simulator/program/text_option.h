@@ -1,5 +1,4 @@
-/// @file text_option.h
-/// Options whose text is a small language of its own, such as "3@always".
+// Options whose text is a small language of its own, such as "3@always".
 #ifndef SIMULATOR_PROGRAM_TEXT_OPTION_H_
 #define SIMULATOR_PROGRAM_TEXT_OPTION_H_
 

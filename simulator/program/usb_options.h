@@ -1,5 +1,4 @@
-/// @file usb_options.h
-/// The command line of a simulated USB device.
+// The command line of a simulated USB device.
 #ifndef SIMULATOR_PROGRAM_USB_OPTIONS_H_
 #define SIMULATOR_PROGRAM_USB_OPTIONS_H_
 

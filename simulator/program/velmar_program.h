@@ -1,5 +1,4 @@
-/// @file velmar_program.h
-/// The command line of a Velmar receiver.
+// The command line of a Velmar receiver.
 #ifndef SIMULATOR_PROGRAM_VELMAR_PROGRAM_H_
 #define SIMULATOR_PROGRAM_VELMAR_PROGRAM_H_
 

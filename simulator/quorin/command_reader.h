@@ -1,5 +1,4 @@
-/// @file command_reader.h
-/// From the bytes that a host sends to the commands of a Quorin receiver.
+// From the bytes that a host sends to the commands of a Quorin receiver.
 #ifndef SIMULATOR_QUORIN_COMMAND_READER_H_
 #define SIMULATOR_QUORIN_COMMAND_READER_H_
 

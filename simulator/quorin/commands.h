@@ -1,5 +1,4 @@
-/// @file commands.h
-/// What a Quorin receiver does on each command.
+// What a Quorin receiver does on each command.
 #ifndef SIMULATOR_QUORIN_COMMANDS_H_
 #define SIMULATOR_QUORIN_COMMANDS_H_
 

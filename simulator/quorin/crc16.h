@@ -1,5 +1,4 @@
-/// @file crc16.h
-/// The CRC of Quorin blocks.
+// The CRC of Quorin blocks.
 #ifndef SIMULATOR_QUORIN_CRC16_H_
 #define SIMULATOR_QUORIN_CRC16_H_
 

@@ -1,5 +1,4 @@
-/// @file directory.h
-/// A Quorin receiver's listing of its files.
+// A Quorin receiver's listing of its files.
 #ifndef SIMULATOR_QUORIN_DIRECTORY_H_
 #define SIMULATOR_QUORIN_DIRECTORY_H_
 

@@ -1,5 +1,4 @@
-/// @file faults.h
-/// What a Quorin receiver can be told to do wrong.
+// What a Quorin receiver can be told to do wrong.
 #ifndef SIMULATOR_QUORIN_FAULTS_H_
 #define SIMULATOR_QUORIN_FAULTS_H_
 

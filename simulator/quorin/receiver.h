@@ -1,5 +1,4 @@
-/// @file receiver.h
-/// The simulated Quorin receiver.
+// The simulated Quorin receiver.
 #ifndef SIMULATOR_QUORIN_RECEIVER_H_
 #define SIMULATOR_QUORIN_RECEIVER_H_
 

@@ -1,5 +1,4 @@
-/// @file reply.h
-/// The frame of a Quorin reply.
+// The frame of a Quorin reply.
 #ifndef SIMULATOR_QUORIN_REPLY_H_
 #define SIMULATOR_QUORIN_REPLY_H_
 

@@ -1,5 +1,4 @@
-/// @file settings.h
-/// The settings of a Quorin receiver's serial ports.
+// The settings of a Quorin receiver's serial ports.
 #ifndef SIMULATOR_QUORIN_SETTINGS_H_
 #define SIMULATOR_QUORIN_SETTINGS_H_
 

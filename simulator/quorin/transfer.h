@@ -1,5 +1,4 @@
-/// @file transfer.h
-/// A file as the blocks of a Quorin transfer.
+// A file as the blocks of a Quorin transfer.
 #ifndef SIMULATOR_QUORIN_TRANSFER_H_
 #define SIMULATOR_QUORIN_TRANSFER_H_
 

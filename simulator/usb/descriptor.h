@@ -1,5 +1,4 @@
-/// @file descriptor.h
-/// The configuration descriptor of a simulated USB device.
+// The configuration descriptor of a simulated USB device.
 #ifndef SIMULATOR_USB_DESCRIPTOR_H_
 #define SIMULATOR_USB_DESCRIPTOR_H_
 

@@ -1,5 +1,4 @@
-/// @file device.h
-/// A simulated USB device with a receiver in it.
+// A simulated USB device with a receiver in it.
 #ifndef SIMULATOR_USB_DEVICE_H_
 #define SIMULATOR_USB_DEVICE_H_
 

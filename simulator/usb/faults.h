@@ -1,5 +1,4 @@
-/// @file faults.h
-/// What a simulated USB device can be told to do wrong, and the command-line form of that.
+// What a simulated USB device can be told to do wrong, and the command-line form of that.
 #ifndef SIMULATOR_USB_FAULTS_H_
 #define SIMULATOR_USB_FAULTS_H_
 

@@ -1,5 +1,4 @@
-/// @file interface.h
-/// What a host says to the USB driver that real receivers are attached through.
+// What a host says to the USB driver that real receivers are attached through.
 #ifndef SIMULATOR_USB_INTERFACE_H_
 #define SIMULATOR_USB_INTERFACE_H_
 

@@ -1,5 +1,4 @@
-/// @file command_reader.h
-/// From the bytes that a host sends to the commands of a Velmar receiver.
+// From the bytes that a host sends to the commands of a Velmar receiver.
 #ifndef SIMULATOR_VELMAR_COMMAND_READER_H_
 #define SIMULATOR_VELMAR_COMMAND_READER_H_
 

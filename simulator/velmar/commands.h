@@ -1,5 +1,4 @@
-/// @file commands.h
-/// What a Velmar receiver does on each command.
+// What a Velmar receiver does on each command.
 #ifndef SIMULATOR_VELMAR_COMMANDS_H_
 #define SIMULATOR_VELMAR_COMMANDS_H_
 

@@ -1,5 +1,4 @@
-/// @file crc32.h
-/// The CRC of Velmar logs.
+// The CRC of Velmar logs.
 #ifndef SIMULATOR_VELMAR_CRC32_H_
 #define SIMULATOR_VELMAR_CRC32_H_
 

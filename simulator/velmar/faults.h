@@ -1,5 +1,4 @@
-/// @file faults.h
-/// What a Velmar receiver can be told to do wrong.
+// What a Velmar receiver can be told to do wrong.
 #ifndef SIMULATOR_VELMAR_FAULTS_H_
 #define SIMULATOR_VELMAR_FAULTS_H_
 

@@ -1,5 +1,4 @@
-/// @file file_logs.h
-/// The logs of a Velmar receiver that are about its files.
+// The logs of a Velmar receiver that are about its files.
 #ifndef SIMULATOR_VELMAR_FILE_LOGS_H_
 #define SIMULATOR_VELMAR_FILE_LOGS_H_
 

@@ -1,5 +1,4 @@
-/// @file log.h
-/// The frames of Velmar logs: ASCII, abbreviated and binary.
+// The frames of Velmar logs: ASCII, abbreviated and binary.
 #ifndef SIMULATOR_VELMAR_LOG_H_
 #define SIMULATOR_VELMAR_LOG_H_
 

@@ -1,5 +1,4 @@
-/// @file port_settings.h
-/// The settings of a Velmar receiver's serial ports.
+// The settings of a Velmar receiver's serial ports.
 #ifndef SIMULATOR_VELMAR_PORT_SETTINGS_H_
 #define SIMULATOR_VELMAR_PORT_SETTINGS_H_
 

@@ -1,5 +1,4 @@
-/// @file receiver.h
-/// The simulated Velmar receiver.
+// The simulated Velmar receiver.
 #ifndef SIMULATOR_VELMAR_RECEIVER_H_
 #define SIMULATOR_VELMAR_RECEIVER_H_
 

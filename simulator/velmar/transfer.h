@@ -1,5 +1,4 @@
-/// @file transfer.h
-/// A file as the binary logs of a Velmar transfer.
+// A file as the binary logs of a Velmar transfer.
 #ifndef SIMULATOR_VELMAR_TRANSFER_H_
 #define SIMULATOR_VELMAR_TRANSFER_H_
 

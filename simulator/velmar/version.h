@@ -1,5 +1,4 @@
-/// @file version.h
-/// A Velmar receiver's identity, and the log with it.
+// A Velmar receiver's identity, and the log with it.
 #ifndef SIMULATOR_VELMAR_VERSION_H_
 #define SIMULATOR_VELMAR_VERSION_H_
 

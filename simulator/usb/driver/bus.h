@@ -1,11 +1,10 @@
-/// @file bus.h
-/// What the bus driver and the program that plays a device say to each other.
-///
-/// A program opens the bus and plugs a device in. It then gets the requests of hosts for that
-/// device, and executes them. The driver itself knows nothing of USB. It only keeps the bytes on
-/// their way to the host, so that a read that is cancelled at the last moment loses none.
-///
-/// Closing the handle unplugs the device. So does the program's death.
+// What the bus driver and the program that plays a device say to each other.
+//
+// A program opens the bus and plugs a device in. It then gets the requests of hosts for that
+// device, and executes them. The driver itself knows nothing of USB. It only keeps the bytes on
+// their way to the host, so that a read that is cancelled at the last moment loses none.
+//
+// Closing the handle unplugs the device. So does the program's death.
 #ifndef SIMULATOR_USB_DRIVER_BUS_H_
 #define SIMULATOR_USB_DRIVER_BUS_H_
 

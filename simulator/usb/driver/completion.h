@@ -1,5 +1,4 @@
-/// @file completion.h
-/// How IRPs end: at once, or after the state is unlocked; and how long their memory is kept.
+// How IRPs end: at once, or after the state is unlocked; and how long their memory is kept.
 #ifndef SIMULATOR_USB_DRIVER_COMPLETION_H_
 #define SIMULATOR_USB_DRIVER_COMPLETION_H_
 

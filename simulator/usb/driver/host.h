@@ -1,6 +1,5 @@
-/// @file host.h
-/// The host's side: what hosts do to a device that is plugged in. Each function completes the IRP,
-/// now or later.
+// The host's side: what hosts do to a device that is plugged in. Each function completes the IRP,
+// now or later.
 #ifndef SIMULATOR_USB_DRIVER_HOST_H_
 #define SIMULATOR_USB_DRIVER_HOST_H_
 

@@ -1,5 +1,4 @@
-/// @file kernel.h
-/// The kernel's header, made fit for C++.
+// The kernel's header, made fit for C++.
 #ifndef SIMULATOR_USB_DRIVER_KERNEL_H_
 #define SIMULATOR_USB_DRIVER_KERNEL_H_
 

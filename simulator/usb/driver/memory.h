@@ -1,5 +1,4 @@
-/// @file memory.h
-/// Memory of the kernel's pool, its owner, and lists that own what is linked into them.
+// Memory of the kernel's pool, its owner, and lists that own what is linked into them.
 #ifndef SIMULATOR_USB_DRIVER_MEMORY_H_
 #define SIMULATOR_USB_DRIVER_MEMORY_H_
 

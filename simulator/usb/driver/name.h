@@ -1,5 +1,4 @@
-/// @file name.h
-/// Names of kernel objects: constant ones, and ones that are put together.
+// Names of kernel objects: constant ones, and ones that are put together.
 #ifndef SIMULATOR_USB_DRIVER_NAME_H_
 #define SIMULATOR_USB_DRIVER_NAME_H_
 

@@ -1,5 +1,4 @@
-/// @file plugging.h
-/// Plugging devices in and out: the device objects and the paths that hosts open.
+// Plugging devices in and out: the device objects and the paths that hosts open.
 #ifndef SIMULATOR_USB_DRIVER_PLUGGING_H_
 #define SIMULATOR_USB_DRIVER_PLUGGING_H_
 

@@ -1,6 +1,5 @@
-/// @file program.h
-/// The program's side: what a program that plays a device does to the bus. Each function completes
-/// the IRP, now or later.
+// The program's side: what a program that plays a device does to the bus. Each function completes
+// the IRP, now or later.
 #ifndef SIMULATOR_USB_DRIVER_PROGRAM_H_
 #define SIMULATOR_USB_DRIVER_PROGRAM_H_
 

@@ -1,5 +1,4 @@
-/// @file request_bytes.h
-/// The bytes that a host hands in with a request, and where those for the host go.
+// The bytes that a host hands in with a request, and where those for the host go.
 #ifndef SIMULATOR_USB_DRIVER_REQUEST_BYTES_H_
 #define SIMULATOR_USB_DRIVER_REQUEST_BYTES_H_
 

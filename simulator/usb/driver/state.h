@@ -1,5 +1,4 @@
-/// @file state.h
-/// What the driver keeps of devices, handles and requests, and the lock that guards all of it.
+// What the driver keeps of devices, handles and requests, and the lock that guards all of it.
 #ifndef SIMULATOR_USB_DRIVER_STATE_H_
 #define SIMULATOR_USB_DRIVER_STATE_H_
 

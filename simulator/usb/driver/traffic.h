@@ -1,6 +1,5 @@
-/// @file traffic.h
-/// Requests on their way to the program, and transfers on their way to the host. The state must be
-/// locked for all of these.
+// Requests on their way to the program, and transfers on their way to the host. The state must be
+// locked for all of these.
 #ifndef SIMULATOR_USB_DRIVER_TRAFFIC_H_
 #define SIMULATOR_USB_DRIVER_TRAFFIC_H_
 
