@@ -4,7 +4,7 @@ namespace VelmarCommands {
 namespace {
 
 constexpr std::string_view kOpening = "\r\n<";
-constexpr std::string_view kOk = "\r\n<OK\r\n";
+constexpr std::string_view kOkLine = "\r\n<OK\r\n";
 // The acknowledgement, or the beginning of a refusal, and one byte of what follows.
 constexpr size_t kEnoughForOk = 8;
 constexpr size_t kEnoughForError = 10;
@@ -27,7 +27,7 @@ Response RecogniseResponse(std::string_view bytes) {
   const std::string_view opening = bytes.substr(0, kOpening.size());
   if (!kOpening.starts_with(opening)) return {RESPONSE_UNKNOWN};
   if (bytes.size() < kEnoughForOk) return {RESPONSE_INCOMPLETE};
-  if (bytes.starts_with(kOk)) return WithPrompt(bytes, RESPONSE_OK, kOk.size());
+  if (bytes.starts_with(kOkLine)) return WithPrompt(bytes, RESPONSE_OK, kOkLine.size());
   if (bytes.size() < kEnoughForError) return {RESPONSE_INCOMPLETE};
   if (bytes.starts_with(kRefusal)) return WithPrompt(bytes, RESPONSE_ERROR, kRefusal.size());
   return {RESPONSE_UNKNOWN};
