@@ -16,9 +16,14 @@
 #include "transport/serial_connection.h"
 #include "transport/usb_connection.h"
 
+using rcvlink::CatchResult;
 using rcvlink::Family;
 using rcvlink::FindReceiver;
 using rcvlink::Inquiry;
+using rcvlink::IsSignalled;
+using rcvlink::Receivers;
+using rcvlink::ThrowIfFailed;
+using rcvlink::Trace;
 
 namespace {
 

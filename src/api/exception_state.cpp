@@ -31,7 +31,7 @@ namespace __gnu_cxx {
 
 // Frees the memory that libsupc++ allocates at load, for exceptions that are raised when no memory
 // is left. No header declares the function.
-void __freeres();
+void __freeres();  // NOLINT(bugprone-reserved-identifier)
 
 }  // namespace __gnu_cxx
 
@@ -76,7 +76,7 @@ extern "C" abi::__cxa_eh_globals* abi::__cxa_get_globals() noexcept { return Thr
 
 extern "C" abi::__cxa_eh_globals* abi::__cxa_get_globals_fast() noexcept { return ThreadState(); }
 
-void FreeExceptionState() {
+void rcvlink::FreeExceptionState() {
   const DWORD slot = state_slot.exchange(FLS_OUT_OF_INDEXES);
   if (slot != FLS_OUT_OF_INDEXES) FlsFree(slot);
   __gnu_cxx::__freeres();

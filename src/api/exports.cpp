@@ -6,6 +6,8 @@
 #include "platform/api_types.h"
 #include "receiver/receiver.h"
 
+using rcvlink::Receivers;
+
 namespace {
 
 // The shared pointer keeps the receiver alive until the operation returns, also when another thread

@@ -8,6 +8,7 @@
 #include "platform/process_object.h"
 #include "report/report_file.h"
 
+namespace rcvlink {
 namespace {
 
 constinit ProcessObject<FileLists> lists;
@@ -28,6 +29,15 @@ const CFileList* FileLists::Find(void* handle) const {
 bool FileLists::Remove(void* handle) { return lists_.erase(handle) != 0; }
 
 FileLists& OpenLists() { return lists.get(); }
+
+}  // namespace rcvlink
+
+using rcvlink::CatchResult;
+using rcvlink::CopyBstr;
+using rcvlink::OpenLists;
+using rcvlink::Receivers;
+using rcvlink::Trace;
+using rcvlink::UniqueBstr;
 
 namespace devapi {
 

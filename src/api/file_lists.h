@@ -8,6 +8,8 @@
 
 #include "receiver/file_list.h"
 
+namespace rcvlink {
+
 class FileLists {
  public:
   // Registers a list and gives its handle.
@@ -25,5 +27,7 @@ class FileLists {
 
 // The table of the process.
 FileLists& OpenLists();
+
+}  // namespace rcvlink
 
 #endif  // RCVLINK_API_FILE_LISTS_H_

@@ -10,6 +10,13 @@
 #include "platform/win32.h"
 #include "report/report_file.h"
 
+using rcvlink::CatchResult;
+using rcvlink::FreeExceptionState;
+using rcvlink::OpenLists;
+using rcvlink::PrepareReport;
+using rcvlink::Receivers;
+using rcvlink::Trace;
+
 namespace {
 
 // Writes a line with the module's path and product version; nothing when a step fails. A host opens

@@ -8,6 +8,7 @@
 #include "platform/process_object.h"
 #include "report/report_file.h"
 
+namespace rcvlink {
 namespace {
 
 // Letter case counts: names are compared as the host gave them. A null name equals an empty one.
@@ -94,3 +95,5 @@ HRESULT ReceiverRegistry::Destroy(const wchar_t* port) {
 }
 
 ReceiverRegistry& Receivers() { return registry.get(); }
+
+}  // namespace rcvlink

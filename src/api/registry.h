@@ -11,6 +11,8 @@
 #include "platform/text.h"
 #include "receiver/receiver.h"
 
+namespace rcvlink {
+
 class ReceiverRegistry {
  public:
   // Registers a new receiver with one user and gives its handle. E_OUTOFMEMORY: the receiver is
@@ -43,5 +45,7 @@ class ReceiverRegistry {
 
 // The registry of the process.
 ReceiverRegistry& Receivers();
+
+}  // namespace rcvlink
 
 #endif  // RCVLINK_API_REGISTRY_H_

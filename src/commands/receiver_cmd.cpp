@@ -8,6 +8,9 @@
 #include "platform/event.h"
 #include "transport/wait_scope.h"
 
+using rcvlink::IsSignalled;
+using rcvlink::WaitScope;
+
 namespace {
 
 // Null when there is no memory.

@@ -2,6 +2,7 @@
 
 #include <atomic>
 
+namespace rcvlink {
 namespace {
 
 class SystemClock : public Clock {
@@ -23,3 +24,5 @@ Clock& CurrentClock() {
 ClockOverride::ClockOverride(Clock& clock) : previous_(clock_override.exchange(&clock)) {}
 
 ClockOverride::~ClockOverride() { clock_override = previous_; }
+
+}  // namespace rcvlink

@@ -4,6 +4,8 @@
 
 #include "platform/win32.h"
 
+namespace rcvlink {
+
 class Clock {
  public:
   virtual ~Clock() = default;
@@ -28,5 +30,7 @@ class ClockOverride {
  private:
   Clock* previous_;
 };
+
+}  // namespace rcvlink
 
 #endif  // RCVLINK_PLATFORM_CLOCK_H_

@@ -5,6 +5,8 @@
 #include "platform/hresult.h"
 #include "platform/win32.h"
 
+namespace rcvlink {
+
 class CriticalSection {
  public:
   // Raises the HRESULT of the Win32 error when the section cannot be created.
@@ -26,5 +28,7 @@ class CriticalSection {
  private:
   CRITICAL_SECTION section_;
 };
+
+}  // namespace rcvlink
 
 #endif  // RCVLINK_PLATFORM_CRITICAL_SECTION_H_

@@ -6,6 +6,8 @@
 
 #include "platform/win32.h"
 
+namespace rcvlink {
+
 // Owns one handle of the kind that Traits describes (its type, its empty value, how it is closed).
 // Closing keeps the thread's last error: callers read it after a failed call, when owners may have
 // closed their handles already.
@@ -57,5 +59,7 @@ struct KernelHandleTraits {
 
 using FileHandle = UniqueHandle<FileHandleTraits>;      // files and devices
 using KernelHandle = UniqueHandle<KernelHandleTraits>;  // events and mutexes
+
+}  // namespace rcvlink
 
 #endif  // RCVLINK_PLATFORM_HANDLE_H_

@@ -7,6 +7,8 @@
 
 #include "platform/win32.h"
 
+namespace rcvlink {
+
 // The HRESULT of a Win32 error. A positive error gets the Win32 facility. Negative ones are a
 // device driver's own error numbers (usbio.h): they are failing HRESULTs already, and a host would
 // lose their upper bits. Zero is S_OK.
@@ -51,5 +53,7 @@ HRESULT CatchResult(Operation operation) {
     return E_UNEXPECTED;  // a host of another compiler could not catch an exception of this one
   }
 }
+
+}  // namespace rcvlink
 
 #endif  // RCVLINK_PLATFORM_HRESULT_H_

@@ -2,6 +2,8 @@
 
 #include "platform/hresult.h"
 
+namespace rcvlink {
+
 Mutex::Mutex() : handle_(CreateMutexW(nullptr, FALSE, nullptr)) {
   if (!handle_) throw HResultError(HResultFromError(GetLastError()));
 }
@@ -11,3 +13,5 @@ Mutex::Mutex() : handle_(CreateMutexW(nullptr, FALSE, nullptr)) {
 void Mutex::Lock() { WaitForSingleObject(handle_.get(), INFINITE); }
 
 bool Mutex::Unlock() { return ReleaseMutex(handle_.get()) != FALSE; }
+
+}  // namespace rcvlink

@@ -4,6 +4,8 @@
 
 #include "platform/handle.h"
 
+namespace rcvlink {
+
 class Mutex {
  public:
   Mutex();  // not held; raises the HRESULT of the Win32 error when it cannot be created
@@ -36,5 +38,7 @@ class MutexGuard {
   Mutex& mutex_;
   bool held_ = true;
 };
+
+}  // namespace rcvlink
 
 #endif  // RCVLINK_PLATFORM_MUTEX_H_

@@ -5,6 +5,8 @@
 
 #include <optional>
 
+namespace rcvlink {
+
 // Declare it constinit at namespace scope of a source, with a function that gives the object.
 //
 // The first get() creates the object. DllMain makes that call at load, when no other thread can be
@@ -25,5 +27,7 @@ class ProcessObject {
  private:
   std::optional<T> object_;
 };
+
+}  // namespace rcvlink
 
 #endif  // RCVLINK_PLATFORM_PROCESS_OBJECT_H_

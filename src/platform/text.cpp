@@ -5,6 +5,8 @@
 
 #include "platform/hresult.h"
 
+namespace rcvlink {
+
 UniqueBstr CopyBstr(const wchar_t* text) {
   if (!text) return nullptr;
   UniqueBstr copy(SysAllocString(text));
@@ -71,3 +73,5 @@ std::string FormatText(const char* format, ...) {
   va_end(arguments);
   return text;
 }
+
+}  // namespace rcvlink

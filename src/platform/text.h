@@ -11,6 +11,8 @@
 
 #include <oleauto.h>
 
+namespace rcvlink {
+
 struct BstrDeleter {
   void operator()(wchar_t* text) const { SysFreeString(text); }
 };
@@ -31,5 +33,7 @@ std::string ToNarrow(std::wstring_view text);
 std::string FormatText(const char* format, ...);
 std::string FormatArguments(const char* format, va_list arguments);
 std::wstring FormatArguments(const wchar_t* format, va_list arguments);
+
+}  // namespace rcvlink
 
 #endif  // RCVLINK_PLATFORM_TEXT_H_

@@ -2,6 +2,7 @@
 
 #include "quorin/block_crc.h"
 
+namespace rcvlink {
 namespace {
 
 constexpr uint8_t kEndOfBlock = 0x03;
@@ -21,3 +22,5 @@ bool Block::IsChainedTo(uint16_t previous_crc) const {
   const std::span<const uint8_t> checked(bytes_.data(), kBlockHeader + kBlockPayload);
   return BlockCrc(checked, previous_crc) == Crc();
 }
+
+}  // namespace rcvlink

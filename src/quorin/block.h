@@ -19,6 +19,8 @@
 
 #include "platform/little_endian.h"
 
+namespace rcvlink {
+
 constexpr uint8_t kAck = 0x06;            // accepted, send the next
 constexpr uint8_t kNak = 0x15;            // start; or send the current block again
 constexpr uint8_t kEndOfTransfer = 0x23;  // '#'
@@ -51,5 +53,7 @@ class Block {
 
   std::array<uint8_t, kBlockLength> bytes_{};
 };
+
+}  // namespace rcvlink
 
 #endif  // RCVLINK_QUORIN_BLOCK_H_

@@ -3,6 +3,7 @@
 #include <array>
 #include <cstddef>
 
+namespace rcvlink {
 namespace {
 
 constexpr uint16_t kPolynomial = 0x1021;
@@ -36,3 +37,5 @@ uint16_t BlockCrc(std::span<const uint8_t> bytes, uint16_t crc) {
   }
   return crc;
 }
+
+}  // namespace rcvlink

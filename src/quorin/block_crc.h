@@ -6,7 +6,11 @@
 #include <cstdint>
 #include <span>
 
+namespace rcvlink {
+
 // The checksum after these bytes, starting from `crc` (0 before the first block).
 uint16_t BlockCrc(std::span<const uint8_t> bytes, uint16_t crc);
+
+}  // namespace rcvlink
 
 #endif  // RCVLINK_QUORIN_BLOCK_CRC_H_

@@ -8,6 +8,7 @@
 #include "report/report_file.h"
 #include "transport/wait_scope.h"
 
+namespace rcvlink {
 namespace {
 
 // A silence may be a lost control byte, so the receiver is asked again before the transfer ends.
@@ -157,3 +158,5 @@ void BlockDownload::TraceText(const wchar_t* text) const {
 void BlockDownload::TraceWhy(const wchar_t* text) const {
   if (policy_.TellsWhy()) TraceText(text);
 }
+
+}  // namespace rcvlink

@@ -15,6 +15,8 @@
 
 #include <objidl.h>
 
+namespace rcvlink {
+
 // Writes one of the control bytes. No abort ends the write: the host would not know whether the
 // receiver has got the byte.
 HRESULT WriteControl(CIConnection* connection, uint8_t control);
@@ -67,5 +69,7 @@ class BlockDownload {
   uint8_t percent_ = 0;  // the last that was computed, also when it was not reported
   int timeouts_ = 0;
 };
+
+}  // namespace rcvlink
 
 #endif  // RCVLINK_QUORIN_BLOCK_DOWNLOAD_H_

@@ -11,6 +11,12 @@
 #include "quorin/directory_message.h"
 #include "report/report_file.h"
 
+using rcvlink::FormatText;
+using rcvlink::kNotConnected;
+using rcvlink::ToNarrow;
+using rcvlink::ToWide;
+using rcvlink::Trace;
+
 namespace QuorinCommands {
 namespace {
 

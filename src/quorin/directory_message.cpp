@@ -8,6 +8,9 @@
 #include "platform/hresult.h"
 #include "platform/text.h"
 
+using rcvlink::HResultError;
+using rcvlink::ToWide;
+
 namespace QuorinCommands {
 namespace {
 

@@ -12,6 +12,22 @@
 #include "quorin/quorin_protocol.h"
 #include "report/report_file.h"
 
+using rcvlink::BlockDownload;
+using rcvlink::CatchResult;
+using rcvlink::kBlockPayload;
+using rcvlink::kCommandFlags;
+using rcvlink::kEndOfTransfer;
+using rcvlink::kNak;
+using rcvlink::kNotConnected;
+using rcvlink::LinkPolicy;
+using rcvlink::MutexGuard;
+using rcvlink::SerialPolicy;
+using rcvlink::ThrowIfFailed;
+using rcvlink::ToNarrow;
+using rcvlink::Trace;
+using rcvlink::UsbPolicy;
+using rcvlink::WriteControl;
+
 using QuorinCommands::CChangeBaudRateCmd;
 using QuorinCommands::CGetFileCmd;
 using QuorinCommands::CGetFileSizeCmd;

@@ -4,6 +4,7 @@
 
 #include "platform/clock.h"
 
+namespace rcvlink {
 namespace {
 
 constexpr DWORD kSerialReadTimeoutMs = 3000;
@@ -75,3 +76,5 @@ bool UsbPolicy::IsTimeToTell() {
   told_at_ = now;
   return true;
 }
+
+}  // namespace rcvlink

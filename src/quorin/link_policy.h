@@ -8,6 +8,8 @@
 #include "receiver/abort_switch.h"
 #include "transport/connection.h"
 
+namespace rcvlink {
+
 class LinkPolicy {
  public:
   virtual ~LinkPolicy() = default;
@@ -85,5 +87,7 @@ class UsbPolicy : public LinkPolicy {
   HRESULT read_result_ = S_OK;  // of the current block
   DWORD told_at_;               // when progress was reported last, in ticks of the clock
 };
+
+}  // namespace rcvlink
 
 #endif  // RCVLINK_QUORIN_LINK_POLICY_H_

@@ -10,6 +10,12 @@
 #include "platform/text.h"
 #include "report/report_file.h"
 
+using rcvlink::Clock;
+using rcvlink::CurrentClock;
+using rcvlink::FormatText;
+using rcvlink::kNotConnected;
+using rcvlink::Trace;
+
 namespace QuorinCommands {
 namespace {
 

@@ -12,6 +12,22 @@
 #include "report/report_file.h"
 #include "transport/wait_scope.h"
 
+using rcvlink::CatchResult;
+using rcvlink::CopyBstr;
+using rcvlink::HResultError;
+using rcvlink::IsSignalled;
+using rcvlink::kCommandFlags;
+using rcvlink::kNotConnected;
+using rcvlink::MutexGuard;
+using rcvlink::NameOf;
+using rcvlink::NarrowNameOf;
+using rcvlink::ReadDownloadReadTimeout;
+using rcvlink::ThrowIfFailed;
+using rcvlink::ToNarrow;
+using rcvlink::Trace;
+using rcvlink::UniqueBstr;
+using rcvlink::WaitScope;
+
 using QuorinCommands::CChangeBaudRateCmd;
 using QuorinCommands::CChangeParityCmd;
 using QuorinCommands::CChangeRTSSignalCmd;

@@ -8,7 +8,9 @@
 #include "quorin/quorin_command.h"
 #include "receiver/abstract_protocol.h"
 
+namespace rcvlink {
 class LinkPolicy;
+}
 
 class CQuorinProtocol : public CAbstractProtocol {
  public:
@@ -53,7 +55,7 @@ class CQuorinProtocol : public CAbstractProtocol {
 
   // The parts of a download.
   HRESULT Transfer(const wchar_t* name, IStream* stream, EInstanceType link);
-  HRESULT TakeBlocks(IStream* stream, int size, LinkPolicy& policy);
+  HRESULT TakeBlocks(IStream* stream, int size, rcvlink::LinkPolicy& policy);
   void RestoreSpeed(DWORD saved_speed);
   HRESULT RaiseReceiver(DWORD speed) override { return ChangeSpeed(speed); }
   void SetReceiverBack(DWORD speed) override;

@@ -3,6 +3,7 @@
 #include "platform/handle.h"
 #include "report/report_file.h"
 
+namespace rcvlink {
 namespace {
 
 constexpr DWORD kDefaultTimeoutMs = 30000;
@@ -44,3 +45,5 @@ DWORD ReadDownloadReadTimeout() {
   }
   return timeout_ms;
 }
+
+}  // namespace rcvlink

@@ -2,6 +2,8 @@
 
 #include <mutex>
 
+namespace rcvlink {
+
 void AbortSwitch::Abort() {
   if (!connection_) return;
   const std::scoped_lock lock(lock_);
@@ -32,3 +34,5 @@ void AbortSwitch::SetCurrentCommand(CReceiverCmd* command) {
   const std::scoped_lock lock(lock_);
   current_command_ = command;
 }
+
+}  // namespace rcvlink

@@ -8,6 +8,8 @@
 #include "platform/critical_section.h"
 #include "transport/connection.h"
 
+namespace rcvlink {
+
 // Any thread may call these functions; none of them waits for the link.
 class AbortSwitch {
  public:
@@ -52,5 +54,7 @@ class AbortSwitch {
   bool aborted_ = false;
   CReceiverCmd* current_command_ = nullptr;
 };
+
+}  // namespace rcvlink
 
 #endif  // RCVLINK_RECEIVER_ABORT_SWITCH_H_

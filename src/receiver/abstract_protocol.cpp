@@ -9,6 +9,16 @@
 #include "platform/text.h"
 #include "report/report_file.h"
 
+using rcvlink::AbortSwitch;
+using rcvlink::CatchResult;
+using rcvlink::CopyBstr;
+using rcvlink::HResultError;
+using rcvlink::HResultFromError;
+using rcvlink::kNotConnected;
+using rcvlink::ToNarrow;
+using rcvlink::Trace;
+using rcvlink::UniqueBstr;
+
 CAbstractProtocol::CAbstractProtocol(const wchar_t* class_name,
                                      std::unique_ptr<CIConnection> connection)
     : abort_(connection.get()), class_name_(class_name), connection_(std::move(connection)) {}
@@ -115,11 +125,11 @@ void CAbstractProtocol::ReportProgress(DWORD percent) {
   if (callback_) callback_->OnProgress(static_cast<BYTE>(std::min(percent, kComplete)));
 }
 
-std::wstring NameOf(CIConnection* connection) {
+std::wstring rcvlink::NameOf(CIConnection* connection) {
   BSTR name = nullptr;
   if (FAILED(connection->GetName(&name))) return {};
   const UniqueBstr owner(name);
   return owner ? owner.get() : L"";
 }
 
-std::string NarrowNameOf(CIConnection* connection) { return ToNarrow(NameOf(connection)); }
+std::string rcvlink::NarrowNameOf(CIConnection* connection) { return ToNarrow(NameOf(connection)); }

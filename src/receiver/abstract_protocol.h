@@ -62,10 +62,10 @@ class CAbstractProtocol : public CIProtocol {
   // Reports progress; a higher percent counts as 100.
   void ReportProgress(DWORD percent);
 
-  AbortSwitch abort_;
-  CriticalSection callback_lock_;  // guards callback_
+  rcvlink::AbortSwitch abort_;
+  rcvlink::CriticalSection callback_lock_;  // guards callback_
   CIProtocolCallback* callback_ = nullptr;
-  Mutex connection_lock_;  // held for a whole operation on the receiver
+  rcvlink::Mutex connection_lock_;  // held for a whole operation on the receiver
 
  private:
   // Whether a receiver of the family answers.
@@ -81,8 +81,12 @@ class CAbstractProtocol : public CIProtocol {
   std::unique_ptr<CIConnection> connection_;  // declared last, destroyed first: it closes the link
 };
 
+namespace rcvlink {
+
 // The name of a connection for the report, in the thread's ANSI code page; empty when it has none.
 std::string NarrowNameOf(CIConnection* connection);
 std::wstring NameOf(CIConnection* connection);
+
+}  // namespace rcvlink
 
 #endif  // RCVLINK_RECEIVER_ABSTRACT_PROTOCOL_H_

@@ -6,6 +6,9 @@
 #include "platform/hresult.h"
 #include "report/report_file.h"
 
+using rcvlink::kNotConnected;
+using rcvlink::Trace;
+
 CAbstractReceiver::CAbstractReceiver(std::unique_ptr<CIProtocol> driver)
     : driver_(std::move(driver)) {
   if (driver_) driver_->SetCallback(this);

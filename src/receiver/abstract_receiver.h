@@ -49,7 +49,7 @@ class CAbstractReceiver : public CIReceiver, public CIProtocolCallback {
 
   // Guards the next two members, and is held during each call of the function, so that the function
   // is not removed while it runs.
-  CriticalSection lock_;
+  rcvlink::CriticalSection lock_;
   ProgressFunction progress_function_ = nullptr;
   void* progress_context_ = nullptr;
   std::unique_ptr<CIProtocol> driver_;  // declared last, destroyed first: it may report progress

@@ -3,6 +3,8 @@
 #include <limits>
 #include <new>
 
+using rcvlink::UniqueBstr;
+
 CFileList::~CFileList() {
   for (const CFileInfo& file : files_) SysFreeString(file.bstrName);
 }

@@ -17,7 +17,7 @@ class CFileList {
 
   // Appends one file. Both its times are set to `time`, since a receiver gives one time for a file.
   // False when the list cannot grow; the name is then freed.
-  bool Append(UniqueBstr name, DWORD size, const SYSTEMTIME& time);
+  bool Append(rcvlink::UniqueBstr name, DWORD size, const SYSTEMTIME& time);
 
   long Count() const { return static_cast<long>(files_.size()); }
 

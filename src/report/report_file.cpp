@@ -16,6 +16,13 @@
 #include "platform/text.h"
 #include "platform/win32.h"
 
+using rcvlink::CriticalSection;
+using rcvlink::FileHandle;
+using rcvlink::FormatArguments;
+using rcvlink::HResultError;
+using rcvlink::HResultFromError;
+using rcvlink::ProcessObject;
+
 namespace {
 
 class ReportFile {
@@ -145,18 +152,18 @@ void CloseReportFile() { TheReport().Close(); }
 
 }  // namespace dump_hlp
 
-void Trace(const wchar_t* format, ...) {
+void rcvlink::Trace(const wchar_t* format, ...) {
   va_list arguments;
   va_start(arguments, format);
   dump_hlp::DumpReportString(format, arguments);
   va_end(arguments);
 }
 
-void Trace(const char* format, ...) {
+void rcvlink::Trace(const char* format, ...) {
   va_list arguments;
   va_start(arguments, format);
   dump_hlp::DumpReportString(format, arguments);
   va_end(arguments);
 }
 
-void PrepareReport() { TheReport(); }
+void rcvlink::PrepareReport() { TheReport(); }

@@ -9,6 +9,8 @@
 
 #include "platform/api_types.h"
 
+namespace rcvlink {
+
 // Writes one entry; nothing when no report is open. The formats are those of Microsoft's printf (%s
 // in a wide format is a wide string); end the text in "\r\n". Raises E_INVALIDARG for a null
 // format, E_FAIL for an invalid one, and E_OUTOFMEMORY.
@@ -18,5 +20,7 @@ void Trace(const char* format, ...);
 // Creates the report's object, and with it its lock. Called at load, before there can be a second
 // thread that needs the lock.
 void PrepareReport();
+
+}  // namespace rcvlink
 
 #endif  // RCVLINK_REPORT_REPORT_FILE_H_

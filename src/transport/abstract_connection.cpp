@@ -7,6 +7,16 @@
 #include "platform/hresult.h"
 #include "report/report_file.h"
 
+using rcvlink::CatchResult;
+using rcvlink::CopyBstr;
+using rcvlink::HResultFromError;
+using rcvlink::IsSignalled;
+using rcvlink::KernelHandle;
+using rcvlink::kNotConnected;
+using rcvlink::kTimedOut;
+using rcvlink::Trace;
+using rcvlink::WaitRule;
+
 namespace {
 
 HRESULT CreateEventIfMissing(KernelHandle& event, BOOL manual_reset) {

@@ -21,7 +21,7 @@ class CAbstractConnection : public CIConnection {
   HRESULT GetName(BSTR* name) override;
   void SetAbortEvent(HANDLE event) override;
   void ClearCancel() override;
-  WaitRule ExchangeWaitRule(const WaitRule& rule) override;
+  rcvlink::WaitRule ExchangeWaitRule(const rcvlink::WaitRule& rule) override;
 
   // The handle of Write and that of Read: a USB link has one for each direction.
   virtual HANDLE GetWriteHandle();
@@ -31,7 +31,7 @@ class CAbstractConnection : public CIConnection {
   virtual HANDLE GetAbortEvent();
 
  protected:
-  explicit CAbstractConnection(DeviceCalls& calls) : calls_(calls) {}
+  explicit CAbstractConnection(rcvlink::DeviceCalls& calls) : calls_(calls) {}
 
   // Creates the events that do not exist yet. They stay when the link is opened again, so that
   // Cancel from another thread never meets a closed handle. S_OK or the Win32 error.
@@ -40,9 +40,9 @@ class CAbstractConnection : public CIConnection {
   // Whether a Cancel has not ended a wait yet; it still will.
   bool IsCancelPending() const;
 
-  DeviceCalls& calls_;
-  FileHandle device_;
-  UniqueBstr name_;
+  rcvlink::DeviceCalls& calls_;
+  rcvlink::FileHandle device_;
+  rcvlink::UniqueBstr name_;
 
  private:
   // Waits for a pending transfer; `watched` (may be null) ends the wait as well. Whatever ends the
@@ -51,11 +51,11 @@ class CAbstractConnection : public CIConnection {
   HRESULT WaitForTransfer(HANDLE handle, OVERLAPPED& overlapped, DWORD timeout_ms, HANDLE watched);
   void CancelTransfer(HANDLE handle, OVERLAPPED& overlapped);
 
-  KernelHandle write_event_;      // auto-reset
-  KernelHandle read_event_;       // manual-reset; Read resets it before each transfer
-  KernelHandle cancel_event_;     // auto-reset: one Cancel ends one wait
-  HANDLE abort_event_ = nullptr;  // the caller's
-  WaitRule wait_rule_;
+  rcvlink::KernelHandle write_event_;   // auto-reset
+  rcvlink::KernelHandle read_event_;    // manual-reset; Read resets it before each transfer
+  rcvlink::KernelHandle cancel_event_;  // auto-reset: one Cancel ends one wait
+  HANDLE abort_event_ = nullptr;        // the caller's
+  rcvlink::WaitRule wait_rule_;
 };
 
 #endif  // RCVLINK_TRANSPORT_ABSTRACT_CONNECTION_H_

@@ -7,11 +7,15 @@
 
 #include <wtypes.h>
 
+namespace rcvlink {
+
 // What ends a wait of Read or Write early.
 struct WaitRule {
   bool shielded = false;     // neither Cancel nor the abort event does; they end a later wait
   HANDLE watched = nullptr;  // this event of the caller ends a Read as well
 };
+
+}  // namespace rcvlink
 
 // One thread uses a connection at a time, the one that holds the driver's connection lock. Only
 // Cancel and ClearCancel may be called from any thread. The order of the operations is fixed, since
@@ -60,7 +64,7 @@ class CIConnection {
   virtual void ClearCancel() = 0;
 
   // Sets the rule for the waits that follow, and gives the one that held before.
-  virtual WaitRule ExchangeWaitRule(const WaitRule& rule) = 0;
+  virtual rcvlink::WaitRule ExchangeWaitRule(const rcvlink::WaitRule& rule) = 0;
 };
 
 #endif  // RCVLINK_TRANSPORT_CONNECTION_H_

@@ -4,6 +4,7 @@
 
 #include "platform/handle.h"
 
+namespace rcvlink {
 namespace {
 
 constinit DeviceCalls system_calls;
@@ -92,3 +93,5 @@ SystemCallsOverride::SystemCallsOverride(DeviceCalls& calls)
     : previous_(calls_override.exchange(&calls)) {}
 
 SystemCallsOverride::~SystemCallsOverride() { calls_override = previous_; }
+
+}  // namespace rcvlink

@@ -5,6 +5,8 @@
 
 #include "platform/win32.h"
 
+namespace rcvlink {
+
 // Each operation is the Win32 function of its name; failures leave their reason in the thread's
 // last error.
 class DeviceCalls {
@@ -54,5 +56,7 @@ class SystemCallsOverride {
  private:
   DeviceCalls* previous_;
 };
+
+}  // namespace rcvlink
 
 #endif  // RCVLINK_TRANSPORT_DEVICE_CALLS_H_

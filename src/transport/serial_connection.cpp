@@ -8,6 +8,15 @@
 #include "platform/hresult.h"
 #include "report/report_file.h"
 
+using rcvlink::Clock;
+using rcvlink::CopyBstr;
+using rcvlink::CurrentClock;
+using rcvlink::DeviceCalls;
+using rcvlink::FileHandle;
+using rcvlink::HResultFromError;
+using rcvlink::IsSignalled;
+using rcvlink::Trace;
+
 namespace {
 
 constexpr DWORD kEventMask = EV_RXCHAR | EV_ERR;

@@ -6,7 +6,7 @@
 
 class CSerialConnection : public CAbstractConnection {
  public:
-  explicit CSerialConnection(DeviceCalls& calls = SystemCalls());
+  explicit CSerialConnection(rcvlink::DeviceCalls& calls = rcvlink::SystemCalls());
   ~CSerialConnection() override;
 
   HRESULT Flush() override;

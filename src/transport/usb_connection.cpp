@@ -8,6 +8,16 @@
 #include "transport/usbio.h"
 #include "transport/wait_scope.h"
 
+using rcvlink::BulkEndpoints;
+using rcvlink::CopyBstr;
+using rcvlink::FileHandle;
+using rcvlink::FindBulkEndpoints;
+using rcvlink::HResultFromError;
+using rcvlink::kConfigurationDescriptorLength;
+using rcvlink::TotalLength;
+using rcvlink::Trace;
+using rcvlink::WaitScope;
+
 namespace {
 
 template <typename Record>

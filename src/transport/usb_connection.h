@@ -11,7 +11,8 @@
 
 class CUSBConnection : public CAbstractConnection {
  public:
-  explicit CUSBConnection(DeviceCalls& calls = SystemCalls()) : CAbstractConnection(calls) {}
+  explicit CUSBConnection(rcvlink::DeviceCalls& calls = rcvlink::SystemCalls())
+      : CAbstractConnection(calls) {}
   ~CUSBConnection() override;
 
   HRESULT Disconnect() override;
@@ -47,8 +48,8 @@ class CUSBConnection : public CAbstractConnection {
   void OpenHandles(const wchar_t* device);
   void Configure(const wchar_t* device);
   // S_OK and the endpoints, or the result with which the open ends.
-  HRESULT ReadEndpoints(BulkEndpoints* endpoints);
-  HRESULT BindPipes(const BulkEndpoints& endpoints);
+  HRESULT ReadEndpoints(rcvlink::BulkEndpoints* endpoints);
+  HRESULT BindPipes(const rcvlink::BulkEndpoints& endpoints);
   // Sends one request to the driver and gives the Win32 error, 0 for none. `*returned` is the
   // number of bytes in `output`.
   DWORD Request(HANDLE handle,
@@ -57,7 +58,7 @@ class CUSBConnection : public CAbstractConnection {
                 std::span<uint8_t> output = {},
                 DWORD* returned = nullptr);
 
-  FileHandle read_handle_;  // the base's device_ is for writing
+  rcvlink::FileHandle read_handle_;  // the base's device_ is for writing
 };
 
 #endif  // RCVLINK_TRANSPORT_USB_CONNECTION_H_

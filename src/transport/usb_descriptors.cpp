@@ -2,6 +2,7 @@
 
 #include "platform/little_endian.h"
 
+namespace rcvlink {
 namespace {
 
 // Offsets within descriptors and values of their fields, from the USB 2.0 standard, chapter 9.6.
@@ -51,3 +52,5 @@ std::optional<BulkEndpoints> FindBulkEndpoints(std::span<const uint8_t> descript
   // One bulk endpoint alone is no link, so its address is not mixed with a default one.
   return has_out && has_in ? found : BulkEndpoints{};
 }
+
+}  // namespace rcvlink

@@ -8,6 +8,8 @@
 #include <optional>
 #include <span>
 
+namespace rcvlink {
+
 constexpr size_t kConfigurationDescriptorLength = 9;
 
 // The length of a configuration descriptor and all that follows it, as its first 9 bytes give it.
@@ -28,5 +30,7 @@ struct BulkEndpoints {
 // Receivers have one interface, and after its descriptor its endpoints (two at least) and nothing
 // else. Any other layout gives none, so that no pipe of another kind of device is bound.
 std::optional<BulkEndpoints> FindBulkEndpoints(std::span<const uint8_t> descriptors);
+
+}  // namespace rcvlink
 
 #endif  // RCVLINK_TRANSPORT_USB_DESCRIPTORS_H_

@@ -7,6 +7,8 @@
 #include "platform/handle.h"
 #include "transport/connection.h"
 
+namespace rcvlink {
+
 class WaitScope {
  public:
   // Neither Cancel nor the abort event ends a wait: for bytes that the receiver must get whole. A
@@ -38,5 +40,7 @@ class WaitScope {
   WaitRule previous_;
   KernelHandle watched_;
 };
+
+}  // namespace rcvlink
 
 #endif  // RCVLINK_TRANSPORT_WAIT_SCOPE_H_

@@ -8,6 +8,10 @@
 #include "platform/text.h"
 #include "report/report_file.h"
 
+using rcvlink::FormatText;
+using rcvlink::ToNarrow;
+using rcvlink::Trace;
+
 namespace VelmarCommands {
 namespace {
 

@@ -9,6 +9,14 @@
 #include "velmar/file_download.h"
 #include "velmar/velmar_protocol.h"
 
+using rcvlink::CatchResult;
+using rcvlink::FileDownload;
+using rcvlink::HResultError;
+using rcvlink::MutexGuard;
+using rcvlink::ThrowIfFailed;
+using rcvlink::ToNarrow;
+using rcvlink::Trace;
+
 using VelmarCommands::CGetFileHeaderCmd;
 using VelmarCommands::CLogConfigCommand;
 using VelmarCommands::CSetCurrentFileCmd;

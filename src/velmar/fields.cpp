@@ -4,6 +4,8 @@
 
 #include "platform/text.h"
 
+using rcvlink::ToWide;
+
 namespace VelmarCommands {
 
 std::vector<std::wstring> SplitFields(std::string_view text) {

@@ -4,6 +4,8 @@
 
 #include "velmar/velmar_protocol.h"
 
+namespace rcvlink {
+
 using VelmarCommands::RESPONSE_DATA;
 
 namespace {
@@ -55,3 +57,5 @@ HRESULT FileDownload::TakeChunk() {
   tell_progress_(percent);
   return S_OK;
 }
+
+}  // namespace rcvlink

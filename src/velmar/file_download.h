@@ -13,6 +13,8 @@
 
 class CVelmarProtocol;
 
+namespace rcvlink {
+
 class FileDownload {
  public:
   using ProgressFunction = std::function<void(uint8_t percent)>;
@@ -48,5 +50,7 @@ class FileDownload {
   uint8_t percent_ = 0;  // the last that was reported
   bool is_sending_ = false;
 };
+
+}  // namespace rcvlink
 
 #endif  // RCVLINK_VELMAR_FILE_DOWNLOAD_H_

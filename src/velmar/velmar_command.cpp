@@ -10,6 +10,10 @@
 #include "report/report_file.h"
 #include "velmar/block_crc32.h"
 
+using rcvlink::CurrentClock;
+using rcvlink::kTimedOut;
+using rcvlink::Trace;
+
 namespace VelmarCommands {
 namespace {
 

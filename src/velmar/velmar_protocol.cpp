@@ -11,6 +11,20 @@
 #include "report/report_file.h"
 #include "transport/wait_scope.h"
 
+using rcvlink::CatchResult;
+using rcvlink::CopyBstr;
+using rcvlink::CurrentClock;
+using rcvlink::HResultError;
+using rcvlink::IsSignalled;
+using rcvlink::kNotConnected;
+using rcvlink::MutexGuard;
+using rcvlink::NarrowNameOf;
+using rcvlink::ThrowIfFailed;
+using rcvlink::ToNarrow;
+using rcvlink::Trace;
+using rcvlink::UniqueBstr;
+using rcvlink::WaitScope;
+
 using VelmarCommands::CDeleteFileCmd;
 using VelmarCommands::CGetFileListCmd;
 using VelmarCommands::CGetReceiverInfoCmd;

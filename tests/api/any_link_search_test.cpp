@@ -15,6 +15,9 @@
 #include "tests/support/simulated_com_port.h"
 #include "transport/device_calls.h"
 
+using rcvlink::KernelHandle;
+using rcvlink::SystemCallsOverride;
+
 namespace {
 
 using testing::ElementsAre;

@@ -13,6 +13,10 @@
 #include "tests/support/report_capture.h"
 #include "tests/support/stub_receiver.h"
 
+using rcvlink::CopyBstr;
+using rcvlink::Receivers;
+using rcvlink::UniqueBstr;
+
 namespace {
 
 constexpr long kInvalid = static_cast<long>(0x80070057);

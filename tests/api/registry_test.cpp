@@ -16,6 +16,9 @@
 #include "tests/support/report_capture.h"
 #include "tests/support/stub_receiver.h"
 
+using rcvlink::KernelHandle;
+using rcvlink::Receivers;
+
 namespace {
 
 using testing::ElementsAre;

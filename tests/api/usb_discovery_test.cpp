@@ -16,6 +16,8 @@
 #include "tests/support/report_capture.h"
 #include "tests/support/usb_pipes.h"
 
+using rcvlink::KernelHandle;
+
 using testing::ElementsAre;
 using testing::IsEmpty;
 

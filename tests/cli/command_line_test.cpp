@@ -24,7 +24,7 @@ std::string Help(const Words& words) {
   return std::get<HelpText>(ParseCommandLine(words, MakeCommands())).text;
 }
 
-/// The failure of an invalid line.
+// The failure of an invalid line.
 Failure Refusal(const Words& words) {
   try {
     ParseCommandLine(words, MakeCommands());
@@ -108,7 +108,7 @@ TEST(CommandLineTest, OptionsStandBeforeOrAfterTheCommand) {
   }
 }
 
-/// A command that shows what it was given.
+// A command that shows what it was given.
 class Probe : public Command {
  public:
   explicit Probe(std::vector<std::wstring>& names)
@@ -203,7 +203,7 @@ TEST(CommandLineTest, HelpShowsCommandsExitCodesAndExamples) {
 }
 
 TEST(CommandLineTest, HelpFitsATerminal) {
-  constexpr std::size_t kWidth = 100;
+  constexpr size_t kWidth = 100;
   for (const Words& words : {Words{"--help"}, Words{"get", "--help"}, Words{"set", "--help"}}) {
     std::istringstream help(Help(words));
     for (std::string line; std::getline(help, line);) EXPECT_LE(line.size(), kWidth) << line;
@@ -239,7 +239,7 @@ TEST(CommandLineTest, PortsAreTakenHoweverTheyAreWritten) {
   EXPECT_EQ(Parse({"find", "\\\\.\\COM7"}).arguments.port, L"COM7");
 }
 
-/// An environment variable during a test.
+// An environment variable during a test.
 class Variable {
  public:
   Variable(std::string name, const std::string& value) : name_(std::move(name)) {

@@ -23,7 +23,7 @@ std::string Recorded(const std::string& name) {
   return {std::istreambuf_iterator<char>(file), std::istreambuf_iterator<char>()};
 }
 
-/// The only entry with that text in its meaning; fails when it is not the only one.
+// The only entry with that text in its meaning; fails when it is not the only one.
 ExchangeEntry Only(const Exchange& exchange, const std::string& text) {
   std::vector<ExchangeEntry> found;
   std::ranges::copy_if(exchange.entries, std::back_inserter(found), [&](const auto& entry) {
@@ -86,7 +86,7 @@ TEST(ExchangeTest, ADownloadOfASilentVelmarReceiverIsCancelled) {
 // A report cut at any place is read, and only its last entries differ.
 TEST(ExchangeTest, ATruncatedReportIsReadUpToItsEnd) {
   const std::string whole = Recorded("quorin-retries.txt");
-  for (std::size_t length = 0; length < whole.size(); length += 7) {
+  for (size_t length = 0; length < whole.size(); length += 7) {
     const Exchange exchange = Parse(whole.substr(0, length));
     EXPECT_EQ(exchange.entries.empty(), length < 21) << length;
   }

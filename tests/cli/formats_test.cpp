@@ -5,7 +5,7 @@
 namespace cli {
 namespace {
 
-TransferState State(std::uint64_t done, std::uint64_t total, std::uint64_t rate) {
+TransferState State(uint64_t done, uint64_t total, uint64_t rate) {
   return {.name = L"LOG.DAT", .done = done, .total = total, .rate = rate};
 }
 
@@ -44,7 +44,7 @@ TEST(FormatsTest, PercentIsFullOnlyAtTheEnd) {
 }
 
 TEST(FormatsTest, PercentOfTheLargestFile) {
-  constexpr std::uint64_t kLargest = 4'294'967'295;
+  constexpr uint64_t kLargest = 4'294'967'295;
   EXPECT_EQ(PercentOf(State(kLargest / 2, kLargest, 0)), 49U);
   EXPECT_EQ(PercentOf(State(kLargest - 1, kLargest, 0)), 99U);
 }
@@ -69,7 +69,7 @@ TEST(FormatsTest, MakesAProgressBar) {
 TEST(FormatsTest, BarIsNeverWiderThanItsLine) {
   TransferState state = State(500'000, 1'000'000, 10'000);
   state.name = std::wstring(200, L'x');
-  for (std::size_t width = 0; width < 120; ++width) {
+  for (size_t width = 0; width < 120; ++width) {
     EXPECT_LE(ProgressBar(state, width).size(), width);
   }
 }

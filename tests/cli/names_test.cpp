@@ -89,7 +89,7 @@ INSTANTIATE_TEST_SUITE_P(Impossible,
                                                 L"b"}));
 
 TEST(NamesTest, NoNameAndTooLongNamesAreRefused) {
-  constexpr std::size_t kLongest = 250;  // 255 without ".part"
+  constexpr size_t kLongest = 250;  // 255 without ".part"
   EXPECT_EQ(SafeLocalName(L""), std::nullopt);
   EXPECT_NE(SafeLocalName(std::wstring(kLongest, L'a')), std::nullopt);
   EXPECT_EQ(SafeLocalName(std::wstring(kLongest + 1, L'a')), std::nullopt);

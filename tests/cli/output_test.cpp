@@ -7,7 +7,7 @@
 namespace cli {
 namespace {
 
-/// Replaces the standard output with a pipe during a test.
+// Replaces the standard output with a pipe during a test.
 class OutputTest : public testing::Test {
  protected:
   OutputTest() {

@@ -5,7 +5,7 @@
 namespace cli {
 namespace {
 
-/// A computer with just these ports.
+// A computer with just these ports.
 class FakeSource : public PortSource {
  public:
   std::vector<std::wstring> RegisteredPorts() const override { return registered; }

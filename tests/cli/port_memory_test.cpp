@@ -78,7 +78,7 @@ TEST_F(PortMemoryTest, ADamagedFileIsAnEmptyOneAndReplaced) {
 }
 
 TEST_F(PortMemoryTest, AFileThatIsMuchTooLongIsAnEmptyOne) {
-  constexpr std::size_t kMebibyte = 1 << 20;
+  constexpr size_t kMebibyte = 1 << 20;
   std::string text = R"({"ports": {"COM7": {"speed": 57600, "rts": "on", "protocol": "velmar"}}})";
   folder_.Write(L"ports.json", text);
   EXPECT_NE(memory_.Recall(L"COM7"), std::nullopt);
@@ -104,7 +104,7 @@ TEST_F(PortMemoryTest, InvalidEntriesAreIgnored) {
   }
 }
 
-/// Keeps a file open, so that it cannot be replaced.
+// Keeps a file open, so that it cannot be replaced.
 class HeldFile {
  public:
   HeldFile(const std::filesystem::path& file, DWORD share)

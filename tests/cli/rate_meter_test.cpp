@@ -18,13 +18,13 @@ TEST(RateMeterTest, IsUnknownAtFirst) {
 TEST(RateMeterTest, ForgetsWhatIsLongAgo) {
   RateMeter meter;
   meter.Add(0, 0);
-  for (std::uint64_t ms = 60'000; ms <= 70'000; ms += 100) meter.Add(ms, (ms - 60'000) * 10);
+  for (uint64_t ms = 60'000; ms <= 70'000; ms += 100) meter.Add(ms, (ms - 60'000) * 10);
   EXPECT_EQ(meter.BytesPerSecond(), 10'000U);
 }
 
 TEST(RateMeterTest, FallsToNothingWhenNothingArrives) {
   RateMeter meter;
-  for (std::uint64_t ms = 0; ms <= 10'000; ms += 100) meter.Add(ms, 1000);
+  for (uint64_t ms = 0; ms <= 10'000; ms += 100) meter.Add(ms, 1000);
   EXPECT_EQ(meter.BytesPerSecond(), 0U);
 }
 

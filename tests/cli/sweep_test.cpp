@@ -64,7 +64,7 @@ TEST(SweepTest, DescribesATry) {
   EXPECT_EQ(InWords({0, RtsMode::kHandshake}), "the port's current speed, RTS handshake");
 }
 
-/// A port on which a receiver of one family answers at one setting.
+// A port on which a receiver of one family answers at one setting.
 class FakePort : public SweepPort {
  public:
   long Ask(const LineSetting& line, EProtocol family, void** receiver) override {
@@ -74,15 +74,15 @@ class FakePort : public SweepPort {
     *receiver = this;
     return S_OK;
   }
-  void Begin(std::size_t number, std::size_t count, const LineSetting& line) override {
+  void Begin(size_t number, size_t count, const LineSetting& line) override {
     begun.push_back(std::to_string(number) + "/" + std::to_string(count) + " " +
                     std::to_string(line.speed));
   }
   bool IsCancelled() const override { return asked.size() == cancelled_at; }
 
   KnownSetting answers_at{};
-  std::size_t fails_at = 0;
-  std::size_t cancelled_at = 0;
+  size_t fails_at = 0;
+  size_t cancelled_at = 0;
   std::vector<KnownSetting> asked;
   std::vector<std::string> begun;
 };

@@ -10,7 +10,7 @@ namespace {
 
 class TargetsTest : public testing::Test {
  protected:
-  /// The place for downloads in the test's folder.
+  // The place for downloads in the test's folder.
   Place Into(const std::wstring& output = L"") const {
     return {.output = (folder_.path() / output).native()};
   }
@@ -99,7 +99,7 @@ TEST_F(TargetsTest, FoldersThatCannotBeMadeAreRefused) {
 }
 
 TEST_F(TargetsTest, TheDiskMustHaveRoom) {
-  constexpr std::uint64_t kTooMuch = std::uint64_t{1} << 62;
+  constexpr uint64_t kTooMuch = uint64_t{1} << 62;
   EXPECT_NO_THROW(Targets(Into(L"new\\")).CheckRoom(1));
   EXPECT_THROW(Targets(Into(L"new\\")).CheckRoom(kTooMuch), Failure);
   EXPECT_THROW(Targets(Into(L"a.dat")).CheckRoom(kTooMuch), Failure);

@@ -1,5 +1,4 @@
-/// @file temporary_folder.h
-/// A folder for one test.
+// A folder for one test.
 #ifndef RCVLINK_TESTS_CLI_TEMPORARY_FOLDER_H_
 #define RCVLINK_TESTS_CLI_TEMPORARY_FOLDER_H_
 
@@ -12,7 +11,7 @@
 
 namespace cli {
 
-/// Deleted with its content at the end of the test.
+// Deleted with its content at the end of the test.
 class TemporaryFolder {
  public:
   TemporaryFolder()

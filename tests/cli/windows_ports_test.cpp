@@ -16,7 +16,7 @@ const std::wstring kInstance = L"RCVLINK-TEST";
 const std::wstring kClasses = L"SYSTEM\\CurrentControlSet\\Control\\DeviceClasses\\" + kClass;
 const std::wstring kPath = LR"(\\?\usb#vid_12ab&pid_5678#rcvlink-test#)" + kClass;
 
-/// The registry entries of a USB device that is plugged in.
+// The registry entries of a USB device that is plugged in.
 class ListedDevice {
  public:
   explicit ListedDevice(const std::wstring& service) {

@@ -234,13 +234,13 @@ TEST_F(Cli, AFileThatTheProtocolCannotNumberIsRefusedAtOnce) {
 }
 
 TEST_F(Cli, FilesThatTheDiskHasNoRoomForAreRefusedAtOnce) {
-  constexpr std::uint64_t kListed = 2'147'483'647;
-  constexpr std::uint64_t kMostFiles = 60;  // a longer list is cut
-  const std::uint64_t needed = std::filesystem::space(folder.path()).available / kListed + 1;
+  constexpr uint64_t kListed = 2'147'483'647;
+  constexpr uint64_t kMostFiles = 60;  // a longer list is cut
+  const uint64_t needed = std::filesystem::space(folder.path()).available / kListed + 1;
   if (needed > kMostFiles) GTEST_SKIP() << "this disk has room for all that can be listed";
   std::vector<std::string> simulator = {"velmar"};
   Files files;
-  for (std::uint64_t i = 0; i < needed; ++i) {
+  for (uint64_t i = 0; i < needed; ++i) {
     const std::string name = "f" + std::to_string(i);
     files.emplace(name, "x");
     simulator.insert(simulator.end(), {"--lie-size", name + "=" + std::to_string(kListed)});

@@ -6,6 +6,8 @@
 
 #include "platform/handle.h"
 
+using rcvlink::KernelHandle;
+
 namespace {
 
 class TestCommand : public CReceiverCmd {

@@ -2,6 +2,8 @@
 
 #include "platform/hresult.h"
 
+using rcvlink::kTimedOut;
+
 namespace {
 
 constexpr std::string_view kEnd = "\n.\n";

@@ -21,6 +21,8 @@
 
 using rcvlink::FamilyOf;
 using rcvlink::OnUsb;
+using rcvlink::UniqueBstr;
+
 using testing::Contains;
 
 namespace {

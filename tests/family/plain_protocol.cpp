@@ -10,6 +10,15 @@
 
 #include <objidl.h>
 
+using rcvlink::CatchResult;
+using rcvlink::CopyBstr;
+using rcvlink::MutexGuard;
+using rcvlink::ThrowIfFailed;
+using rcvlink::ToNarrow;
+using rcvlink::ToWide;
+using rcvlink::UniqueBstr;
+using rcvlink::WaitScope;
+
 namespace {
 
 // A number of EProtocol that no other family has.

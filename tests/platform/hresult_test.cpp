@@ -5,6 +5,11 @@
 #include <new>
 #include <stdexcept>
 
+using rcvlink::CatchResult;
+using rcvlink::HResultError;
+using rcvlink::HResultFromError;
+using rcvlink::ThrowIfFailed;
+
 namespace {
 
 TEST(HResult, IsMadeOfAWin32Error) {

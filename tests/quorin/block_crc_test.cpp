@@ -5,6 +5,8 @@
 #include <cstdint>
 #include <string_view>
 
+using rcvlink::BlockCrc;
+
 namespace {
 
 std::span<const uint8_t> Bytes(std::string_view text) {

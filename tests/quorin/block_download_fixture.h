@@ -87,7 +87,7 @@ class QuorinBlockDownloadTest : public QuorinDriverTest {
   // discarded.
   void GiveHeaderOf(const std::string& block) { Give(block.substr(0, link.header_size)); }
   void GiveSilences(int count) {
-    for (int i = 0; i < count; ++i) connection->GiveResult(kTimedOut);
+    for (int i = 0; i < count; ++i) connection->GiveResult(rcvlink::kTimedOut);
   }
 
   // The outcome of the transfer.

@@ -15,6 +15,9 @@
 #include "platform/hresult.h"
 #include "tests/quorin/block_download_fixture.h"
 
+using rcvlink::kNotConnected;
+using rcvlink::kTimedOut;
+
 using testing::ElementsAre;
 using testing::ElementsAreArray;
 using testing::IsEmpty;

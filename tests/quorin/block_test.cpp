@@ -7,6 +7,10 @@
 
 #include "tests/quorin/block_stream.h"
 
+using rcvlink::Block;
+using rcvlink::BlockType;
+using rcvlink::kBlockLength;
+
 namespace {
 
 Block BlockOf(const std::string& bytes) {

@@ -11,6 +11,8 @@
 #include "tests/support/report_capture.h"
 #include "tests/support/scripted_connection.h"
 
+using rcvlink::kNotConnected;
+
 using namespace QuorinCommands;
 using testing::ElementsAre;
 

@@ -9,6 +9,9 @@
 #include "tests/quorin/quorin_driver.h"
 #include "tests/support/report_capture.h"
 
+using rcvlink::HResultFromError;
+using rcvlink::KernelHandle;
+
 using testing::ElementsAre;
 using testing::IsEmpty;
 

@@ -10,6 +10,9 @@
 #include "platform/hresult.h"
 #include "tests/quorin/simulated_download.h"
 
+using rcvlink::kNotConnected;
+using rcvlink::kTimedOut;
+
 using sim::BlockFaultKind;
 using sim::ReplyFaultKind;
 

@@ -12,6 +12,9 @@
 #include "platform/hresult.h"
 #include "tests/quorin/download_fixture.h"
 
+using rcvlink::kNotConnected;
+using rcvlink::kTimedOut;
+
 using testing::Contains;
 using testing::ElementsAre;
 using testing::IsEmpty;

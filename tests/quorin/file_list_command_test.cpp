@@ -10,6 +10,9 @@
 #include "tests/quorin/quorin_responder.h"
 #include "tests/support/scripted_connection.h"
 
+using rcvlink::kNotConnected;
+using rcvlink::kTimedOut;
+
 using namespace QuorinCommands;
 using testing::ElementsAre;
 using testing::IsEmpty;

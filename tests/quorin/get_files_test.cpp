@@ -10,6 +10,9 @@
 #include "tests/quorin/quorin_driver.h"
 #include "tests/support/report_capture.h"
 
+using rcvlink::kNotConnected;
+using rcvlink::kTimedOut;
+
 using testing::ElementsAre;
 using testing::IsEmpty;
 

@@ -10,6 +10,8 @@
 #include "tests/quorin/quorin_driver.h"
 #include "tests/support/report_capture.h"
 
+using rcvlink::KernelHandle;
+
 using testing::ElementsAre;
 using testing::ElementsAreArray;
 

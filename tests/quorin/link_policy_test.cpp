@@ -18,6 +18,13 @@
 #include "tests/quorin/block_download_fixture.h"
 #include "tests/support/user_settings.h"
 
+using rcvlink::AbortSwitch;
+using rcvlink::kNotConnected;
+using rcvlink::kTimedOut;
+using rcvlink::LinkPolicy;
+using rcvlink::SerialPolicy;
+using rcvlink::UsbPolicy;
+
 using testing::ElementsAre;
 using testing::ElementsAreArray;
 using testing::IsEmpty;

@@ -8,6 +8,8 @@
 #include "platform/hresult.h"
 #include "tests/quorin/quorin_driver.h"
 
+using rcvlink::kNotConnected;
+
 using testing::Contains;
 using testing::ElementsAre;
 using testing::IsEmpty;

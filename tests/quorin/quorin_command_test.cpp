@@ -13,6 +13,9 @@
 #include "tests/support/report_capture.h"
 #include "tests/support/scripted_connection.h"
 
+using rcvlink::KernelHandle;
+using rcvlink::kTimedOut;
+
 using namespace QuorinCommands;
 using testing::ElementsAre;
 

@@ -12,6 +12,9 @@
 #include "tests/support/memory_stream.h"
 #include "tests/support/report_capture.h"
 
+using rcvlink::kNotConnected;
+using rcvlink::kTimedOut;
+
 using namespace QuorinCommands;
 using testing::ElementsAre;
 using testing::IsEmpty;

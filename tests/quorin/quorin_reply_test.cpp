@@ -9,6 +9,10 @@
 #include "platform/hresult.h"
 #include "tests/quorin/reply_fixture.h"
 
+using rcvlink::KernelHandle;
+using rcvlink::kNotConnected;
+using rcvlink::kTimedOut;
+
 using namespace QuorinCommands;
 using testing::ElementsAre;
 

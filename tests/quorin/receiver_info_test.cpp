@@ -9,6 +9,9 @@
 #include "tests/quorin/quorin_driver.h"
 #include "tests/support/report_capture.h"
 
+using rcvlink::kNotConnected;
+using rcvlink::kTimedOut;
+
 using testing::ElementsAre;
 
 namespace {

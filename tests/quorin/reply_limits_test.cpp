@@ -8,6 +8,9 @@
 #include "tests/quorin/reply_fixture.h"
 #include "tests/support/manual_clock.h"
 
+using rcvlink::kNotConnected;
+using rcvlink::kTimedOut;
+
 using namespace QuorinCommands;
 using testing::ElementsAre;
 

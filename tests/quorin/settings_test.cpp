@@ -6,6 +6,8 @@
 #include "tests/support/report_capture.h"
 #include "tests/support/user_settings.h"
 
+using rcvlink::ReadDownloadReadTimeout;
+
 using testing::ElementsAre;
 
 namespace {

@@ -8,6 +8,8 @@
 #include "platform/hresult.h"
 #include "tests/quorin/simulated_download.h"
 
+using rcvlink::kNotConnected;
+
 namespace {
 
 TEST(QuorinSimulatedReceiver, IsFoundWhateverStateItIsIn) {

@@ -6,6 +6,8 @@
 #include "quorin/quorin_command.h"
 #include "tests/support/scripted_connection.h"
 
+using rcvlink::AbortSwitch;
+
 namespace {
 
 class AbortSwitchTest : public testing::Test {

@@ -7,6 +7,9 @@
 
 #include "platform/handle.h"
 
+using rcvlink::CopyBstr;
+using rcvlink::KernelHandle;
+
 namespace {
 
 const SYSTEMTIME kTime = {2026, 3, 0, 1, 12, 30, 59, 0};

@@ -10,6 +10,8 @@
 #include "report/report_file.h"
 #include "tests/support/report_capture.h"
 
+using rcvlink::Trace;
+
 namespace {
 
 constexpr LCID kJapanese = 0x0411;

@@ -16,6 +16,11 @@
 #include "platform/win32.h"
 #include "tests/support/report_capture.h"
 
+using rcvlink::FileHandle;
+using rcvlink::HResultError;
+using rcvlink::HResultFromError;
+using rcvlink::Trace;
+
 namespace {
 
 std::wstring TempFolder() {

@@ -9,6 +9,9 @@
 #include "platform/win32.h"
 #include "report/report_file.h"
 
+using rcvlink::FileHandle;
+using rcvlink::Trace;
+
 namespace {
 
 // With its ending zero the longest path has MAX_PATH characters.

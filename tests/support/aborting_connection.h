@@ -62,7 +62,9 @@ class AbortingConnection : public CIConnection {
     return Call([&] { return inner_.SetSpeed(speed); });
   }
   void ClearCancel() override { cancelled_ = false; }
-  WaitRule ExchangeWaitRule(const WaitRule& rule) override { return std::exchange(rule_, rule); }
+  rcvlink::WaitRule ExchangeWaitRule(const rcvlink::WaitRule& rule) override {
+    return std::exchange(rule_, rule);
+  }
 
   DWORD Speed() {
     DWORD speed = 0;
@@ -84,7 +86,7 @@ class AbortingConnection : public CIConnection {
   SimulatedConnection inner_;
   CancelledWrite cancelled_write_;
   bool cancelled_ = false;
-  WaitRule rule_;
+  rcvlink::WaitRule rule_;
 };
 
 #endif  // RCVLINK_TESTS_SUPPORT_ABORTING_CONNECTION_H_

@@ -30,7 +30,7 @@ inline bool IsFreeForOthers(CIProtocol& driver) {
   HRESULT locked = E_FAIL;
   std::thread([&] {
     // The lock comes first if it is free, or else the event.
-    const KernelHandle event(CreateEventW(nullptr, TRUE, TRUE, nullptr));
+    const rcvlink::KernelHandle event(CreateEventW(nullptr, TRUE, TRUE, nullptr));
     locked = driver.LockConnection(event.get());
     if (locked == S_OK) driver.UnlockConnection();
   }).join();

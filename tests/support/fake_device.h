@@ -10,7 +10,7 @@
 
 #include "transport/device_calls.h"
 
-class FakeDevice : public DeviceCalls {
+class FakeDevice : public rcvlink::DeviceCalls {
  public:
   FakeDevice() { state.DCBlength = sizeof(DCB); }
 

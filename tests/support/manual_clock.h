@@ -4,7 +4,7 @@
 
 #include "platform/clock.h"
 
-class ManualClock : public Clock {
+class ManualClock : public rcvlink::Clock {
  public:
   DWORD Ticks() override { return now; }
   void Pause(DWORD milliseconds) override {
@@ -16,7 +16,7 @@ class ManualClock : public Clock {
   DWORD paused = 0;  // all pauses together
 
  private:
-  ClockOverride override_{*this};  // used while this lives
+  rcvlink::ClockOverride override_{*this};  // used while this lives
 };
 
 #endif  // RCVLINK_TESTS_SUPPORT_MANUAL_CLOCK_H_

@@ -7,6 +7,8 @@
 #include "platform/api_types.h"
 #include "platform/handle.h"
 
+using rcvlink::FileHandle;
+
 ReportCapture::ReportCapture() {
   static std::atomic<int> counter = 0;
   const std::wstring name = L"rcvlink-test-" + std::to_wstring(GetCurrentProcessId()) + L"-" +

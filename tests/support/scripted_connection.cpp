@@ -6,6 +6,9 @@
 #include "platform/hresult.h"
 #include "platform/text.h"
 
+using rcvlink::CopyBstr;
+using rcvlink::kTimedOut;
+
 std::vector<std::string> ScriptedConnection::Writes() const { return writes_; }
 
 std::string ScriptedConnection::Written() const {

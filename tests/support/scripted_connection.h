@@ -47,7 +47,7 @@ class ScriptedConnection : public CIConnection {
   std::vector<std::string> Writes() const;  // the bytes of each write
   std::string Written() const;              // all of them
   std::vector<DWORD> write_timeouts;        // of each write
-  WaitRule wait_rule;                       // the one in force
+  rcvlink::WaitRule wait_rule;              // the one in force
   bool is_cancelled = false;                // a Cancel has not ended a read yet
   size_t AnswersLeft() const { return answers_.size(); }
 
@@ -63,7 +63,7 @@ class ScriptedConnection : public CIConnection {
   void SetAbortEvent(HANDLE) override {}
   HRESULT SetSpeed(DWORD speed) override;
   void ClearCancel() override { is_cancelled = false; }
-  WaitRule ExchangeWaitRule(const WaitRule& rule) override {
+  rcvlink::WaitRule ExchangeWaitRule(const rcvlink::WaitRule& rule) override {
     return std::exchange(wait_rule, rule);
   }
 

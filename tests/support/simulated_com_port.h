@@ -13,7 +13,7 @@
 #include "tests/support/manual_clock.h"
 #include "transport/device_calls.h"
 
-class SimulatedComPort : public DeviceCalls {
+class SimulatedComPort : public rcvlink::DeviceCalls {
  public:
   // Both must outlive the port.
   SimulatedComPort(sim::Receiver& receiver, ManualClock& clock);

@@ -6,6 +6,9 @@
 #include "platform/hresult.h"
 #include "platform/text.h"
 
+using rcvlink::CopyBstr;
+using rcvlink::kTimedOut;
+
 HRESULT SimulatedConnection::Read(void* buffer, DWORD size, DWORD* bytes_read, DWORD timeout_ms) {
   constexpr uint64_t kQuietMs = 1000;
   *bytes_read = 0;

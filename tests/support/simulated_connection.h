@@ -33,7 +33,9 @@ class SimulatedConnection : public CIConnection {
   void SetAbortEvent(HANDLE) override {}
   HRESULT SetSpeed(DWORD speed) override;
   void ClearCancel() override { cancelled_ = false; }
-  WaitRule ExchangeWaitRule(const WaitRule& rule) override { return std::exchange(rule_, rule); }
+  rcvlink::WaitRule ExchangeWaitRule(const rcvlink::WaitRule& rule) override {
+    return std::exchange(rule_, rule);
+  }
 
  private:
   bool IsUsb() const { return speed_ == 0; }
@@ -41,7 +43,7 @@ class SimulatedConnection : public CIConnection {
   sim::MemoryPort port_;
   DWORD speed_;
   bool cancelled_ = false;  // one cancel ends one read
-  WaitRule rule_;
+  rcvlink::WaitRule rule_;
 };
 
 #endif  // RCVLINK_TESTS_SUPPORT_SIMULATED_CONNECTION_H_

@@ -4,6 +4,9 @@
 #include <atomic>
 #include <optional>
 
+using rcvlink::FileHandle;
+using rcvlink::KernelHandle;
+
 namespace {
 
 constexpr DWORD kBufferSize = 65536;

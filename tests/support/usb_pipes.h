@@ -26,8 +26,8 @@ class UsbPipes {
  private:
   // The first write shows which pipe the host writes to.
   struct End {
-    FileHandle pipe;
-    KernelHandle event;
+    rcvlink::FileHandle pipe;
+    rcvlink::KernelHandle event;
     OVERLAPPED block{};
     std::array<uint8_t, 4096> buffer{};
     bool connected = false;
@@ -41,7 +41,7 @@ class UsbPipes {
   sim::Receiver& receiver_;
   std::wstring path_;
   std::array<End, 2> ends_;
-  KernelHandle stop_;
+  rcvlink::KernelHandle stop_;
   uint64_t now_ms_ = 0;  // advances to the receiver's next bytes
   std::thread thread_;
 };

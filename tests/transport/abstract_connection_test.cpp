@@ -10,6 +10,13 @@
 #include "tests/support/fake_device.h"
 #include "tests/support/report_capture.h"
 
+using rcvlink::CopyBstr;
+using rcvlink::DeviceCalls;
+using rcvlink::FileHandle;
+using rcvlink::HResultFromError;
+using rcvlink::KernelHandle;
+using rcvlink::UniqueBstr;
+
 namespace {
 
 using testing::ElementsAre;

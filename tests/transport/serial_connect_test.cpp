@@ -14,6 +14,8 @@
 #include "tests/support/report_capture.h"
 #include "transport/serial_connection.h"
 
+using rcvlink::KernelHandle;
+
 namespace {
 
 using testing::ElementsAre;

@@ -12,6 +12,9 @@
 #include "tests/support/manual_clock.h"
 #include "tests/support/report_capture.h"
 
+using rcvlink::HResultFromError;
+using rcvlink::KernelHandle;
+
 namespace {
 
 using testing::ElementsAre;

@@ -9,6 +9,8 @@
 #include "platform/hresult.h"
 #include "tests/transport/usb_connection_fixture.h"
 
+using rcvlink::kNotConnected;
+
 using testing::Contains;
 using testing::ElementsAre;
 using testing::IsEmpty;

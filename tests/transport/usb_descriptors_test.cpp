@@ -11,6 +11,10 @@
 #include "tests/support/guarded_bytes.h"
 #include "tests/transport/descriptor_bytes.h"
 
+using rcvlink::BulkEndpoints;
+using rcvlink::FindBulkEndpoints;
+using rcvlink::TotalLength;
+
 namespace {
 
 using Found = std::optional<BulkEndpoints>;

@@ -8,6 +8,9 @@
 #include "platform/hresult.h"
 #include "tests/transport/usb_connection_fixture.h"
 
+using rcvlink::HResultFromError;
+using rcvlink::kTimedOut;
+
 using testing::ElementsAre;
 using testing::IsEmpty;
 

@@ -10,6 +10,9 @@
 #include "transport/serial_connection.h"
 #include "transport/wait_scope.h"
 
+using rcvlink::KernelHandle;
+using rcvlink::WaitScope;
+
 using testing::ElementsAre;
 
 namespace {

@@ -13,6 +13,10 @@
 #include "platform/hresult.h"
 #include "transport/serial_connection.h"
 
+using rcvlink::DeviceCalls;
+using rcvlink::FileHandle;
+using rcvlink::KernelHandle;
+
 namespace {
 
 constexpr DWORD kBufferBytes = 4096;

@@ -5,6 +5,9 @@
 #include "platform/hresult.h"
 #include "tests/velmar/velmar_driver.h"
 
+using rcvlink::HResultFromError;
+using rcvlink::KernelHandle;
+
 namespace {
 
 using testing::ElementsAre;

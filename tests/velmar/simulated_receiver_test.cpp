@@ -17,6 +17,8 @@
 #include "tests/support/simulated_connection.h"
 #include "velmar/velmar_protocol.h"
 
+using rcvlink::UniqueBstr;
+
 namespace {
 
 using testing::ElementsAre;

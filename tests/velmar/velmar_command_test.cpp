@@ -17,6 +17,9 @@
 #include "tests/support/scripted_connection.h"
 #include "tests/velmar/velmar_replies.h"
 
+using rcvlink::KernelHandle;
+using rcvlink::kTimedOut;
+
 namespace {
 
 using namespace VelmarCommands;

@@ -7,6 +7,10 @@
 #include "tests/support/memory_stream.h"
 #include "tests/velmar/velmar_driver.h"
 
+using rcvlink::HResultError;
+using rcvlink::KernelHandle;
+using rcvlink::UniqueBstr;
+
 namespace {
 
 using testing::Contains;
