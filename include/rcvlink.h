@@ -112,7 +112,8 @@ struct CReceiverInfo {
   unsigned int dwVariant;
 };
 
-/// One entry of a file list. 56 bytes.
+/// One entry of a file list. 56 bytes. The times of a Velmar receiver have no day of the week:
+/// wDayOfWeek is 0.
 struct CFileInfo {
   unsigned int dwSize;            ///< size in bytes
   unsigned int dwPadding;         ///< zero
@@ -182,7 +183,8 @@ namespace devapi {
 /// @retval E_UNEXPECTED `type` is none of the three (and the name is not registered)
 /// @return otherwise why the port could not be opened: 0x80070002 when it does not exist,
 ///         0x80070005 when another program has it. A USB device that cannot be opened gives
-///         S_FALSE; one whose pipes cannot be used gives the error of the pipe.
+///         S_FALSE; one whose pipes cannot be used gives the error of the pipe. With `eInstanceAny`
+///         the result is that of the USB device when the port has no receiver or cannot be opened.
 RCVLINK_API long SearchReceiver(
     wchar_t* port, EInstanceType type, EProtocol protocol, void* abortEvent, void** receiver);
 
@@ -223,9 +225,9 @@ RCVLINK_API long CreateReceiverOnUSB(wchar_t* device,
 /// @retval E_INVALIDARG `receiver` is null
 RCVLINK_API long OpenReceiver(wchar_t* port, void** receiver);
 
-/// Counts one user of the receiver less. When none is left, the receiver's operation is aborted,
-/// its handle becomes unknown, and its port is closed. A call that still runs on another thread
-/// keeps the receiver and its port open until it returns; `CloseReceiver` does not wait for it.
+/// Removes one user of the receiver. When none is left, the receiver's operation is aborted, its
+/// handle becomes unknown, and its port is closed. A call that still runs on another thread keeps
+/// the receiver and its port open until it returns; `CloseReceiver` does not wait for it.
 /// @retval S_OK         the receiver was removed
 /// @retval S_FALSE      other users remain
 /// @retval E_INVALIDARG unknown handle
@@ -305,11 +307,11 @@ RCVLINK_API long Abort(void* receiver);
 /// @param stream   COM stream that the host owns. Its Write is called on the calling thread; with a
 ///                 Velmar receiver also AddRef before the transfer and Release after it.
 /// @param progress may be null
-/// @retval S_OK         finished, or failed without a sign: compare the byte count with the size in
-///                      the file list. It is also given when the stream's Write failed, with a
-///                      Quorin receiver on a serial port. A Velmar receiver gives it also for a
-///                      file that it does not have (nothing is written then), after it fell silent,
-///                      and, when the download raised the speed, after any failure of the transfer.
+/// @retval S_OK         finished, or failed: compare the byte count with the size in the file list.
+///                      A Quorin receiver on a serial port gives it also when the stream's Write
+///                      failed. A Velmar receiver gives it also for a file that it does not have
+///                      (nothing is written then), after it fell silent, and, when the download
+///                      raised the speed, after any failure of the transfer.
 /// @retval S_FALSE      aborted, or ended by the receiver
 /// @retval E_INVALIDARG `name` or `stream` is null
 /// @retval E_FAIL       a Quorin receiver says that the file's size is 0, or does not say it
