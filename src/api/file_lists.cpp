@@ -48,7 +48,7 @@ long OpenFileList(void* receiver, void** fileList) {
     auto files = std::make_unique<CFileList>();
     const HRESULT result = found->GetFiles(files.get());
     if (FAILED(result)) return result;
-    // Also after S_FALSE, which is no failure: a host that tests for failures closes this list.
+    // Also after S_FALSE: a host that tests for failures takes it as success and closes this list.
     *fileList = OpenLists().Insert(std::move(files));
     return result;
   });

@@ -20,8 +20,8 @@ using rcvlink::Trace;
 namespace {
 
 // Writes a line with the module's path and product version; nothing when a step fails. A host opens
-// a report through the loaded library, so none is open yet and the line is dropped: it shows in a
-// debugger only.
+// a report through the loaded library, so none is open yet and the line is discarded: only a
+// debugger that stops here shows it.
 void TraceModule(HMODULE module) {
   std::array<wchar_t, MAX_PATH> path{};
   if (GetModuleFileNameW(module, path.data(), MAX_PATH) == 0) return;
@@ -51,8 +51,8 @@ void Start(HMODULE module) {
   TraceModule(module);
 }
 
-// Closes what the host left open. The report is still open, so the lines of the ports that are
-// closed stand in it, after the module's last line.
+// Closes what the host left open. The report is still open, so it also has the lines of the ports
+// that are closed, after "Bye!".
 void End() {
   Trace(L"Bye!\r\n");
   OpenLists().Clear();

@@ -28,8 +28,8 @@ class ReceiverRegistry {
   HRESULT Close(void* handle);
   HRESULT Destroy(const wchar_t* port);
 
-  // Closes every receiver, at unload. It takes no lock: no other thread is in the library then, but
-  // one that the end of the process has stopped may hold it.
+  // Closes every receiver, at unload. It takes no lock: no other thread is in the library then, and
+  // a thread that the end of the process has stopped may still hold the lock.
   void Clear() { entries_.clear(); }
 
  private:

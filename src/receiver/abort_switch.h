@@ -26,8 +26,8 @@ class AbortSwitch {
   // Tests the flag and does not clear it.
   bool IsSet();
 
-  // Clears a cancel that has not ended a wait yet; the flag stays. The abort that came before then
-  // ends no wait of the next step.
+  // Clears a cancel that has not ended a wait yet, so that it ends no wait of the next step. The
+  // flag stays.
   void ClearCancel();
 
   // The command that Abort marks, for a scope: it must not be marked after it was destroyed.

@@ -18,7 +18,7 @@
 class CAbstractProtocol : public CIProtocol {
  public:
   HRESULT CheckConnection(HANDLE abort_event, short* answer) override;
-  // Not every family offers these operations: E_NOTIMPL unless a driver overrides it.
+  // Not every family offers these operations: E_NOTIMPL unless a driver overrides them.
   HRESULT UploadFile(const CFileInfo* info, IStream* stream) override;
   HRESULT DeleteFile(const wchar_t* name) override;
   HRESULT RenameFile(const wchar_t* old_name, const wchar_t* new_name) override;
