@@ -19,7 +19,7 @@ struct WaitRule {
 
 // One thread uses a connection at a time, the one that holds the driver's connection lock. Only
 // Cancel and ClearCancel may be called from any thread. The order of the operations is fixed, since
-// CIConnection is declared in the public header: code compiled against it finds them by their
+// the public header names CIConnection: code that has a connection's address finds them by their
 // order. New ones are added at the end.
 class CIConnection {
  public:

@@ -24,7 +24,7 @@ constexpr DWORD kInputQueueBytes = 16384;
 constexpr DWORD kOutputQueueBytes = 1024;
 // Milliseconds, of the port's driver. A read ends when the line is silent for 1 s after a byte, or
 // after 200 ms for each byte asked for and 100 ms more; it then is a success, also of 0 bytes. The
-// time-outs of Read and Write count besides.
+// time-outs of Read and Write apply as well.
 constexpr COMMTIMEOUTS kTimeouts = {
     .ReadIntervalTimeout = 1000,
     .ReadTotalTimeoutMultiplier = 200,
@@ -36,8 +36,8 @@ constexpr DWORD kPurgeAll = PURGE_TXABORT | PURGE_RXABORT | PURGE_TXCLEAR | PURG
 constexpr BYTE kByteSize = 8;
 constexpr DWORD kRtsControlMask = 0x3;  // fRtsControl has two bits
 
-// How long the output queue may stand still before the flush stops waiting for it. It is long
-// beside the 33 ms of a byte at 300 bit/s: a queue that stands still for so long is not just slow.
+// How long the output queue may stand still before the flush stops waiting for it. A byte
+// takes 33 ms at 300 bit/s, so a queue that stands still for so long is not just slow.
 constexpr DWORD kDrainLimitMs = 3000;
 
 constexpr std::array<DWORD, 5> kSweepSpeeds = {

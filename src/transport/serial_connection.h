@@ -16,7 +16,8 @@ class CSerialConnection : public CAbstractConnection {
 
   // Opens the port at the first speed and RTS mode at which `probe` is true (without a probe, the
   // first of all). S_OK; S_FALSE when there was none or the abort event was signalled; else why the
-  // port could not be opened.
+  // port could not be opened. Discovery does not call it: its tries begin with the port's
+  // current speed.
   virtual HRESULT Connect(const wchar_t* port, HANDLE abort_event, Probe probe);
 
   // Opens the port ("COM7") with these settings, which must not be null; a baud rate of 0 keeps the

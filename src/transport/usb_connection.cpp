@@ -95,8 +95,7 @@ HRESULT CUSBConnection::ReadEndpoints(BulkEndpoints* endpoints) {
   const DWORD head_error =
       Request(device_.get(), usbio::kGetDescriptor, BytesOf(request), head, &returned);
   // The plain error number is no failing HRESULT: discovery goes on, finds that no receiver
-  // answers, and gives S_FALSE. A host so sees a device that is not there as one without a
-  // receiver.
+  // answers, and gives S_FALSE. So a host cannot tell a missing device from one without a receiver.
   if (head_error != ERROR_SUCCESS) return static_cast<HRESULT>(head_error);
   if (returned != head.size()) return S_FALSE;
 
