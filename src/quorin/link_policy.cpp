@@ -28,8 +28,8 @@ HRESULT SerialPolicy::ReadRest(Block& block) {
   return FAILED(result) ? result : S_OK;
 }
 
-// In 32-bit arithmetic: beyond 43383508 bytes the percent starts again from 1. It decides nothing;
-// a host that compares the reports of a transfer with recorded ones would see others if it did not.
+// In 32-bit arithmetic: beyond 43383508 bytes the percent starts again from 1. This is kept for
+// hosts that compare the percents of a transfer with recorded ones; nothing else depends on them.
 uint8_t SerialPolicy::Percent(uint32_t delivered, uint32_t size) const {
   return static_cast<uint8_t>(delivered * 99 / size + 1);
 }

@@ -22,14 +22,16 @@ class CQuorinCommand : public CReceiverCmd {
  public:
   CQuorinCommand(const char* text, uint32_t flags);
 
-  // S_OK: the exchange ran, and Result() says how. S_FALSE: cancelled. E_INVALIDARG: no connection.
-  // 0x8007048F: the reply did not become whole in time, or does not fit into the buffer.
+  // S_OK: the exchange ran, or a read ended it; Result() says how. S_FALSE: cancelled.
+  // E_INVALIDARG: no connection. 0x8007048F: refused, or the reply did not become whole in time or
+  // does not fit into the buffer. Else the failure that ended it.
   HRESULT Execute(CIConnection* connection, HANDLE abort_event) override;
 
   // Evaluates the body of one message, and sets `done` when the command needs no further message.
   virtual HRESULT ParseReply(const char* body, uint32_t length, ReplyKind kind, bool* done);
 
-  // 0, 0x8007048F when the receiver refused, or the code of a failed read.
+  // S_OK, 0x8007048F when the receiver refused, or the code of the read that ended the exchange:
+  // S_FALSE after an abort.
   HRESULT Result() const { return result_; }
   // The kind of the last message that was evaluated.
   ReplyKind Kind() const { return kind_; }

@@ -21,7 +21,7 @@ bool IsLetterOrDigit(char c) {
   return (c >= '0' && c <= '9') || (c >= 'A' && c <= 'Z') || (c >= 'a' && c <= 'z');
 }
 
-// The number at the start of the text, as scanf's %X reads it: an 0x before it is passed over, and
+// The number at the start of the text, as scanf's %X reads it: an 0x before it is skipped, and
 // hexadecimal digits after the three characters of the length count as well. A tagged body begins
 // with "%", which ends the number. An untagged body must not begin with such a digit: its message
 // would get another length.
