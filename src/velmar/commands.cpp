@@ -112,8 +112,8 @@ HRESULT CReadFileCmd::ParseReply(const char* bytes,
                                  bool* done,
                                  uint32_t* consumed) {
   has_begun_ = !std::string_view(bytes, length).starts_with(kRefusal);
-  // The prompt is consumed as soon as a byte has come after it. A first log that comes in pieces so
-  // stands without its prompt from the second piece on, and is recognised by its first byte.
+  // The prompt is consumed as soon as a byte has come after it. So a first log that comes in pieces
+  // has no prompt before it from the second piece on, and is recognised by its first byte.
   const bool at_log = length != 0 && static_cast<uint8_t>(bytes[0]) == BinaryHeader::kSync;
   const bool acknowledged = Response() == RESPONSE_OK && at_log;
   if (!chunk_ && !acknowledged) return CLogCommand::ParseReply(bytes, length, done, consumed);
@@ -127,7 +127,9 @@ HRESULT CReadFileCmd::ParseLogBody(const char* bytes,
                                    bool* done,
                                    uint32_t* consumed) {
   // The binary header holds these bytes: the chunk's offset in the file and its length. They are
-  // not needed, as the chunks come in order.
+  // not needed, as the chunks come in order. At least 8 bytes must follow them, the checksum
+  // included: a last chunk of less than 4 bytes is never recognised, and the download ends by a
+  // time-out.
   constexpr uint32_t kBodyBeforeData = 8;
   constexpr uint32_t kUsualChunk = 1024;
   *done = false;

@@ -132,7 +132,7 @@ class CSetPortParamsCmd : public CVelmarCommand {
   explicit CSetPortParamsCmd(const PortConfigLog& settings);
 };
 
-// Makes the receiver take and give this protocol on the port.
+// Makes the receiver use this protocol on the port, for commands and answers.
 class CSetInterfacemodeCommand : public CVelmarCommand {
  public:
   CSetInterfacemodeCommand();

@@ -128,8 +128,8 @@ HRESULT CVelmarProtocol::RaiseReceiver(DWORD speed) {
   CSetPortParamsCmd set_port(settings);
   const HRESULT result = ExecuteForCertain(set_port);
   if (result == S_FALSE) {
-    // It may have changed its speed already, or may do so now. So the old speed is set at the new
-    // one.
+    // It may have changed its speed already, or may do so now. So it is sent the old speed, at the
+    // new one.
     DWORD old_speed = 0;
     ThrowIfFailed(connection()->GetSpeed(&old_speed));
     ThrowIfFailed(connection()->SetSpeed(speed));
@@ -149,9 +149,8 @@ HRESULT CVelmarProtocol::RestoreSpeed(DWORD speed, bool is_aborted) {
   return FAILED(result) ? result : connection()->SetSpeed(speed);
 }
 
-// Sends the receiver its port's settings with this speed. After an abort neither is it asked for
-// the settings (those from before are sent) nor is its answer waited for: the host wants no more
-// waits.
+// Sends the receiver its port's settings with this speed. After an abort it is not asked for them
+// (those from before are sent), and its answer is not waited for: the host wants no more waits.
 HRESULT CVelmarProtocol::TellSpeed(DWORD speed, bool is_aborted) {
   PortConfigLog settings = raised_port_;
   if (!is_aborted) {

@@ -15,9 +15,9 @@ IStream* AddReference(IStream* stream) {
   return stream;
 }
 
-// In 32-bit arithmetic: the percent wraps in files beyond 42949672 bytes. It decides nothing; a
-// host that compares the reports of a transfer with recorded ones would see others if it did not. A
-// size of 0 gives 100, as there is nothing to divide by.
+// In 32-bit arithmetic: the percent wraps in files beyond 42949672 bytes. This is kept for hosts
+// that compare the percents of a transfer with recorded ones; nothing else depends on them. A size
+// of 0 gives 100, as there is nothing to divide by.
 uint8_t Percent(uint32_t total, uint32_t remaining) {
   constexpr uint32_t kComplete = 100;
   if (total == 0) return kComplete;

@@ -108,6 +108,7 @@ Progress DecodeDirectory(std::string_view text, std::vector<FileEntry>& entries)
       ++i;
       continue;
     }
+    // One field more: only the line end after the checksum shows that the log is whole.
     if (fields.size() <= i + kLogFields) return Progress::kMore;
     try {
       entries.push_back({.name = WithoutQuotes(fields[i + 10]),

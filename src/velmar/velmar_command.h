@@ -16,7 +16,7 @@ namespace VelmarCommands {
 
 // Flags of a command.
 constexpr uint32_t kSendOnly = 0x0001;   // no reply is read
-constexpr uint32_t kAppendCrc = 0x0002;  // the command's CRC-32 is sent after it
+constexpr uint32_t kAppendCrc = 0x0002;  // the CRC-32 is sent after it; no command asks for it
 // The reply is not kept, and the parse operations discard the logs that they have read: a file is
 // larger than the buffer.
 constexpr uint32_t kStreamed = 0x1000;
@@ -34,7 +34,8 @@ class CVelmarCommand : public CReceiverCmd {
 
   // The parse operations get the bytes that were received and not consumed. `done` ends the
   // exchange. The first `consumed` bytes are discarded after the call. S_FALSE: not recognised, or
-  // more bytes are needed.
+  // more bytes are needed. ParseReserved, ParseAsciiMessage and ParseAcknowledgement are for
+  // derived commands: the library does not call them.
   virtual HRESULT ParseReply(const char* bytes, uint32_t length, bool* done, uint32_t* consumed);
   virtual HRESULT ParseResponse(const char* bytes, uint32_t length, bool* done, uint32_t* consumed);
   virtual HRESULT ParseReserved(const char* bytes, uint32_t length, bool* done, uint32_t* consumed);

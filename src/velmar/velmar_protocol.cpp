@@ -124,8 +124,8 @@ HRESULT CVelmarProtocol::GetReceiverInfo(HANDLE abort_event, CReceiverInfo* info
     ReadIdentity(abort_event, info);
     return S_OK;
   });
-  // Also when the lock was not taken: the report then has this line for every call, whatever came
-  // of it. Windows refuses the release of a mutex that the thread does not hold.
+  // Also when the lock was not taken, so that the report has this line for every call. Windows
+  // refuses to release a mutex that the thread does not hold.
   UnlockConnection();
   if (result != S_OK) return result;
   ReportProgress(100);

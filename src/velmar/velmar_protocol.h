@@ -35,15 +35,14 @@ class CVelmarProtocol : public CAbstractProtocol, public VelmarCommands::CReadFi
  private:
   bool IsAnswering(HANDLE abort_event) override;
 
-  // Executes a command whose line is sent whatever comes: an abort ends only the wait for the
-  // answer.
+  // Executes a command whose line is always sent: an abort ends only the wait for the answer.
   HRESULT ExecuteForCertain(VelmarCommands::CVelmarCommand& command);
 
   // What follows each command: notes when an abort ended it, and writes a failure to the report.
   HRESULT Conclude(HRESULT result, const VelmarCommands::CVelmarCommand& command);
 
-  // Waits for the answer to a command whose wait an abort ended: answers do not say to which
-  // command they belong, so the next command would take it for its own.
+  // After an abort has ended a command's wait: waits for as long as a late answer may take. Answers
+  // do not say to which command they belong, so the next command would take it for its own.
   void AwaitLateAnswer();
   void NoteCutOff();
 
