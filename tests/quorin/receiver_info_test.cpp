@@ -178,6 +178,27 @@ TEST_F(QuorinReceiverInfo, IsAbortedWhileItWaits) {
   ExpectNothingButTheLock();
 }
 
+// The answer has another kind than the one that was waited for. The abort is taken all the same, and
+// ends no further operation.
+TEST_F(QuorinReceiverInfo, IsAbortedWithABlankReply) {
+  receiver.On(kGetId, [this](const std::string& tag) {
+    connection->Give({S_OK, Message("  ", tag + "QR"), [this] { driver.Abort(); }});
+  });
+  receiver.Reply("remove,A.log\r\n", "");
+  EXPECT_EQ(Get(), S_FALSE);
+  ExpectNothingButTheLock();
+  EXPECT_EQ(driver.DeleteFile(L"A.log"), S_OK);
+}
+
+TEST_F(QuorinReceiverInfo, FailsOnARefusalThatComesWithAnAbort) {
+  receiver.On(kGetId, [this](const std::string& tag) {
+    connection->Give({S_OK, Message("ER", tag + "{no}"), [this] { driver.Abort(); }});
+  });
+  EXPECT_EQ(Get(), kNotConnected);
+  ExpectNothingButTheLock();
+  EXPECT_EQ(driver.DeleteFile(L"A.log"), S_FALSE) << "the abort is still there";
+}
+
 class QuorinVariant : public QuorinReceiverInfo,
                       public testing::WithParamInterface<std::pair<const char*, DWORD>> {};
 
