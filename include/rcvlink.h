@@ -260,7 +260,7 @@ RCVLINK_API long DestroyReceiver(wchar_t* port);
 /// @warning When a Quorin receiver's identity cannot be read, the calling thread still holds the
 ///          receiver's lock: call `UnlockConnection` after a result other than S_OK. A Velmar
 ///          receiver's lock is released also after a failure; a lock that the host took itself with
-///          `LockConnection` stays.
+///          `LockConnection` stays, unless `abortEvent` is no valid handle.
 RCVLINK_API long GetReceiverInfo(void* receiver, void* abortEvent, CReceiverInfo* info);
 
 /// Asks whether the receiver still answers.

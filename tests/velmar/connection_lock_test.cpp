@@ -137,6 +137,19 @@ TEST_F(VelmarConnectionLock, ThatCannotBeHadFailsACheckAndAnInquiry) {
   driver.UnlockConnection();
 }
 
+// An inquiry that could not wait for the lock releases it all the same, and so one that its thread
+// held before.
+TEST_F(VelmarConnectionLock, IsReleasedOnceByAnInquiryThatCannotWaitForIt) {
+  driver.LockConnection(nullptr);
+  driver.LockConnection(nullptr);
+  const HANDLE none = reinterpret_cast<HANDLE>(static_cast<uintptr_t>(0xDEAD0));
+  CReceiverInfo info{};
+  EXPECT_EQ(driver.GetReceiverInfo(none, &info), HResultFromError(ERROR_INVALID_HANDLE));
+  EXPECT_FALSE(IsFreeForOthers(driver));
+  EXPECT_EQ(driver.UnlockConnection(), 1);
+  EXPECT_EQ(driver.UnlockConnection(), 0) << "it was held once";
+}
+
 // Operations may be called inside a lock of the host's, on its thread.
 TEST_F(VelmarConnectionLock, LetsItsHolderWork) {
   driver.LockConnection(nullptr);
