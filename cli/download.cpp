@@ -145,14 +145,12 @@ void CheckSize(Receiver& receiver, const RemoteFile& file) {
   constexpr uint64_t kMostBlocks = 65'536;
   constexpr uint64_t kBlockBytes = 512;
   constexpr uint64_t kMostBytes = kMostBlocks * kBlockBytes;
-  if (file.size <= kMostBytes || receiver.link() == eInstanceUSB) return;
-  if (receiver.Family() != eProtocolQuorin) return;
+  if (file.size <= kMostBytes || receiver.Family() != eProtocolQuorin) return;
   throw Failure{.tried = "download " + Printable(file.name),
                 .code = ResultOfWin32(ERROR_FILE_TOO_LARGE),
                 .meaning = "the file has " + std::to_string(file.size) +
-                           " bytes; over a serial link a Quorin receiver can send at most " +
-                           std::to_string(kMostBytes) + " bytes of a file",
-                .hint = "Download it over USB."};
+                           " bytes; a Quorin receiver can send at most " +
+                           std::to_string(kMostBytes) + " bytes of a file"};
 }
 
 Downloaded Download(Context& context,

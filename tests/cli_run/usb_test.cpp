@@ -55,6 +55,15 @@ TEST_F(UsbCli, ListsGetsAndRemoves) {
   EXPECT_THAT(RunOn(usb, {"ls"}).output, HasSubstr("1 file, 1 bytes"));
 }
 
+// Blocks have numbers of 16 bits on both links.
+TEST_F(UsbCli, AFileThatTheProtocolCannotNumberIsRefusedAtOnce) {
+  const bed::SimulatedUsb usb({"quorin", "--lie-size", "a.log=33554433"}, {{"a.log", "aa"}});
+  const auto result = RunOn(usb, {"get", "a.log"});
+  EXPECT_EQ(result.status, kFailed);
+  EXPECT_THAT(result.errors, HasSubstr("33554432"));
+  EXPECT_THAT(usb.Transcript(), Not(HasSubstr("%get,")));
+}
+
 TEST_F(UsbCli, AnyLinkFindsItOnUsb) {
   const bed::SimulatedUsb usb({"quorin"});
   const auto quiet = RunOn(usb, {"find"}, "any");
