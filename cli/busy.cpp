@@ -24,7 +24,6 @@ Busy::~Busy() {
 }
 
 void Busy::Draw() {
-  constexpr uint64_t kMsPerSecond = 1000;
   const std::string line = what_ + " ... " +
                            FormatDuration((GetTickCount64() - start_ms_) / kMsPerSecond) +
                            " (Ctrl-C stops it)";

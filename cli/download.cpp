@@ -3,14 +3,13 @@
 #include <atomic>
 
 #include "file_stream.h"
+#include "formats.h"
 #include "progress.h"
 #include "text.h"
 #include "ticker.h"
 
 namespace cli {
 namespace {
-
-constexpr uint64_t kMsPerSecond = 1000;
 
 // Watches a transfer on a thread of its own: shows the progress, and aborts the transfer when no
 // new data arrives or the data cannot be written.

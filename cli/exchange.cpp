@@ -7,6 +7,7 @@
 #include <map>
 #include <utility>
 
+#include "formats.h"
 #include "results.h"
 #include "text.h"
 #include "trace_lines.h"
@@ -14,8 +15,6 @@
 
 namespace cli {
 namespace {
-
-constexpr uint32_t kMsPerSecond = 1000;
 constexpr uint32_t kMsPerMinute = 60 * kMsPerSecond;
 constexpr uint32_t kMsPerHour = 60 * kMsPerMinute;
 constexpr uint32_t kMsPerDay = 24 * kMsPerHour;

@@ -5,6 +5,7 @@
 #include <span>
 
 #include "exchange_text.h"
+#include "formats.h"
 #include "text.h"
 #include "troubleshooting.h"
 
@@ -138,7 +139,6 @@ class Drawing {
   }
 
   void DrawAxis(uint64_t bottom) {
-    constexpr uint64_t kMsPerSecond = 1000;
     const uint64_t step = Step();
     for (uint64_t ms = 0; ms <= duration_; ms += step) {
       const uint64_t x = XOf(ms);

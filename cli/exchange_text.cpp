@@ -3,12 +3,11 @@
 #include <algorithm>
 #include <set>
 
+#include "formats.h"
 #include "text.h"
 
 namespace cli {
 namespace {
-
-constexpr uint64_t kMsPerSecond = 1000;
 
 std::string Seconds(uint64_t ms) {
   constexpr uint64_t kMsPerTenth = 100;

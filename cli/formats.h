@@ -9,6 +9,8 @@
 
 namespace cli {
 
+inline constexpr uint32_t kMsPerSecond = 1000;
+
 // "512 B", "1.2 MB": thousands, as in the speed of a line.
 std::string FormatBytes(uint64_t bytes);
 

@@ -26,9 +26,9 @@ UniqueHandle Open(const std::filesystem::path& file,
 }
 
 // Reads a file from its beginning.
-class Reader {
+class FileReader {
  public:
-  explicit Reader(const std::filesystem::path& file)
+  explicit FileReader(const std::filesystem::path& file)
       : file_(file), handle_(Open(file, GENERIC_READ, OPEN_EXISTING, "read")) {}
 
   // The next bytes, as many as there is room for; fewer only at the end.
@@ -59,8 +59,8 @@ std::optional<uint64_t> SizeOf(const std::filesystem::path& file) {
 }
 
 bool BeginsWith(const std::filesystem::path& file, const std::filesystem::path& beginning) {
-  Reader whole(file);
-  Reader start(beginning);
+  FileReader whole(file);
+  FileReader start(beginning);
   std::array<char, kPiece> expected;
   std::array<char, kPiece> bytes;
   for (;;) {
@@ -74,7 +74,7 @@ bool BeginsWith(const std::filesystem::path& file, const std::filesystem::path& 
 }
 
 std::string Sha256Of(const std::filesystem::path& file) {
-  Reader reader(file);
+  FileReader reader(file);
   Sha256 hash;
   std::array<char, kPiece> bytes;
   while (const DWORD count = reader.Read(bytes)) hash.Add(bytes.data(), count);

@@ -27,7 +27,6 @@ ExitCode Worse(ExitCode first, ExitCode second) {
 }
 
 std::string InWords(const MirrorState& state, const std::wstring& name, uint64_t size) {
-  constexpr uint64_t kMsPerSecond = 1000;
   std::string text = "File " + std::to_string(state.file) + " of " + std::to_string(state.files) +
                      ": " + Printable(name) + ", " + FormatBytes(size);
   const uint64_t rate = state.elapsed_ms == 0 ? 0 : state.done * kMsPerSecond / state.elapsed_ms;

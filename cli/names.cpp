@@ -31,11 +31,12 @@ bool IsPortNumber(std::wstring_view text) {
 
 // Names that reach a device in any folder, whatever follows their first dot.
 bool IsDeviceName(std::wstring_view name) {
-  constexpr std::array<std::wstring_view, 6> kDevices = {
+  constexpr std::array<std::wstring_view, 6> kReservedNames = {
       L"CON", L"PRN", L"AUX", L"NUL", L"CONIN$", L"CONOUT$"};
   std::wstring stem = Capitals(name.substr(0, name.find(L'.')));
   stem.erase(stem.find_last_not_of(L' ') + 1);
-  if (std::find(kDevices.begin(), kDevices.end(), stem) != kDevices.end()) return true;
+  if (std::find(kReservedNames.begin(), kReservedNames.end(), stem) != kReservedNames.end())
+    return true;
   constexpr size_t kPortPrefix = 3;
   return (stem.starts_with(L"COM") || stem.starts_with(L"LPT")) &&
          IsPortNumber(std::wstring_view(stem).substr(kPortPrefix));
@@ -92,9 +93,9 @@ bool SameLocalName(std::wstring_view first, std::wstring_view second) {
 }
 
 std::wstring PlainPortName(std::wstring_view name) {
-  constexpr std::wstring_view kDevices = L"\\\\.\\";
+  constexpr std::wstring_view kPrefix = L"\\\\.\\";
   std::wstring_view plain = name;
-  if (plain.starts_with(kDevices)) plain.remove_prefix(kDevices.size());
+  if (plain.starts_with(kPrefix)) plain.remove_prefix(kPrefix.size());
   if (plain.ends_with(L':')) plain.remove_suffix(1);
   return IsComPort(plain) ? Capitals(plain) : std::wstring(name);
 }

@@ -18,7 +18,7 @@
 namespace cli {
 namespace {
 
-using Json = nlohmann::json;
+using Document = nlohmann::json;
 
 struct MemoryFreer {
   void operator()(wchar_t* text) const { CoTaskMemFree(text); }
@@ -47,25 +47,25 @@ class MemoryLock {
 };
 
 // The ports of a file; none when it is missing, damaged or something else.
-Json PortsIn(const std::filesystem::path& file) {
+Document PortsIn(const std::filesystem::path& file) {
   constexpr size_t kMostBytes = 1 << 20;
   std::ifstream stream(file, std::ios::binary);
   std::string text;
   for (std::istreambuf_iterator<char> byte(stream), end; byte != end; ++byte) {
-    if (text.size() == kMostBytes) return Json::object();
+    if (text.size() == kMostBytes) return Document::object();
     text += *byte;
   }
-  const Json document = Json::parse(text, nullptr, /*allow_exceptions=*/false);
-  if (!document.is_object() || !document.contains("ports")) return Json::object();
-  const Json& ports = document["ports"];
-  return ports.is_object() ? ports : Json::object();
+  const Document document = Document::parse(text, nullptr, /*allow_exceptions=*/false);
+  if (!document.is_object() || !document.contains("ports")) return Document::object();
+  const Document& ports = document["ports"];
+  return ports.is_object() ? ports : Document::object();
 }
 
 // A number or text of an entry, whatever the entry is.
 template <typename T>
-T ValueOf(const Json& entry, const char* name, const T& otherwise) {
+T ValueOf(const Document& entry, const char* name, const T& otherwise) {
   if (!entry.is_object() || !entry.contains(name)) return otherwise;
-  const Json& value = entry[name];
+  const Document& value = entry[name];
   if constexpr (std::is_same_v<T, std::string>) {
     return value.is_string() ? value.get<std::string>() : otherwise;
   } else {
@@ -73,7 +73,7 @@ T ValueOf(const Json& entry, const char* name, const T& otherwise) {
   }
 }
 
-std::optional<KnownSetting> SettingOf(const Json& entry) {
+std::optional<KnownSetting> SettingOf(const Document& entry) {
   const auto speed = ValueOf<uint64_t>(entry, "speed", 0);
   const auto rts = ParseRts(ValueOf<std::string>(entry, "rts", ""));
   const auto family = ParseFamily(ValueOf<std::string>(entry, "protocol", ""));
@@ -81,18 +81,18 @@ std::optional<KnownSetting> SettingOf(const Json& entry) {
   return KnownSetting{{static_cast<unsigned long>(speed), *rts}, *family};
 }
 
-Json EntryOf(const KnownSetting& setting) {
+Document EntryOf(const KnownSetting& setting) {
   return {{"speed", setting.line.speed},
           {"rts", RtsWord(setting.line.rts)},
           {"protocol", FamilyWord(setting.family)}};
 }
 
 // Replaces the file in one step, so that nobody reads half of it.
-bool Replace(const std::filesystem::path& file, const Json& ports) {
+bool Replace(const std::filesystem::path& file, const Document& ports) {
   constexpr int kIndent = 2;
   const std::filesystem::path fresh = file.native() + L".new";
   std::ofstream stream(fresh, std::ios::binary | std::ios::trunc);
-  stream << Json{{"ports", ports}}.dump(kIndent) << "\n";
+  stream << Document{{"ports", ports}}.dump(kIndent) << "\n";
   stream.close();
   const bool replaced =
       stream && MoveFileExW(fresh.c_str(), file.c_str(), MOVEFILE_REPLACE_EXISTING);
@@ -116,7 +116,7 @@ std::optional<KnownSetting> PortMemory::Recall(const std::wstring& port) const {
   if (file_.empty()) return std::nullopt;
   const MemoryLock lock;
   if (!lock.held()) return std::nullopt;
-  const Json ports = PortsIn(file_);
+  const Document ports = PortsIn(file_);
   const auto entry = ports.find(KeyOf(port));
   return entry == ports.end() ? std::nullopt : SettingOf(*entry);
 }
@@ -125,8 +125,8 @@ bool PortMemory::Remember(const std::wstring& port, const KnownSetting& setting)
   if (file_.empty()) return true;
   const MemoryLock lock;
   if (!lock.held()) return false;
-  Json ports = PortsIn(file_);
-  Json& entry = ports[KeyOf(port)];
+  Document ports = PortsIn(file_);
+  Document& entry = ports[KeyOf(port)];
   if (SettingOf(entry) == setting) return true;
   entry = EntryOf(setting);
   try {
@@ -141,7 +141,7 @@ bool PortMemory::Forget(const std::wstring& port) const {
   if (file_.empty()) return true;
   const MemoryLock lock;
   if (!lock.held()) return false;
-  Json ports = PortsIn(file_);
+  Document ports = PortsIn(file_);
   return ports.erase(KeyOf(port)) == 0 || Replace(file_, ports);
 }
 

@@ -1,5 +1,7 @@
 #include "rate_meter.h"
 
+#include "formats.h"
+
 namespace cli {
 
 void RateMeter::Add(uint64_t elapsed_ms, uint64_t done) {
@@ -12,7 +14,6 @@ void RateMeter::Add(uint64_t elapsed_ms, uint64_t done) {
 }
 
 uint64_t RateMeter::BytesPerSecond() const {
-  constexpr uint64_t kMsPerSecond = 1000;
   if (samples_.empty()) return 0;
   const Sample& first = samples_.front();
   const Sample& last = samples_.back();

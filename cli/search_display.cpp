@@ -64,7 +64,6 @@ void SearchDisplay::PrintFailure(const Failure& failure) {
 }
 
 void SearchDisplay::Draw() {
-  constexpr uint64_t kMsPerSecond = 1000;
   const std::string seconds = FormatDuration((GetTickCount64() - start_ms_) / kMsPerSecond);
   // The last column stays free, because a full line would wrap.
   const size_t width = context_.err.Width() - 1;

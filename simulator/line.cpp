@@ -9,7 +9,7 @@ namespace {
 
 constexpr uint64_t kNsPerMs = 1'000'000;
 constexpr uint64_t kNsPerSecond = 1'000'000'000;
-constexpr uint64_t kBitsPerByte = 10;  // A start bit, eight data bits and a stop bit.
+constexpr uint64_t kBitsOnLine = 10;  // A start bit, eight data bits and a stop bit.
 
 // Bits sampled at the wrong rate: always the same wrong byte for a byte, never the byte itself.
 uint8_t Garble(uint8_t byte) {
@@ -82,7 +82,7 @@ size_t Line::PieceLength() const {
   return std::min(options_.piece_size, length);
 }
 
-uint64_t Line::ByteTimeNs() const { return kBitsPerByte * kNsPerSecond / std::max(speed_, 1U); }
+uint64_t Line::ByteTimeNs() const { return kBitsOnLine * kNsPerSecond / std::max(speed_, 1U); }
 
 uint64_t Line::WireStartNs() const {
   if (sent_of_front_ > 0) {

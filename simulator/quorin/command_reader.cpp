@@ -6,7 +6,6 @@ namespace sim {
 namespace {
 
 constexpr size_t kMaxLineLength = 1024;
-constexpr std::string_view kEchoOff = "#OFF#";
 
 // A host may send '#' to end a transfer that has ended already. It then stands before the next
 // command.

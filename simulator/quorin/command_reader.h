@@ -9,6 +9,9 @@
 
 namespace sim {
 
+// The one command that begins with a '#', which otherwise ends a transfer.
+inline constexpr std::string_view kEchoOff = "#OFF#";
+
 // A line as it came: `raw` with its end, `text` without.
 struct CommandLine {
   std::string raw;

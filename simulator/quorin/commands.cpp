@@ -4,6 +4,7 @@
 #include <charconv>
 #include <utility>
 
+#include "simulator/quorin/command_reader.h"
 #include "simulator/quorin/directory.h"
 
 namespace sim {
@@ -13,7 +14,6 @@ constexpr std::string_view kPrint = "print,";
 constexpr std::string_view kSet = "set,";
 constexpr std::string_view kRemove = "remove,";
 constexpr std::string_view kGet = "get,";
-constexpr std::string_view kEchoOff = "#OFF#";
 constexpr std::string_view kStopOutput = "dm";
 
 constexpr std::string_view kLogFolder = "log/";
