@@ -15,7 +15,7 @@
 namespace bed {
 
 // The right to use one of the serial ports of this test process. Each process that runs has ports of
-// its own (RCVLINK_PORTS, set by run_tests.py), so those that run side by side do not meet. Nothing is
+// its own (RCVLINK_PORTS, set by run_program.py), so those that run side by side do not meet. Nothing is
 // plugged in.
 class PortLease {
  public:
