@@ -1,11 +1,15 @@
 #include <signal.h>
 
 #include <CLI/CLI.hpp>
+#include <array>
 #include <cstdio>
 #include <exception>
 #include <fstream>
+#include <functional>
 #include <iostream>
+#include <memory>
 #include <string>
+#include <utility>
 
 #include "simulator/files.h"
 #include "simulator/line.h"
@@ -14,6 +18,7 @@
 #include "simulator/program/quorin_program.h"
 #include "simulator/program/velmar_program.h"
 #include "simulator/quorin/receiver.h"
+#include "simulator/receiver.h"
 #include "simulator/transcript.h"
 #include "simulator/velmar/receiver.h"
 
@@ -66,16 +71,47 @@ void AddPortOptions(CLI::App& command, PortOptions& port, sim::LineOptions& line
   sim::AddPieceOptions(command, line);
 }
 
-template <typename FamilyReceiver, typename FamilyOptions>
-void Run(const FamilyOptions& options, const PortOptions& port_options) {
+using MakeReceiver = std::function<std::unique_ptr<sim::Receiver>(sim::FileStore files,
+                                                                  sim::Transcript* transcript)>;
+
+// Adds the switches of a family to its subcommand; gives what makes a receiver of what they say
+// once they are parsed.
+template <typename FamilyReceiver,
+          typename FamilyOptions,
+          void (*AddFamilyOptions)(CLI::App&, FamilyOptions&)>
+MakeReceiver AddOptions(CLI::App& command, PortOptions& port) {
+  const auto options = std::make_shared<FamilyOptions>();
+  AddPortOptions(command, port, options->line);
+  AddFamilyOptions(command, *options);
+  return [options](sim::FileStore files, sim::Transcript* transcript) {
+    return std::make_unique<FamilyReceiver>(*options, std::move(files), transcript);
+  };
+}
+
+struct Family {
+  const char* word;
+  const char* help;
+  MakeReceiver (*add_options)(CLI::App& command, PortOptions& port);
+};
+
+// A new family is one more line.
+constexpr std::array kFamilies = {
+    Family{"quorin",
+           "a Quorin receiver",
+           AddOptions<sim::QuorinReceiver, sim::QuorinOptions, sim::AddQuorinOptions>},
+    Family{"velmar",
+           "a Velmar receiver",
+           AddOptions<sim::VelmarReceiver, sim::VelmarOptions, sim::AddVelmarOptions>}};
+
+void Run(const MakeReceiver& make_receiver, const PortOptions& port_options) {
   const sigset_t wait_mask = CatchSignals();
   std::ofstream file = sim::OpenTranscript(port_options.files.transcript);
   sim::Transcript transcript = file.is_open() ? sim::Transcript(file) : sim::Transcript();
-  FamilyReceiver receiver(
-      options, sim::FileStore::FromFolder(sim::ToPath(port_options.files.folder)), &transcript);
+  const std::unique_ptr<sim::Receiver> receiver = make_receiver(
+      sim::FileStore::FromFolder(sim::ToPath(port_options.files.folder)), &transcript);
   sim::PtyPort port(port_options.link);
   std::cout << port.slave_name() << std::endl;
-  port.Serve(receiver, stop_requested, wait_mask);
+  port.Serve(*receiver, stop_requested, wait_mask);
 }
 
 }  // namespace
@@ -87,23 +123,16 @@ int main(int argc, char** argv) {
   app.require_subcommand(1);
 
   PortOptions port;
-  sim::QuorinOptions quorin;
-  CLI::App* const quorin_command = app.add_subcommand("quorin", "a Quorin receiver");
-  AddPortOptions(*quorin_command, port, quorin.line);
-  sim::AddQuorinOptions(*quorin_command, quorin);
-
-  sim::VelmarOptions velmar;
-  CLI::App* const velmar_command = app.add_subcommand("velmar", "a Velmar receiver");
-  AddPortOptions(*velmar_command, port, velmar.line);
-  sim::AddVelmarOptions(*velmar_command, velmar);
+  MakeReceiver make_receiver;
+  for (const Family& family : kFamilies) {
+    CLI::App* const command = app.add_subcommand(family.word, family.help);
+    command->callback(
+        [&make_receiver, make = family.add_options(*command, port)] { make_receiver = make; });
+  }
 
   CLI11_PARSE(app, argc, argv);
   try {
-    if (quorin_command->parsed()) {
-      Run<sim::QuorinReceiver>(quorin, port);
-    } else {
-      Run<sim::VelmarReceiver>(velmar, port);
-    }
+    Run(make_receiver, port);
   } catch (const std::exception& error) {
     std::fprintf(stderr, "rcvlink-sim: %s\n", error.what());
     return sim::kExitFailure;
