@@ -56,7 +56,7 @@ class Decoder {
 
 // What a thread is doing, according to its lines so far.
 struct ThreadState {
-  TraceFamily family = TraceFamily::kUnknown;
+  const Family* family = nullptr;
   std::optional<size_t> command{};    // the entry of the command that is not ended
   std::optional<size_t> read{};       // the entry of the read that is not ended
   std::optional<size_t> blocks{};     // the entry of the transfer that is not ended
@@ -90,9 +90,7 @@ class Reader {
     entry.code = words.code;
 
     ThreadState& thread = threads_[line.thread];
-    if (const TraceFamily family = FamilyOf(entry.text); family != TraceFamily::kUnknown) {
-      thread.family = family;
-    }
+    if (const Family* const family = FamilyOf(entry.text)) thread.family = family;
     EndRead(thread, entry);
     EndCommand(thread, entry);
     EndBlocks(thread, entry);
@@ -182,11 +180,11 @@ class Reader {
     if (!thread.command) return;
     const bool is_failure = next.kind == TraceKind::kFailure || next.kind == TraceKind::kTimeout;
     if (!is_failure && (!thread.sent_ms || next.kind == TraceKind::kRead)) return;
-    // After a reply of this family the library pauses for 500 ms; timers may be a little early.
+    // Timers may be a little early.
     constexpr uint64_t kRestMs = 450;
     const uint64_t sent_ms = thread.sent_ms.value_or(next.elapsed_ms);
     const bool is_answered =
-        thread.family == TraceFamily::kVelmar && next.elapsed_ms - sent_ms >= kRestMs;
+        thread.family && thread.family->rests && next.elapsed_ms - sent_ms >= kRestMs;
     ExchangeEnd end = EndBy(next, *thread.command);
     if (end == ExchangeEnd::kReply && !is_answered) end = ExchangeEnd::kUntold;
     PushEnd(end, next, sent_ms, "a reply, and a pause of 500 ms,");
@@ -242,9 +240,7 @@ class Reader {
     if (before == "CSetInterfacemodeCommand" || before == "CReadFileCmd") {
       return "stop all logs: unlogall thisport";
     }
-    if (thread.family == TraceFamily::kQuorin) return "end an unfinished line";
-    if (thread.family == TraceFamily::kVelmar) return "choose the file: currentfile NAME all";
-    return "a command";
+    return thread.family ? thread.family->unnamed_command : "a command";
   }
 
   void Begin(ThreadState& thread, ExchangeEntry& entry) {

@@ -21,23 +21,31 @@ struct Family {
   unsigned long even;
   unsigned long one_stop_bit;
   bool sets_rts;  // offers to control its RTS line
+  bool rests;     // the library pauses for 500 ms after a reply
+  // The command that most often has no line of its own in a report, and its text on the wire.
+  const char* unnamed_command;
 };
 
 // A new family is one more entry.
-inline constexpr std::array kFamilies = {Family{.protocol = eProtocolQuorin,
-                                                .name = "Quorin",
-                                                .usual_speeds = {CBR_115200, CBR_9600},
-                                                .odd = 1,
-                                                .even = 2,
-                                                .one_stop_bit = 0,
-                                                .sets_rts = true},
-                                         Family{.protocol = eProtocolVelmar,
-                                                .name = "Velmar",
-                                                .usual_speeds = {CBR_9600, CBR_115200},
-                                                .odd = 2,
-                                                .even = 1,
-                                                .one_stop_bit = 1,
-                                                .sets_rts = false}};
+inline constexpr std::array kFamilies = {
+    Family{.protocol = eProtocolQuorin,
+           .name = "Quorin",
+           .usual_speeds = {CBR_115200, CBR_9600},
+           .odd = 1,
+           .even = 2,
+           .one_stop_bit = 0,
+           .sets_rts = true,
+           .rests = false,
+           .unnamed_command = "end an unfinished line"},
+    Family{.protocol = eProtocolVelmar,
+           .name = "Velmar",
+           .usual_speeds = {CBR_9600, CBR_115200},
+           .odd = 2,
+           .even = 1,
+           .one_stop_bit = 1,
+           .sets_rts = false,
+           .rests = true,
+           .unnamed_command = "choose the file: currentfile NAME all"}};
 
 // Null for a number that belongs to no family.
 constexpr const Family* FindFamily(unsigned protocol) {

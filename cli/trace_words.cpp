@@ -181,41 +181,34 @@ constexpr std::array kPatterns = {
 
 struct CommandText {
   std::string_view class_name;
-  TraceFamily family;  // unknown: any
+  EProtocol family;
   std::string_view meaning;
 };
 
 constexpr std::array kCommands = {
-    CommandText{"CEchoOffCmd", TraceFamily::kUnknown, "turn the echo off: #OFF#"},
-    CommandText{"CDisableEchoCmd", TraceFamily::kUnknown, "turn the port's echo off: set,...echo"},
-    CommandText{"CPingCmd", TraceFamily::kUnknown, "ping (an empty line)"},
-    CommandText{"CGetPortCmd", TraceFamily::kUnknown, "read the port: print,/cur/term"},
+    CommandText{"CEchoOffCmd", eProtocolAny, "turn the echo off: #OFF#"},
+    CommandText{"CDisableEchoCmd", eProtocolAny, "turn the port's echo off: set,...echo"},
+    CommandText{"CPingCmd", eProtocolAny, "ping (an empty line)"},
+    CommandText{"CGetPortCmd", eProtocolAny, "read the port: print,/cur/term"},
+    CommandText{"CGetFileListCmd", eProtocolQuorin, "list the files: print,/log/&[name,size,time]"},
+    CommandText{"CGetFileListCmd", eProtocolVelmar, "list the files: log direnta once"},
+    CommandText{"CGetFileListCmd", eProtocolAny, "list the files"},
+    CommandText{"CDeleteFileCmd", eProtocolQuorin, "delete the file: remove,NAME"},
+    CommandText{"CDeleteFileCmd", eProtocolVelmar, "delete the file: del file NAME"},
+    CommandText{"CDeleteFileCmd", eProtocolAny, "delete the file"},
+    CommandText{"CGetFileCmd", eProtocolAny, "send the file: get,NAME"},
+    CommandText{"CGetFileSizeCmd", eProtocolAny, "read the file size: print,/log/NAME&size"},
+    CommandText{"CGetReceiverIDCmd", eProtocolAny, "read the id: print,/par/rcvid"},
+    CommandText{"CGetReceiverModelCmd", eProtocolAny, "read the model: print,/par/rcv/model"},
+    CommandText{"CSetBoudRateCmd", eProtocolAny, "return to the old speed: set,cur/term/rate"},
+    CommandText{"CGetReceiverInfoCmd", eProtocolAny, "read model and id: log versiona once"},
+    CommandText{"CGetFileHeaderCmd", eProtocolAny, "read the file size: log filehdra"},
+    CommandText{"CLogConfigCommand", eProtocolAny, "read the port settings: log comconfiga once"},
+    CommandText{"CReadFileCmd", eProtocolAny, "send the file: log filetransferb"},
+    CommandText{"CRenameFileCmd", eProtocolAny, "rename the file: rename OLD NEW"},
+    CommandText{"CSetPortParamsCmd", eProtocolAny, "set the port: COM SPEED ..."},
     CommandText{
-        "CGetFileListCmd", TraceFamily::kQuorin, "list the files: print,/log/&[name,size,time]"},
-    CommandText{"CGetFileListCmd", TraceFamily::kVelmar, "list the files: log direnta once"},
-    CommandText{"CGetFileListCmd", TraceFamily::kUnknown, "list the files"},
-    CommandText{"CDeleteFileCmd", TraceFamily::kQuorin, "delete the file: remove,NAME"},
-    CommandText{"CDeleteFileCmd", TraceFamily::kVelmar, "delete the file: del file NAME"},
-    CommandText{"CDeleteFileCmd", TraceFamily::kUnknown, "delete the file"},
-    CommandText{"CGetFileCmd", TraceFamily::kUnknown, "send the file: get,NAME"},
-    CommandText{
-        "CGetFileSizeCmd", TraceFamily::kUnknown, "read the file size: print,/log/NAME&size"},
-    CommandText{"CGetReceiverIDCmd", TraceFamily::kUnknown, "read the id: print,/par/rcvid"},
-    CommandText{
-        "CGetReceiverModelCmd", TraceFamily::kUnknown, "read the model: print,/par/rcv/model"},
-    CommandText{
-        "CSetBoudRateCmd", TraceFamily::kUnknown, "return to the old speed: set,cur/term/rate"},
-    CommandText{
-        "CGetReceiverInfoCmd", TraceFamily::kUnknown, "read model and id: log versiona once"},
-    CommandText{"CGetFileHeaderCmd", TraceFamily::kUnknown, "read the file size: log filehdra"},
-    CommandText{
-        "CLogConfigCommand", TraceFamily::kUnknown, "read the port settings: log comconfiga once"},
-    CommandText{"CReadFileCmd", TraceFamily::kUnknown, "send the file: log filetransferb"},
-    CommandText{"CRenameFileCmd", TraceFamily::kUnknown, "rename the file: rename OLD NEW"},
-    CommandText{"CSetPortParamsCmd", TraceFamily::kUnknown, "set the port: COM SPEED ..."},
-    CommandText{"CSetInterfacemodeCommand",
-                TraceFamily::kUnknown,
-                "set the language of the port: interfacemode"},
+        "CSetInterfacemodeCommand", eProtocolAny, "set the language of the port: interfacemode"},
 };
 
 // The texts that the stars match; nothing when the pattern does not match. The last bracket may be
@@ -355,22 +348,24 @@ TraceWords WordsOf(std::string_view line) {
           .code = is_failure ? CodeOf(line) : std::nullopt};
 }
 
-TraceFamily FamilyOf(std::string_view line) {
+const Family* FamilyOf(std::string_view line) {
   const auto is_about = [line](std::string_view name) {
     return line.starts_with("C" + std::string(name)) ||
            (line.starts_with("Create") &&
             (line.find("looking for " + std::string(name)) != std::string_view::npos ||
              line.find(std::string(name) + " receiver found") != std::string_view::npos));
   };
-  if (is_about("Quorin")) return TraceFamily::kQuorin;
-  if (is_about("Velmar")) return TraceFamily::kVelmar;
-  return TraceFamily::kUnknown;
+  for (const Family& family : kFamilies) {
+    if (is_about(family.name)) return &family;
+  }
+  return nullptr;
 }
 
-std::string CommandMeaning(std::string_view class_name, TraceFamily family) {
+std::string CommandMeaning(std::string_view class_name, const Family* family) {
+  const EProtocol protocol = family ? family->protocol : eProtocolAny;
   const auto* const found = std::ranges::find_if(kCommands, [&](const CommandText& command) {
     return command.class_name == class_name &&
-           (command.family == family || command.family == TraceFamily::kUnknown);
+           (command.family == protocol || command.family == eProtocolAny);
   });
   return std::string(found == kCommands.end() ? class_name : found->meaning);
 }

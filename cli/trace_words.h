@@ -6,6 +6,8 @@
 #include <string>
 #include <string_view>
 
+#include "families.h"
+
 namespace cli {
 
 enum class TraceKind {
@@ -37,13 +39,12 @@ struct TraceWords {
 // `line`: a line without its stamp, printable.
 TraceWords WordsOf(std::string_view line);
 
-enum class TraceFamily { kUnknown, kQuorin, kVelmar };
+// The family of receivers that a line is about; null when the line does not tell.
+const Family* FamilyOf(std::string_view line);
 
-// The family of receivers that a line is about.
-TraceFamily FamilyOf(std::string_view line);
-
-// What a command asks for, and its text on the wire, by the name of its class.
-std::string CommandMeaning(std::string_view class_name, TraceFamily family);
+// What a command asks for, and its text on the wire, by the name of its class. `family`: null if
+// unknown.
+std::string CommandMeaning(std::string_view class_name, const Family* family);
 
 // The class of the command that a line reports as made; empty for other lines.
 std::string_view CommandClass(std::string_view line);
