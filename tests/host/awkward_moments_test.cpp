@@ -62,7 +62,7 @@ class ApiAwkwardProgress : public testing::TestWithParam<int> {};
 TEST_P(ApiAwkwardProgress, ReceiverIsClosed) {
   const bed::SimulatedPort port({"quorin"}, {{"A.log", host::Content(1500)}});
   void* const handle = host::Receiver(port).Release();
-  host::MemoryStream stream;
+  MemoryStream stream;
   std::vector<long> closings;
   host::Progress progress([&](int percent) {
     if (percent >= GetParam() && closings.empty()) closings = {devapi::CloseReceiver(handle)};
@@ -88,7 +88,7 @@ TEST_P(ApiAwkwardVelmarDownload, IsAbortedBeforeTheFileComes) {
                         {{"A.log", host::Content(5000)}},
                         CBR_115200);
   const host::Report report;
-  host::MemoryStream stream;
+  MemoryStream stream;
   auto download = host::OnThread([&] { return receiver.Download(L"A.log", stream); });
   report.WaitFor(GetParam().line);
   devapi::Abort(receiver.get());
@@ -115,7 +115,7 @@ void WorkAndAbort(void* handle) {
       std::minstd_rand random(seed);
       while (!is_over) {
         const host::Event event;
-        host::MemoryStream stream;
+        MemoryStream stream;
         CReceiverInfo info{};
         wchar_t name[] = L"A.log";
         switch (random() % 5) {
@@ -163,7 +163,7 @@ void ExpectNothingIsLeft(const host::OpenReceiver& receiver) {
   EXPECT_EQ(receiver.Check(), -1);
   EXPECT_EQ(receiver.Identify().result, S_OK);
   EXPECT_EQ(host::TryLockElsewhere(receiver.get()), S_OK);
-  host::MemoryStream stream;
+  MemoryStream stream;
   EXPECT_EQ(receiver.Download(L"A.log", stream), S_OK);
   EXPECT_EQ(stream.bytes.size(), 20000U);
 }
@@ -223,7 +223,7 @@ TEST(ApiAwkwardMoments, QuorinDownloadIsAbortedWithItsLastBlock) {
   const bed::SimulatedPort port({"quorin", "--reply-silence", "0.3:set,cur/term/rate"},
                                 {{"A.log", host::Content(1500)}});
   const host::Receiver receiver(port);
-  host::MemoryStream stream;
+  MemoryStream stream;
   host::Progress progress([&](int percent) {
     if (percent == 100) devapi::Abort(receiver.get());
   });
@@ -236,7 +236,7 @@ TEST(ApiAwkwardMoments, VelmarDownloadIsAbortedTwice) {
   // In pieces with pauses, for time to abort; answers come in one piece.
   host::Velmar receiver({"--pieces", "1000", "--piece-gap", "50", "--reply-silence", "0.3:COM"},
                         {{"A.log", host::Content(600000)}});
-  host::MemoryStream stream;
+  MemoryStream stream;
   auto download = host::OnThread([&] { return receiver.Download(L"A.log", stream); });
   receiver.port.WaitForTranscript(" offset=2048 ");
   devapi::Abort(receiver.get());
@@ -254,7 +254,7 @@ TEST(ApiAwkwardMoments, VelmarDownloadIsAbortedTwice) {
 // A receiver that never answers the command that raises its speed.
 TEST(ApiAwkwardMoments, AbortEndsTheRaisingOfTheSpeed) {
   host::Velmar receiver({"--mute", "COM"}, {{"A.log", "content"}});
-  host::MemoryStream stream;
+  MemoryStream stream;
   const host::Report report;
   auto download = host::OnThread([&] { return receiver.Download(L"A.log", stream); });
   report.WaitFor("CSetPortParamsCmd::CSetPortParamsCmd");
@@ -286,7 +286,7 @@ TEST(ApiAwkwardMoments, QuorinDownloadIsAbortedInItsFirstCommand) {
   bed::SimulatedPort port({"quorin", "--speed", "115200"}, {{"A.log", "content"}});
   const host::Receiver receiver(port, CBR_115200);
   const host::Report report;
-  host::MemoryStream stream;
+  MemoryStream stream;
   port.Pause();
   auto download = host::OnThread([&] { return receiver.Download(L"A.log", stream); });
   report.WaitFor(kQuorinReads);

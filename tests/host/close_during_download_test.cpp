@@ -56,7 +56,7 @@ class HeldDownload : public testing::TestWithParam<int> {
   const bed::SimulatedPort port_{{"quorin"}, {{"A.log", content_}}};
   void* const handle_ = host::Receiver(port_).Release();
   const host::Report report_;
-  host::MemoryStream stream_;
+  MemoryStream stream_;
   host::GatedProgress held_{GetParam()};
   std::future<long> download_;
 };
@@ -111,7 +111,7 @@ INSTANTIATE_TEST_SUITE_P(Percents, ApiCloseOfOneOfTwoUsers, testing::Values(50))
 TEST(ApiCloseDuringTransfer, EndsIt) {
   const bed::SimulatedPort port({"quorin", "--pace"}, {{"A.log", host::Content(300000)}});
   void* const handle = host::Receiver(port).Release();
-  host::MemoryStream stream;
+  MemoryStream stream;
   auto download = host::OnThread([&] {
     wchar_t name[] = L"A.log";
     return devapi::DownloadFile(handle, name, &stream, nullptr);

@@ -63,7 +63,7 @@ TEST(ApiUnoffered, OperationsAreRefusedWithoutACommand) {
   wchar_t name[] = L"A.log";
   wchar_t new_name[] = L"B.log";
   CFileInfo info{};
-  host::MemoryStream stream;
+  MemoryStream stream;
   host::Progress progress;
   EXPECT_EQ(devapi::RenameFile(receiver.get(), name, new_name), E_NOTIMPL);
   EXPECT_EQ(devapi::RenameFile(receiver.get(), nullptr, nullptr), E_NOTIMPL);

@@ -53,7 +53,7 @@ class DownloadToAbort {
     EXPECT_EQ(identity.model, L"HVA3-G3T");
   }
   void ExpectNextDownloadWorks() {
-    host::MemoryStream next;
+    MemoryStream next;
     EXPECT_EQ(receiver_.Download(L"B.log", next), S_OK);
     EXPECT_EQ(next.bytes, "next");
   }
@@ -61,7 +61,7 @@ class DownloadToAbort {
   const std::string content_;
   bed::SimulatedPort port_;
   const host::Receiver receiver_;
-  host::MemoryStream stream_;
+  MemoryStream stream_;
 };
 
 class ApiDownloadAbort : public DownloadToAbort, public testing::Test {};
@@ -183,7 +183,7 @@ TEST(ApiDownloadAbortOfDeafReceiver, GoesBackToItsSpeed) {
   const bed::SimulatedPort port({"quorin", "--keep-speed"}, {{"A.log", "a"}});
   const host::Receiver receiver(port);
   const host::Report report;
-  host::MemoryStream stream;
+  MemoryStream stream;
   auto download = host::OnThread([&] { return receiver.Download(L"A.log", stream); });
   report.WaitFor("CSerialConnection::SetSpeed - changing of baudrate [9600 -> 115200]");
   // One wait is over: the one for the name of the port.

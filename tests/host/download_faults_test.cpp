@@ -44,7 +44,7 @@ class FaultyDownload : public testing::TestWithParam<Fault> {
   const bed::SimulatedPort port_{Arguments(GetParam().switches), {{"A.log", content_}}};
   const host::Receiver receiver_{port_, CBR_115200};
   const host::Report report_;
-  host::MemoryStream stream_;
+  MemoryStream stream_;
   host::Progress progress_;
 };
 
@@ -120,7 +120,7 @@ TEST_P(ApiDownloadEnds, WithAClearResult) {
   const bed::SimulatedPort port(arguments, {{"A.log", content}, {"B.log", "next"}});
   const host::Receiver receiver(port, speed);
   const host::Report report;
-  host::MemoryStream stream;
+  MemoryStream stream;
   EXPECT_EQ(receiver.Download(L"A.log", stream), GetParam().result);
 
   EXPECT_TRUE(stream.bytes == content.substr(0, GetParam().blocks * 512));
@@ -131,7 +131,7 @@ TEST_P(ApiDownloadEnds, WithAClearResult) {
     EXPECT_EQ(receiver.WireSince().back(), "= speed 9600") << "the speed was not put back";
   }
 
-  host::MemoryStream next;
+  MemoryStream next;
   EXPECT_EQ(receiver.Download(L"B.log", next), S_OK);
   EXPECT_EQ(next.bytes, "next");
   receiver.WaitForLastSent(speed == CBR_115200 ? "#" : R"(%#%set,cur/term/rate,9600\r\n)");

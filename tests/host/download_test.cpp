@@ -59,7 +59,7 @@ TEST_P(ApiDownloadOf, DeliversEveryByte) {
   const std::string content = host::Content(size);
   const bed::SimulatedPort port({"quorin", "--speed", "115200"}, {{"A0101.log", content}});
   const host::Receiver receiver(port, CBR_115200);
-  host::MemoryStream stream;
+  MemoryStream stream;
   host::Progress progress;
   EXPECT_EQ(receiver.Download(L"A0101.log", stream, &progress), S_OK);
 
@@ -80,7 +80,7 @@ TEST(ApiDownload, TracesItsSteps) {
   const bed::SimulatedPort port({"quorin"}, {{"A.log", host::Content(20000)}});
   const host::Receiver receiver(port);
   const host::Report report;
-  host::MemoryStream stream;
+  MemoryStream stream;
   EXPECT_EQ(receiver.Download(L"A.log", stream), S_OK);
   EXPECT_EQ(stream.bytes.size(), 20000U);
   const char* const reading = "CQuorinCommand::Execute - start reading. Timeout is [30000 msec]";
@@ -112,7 +112,7 @@ TEST(ApiDownload, RaisesTheSpeedAndPutsItBack) {
   const bed::SimulatedPort port({"quorin", "--port-letter", "b", "--speed", "19200"},
                                 {{"A.log", host::Content(20000)}});
   const host::Receiver receiver(port, CBR_19200);
-  host::MemoryStream stream;
+  MemoryStream stream;
   EXPECT_EQ(receiver.Download(L"A.log", stream), S_OK);
   EXPECT_TRUE(stream.bytes == host::Content(20000));
 
@@ -132,7 +132,7 @@ TEST(ApiDownload, TwoInARowAreTheSame) {
   const bed::SimulatedPort port({"quorin", "--speed", "57600"}, {{"A.log", host::Content(1500)}});
   const host::Receiver receiver(port, CBR_57600);
   for (int i = 0; i < 2; ++i) {
-    host::MemoryStream stream;
+    MemoryStream stream;
     EXPECT_EQ(receiver.Download(L"A.log", stream), S_OK);
     EXPECT_TRUE(stream.bytes == host::Content(1500));
   }
@@ -149,8 +149,8 @@ TEST(ApiDownload, RunsOnTwoPortsAtOnce) {
   const host::Receiver receiver(first, CBR_115200);
   const host::Receiver other(second, CBR_115200);
   host::GatedProgress held(50);
-  host::MemoryStream stream;
-  host::MemoryStream other_stream;
+  MemoryStream stream;
+  MemoryStream other_stream;
   auto download =
       host::OnThread([&] { return receiver.Download(L"A.log", stream, &held.progress); });
   ASSERT_TRUE(held.gate.WaitForArrival());
@@ -167,7 +167,7 @@ TEST(ApiDownload, PercentsFollowTheReportedSize) {
   const bed::SimulatedPort port({"quorin", "--speed", "115200", "--lie-size", "A.log=256"},
                                 {{"A.log", host::Content(8000)}});
   const host::Receiver receiver(port, CBR_115200);
-  host::MemoryStream stream;
+  MemoryStream stream;
   host::Progress progress;
   EXPECT_EQ(receiver.Download(L"A.log", stream, &progress), S_OK);
   EXPECT_TRUE(stream.bytes == host::Content(8000));
@@ -178,7 +178,7 @@ TEST(ApiDownload, LastBlockMayBeEmpty) {
   const bed::SimulatedPort port({"quorin", "--speed", "115200", "--empty-last-block"},
                                 {{"A.log", host::Content(2 * kBlock)}});
   const host::Receiver receiver(port, CBR_115200);
-  host::MemoryStream stream;
+  MemoryStream stream;
   EXPECT_EQ(receiver.Download(L"A.log", stream), S_OK);
   EXPECT_TRUE(stream.bytes == host::Content(2 * kBlock));
   port.WaitForTranscript("\n> #\n");
@@ -189,7 +189,7 @@ TEST(ApiDownload, EmptyFileFails) {
   const bed::SimulatedPort port({"quorin"}, {{"A.log", ""}});
   const host::Receiver receiver(port);
   const host::Report report;
-  host::MemoryStream stream;
+  MemoryStream stream;
   host::Progress progress;
   EXPECT_EQ(receiver.Download(L"A.log", stream, &progress), E_FAIL);
   EXPECT_EQ(stream.writes, 0U);
@@ -206,7 +206,7 @@ TEST(ApiDownload, UnknownFileFails) {
   const bed::SimulatedPort port({"quorin"}, {{"A.log", "abc"}});
   const host::Receiver receiver(port);
   const host::Report report;
-  host::MemoryStream stream;
+  MemoryStream stream;
   EXPECT_EQ(receiver.Download(L"B.log", stream), host::kNotConnected);
   EXPECT_EQ(stream.writes, 0U);
   EXPECT_TRUE(
@@ -219,7 +219,7 @@ TEST(ApiDownload, UnknownFileFails) {
 TEST(ApiDownload, RefusedGetFails) {
   const bed::SimulatedPort port({"quorin", "--refuse", "get"}, {{"A.log", "abc"}});
   const host::Receiver receiver(port);
-  host::MemoryStream stream;
+  MemoryStream stream;
   host::Progress progress;
   EXPECT_EQ(receiver.Download(L"A.log", stream, &progress), host::kNotConnected);
   EXPECT_THAT(progress.percents(), ElementsAre(0));
@@ -231,7 +231,7 @@ TEST(ApiDownload, RefusedGetFails) {
 TEST(ApiDownload, FailingStreamEndsItWithoutAFailure) {
   const bed::SimulatedPort port({"quorin", "--speed", "115200"}, {{"A.log", host::Content(9000)}});
   const host::Receiver receiver(port, CBR_115200);
-  host::MemoryStream stream;
+  MemoryStream stream;
   stream.fail_at_write = 3;
   host::Progress progress;
   EXPECT_EQ(receiver.Download(L"A.log", stream, &progress), S_OK);

@@ -134,7 +134,7 @@ TEST(ApiFileList, NamesBeyondAsciiAreConverted) {
   expected.resize(static_cast<size_t>(length));
   EXPECT_EQ(list.At(0).name, expected);
 
-  host::MemoryStream stream;
+  MemoryStream stream;
   EXPECT_EQ(receiver.Download(list.At(0).name, stream), S_OK);
   EXPECT_EQ(stream.bytes, content);
 }

@@ -21,7 +21,7 @@ void ExpectUnknown(void* handle) {
   short answer = 7;
   CReceiverInfo info{};
   CFileInfo file{};
-  host::MemoryStream stream;
+  MemoryStream stream;
   void* list = nullptr;
   EXPECT_EQ(devapi::GetReceiverInfo(handle, nullptr, &info), E_INVALIDARG);
   EXPECT_EQ(devapi::CheckConnection(handle, nullptr, &answer), E_INVALIDARG);
@@ -138,7 +138,7 @@ TEST(ApiHandles, RefuseMissingArguments) {
   const host::Receiver receiver(port);
   void* const handle = receiver.get();
   const size_t before = port.Transcript().size();
-  host::MemoryStream stream;
+  MemoryStream stream;
   wchar_t name[] = L"A.log";
   EXPECT_EQ(devapi::GetReceiverInfo(handle, nullptr, nullptr), E_INVALIDARG);
   EXPECT_EQ(devapi::CheckConnection(handle, nullptr, nullptr), E_INVALIDARG);

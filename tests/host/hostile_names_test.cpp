@@ -40,12 +40,12 @@ TEST_F(ApiHostileNames, AreNotDeleted) {
 
 TEST_F(ApiHostileNames, AreNotDownloaded) {
   for (const std::wstring& name : NastyNames()) {
-    host::MemoryStream stream;
+    MemoryStream stream;
     EXPECT_EQ(receiver_.Download(name, stream), host::kNotConnected)
         << testing::PrintToString(name.substr(0, 50));
     EXPECT_EQ(stream.writes, 0U);
   }
-  host::MemoryStream stream;
+  MemoryStream stream;
   EXPECT_EQ(receiver_.Download(L"A.log", stream), S_OK);
   EXPECT_EQ(stream.bytes, "content");
 }

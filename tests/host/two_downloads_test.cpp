@@ -12,11 +12,11 @@
 
 #include "rcvlink.h"
 #include "tests/host/support/lock.h"
-#include "tests/host/support/memory_stream.h"
 #include "tests/host/support/progress.h"
 #include "tests/host/support/receiver.h"
 #include "tests/host/support/report.h"
 #include "tests/host/support/velmar.h"
+#include "tests/support/memory_stream.h"
 
 using host::TryLockElsewhere;
 using testing::AnyOf;
@@ -36,7 +36,7 @@ Files TwoFiles() {
 
 // Stops after some of the file has arrived. The download then holds the receiver's lock, and no
 // other.
-class HeldStream : public host::MemoryStream {
+class HeldStream : public MemoryStream {
  public:
   HRESULT STDMETHODCALLTYPE Write(const void* data, ULONG size, ULONG* written) override {
     const HRESULT result = MemoryStream::Write(data, size, written);
@@ -161,7 +161,7 @@ TYPED_TEST_SUITE(ApiTwoDownloads, Links, LinkName);
 TYPED_TEST(ApiTwoDownloads, TakeTurns) {
   constexpr auto kAWhile = std::chrono::milliseconds(300);
   HeldStream first;
-  host::MemoryStream second;
+  MemoryStream second;
   auto download = host::OnThread([&] { return this->Download(L"A.log", first); });
   ASSERT_TRUE(first.gate.WaitForArrival());
   const size_t told = this->report_.Lines().size();
@@ -185,7 +185,7 @@ TYPED_TEST(ApiTwoDownloads, TakeTurns) {
 // The holder of the receiver comes first, then both downloads in any order.
 TYPED_TEST(ApiTwoDownloads, WaitForAHolderAndThenForEachOther) {
   ASSERT_EQ(devapi::LockConnection(this->link_.handle(), nullptr), S_OK);
-  host::MemoryStream streams[2];
+  MemoryStream streams[2];
   auto download = host::OnThread([&] { return this->Download(L"A.log", streams[0]); });
   this->report_.WaitFor("CAbstractReceiver::DownloadFile");
   const size_t told = this->report_.Lines().size();

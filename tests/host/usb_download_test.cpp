@@ -45,7 +45,7 @@ TEST(ApiUsbDownload, BringsTheFileWithoutTouchingAnySpeed) {
   const std::string content = host::Content(kSize);
   const bed::SimulatedUsb usb({"quorin"}, {{"A.log", content}});
   const host::UsbReceiver receiver(usb);
-  host::MemoryStream stream;
+  MemoryStream stream;
   EXPECT_EQ(receiver.Download(L"A.log", stream), S_OK);
   EXPECT_TRUE(stream.bytes == content);
   EXPECT_THAT(receiver.SentSince(),
@@ -67,7 +67,7 @@ TEST_P(ApiUsbDownloadOfSize, BringsTheFile) {
   const std::string content = host::Content(GetParam());
   const bed::SimulatedUsb usb({"quorin"}, {{"A.log", content}});
   const host::UsbReceiver receiver(usb);
-  host::MemoryStream stream;
+  MemoryStream stream;
   EXPECT_EQ(receiver.Download(L"A.log", stream), S_OK);
   EXPECT_TRUE(stream.bytes == content);
 }
@@ -94,7 +94,7 @@ TEST_P(ApiUsbDownloadOvercomes, ByAskingAgain) {
   const bed::SimulatedUsb usb(Arguments(GetParam().switches), {{"A.log", content}});
   const host::UsbReceiver receiver(usb);
   const host::Report report;
-  host::MemoryStream stream;
+  MemoryStream stream;
   EXPECT_EQ(receiver.Download(L"A.log", stream), S_OK);
   EXPECT_TRUE(stream.bytes == content);
   const std::string line = "CQuorinProtocol::DownloadOverUSB - " + GetParam().trace;
@@ -125,7 +125,7 @@ TEST_P(ApiUsbDownloadIgnores, WhatDoesNotTouchTheBlocks) {
   const std::string content = host::Content(kSeveralMb);
   const bed::SimulatedUsb usb(Arguments(GetParam().switches), {{"A.log", content}});
   const host::UsbReceiver receiver(usb);
-  host::MemoryStream stream;
+  MemoryStream stream;
   EXPECT_EQ(receiver.Download(L"A.log", stream), S_OK);
   EXPECT_TRUE(stream.bytes == content);
   const host::Lines sent = receiver.SentSince();
@@ -148,7 +148,7 @@ TEST(ApiUsbDownload, TakesBlocksInPiecesOfAnySize) {
   for (const char* const length : {"1", "7", "64", "511", "513", "4096"}) {
     const bed::SimulatedUsb usb({"quorin", "--transfer", length}, {{"A.log", content}});
     const host::UsbReceiver receiver(usb);
-    host::MemoryStream stream;
+    MemoryStream stream;
     EXPECT_EQ(receiver.Download(L"A.log", stream), S_OK) << length;
     EXPECT_TRUE(stream.bytes == content) << length;
   }
@@ -162,7 +162,7 @@ TEST(ApiUsbDownload, AllowsThreeTimeoutsInAll) {
   const bed::SimulatedUsb usb(
       {"quorin", "--lost-byte", "0", "--lost-byte", "2", "--lost-byte", "4"}, {{"A.log", content}});
   const host::UsbReceiver receiver(usb);
-  host::MemoryStream stream;
+  MemoryStream stream;
   EXPECT_EQ(receiver.Download(L"A.log", stream), S_OK);
   EXPECT_TRUE(stream.bytes == content);
 }
@@ -173,7 +173,7 @@ TEST(ApiUsbDownload, TheFourthTimeoutEndsItWhereverItIs) {
       {"quorin", "--lost-byte", "0", "--lost-byte", "1", "--lost-byte", "3", "--lost-byte", "4"},
       {{"A.log", host::Content(kSize)}});
   const host::UsbReceiver receiver(usb);
-  host::MemoryStream stream;
+  MemoryStream stream;
   EXPECT_EQ(receiver.Download(L"A.log", stream), host::kTimedOut);
   EXPECT_EQ(stream.bytes.size(), 4U * 512);
   EXPECT_EQ(receiver.SentSince().back(), "#");
@@ -195,7 +195,7 @@ TEST(ApiUsbDownloadSettings, AnotherTypeIsAcceptedWithoutALine) {
   const ReadTimeout timeout(300, REG_BINARY);
   const bed::SimulatedUsb usb({"quorin", "--lost-byte", "0@4"}, {{"A.log", "a"}});
   const host::UsbReceiver receiver(usb);
-  host::MemoryStream stream;
+  MemoryStream stream;
   const DWORD start = GetTickCount();
   EXPECT_EQ(receiver.Download(L"A.log", stream), host::kTimedOut);
   EXPECT_LT(GetTickCount() - start, 20000U) << "it waited for the usual 30 s";
@@ -219,7 +219,7 @@ TEST(ApiUsbDownload, ReportsAtMostTwiceASecond) {
   const bed::SimulatedUsb usb({"quorin", "--block-silence", "2:0.8", "--block-silence", "15:0.8"},
                               {{"A.log", content}});
   const host::UsbReceiver receiver(usb);
-  host::MemoryStream stream;
+  MemoryStream stream;
   host::Progress progress;
   const DWORD start = GetTickCount();
   EXPECT_EQ(receiver.Download(L"A.log", stream, &progress), S_OK);
@@ -252,13 +252,13 @@ TEST_P(ApiUsbDownloadEnds, WithAClearResult) {
                               {{"A.log", host::Content(kSeveralMb)}, {"B.log", "next"}});
   const host::UsbReceiver receiver(usb);
   const host::Report report;
-  host::MemoryStream stream;
+  MemoryStream stream;
   EXPECT_EQ(receiver.Download(L"A.log", stream), GetParam().result);
   EXPECT_EQ(stream.bytes.size(), GetParam().blocks * 512);
   const size_t failed =
       report.LinesWith("CQuorinProtocol::DownloadFile - download [A.log] is failed").size();
   EXPECT_EQ(failed, FAILED(GetParam().result) ? 1U : 0U);
-  host::MemoryStream next;
+  MemoryStream next;
   EXPECT_EQ(receiver.Download(L"B.log", next), S_OK) << usb.Transcript();
   EXPECT_EQ(next.bytes, "next");
 }
@@ -280,7 +280,7 @@ TEST(ApiUsbDownload, PassesOnAFailureOfTheStream) {
   const bed::SimulatedUsb usb({"quorin"}, {{"A.log", host::Content(kSize)}});
   const host::UsbReceiver receiver(usb);
   const host::Report report;
-  host::MemoryStream stream;
+  MemoryStream stream;
   stream.fail_at_write = 2;
   EXPECT_EQ(receiver.Download(L"A.log", stream), STG_E_MEDIUMFULL);
   EXPECT_TRUE(report.Has("CQuorinProtocol::DownloadOverUSB - write to stream failed [0x80030070]"));
@@ -298,7 +298,7 @@ TEST_P(ApiUsbDownloadAbort, EndsItAtAnyBlock) {
   const host::UsbReceiver receiver(usb);
   const host::Report report;
   host::GatedProgress held(GetParam());
-  host::MemoryStream stream;
+  MemoryStream stream;
   auto download =
       host::OnThread([&] { return receiver.Download(L"A.log", stream, &held.progress); });
   ASSERT_TRUE(held.gate.WaitForArrival());
@@ -307,7 +307,7 @@ TEST_P(ApiUsbDownloadAbort, EndsItAtAnyBlock) {
   EXPECT_EQ(download.get(), S_FALSE);
   EXPECT_LT(stream.bytes.size(), content.size());
   EXPECT_TRUE(content.starts_with(stream.bytes));
-  host::MemoryStream next;
+  MemoryStream next;
   EXPECT_EQ(receiver.Download(L"B.log", next), S_OK) << usb.Transcript();
   EXPECT_EQ(next.bytes, "next");
 }
@@ -332,13 +332,13 @@ TEST(ApiUsbDownload, AnAbortAtManyMomentsEndsIt) {
   const host::UsbReceiver receiver(usb);
   for (size_t blocks = 1; blocks < 200; blocks += 9) {
     const size_t passed = usb.Transcript().size();
-    host::MemoryStream stream;
+    MemoryStream stream;
     auto download = host::OnThread([&] { return receiver.Download(L"A.log", stream); });
     WaitForBlock(usb, blocks, passed);
     EXPECT_EQ(devapi::Abort(receiver.get()), S_OK);
     ASSERT_EQ(download.get(), S_FALSE) << blocks;
     EXPECT_TRUE(content.starts_with(stream.bytes));
-    host::MemoryStream next;
+    MemoryStream next;
     ASSERT_EQ(receiver.Download(L"B.log", next), S_OK) << blocks;
     ASSERT_EQ(next.bytes, "next");
   }
@@ -349,7 +349,7 @@ TEST(ApiUsbDownload, AnAbortEndsTheWaitForASilentReceiver) {
                               {{"A.log", host::Content(kSize)}});
   const host::UsbReceiver receiver(usb);
   const host::Report report;
-  host::MemoryStream stream;
+  MemoryStream stream;
   const DWORD start = GetTickCount();
   auto download = host::OnThread([&] { return receiver.Download(L"A.log", stream); });
   usb.WaitForTranscript(R"(> \x06)");
@@ -368,7 +368,7 @@ TEST_P(ApiUsbUnplugged, IsAFailure) {
   bed::SimulatedUsb usb({"quorin"}, {{"A.log", host::Content(kSeveralMb)}});
   const host::UsbReceiver receiver(usb);
   host::GatedProgress held(GetParam());
-  host::MemoryStream stream;
+  MemoryStream stream;
   auto download =
       host::OnThread([&] { return receiver.Download(L"A.log", stream, &held.progress); });
   ASSERT_TRUE(held.gate.WaitForArrival());
@@ -385,7 +385,7 @@ INSTANTIATE_TEST_SUITE_P(Percents, ApiUsbUnplugged, testing::Values(0, 1, 2));
 TEST(ApiUsbDownload, EndsAtOnceWhenUnpluggedInAWait) {
   bed::SimulatedUsb usb({"quorin", "--block-silence", "1:3600"}, {{"A.log", host::Content(kSize)}});
   const host::UsbReceiver receiver(usb);
-  host::MemoryStream stream;
+  MemoryStream stream;
   const DWORD start = GetTickCount();
   auto download = host::OnThread([&] { return receiver.Download(L"A.log", stream); });
   usb.WaitForTranscript(R"(> \x06)");
@@ -403,7 +403,7 @@ TEST(ApiUsbDownload, WorksWhenPluggedInAgain) {
   }
   usb.Start({"quorin"});
   const host::UsbReceiver receiver(usb);
-  host::MemoryStream stream;
+  MemoryStream stream;
   EXPECT_EQ(receiver.Download(L"A.log", stream), S_OK);
 }
 

@@ -39,7 +39,7 @@ long List(const host::Receiver& receiver) { return host::FileList(receiver.get()
 long Identify(const host::Receiver& receiver) { return receiver.Identify().result; }
 
 long Download(const host::Receiver& receiver) {
-  host::MemoryStream stream;
+  MemoryStream stream;
   return receiver.Download(L"A.log", stream);
 }
 
@@ -76,7 +76,7 @@ TEST(ApiVanishingReceiver, EndsATransfer) {
   bed::SimulatedPort port({"quorin", "--vanish-after", "3"}, {{"A.log", host::Content(5000)}});
   {
     const host::Receiver receiver(port);
-    host::MemoryStream stream;
+    MemoryStream stream;
     const long result = receiver.Download(L"A.log", stream);
     EXPECT_TRUE(FAILED(result)) << result;
     EXPECT_TRUE(stream.bytes == host::Content(5000).substr(0, 4 * 512));

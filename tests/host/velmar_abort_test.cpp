@@ -61,7 +61,7 @@ class ApiVelmarAbortedDownload : public testing::Test {
   const DWORD speed_;
   host::Velmar receiver_{
       kSlowly, {{"A.log", host::Content(kEndless)}, {"B.log", "the next one"}}, speed_};
-  host::MemoryStream stream_;
+  MemoryStream stream_;
   const host::Report report_;
   std::future<long> download_;
 };
@@ -109,7 +109,7 @@ TEST_F(ApiVelmarAbortedDownloadAtFullSpeed, StopsTheReceiverWhenTheStreamFails) 
 TEST(ApiVelmarRefusedDownload, IsNotStopped) {
   for (const char* command : {"currentfile", "log filehdra", "log filetransferb"}) {
     host::Velmar receiver({"--refuse", command}, {{"A.log", "content"}}, CBR_115200);
-    host::MemoryStream stream;
+    MemoryStream stream;
     EXPECT_EQ(receiver.Download(L"A.log", stream), S_OK) << command;
     EXPECT_THAT(receiver.SentAndMoved(), Not(Contains(kStop))) << command;
   }

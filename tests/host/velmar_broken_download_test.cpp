@@ -60,7 +60,7 @@ class ApiVelmarBrokenDownload : public testing::TestWithParam<Behaviour> {
     EXPECT_THAT(receiver_.Names(), ElementsAre(L"A.log", L"B.log")) << receiver_.port.Transcript();
   }
   void ExpectNextDownloadWorks() {
-    host::MemoryStream next;
+    MemoryStream next;
     EXPECT_EQ(receiver_.Download(L"B.log", next), S_OK);
     EXPECT_EQ(next.bytes, "the next one") << receiver_.port.Transcript();
   }
@@ -75,7 +75,7 @@ class ApiVelmarBrokenDownload : public testing::TestWithParam<Behaviour> {
 
   const std::string content_ = host::Content(kEndless);
   host::Velmar receiver_{Switches(), {{"A.log", content_}, {"B.log", "the next one"}}};
-  host::MemoryStream stream_;
+  MemoryStream stream_;
 };
 
 // The result of putting the speed back replaces the failure.

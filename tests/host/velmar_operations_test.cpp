@@ -84,12 +84,13 @@ constexpr const char* kFilePieces[] = {"< log FILETRANSFERB seq=2 offset=0 len=1
 TEST(ApiVelmarDownload, RaisesTheSpeedAndPutsItBack) {
   const std::string content = host::Content(3000);
   Velmar receiver({}, {{"A.log", content}});
-  host::MemoryStream stream;
+  MemoryStream stream;
   host::Progress progress;
   EXPECT_EQ(receiver.Download(L"A.log", stream, &progress), S_OK);
   EXPECT_TRUE(stream.bytes == content);
   EXPECT_EQ(stream.writes, 3U);
   EXPECT_EQ(stream.other_calls, 2U) << "a reference is taken and given back";
+  EXPECT_EQ(stream.references, 1U);
   EXPECT_THAT(progress.percents(), ElementsAre(0, 34, 68, 100, 100));
   receiver.port.WaitForTranscript("= speed 9600\n");
   EXPECT_THAT(receiver.SentAndMoved(),
@@ -111,7 +112,7 @@ TEST(ApiVelmarDownload, RaisesTheSpeedAndPutsItBack) {
 TEST(ApiVelmarDownload, LeavesFullSpeedAlone) {
   const std::string content = host::Content(3000);
   Velmar receiver({}, {{"A.log", content}}, CBR_115200);
-  host::MemoryStream stream;
+  MemoryStream stream;
   EXPECT_EQ(receiver.Download(L"A.log", stream), S_OK);
   EXPECT_TRUE(stream.bytes == content);
   EXPECT_THAT(receiver.SentAndMoved(),
@@ -125,7 +126,7 @@ TEST(ApiVelmarDownload, LeavesFullSpeedAlone) {
 
 TEST(ApiVelmarDownload, OfAnUnknownFileIsASuccessWithoutBytes) {
   Velmar receiver({}, {{"A.log", "a"}}, CBR_115200);
-  host::MemoryStream stream;
+  MemoryStream stream;
   host::Progress progress;
   EXPECT_EQ(receiver.Download(L"B.log", stream, &progress), S_OK);
   EXPECT_EQ(stream.writes, 0U);
@@ -141,7 +142,7 @@ TEST(ApiVelmarDownload, AbortEndsItAndTheNextOperation) {
   Velmar receiver({"--pieces", "1000", "--piece-gap", "85", "--stop-for-commands"},
                   {{"A.log", content}, {"B.log", "b"}, {"C.log", "c"}},
                   CBR_115200);
-  host::MemoryStream stream;
+  MemoryStream stream;
   auto download = host::OnThread([&] { return receiver.Download(L"A.log", stream); });
   receiver.port.WaitForTranscript(" offset=2048 ");
   EXPECT_EQ(devapi::Abort(receiver.get()), S_OK);
@@ -197,7 +198,7 @@ TEST(ApiVelmarSettings, ChangeOneValueOfThePort) {
 TEST(ApiVelmarUnoffered, OperationsAreRefusedWithoutACommand) {
   const Velmar receiver({});
   CFileInfo info{};
-  host::MemoryStream stream;
+  MemoryStream stream;
   EXPECT_EQ(devapi::DCSetRcvRTSControl(receiver.get(), 1), E_NOTIMPL);
   EXPECT_EQ(devapi::UploadFile(receiver.get(), &info, &stream, nullptr), E_NOTIMPL);
   EXPECT_THAT(receiver.Sent(), IsEmpty());

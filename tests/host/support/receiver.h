@@ -11,11 +11,11 @@
 #include <utility>
 
 #include "rcvlink.h"
-#include "tests/host/support/memory_stream.h"
 #include "tests/host/support/progress.h"
 #include "tests/host/support/simulated_port.h"
 #include "tests/host/support/simulated_usb.h"
 #include "tests/host/support/wire.h"
+#include "tests/support/memory_stream.h"
 
 namespace host {
 
