@@ -12,6 +12,7 @@
 #include "platform/hresult.h"
 #include "simulator/quorin/receiver.h"
 #include "tests/quorin/block_stream.h"
+#include "tests/support/content.h"
 #include "tests/support/memory_stream.h"
 #include "tests/support/report_capture.h"
 #include "tests/support/usb_pipes.h"
@@ -27,7 +28,7 @@ class ApiUsb : public testing::Test {
  protected:
   static sim::FileStore OneFile() {
     sim::FileStore files;
-    files.Add("A0101.log", sim::ToBytes(TestContent(1300)), 600000000);
+    files.Add("A0101.log", sim::ToBytes(Content(1300)), 600000000);
     return files;
   }
   std::string Narrow() const { return {path.begin(), path.end()}; }
@@ -111,7 +112,7 @@ TEST_F(ApiUsb, DownloadsAFile) {
   MemoryStream stream;
   std::wstring name = L"A0101.log";
   EXPECT_EQ(devapi::DownloadFile(handle, name.data(), &stream, nullptr), S_OK);
-  EXPECT_TRUE(stream.bytes == TestContent(1300));
+  EXPECT_TRUE(stream.bytes == Content(1300));
   EXPECT_EQ(devapi::CloseReceiver(handle), S_OK);
   pipes.WaitUntilClosed();
   EXPECT_FALSE(receiver.in_transfer());

@@ -14,14 +14,4 @@ std::vector<std::string> Cli::LocalFiles() const {
   return names;
 }
 
-std::string Content(size_t size) {
-  std::string content(size, '\0');
-  uint32_t value = 12345;
-  for (char& byte : content) {
-    value = value * 1103515245 + 12345;
-    byte = static_cast<char>(value >> 24);
-  }
-  return content;
-}
-
 }  // namespace cli_run

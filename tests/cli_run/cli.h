@@ -12,6 +12,7 @@
 #include "tests/host/support/program.h"
 #include "tests/host/support/simulated_port.h"
 #include "tests/host/support/temp_folder.h"
+#include "tests/support/content.h"
 
 namespace cli_run {
 
@@ -56,9 +57,6 @@ class Cli : public testing::Test {
 
   bed::TempFolder folder;  // where the program runs
 };
-
-// Content of a size that tells one byte's place from another's.
-std::string Content(size_t size);
 
 }  // namespace cli_run
 

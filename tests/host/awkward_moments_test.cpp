@@ -16,6 +16,7 @@
 #include "tests/host/support/receiver.h"
 #include "tests/host/support/report.h"
 #include "tests/host/support/velmar.h"
+#include "tests/support/content.h"
 
 using testing::Contains;
 using testing::ElementsAre;
@@ -60,7 +61,7 @@ class ApiAwkwardProgress : public testing::TestWithParam<int> {};
 
 // The download's own thread closes the receiver while it holds locks of it.
 TEST_P(ApiAwkwardProgress, ReceiverIsClosed) {
-  const bed::SimulatedPort port({"quorin"}, {{"A.log", host::Content(1500)}});
+  const bed::SimulatedPort port({"quorin"}, {{"A.log", Content(1500)}});
   void* const handle = host::Receiver(port).Release();
   MemoryStream stream;
   std::vector<long> closings;
@@ -84,9 +85,8 @@ class ApiAwkwardVelmarDownload : public testing::TestWithParam<Silence> {};
 
 // After an abort before the file is requested, no command to stop the file is sent.
 TEST_P(ApiAwkwardVelmarDownload, IsAbortedBeforeTheFileComes) {
-  host::Velmar receiver({"--mute", std::string(GetParam().command) + "@1"},
-                        {{"A.log", host::Content(5000)}},
-                        CBR_115200);
+  host::Velmar receiver(
+      {"--mute", std::string(GetParam().command) + "@1"}, {{"A.log", Content(5000)}}, CBR_115200);
   const host::Report report;
   MemoryStream stream;
   auto download = host::OnThread([&] { return receiver.Download(L"A.log", stream); });
@@ -169,7 +169,7 @@ void ExpectNothingIsLeft(const host::OpenReceiver& receiver) {
 }
 
 TEST(ApiAwkwardMoments, ManyThreadsOnUsb) {
-  const bed::SimulatedUsb usb({"quorin"}, {{"A.log", host::Content(20000)}});
+  const bed::SimulatedUsb usb({"quorin"}, {{"A.log", Content(20000)}});
   const host::UsbReceiver receiver(usb);
   WorkAndAbort(receiver.get());
   ExpectNothingIsLeft(receiver);
@@ -221,7 +221,7 @@ TEST(ApiAwkwardMoments, SelfResettingEventEndsTheCheckOfAVelmarReceiver) {
 // download returns when both ends are at the old speed.
 TEST(ApiAwkwardMoments, QuorinDownloadIsAbortedWithItsLastBlock) {
   const bed::SimulatedPort port({"quorin", "--reply-silence", "0.3:set,cur/term/rate"},
-                                {{"A.log", host::Content(1500)}});
+                                {{"A.log", Content(1500)}});
   const host::Receiver receiver(port);
   MemoryStream stream;
   host::Progress progress([&](int percent) {
@@ -235,7 +235,7 @@ TEST(ApiAwkwardMoments, QuorinDownloadIsAbortedWithItsLastBlock) {
 TEST(ApiAwkwardMoments, VelmarDownloadIsAbortedTwice) {
   // In pieces with pauses, for time to abort; answers come in one piece.
   host::Velmar receiver({"--pieces", "1000", "--piece-gap", "50", "--reply-silence", "0.3:COM"},
-                        {{"A.log", host::Content(600000)}});
+                        {{"A.log", Content(600000)}});
   MemoryStream stream;
   auto download = host::OnThread([&] { return receiver.Download(L"A.log", stream); });
   receiver.port.WaitForTranscript(" offset=2048 ");

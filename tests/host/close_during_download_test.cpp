@@ -8,6 +8,7 @@
 #include "rcvlink.h"
 #include "tests/host/support/receiver.h"
 #include "tests/host/support/report.h"
+#include "tests/support/content.h"
 
 namespace {
 
@@ -52,7 +53,7 @@ class HeldDownload : public testing::TestWithParam<int> {
     EXPECT_EQ(again.Identify().model, L"HVA3-G3T");
   }
 
-  const std::string content_ = host::Content(kSize);
+  const std::string content_ = Content(kSize);
   const bed::SimulatedPort port_{{"quorin"}, {{"A.log", content_}}};
   void* const handle_ = host::Receiver(port_).Release();
   const host::Report report_;
@@ -109,7 +110,7 @@ INSTANTIATE_TEST_SUITE_P(Percents, ApiCloseOfOneOfTwoUsers, testing::Values(50))
 
 // Without a stop: whatever the download does at that moment, it ends.
 TEST(ApiCloseDuringTransfer, EndsIt) {
-  const bed::SimulatedPort port({"quorin", "--pace"}, {{"A.log", host::Content(300000)}});
+  const bed::SimulatedPort port({"quorin", "--pace"}, {{"A.log", Content(300000)}});
   void* const handle = host::Receiver(port).Release();
   MemoryStream stream;
   auto download = host::OnThread([&] {

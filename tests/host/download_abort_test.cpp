@@ -10,6 +10,7 @@
 #include "rcvlink.h"
 #include "tests/host/support/receiver.h"
 #include "tests/host/support/report.h"
+#include "tests/support/content.h"
 
 using testing::IsEmpty;
 
@@ -23,7 +24,7 @@ constexpr auto kPoll = std::chrono::milliseconds(5);
 class DownloadToAbort {
  protected:
   explicit DownloadToAbort(size_t size = kEndless)
-      : content_(host::Content(size)),
+      : content_(Content(size)),
         port_({"quorin", "--pace"}, {{"A.log", content_}, {"B.log", "next"}}),
         receiver_(port_) {}
 

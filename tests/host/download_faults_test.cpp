@@ -11,6 +11,7 @@
 #include "rcvlink.h"
 #include "tests/host/support/receiver.h"
 #include "tests/host/support/report.h"
+#include "tests/support/content.h"
 
 namespace {
 
@@ -40,7 +41,7 @@ class FaultyDownload : public testing::TestWithParam<Fault> {
     return host::CountOf(receiver_.SentSince(), what);
   }
 
-  const std::string content_ = host::Content(kSize);
+  const std::string content_ = Content(kSize);
   const bed::SimulatedPort port_{Arguments(GetParam().switches), {{"A.log", content_}}};
   const host::Receiver receiver_{port_, CBR_115200};
   const host::Report report_;
@@ -116,7 +117,7 @@ TEST_P(ApiDownloadEnds, WithAClearResult) {
   const DWORD speed = GetParam().speed;
   std::vector<std::string> arguments = {"quorin", "--speed", std::to_string(speed)};
   arguments.insert(arguments.end(), GetParam().switches.begin(), GetParam().switches.end());
-  const std::string content = host::Content(kSize);
+  const std::string content = Content(kSize);
   const bed::SimulatedPort port(arguments, {{"A.log", content}, {"B.log", "next"}});
   const host::Receiver receiver(port, speed);
   const host::Report report;

@@ -11,6 +11,7 @@
 #include "rcvlink.h"
 #include "tests/host/support/receiver.h"
 #include "tests/host/support/report.h"
+#include "tests/support/content.h"
 
 using testing::ElementsAre;
 using testing::ElementsAreArray;
@@ -56,7 +57,7 @@ class ApiDownloadOf : public testing::TestWithParam<size_t> {};
 
 TEST_P(ApiDownloadOf, DeliversEveryByte) {
   const size_t size = GetParam();
-  const std::string content = host::Content(size);
+  const std::string content = Content(size);
   const bed::SimulatedPort port({"quorin", "--speed", "115200"}, {{"A0101.log", content}});
   const host::Receiver receiver(port, CBR_115200);
   MemoryStream stream;
@@ -77,7 +78,7 @@ TEST_P(ApiDownloadOf, DeliversEveryByte) {
 INSTANTIATE_TEST_SUITE_P(Sizes, ApiDownloadOf, testing::Values(1, 511, 512, 513, 60000));
 
 TEST(ApiDownload, TracesItsSteps) {
-  const bed::SimulatedPort port({"quorin"}, {{"A.log", host::Content(20000)}});
+  const bed::SimulatedPort port({"quorin"}, {{"A.log", Content(20000)}});
   const host::Receiver receiver(port);
   const host::Report report;
   MemoryStream stream;
@@ -110,11 +111,11 @@ TEST(ApiDownload, TracesItsSteps) {
 
 TEST(ApiDownload, RaisesTheSpeedAndPutsItBack) {
   const bed::SimulatedPort port({"quorin", "--port-letter", "b", "--speed", "19200"},
-                                {{"A.log", host::Content(20000)}});
+                                {{"A.log", Content(20000)}});
   const host::Receiver receiver(port, CBR_19200);
   MemoryStream stream;
   EXPECT_EQ(receiver.Download(L"A.log", stream), S_OK);
-  EXPECT_TRUE(stream.bytes == host::Content(20000));
+  EXPECT_TRUE(stream.bytes == Content(20000));
 
   host::Lines expected = {R"(> %#%print,/cur/term\r\n)",
                           R"(< RE%#%/dev/ser/b\r\n)",
@@ -129,12 +130,12 @@ TEST(ApiDownload, RaisesTheSpeedAndPutsItBack) {
 }
 
 TEST(ApiDownload, TwoInARowAreTheSame) {
-  const bed::SimulatedPort port({"quorin", "--speed", "57600"}, {{"A.log", host::Content(1500)}});
+  const bed::SimulatedPort port({"quorin", "--speed", "57600"}, {{"A.log", Content(1500)}});
   const host::Receiver receiver(port, CBR_57600);
   for (int i = 0; i < 2; ++i) {
     MemoryStream stream;
     EXPECT_EQ(receiver.Download(L"A.log", stream), S_OK);
-    EXPECT_TRUE(stream.bytes == host::Content(1500));
+    EXPECT_TRUE(stream.bytes == Content(1500));
   }
   const host::Lines lines = receiver.WireSince();
   EXPECT_EQ(host::CountOf(lines, "= speed 115200"), 2U);
@@ -144,7 +145,7 @@ TEST(ApiDownload, TwoInARowAreTheSame) {
 // Two receivers, two threads: each gets its own file.
 TEST(ApiDownload, RunsOnTwoPortsAtOnce) {
   const std::vector<std::string> arguments = {"quorin", "--speed", "115200"};
-  const bed::SimulatedPort first(arguments, {{"A.log", host::Content(9000)}});
+  const bed::SimulatedPort first(arguments, {{"A.log", Content(9000)}});
   const bed::SimulatedPort second(arguments, {{"A.log", std::string(7000, 'x')}});
   const host::Receiver receiver(first, CBR_115200);
   const host::Receiver other(second, CBR_115200);
@@ -157,7 +158,7 @@ TEST(ApiDownload, RunsOnTwoPortsAtOnce) {
   EXPECT_EQ(other.Download(L"A.log", other_stream), S_OK) << "while the first stands still";
   held.gate.Open();
   EXPECT_EQ(download.get(), S_OK);
-  EXPECT_TRUE(stream.bytes == host::Content(9000));
+  EXPECT_TRUE(stream.bytes == Content(9000));
   EXPECT_TRUE(other_stream.bytes == std::string(7000, 'x'));
 }
 
@@ -165,22 +166,22 @@ TEST(ApiDownload, RunsOnTwoPortsAtOnce) {
 // downloaded.
 TEST(ApiDownload, PercentsFollowTheReportedSize) {
   const bed::SimulatedPort port({"quorin", "--speed", "115200", "--lie-size", "A.log=256"},
-                                {{"A.log", host::Content(8000)}});
+                                {{"A.log", Content(8000)}});
   const host::Receiver receiver(port, CBR_115200);
   MemoryStream stream;
   host::Progress progress;
   EXPECT_EQ(receiver.Download(L"A.log", stream, &progress), S_OK);
-  EXPECT_TRUE(stream.bytes == host::Content(8000));
+  EXPECT_TRUE(stream.bytes == Content(8000));
   EXPECT_THAT(progress.percents(), ElementsAreArray(ExpectedPercents(8000, 256)));
 }
 
 TEST(ApiDownload, LastBlockMayBeEmpty) {
   const bed::SimulatedPort port({"quorin", "--speed", "115200", "--empty-last-block"},
-                                {{"A.log", host::Content(2 * kBlock)}});
+                                {{"A.log", Content(2 * kBlock)}});
   const host::Receiver receiver(port, CBR_115200);
   MemoryStream stream;
   EXPECT_EQ(receiver.Download(L"A.log", stream), S_OK);
-  EXPECT_TRUE(stream.bytes == host::Content(2 * kBlock));
+  EXPECT_TRUE(stream.bytes == Content(2 * kBlock));
   port.WaitForTranscript("\n> #\n");
   EXPECT_EQ(host::CountOf(receiver.WireSince(), "< block type=04 len=0 bytes=518"), 1U);
 }
@@ -229,13 +230,13 @@ TEST(ApiDownload, RefusedGetFails) {
 
 // On a serial port a failure of the host's stream is not returned; the receiver is sent the end.
 TEST(ApiDownload, FailingStreamEndsItWithoutAFailure) {
-  const bed::SimulatedPort port({"quorin", "--speed", "115200"}, {{"A.log", host::Content(9000)}});
+  const bed::SimulatedPort port({"quorin", "--speed", "115200"}, {{"A.log", Content(9000)}});
   const host::Receiver receiver(port, CBR_115200);
   MemoryStream stream;
   stream.fail_at_write = 3;
   host::Progress progress;
   EXPECT_EQ(receiver.Download(L"A.log", stream, &progress), S_OK);
-  EXPECT_TRUE(stream.bytes == host::Content(9000).substr(0, 3 * kBlock));
+  EXPECT_TRUE(stream.bytes == Content(9000).substr(0, 3 * kBlock));
   EXPECT_EQ(stream.writes, 4U);
   EXPECT_LT(progress.percents().back(), 100);
   port.WaitForTranscript("\n> #\n");
@@ -245,7 +246,7 @@ TEST(ApiDownload, FailingStreamEndsItWithoutAFailure) {
 
   stream = {};
   EXPECT_EQ(receiver.Download(L"A.log", stream), S_OK);
-  EXPECT_TRUE(stream.bytes == host::Content(9000));
+  EXPECT_TRUE(stream.bytes == Content(9000));
 }
 
 }  // namespace

@@ -15,6 +15,7 @@
 #include "tests/host/support/file_list.h"
 #include "tests/host/support/receiver.h"
 #include "tests/host/support/report.h"
+#include "tests/support/content.h"
 
 using testing::ElementsAre;
 
@@ -64,7 +65,7 @@ class ApiFileListOf : public testing::TestWithParam<Amount> {};
 TEST_P(ApiFileListOf, HasNamesSizesAndTimes) {
   bed::TempFolder folder;
   for (size_t i = 0; i < GetParam().files; ++i) {
-    folder.Write(NumberedName(i), host::Content(i * i * 7));
+    folder.Write(NumberedName(i), Content(i * i * 7));
     SetModified(folder / NumberedName(i), kTime + static_cast<__time64_t>(i) * kTimeStep);
   }
   std::vector<std::string> arguments = {"quorin", "--folder", folder.unix_path()};
@@ -118,7 +119,7 @@ TEST(ApiFileList, TracesItsSteps) {
 TEST(ApiFileList, NamesBeyondAsciiAreConverted) {
   const std::u8string utf8 = u8"Gr\u00F6\u00DFe.log";
   const std::string bytes(utf8.begin(), utf8.end());
-  const std::string content = host::Content(700);
+  const std::string content = Content(700);
   const bed::SimulatedPort port({"quorin", "--speed", "115200"}, {{bytes, content}});
   const host::Receiver receiver(port, CBR_115200);
 

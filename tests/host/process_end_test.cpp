@@ -12,6 +12,7 @@
 #include "tests/host/support/receiver.h"
 #include "tests/host/support/report.h"
 #include "tests/host/support/simulated_port.h"
+#include "tests/support/content.h"
 
 using testing::ElementsAre;
 
@@ -54,7 +55,7 @@ TEST_F(ApiProcessEnd, ClosesAReceiver) {
 
 // The download also owns the receiver, and its thread is gone, so that ownership is never released.
 TEST_F(ApiProcessEnd, LeavesADownloadAsItIs) {
-  bed::SimulatedPort port({"quorin", "--pace"}, {{"A.log", host::Content(300000)}});
+  bed::SimulatedPort port({"quorin", "--pace"}, {{"A.log", Content(300000)}});
   RunHost(port, {"A.log"});
   EXPECT_THAT(LastLines(), ElementsAre("Bye!"));
 }

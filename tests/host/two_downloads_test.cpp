@@ -16,6 +16,7 @@
 #include "tests/host/support/receiver.h"
 #include "tests/host/support/report.h"
 #include "tests/host/support/velmar.h"
+#include "tests/support/content.h"
 #include "tests/support/memory_stream.h"
 
 using host::TryLockElsewhere;
@@ -30,8 +31,8 @@ constexpr size_t kSecondSize = 7001;
 using Files = std::map<std::string, std::string>;
 
 Files TwoFiles() {
-  std::string second = host::Content(kSecondSize + 1).substr(1);
-  return {{"A.log", host::Content(kFirstSize)}, {"B.log", std::move(second)}};
+  std::string second = Content(kSecondSize + 1).substr(1);
+  return {{"A.log", Content(kFirstSize)}, {"B.log", std::move(second)}};
 }
 
 // Stops after some of the file has arrived. The download then holds the receiver's lock, and no

@@ -13,6 +13,7 @@
 #include "rcvlink.h"
 #include "tests/host/support/receiver.h"
 #include "tests/host/support/report.h"
+#include "tests/support/content.h"
 #include "tests/support/user_settings.h"
 
 using testing::ElementsAre;
@@ -42,7 +43,7 @@ class ReadTimeout {
 };
 
 TEST(ApiUsbDownload, BringsTheFileWithoutTouchingAnySpeed) {
-  const std::string content = host::Content(kSize);
+  const std::string content = Content(kSize);
   const bed::SimulatedUsb usb({"quorin"}, {{"A.log", content}});
   const host::UsbReceiver receiver(usb);
   MemoryStream stream;
@@ -64,7 +65,7 @@ TEST(ApiUsbDownload, BringsTheFileWithoutTouchingAnySpeed) {
 class ApiUsbDownloadOfSize : public testing::TestWithParam<size_t> {};
 
 TEST_P(ApiUsbDownloadOfSize, BringsTheFile) {
-  const std::string content = host::Content(GetParam());
+  const std::string content = Content(GetParam());
   const bed::SimulatedUsb usb({"quorin"}, {{"A.log", content}});
   const host::UsbReceiver receiver(usb);
   MemoryStream stream;
@@ -90,7 +91,7 @@ class ApiUsbDownloadOvercomes : public testing::TestWithParam<Fault> {};
 
 TEST_P(ApiUsbDownloadOvercomes, ByAskingAgain) {
   const ReadTimeout timeout(kShortTimeoutMs);
-  const std::string content = host::Content(kSeveralMb);
+  const std::string content = Content(kSeveralMb);
   const bed::SimulatedUsb usb(Arguments(GetParam().switches), {{"A.log", content}});
   const host::UsbReceiver receiver(usb);
   const host::Report report;
@@ -122,7 +123,7 @@ INSTANTIATE_TEST_SUITE_P(
 class ApiUsbDownloadIgnores : public testing::TestWithParam<Fault> {};
 
 TEST_P(ApiUsbDownloadIgnores, WhatDoesNotTouchTheBlocks) {
-  const std::string content = host::Content(kSeveralMb);
+  const std::string content = Content(kSeveralMb);
   const bed::SimulatedUsb usb(Arguments(GetParam().switches), {{"A.log", content}});
   const host::UsbReceiver receiver(usb);
   MemoryStream stream;
@@ -144,7 +145,7 @@ INSTANTIATE_TEST_SUITE_P(
     [](const auto& fault) { return fault.param.name; });
 
 TEST(ApiUsbDownload, TakesBlocksInPiecesOfAnySize) {
-  const std::string content = host::Content(20000);
+  const std::string content = Content(20000);
   for (const char* const length : {"1", "7", "64", "511", "513", "4096"}) {
     const bed::SimulatedUsb usb({"quorin", "--transfer", length}, {{"A.log", content}});
     const host::UsbReceiver receiver(usb);
@@ -158,7 +159,7 @@ TEST(ApiUsbDownload, TakesBlocksInPiecesOfAnySize) {
 
 TEST(ApiUsbDownload, AllowsThreeTimeoutsInAll) {
   const ReadTimeout timeout(kShortTimeoutMs);
-  const std::string content = host::Content(kSize);
+  const std::string content = Content(kSize);
   const bed::SimulatedUsb usb(
       {"quorin", "--lost-byte", "0", "--lost-byte", "2", "--lost-byte", "4"}, {{"A.log", content}});
   const host::UsbReceiver receiver(usb);
@@ -171,7 +172,7 @@ TEST(ApiUsbDownload, TheFourthTimeoutEndsItWhereverItIs) {
   const ReadTimeout timeout(kShortTimeoutMs);
   const bed::SimulatedUsb usb(
       {"quorin", "--lost-byte", "0", "--lost-byte", "1", "--lost-byte", "3", "--lost-byte", "4"},
-      {{"A.log", host::Content(kSize)}});
+      {{"A.log", Content(kSize)}});
   const host::UsbReceiver receiver(usb);
   MemoryStream stream;
   EXPECT_EQ(receiver.Download(L"A.log", stream), host::kTimedOut);
@@ -214,7 +215,7 @@ TEST(ApiUsbDownloadSettings, WithoutAValueNothingIsTraced) {
 
 TEST(ApiUsbDownload, ReportsAtMostTwiceASecond) {
   constexpr size_t kTwentyBlocks = 10000;
-  const std::string content = host::Content(kTwentyBlocks);
+  const std::string content = Content(kTwentyBlocks);
   // Some blocks come more than half a second after the previous one.
   const bed::SimulatedUsb usb({"quorin", "--block-silence", "2:0.8", "--block-silence", "15:0.8"},
                               {{"A.log", content}});
@@ -249,7 +250,7 @@ class ApiUsbDownloadEnds : public testing::TestWithParam<Ending> {};
 TEST_P(ApiUsbDownloadEnds, WithAClearResult) {
   const ReadTimeout timeout(kShortTimeoutMs);
   const bed::SimulatedUsb usb(Arguments(GetParam().switches),
-                              {{"A.log", host::Content(kSeveralMb)}, {"B.log", "next"}});
+                              {{"A.log", Content(kSeveralMb)}, {"B.log", "next"}});
   const host::UsbReceiver receiver(usb);
   const host::Report report;
   MemoryStream stream;
@@ -277,7 +278,7 @@ INSTANTIATE_TEST_SUITE_P(
 
 // Over USB a failure of the host's stream is returned, unlike on a serial port.
 TEST(ApiUsbDownload, PassesOnAFailureOfTheStream) {
-  const bed::SimulatedUsb usb({"quorin"}, {{"A.log", host::Content(kSize)}});
+  const bed::SimulatedUsb usb({"quorin"}, {{"A.log", Content(kSize)}});
   const host::UsbReceiver receiver(usb);
   const host::Report report;
   MemoryStream stream;
@@ -293,7 +294,7 @@ class ApiUsbDownloadAbort : public testing::TestWithParam<int> {};
 
 // The download is stopped in its progress function while the abort comes.
 TEST_P(ApiUsbDownloadAbort, EndsItAtAnyBlock) {
-  const std::string content = host::Content(kSeveralMb);
+  const std::string content = Content(kSeveralMb);
   const bed::SimulatedUsb usb({"quorin"}, {{"A.log", content}, {"B.log", "next"}});
   const host::UsbReceiver receiver(usb);
   const host::Report report;
@@ -327,7 +328,7 @@ void WaitForBlock(const bed::SimulatedUsb& usb, size_t number, size_t place) {
 
 // At any moment: in the middle of a wait, of a write, or between two steps.
 TEST(ApiUsbDownload, AnAbortAtManyMomentsEndsIt) {
-  const std::string content = host::Content(kSeveralMb);
+  const std::string content = Content(kSeveralMb);
   const bed::SimulatedUsb usb({"quorin"}, {{"A.log", content}, {"B.log", "next"}});
   const host::UsbReceiver receiver(usb);
   for (size_t blocks = 1; blocks < 200; blocks += 9) {
@@ -345,8 +346,7 @@ TEST(ApiUsbDownload, AnAbortAtManyMomentsEndsIt) {
 }
 
 TEST(ApiUsbDownload, AnAbortEndsTheWaitForASilentReceiver) {
-  const bed::SimulatedUsb usb({"quorin", "--block-silence", "1:3600"},
-                              {{"A.log", host::Content(kSize)}});
+  const bed::SimulatedUsb usb({"quorin", "--block-silence", "1:3600"}, {{"A.log", Content(kSize)}});
   const host::UsbReceiver receiver(usb);
   const host::Report report;
   MemoryStream stream;
@@ -365,7 +365,7 @@ TEST(ApiUsbDownload, AnAbortEndsTheWaitForASilentReceiver) {
 class ApiUsbUnplugged : public testing::TestWithParam<int> {};
 
 TEST_P(ApiUsbUnplugged, IsAFailure) {
-  bed::SimulatedUsb usb({"quorin"}, {{"A.log", host::Content(kSeveralMb)}});
+  bed::SimulatedUsb usb({"quorin"}, {{"A.log", Content(kSeveralMb)}});
   const host::UsbReceiver receiver(usb);
   host::GatedProgress held(GetParam());
   MemoryStream stream;
@@ -383,7 +383,7 @@ TEST_P(ApiUsbUnplugged, IsAFailure) {
 INSTANTIATE_TEST_SUITE_P(Percents, ApiUsbUnplugged, testing::Values(0, 1, 2));
 
 TEST(ApiUsbDownload, EndsAtOnceWhenUnpluggedInAWait) {
-  bed::SimulatedUsb usb({"quorin", "--block-silence", "1:3600"}, {{"A.log", host::Content(kSize)}});
+  bed::SimulatedUsb usb({"quorin", "--block-silence", "1:3600"}, {{"A.log", Content(kSize)}});
   const host::UsbReceiver receiver(usb);
   MemoryStream stream;
   const DWORD start = GetTickCount();

@@ -11,6 +11,7 @@
 #include "tests/host/support/file_list.h"
 #include "tests/host/support/receiver.h"
 #include "tests/host/support/report.h"
+#include "tests/support/content.h"
 
 namespace {
 
@@ -73,13 +74,13 @@ INSTANTIATE_TEST_SUITE_P(Operations,
                          OperationName);
 
 TEST(ApiVanishingReceiver, EndsATransfer) {
-  bed::SimulatedPort port({"quorin", "--vanish-after", "3"}, {{"A.log", host::Content(5000)}});
+  bed::SimulatedPort port({"quorin", "--vanish-after", "3"}, {{"A.log", Content(5000)}});
   {
     const host::Receiver receiver(port);
     MemoryStream stream;
     const long result = receiver.Download(L"A.log", stream);
     EXPECT_TRUE(FAILED(result)) << result;
-    EXPECT_TRUE(stream.bytes == host::Content(5000).substr(0, 4 * 512));
+    EXPECT_TRUE(stream.bytes == Content(5000).substr(0, 4 * 512));
   }
   port.Kill();
   port.Start({"quorin"});

@@ -13,6 +13,7 @@
 #include "tests/host/support/receiver.h"
 #include "tests/host/support/report.h"
 #include "tests/host/support/velmar.h"
+#include "tests/support/content.h"
 
 using testing::Contains;
 using testing::ElementsAre;
@@ -60,7 +61,7 @@ class ApiVelmarAbortedDownload : public testing::Test {
 
   const DWORD speed_;
   host::Velmar receiver_{
-      kSlowly, {{"A.log", host::Content(kEndless)}, {"B.log", "the next one"}}, speed_};
+      kSlowly, {{"A.log", Content(kEndless)}, {"B.log", "the next one"}}, speed_};
   MemoryStream stream_;
   const host::Report report_;
   std::future<long> download_;

@@ -14,6 +14,7 @@
 #include "rcvlink.h"
 #include "tests/host/support/receiver.h"
 #include "tests/host/support/velmar.h"
+#include "tests/support/content.h"
 
 using testing::ElementsAre;
 
@@ -73,7 +74,7 @@ class ApiVelmarBrokenDownload : public testing::TestWithParam<Behaviour> {
     return switches;
   }
 
-  const std::string content_ = host::Content(kEndless);
+  const std::string content_ = Content(kEndless);
   host::Velmar receiver_{Switches(), {{"A.log", content_}, {"B.log", "the next one"}}};
   MemoryStream stream_;
 };

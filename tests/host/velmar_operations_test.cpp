@@ -15,6 +15,7 @@
 #include "tests/host/support/file_list.h"
 #include "tests/host/support/receiver.h"
 #include "tests/host/support/velmar.h"
+#include "tests/support/content.h"
 
 using host::Velmar;
 using testing::ElementsAre;
@@ -55,7 +56,7 @@ TEST(ApiVelmarFileList, HasNamesSizesAndTimes) {
   // Year, month, no day of the week, day, hour, minute, second, no milliseconds.
   const SYSTEMTIME times[] = {{2024, 2, 0, 29, 23, 59, 58, 0}, {2023, 12, 0, 1, 0, 2, 3, 0}};
   const bed::TempFolder folder;
-  folder.Write("A.log", host::Content(1025));
+  folder.Write("A.log", Content(1025));
   folder.Write("B.log", "");
   SetModified(folder / "A.log", times[0]);
   SetModified(folder / "B.log", times[1]);
@@ -82,7 +83,7 @@ constexpr const char* kFilePieces[] = {"< log FILETRANSFERB seq=2 offset=0 len=1
                                        "< log FILETRANSFERB seq=0 offset=2048 len=960 bytes=992"};
 
 TEST(ApiVelmarDownload, RaisesTheSpeedAndPutsItBack) {
-  const std::string content = host::Content(3000);
+  const std::string content = Content(3000);
   Velmar receiver({}, {{"A.log", content}});
   MemoryStream stream;
   host::Progress progress;
@@ -110,7 +111,7 @@ TEST(ApiVelmarDownload, RaisesTheSpeedAndPutsItBack) {
 }
 
 TEST(ApiVelmarDownload, LeavesFullSpeedAlone) {
-  const std::string content = host::Content(3000);
+  const std::string content = Content(3000);
   Velmar receiver({}, {{"A.log", content}}, CBR_115200);
   MemoryStream stream;
   EXPECT_EQ(receiver.Download(L"A.log", stream), S_OK);
@@ -138,7 +139,7 @@ TEST(ApiVelmarDownload, OfAnUnknownFileIsASuccessWithoutBytes) {
 TEST(ApiVelmarDownload, AbortEndsItAndTheNextOperation) {
   constexpr size_t kHalfAMinuteAndMore = 600000;
   constexpr auto kMuchLess = std::chrono::seconds(10);
-  const std::string content = host::Content(kHalfAMinuteAndMore);
+  const std::string content = Content(kHalfAMinuteAndMore);
   Velmar receiver({"--pieces", "1000", "--piece-gap", "85", "--stop-for-commands"},
                   {{"A.log", content}, {"B.log", "b"}, {"C.log", "c"}},
                   CBR_115200);

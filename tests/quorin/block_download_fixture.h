@@ -14,6 +14,7 @@
 #include "platform/hresult.h"
 #include "tests/quorin/block_stream.h"
 #include "tests/quorin/quorin_driver.h"
+#include "tests/support/content.h"
 #include "tests/support/manual_clock.h"
 #include "tests/support/memory_stream.h"
 #include "tests/support/report_capture.h"
@@ -113,7 +114,7 @@ class QuorinBlockDownloadTest : public QuorinDriverTest {
   }
 
   const Link link;
-  const std::string content = TestContent(1100);
+  const std::string content = Content(1100);
   BlockStream blocks;
   MemoryStream stream;
   ManualClock clock;

@@ -14,6 +14,7 @@
 
 #include "platform/hresult.h"
 #include "tests/quorin/block_download_fixture.h"
+#include "tests/support/content.h"
 
 using rcvlink::kNotConnected;
 using rcvlink::kTimedOut;
@@ -280,7 +281,7 @@ TEST_P(QuorinBlockDownload, KeepsTheChecksumOfTheLastAcceptedBlock) {
   const uint16_t accepted = blocks.crc();
   // Rejected, although the next block would fit its checksum.
   uint16_t bad_crc = 0;
-  Give(BlockStream::Make(0x02, 1, TestContent(512), 0x5555, &bad_crc));
+  Give(BlockStream::Make(0x02, 1, Content(512), 0x5555, &bad_crc));
   Give(BlockStream::Make(0x02, 1, content.substr(512, 512), bad_crc));
   Give(BlockStream::Make(0x02, 1, content.substr(512, 512), accepted));
   Give(blocks.Next(0x23, 0, ""));

@@ -62,11 +62,4 @@ class BlockStream {
   uint16_t crc_ = 0;
 };
 
-// Bytes that differ from each other and from their neighbours.
-inline std::string TestContent(size_t size) {
-  std::string content(size, '\0');
-  for (size_t i = 0; i < size; ++i) content[i] = static_cast<char>(i * 7 + i / 256 + 3);
-  return content;
-}
-
 #endif  // RCVLINK_TESTS_QUORIN_BLOCK_STREAM_H_

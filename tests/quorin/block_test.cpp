@@ -6,6 +6,7 @@
 #include <string>
 
 #include "tests/quorin/block_stream.h"
+#include "tests/support/content.h"
 
 using rcvlink::Block;
 using rcvlink::BlockType;
@@ -24,7 +25,7 @@ Block LastBlock(uint16_t length) { return BlockOf(BlockStream::Make(0x04, length
 TEST(QuorinBlock, IsOf518Bytes) { EXPECT_EQ(kBlockLength, 518U); }
 
 TEST(QuorinBlock, HasItsFieldsInTheirPlaces) {
-  const std::string payload = TestContent(512);
+  const std::string payload = Content(512);
   const std::string bytes = BlockStream::Make(0x02, 0x1234, payload, 0xABCD);
   const Block block = BlockOf(bytes);
   EXPECT_EQ(block.Type(), BlockType::kData);
@@ -71,7 +72,7 @@ TEST(QuorinBlock, HasAnEndByteOfThree) {
 }
 
 TEST(QuorinBlock, IsChainedToTheChecksumBefore) {
-  const Block block = BlockOf(BlockStream::Make(0x02, 1, TestContent(512), 0xABCD));
+  const Block block = BlockOf(BlockStream::Make(0x02, 1, Content(512), 0xABCD));
   EXPECT_TRUE(block.IsChainedTo(0xABCD));
   EXPECT_FALSE(block.IsChainedTo(0));
   EXPECT_FALSE(block.IsChainedTo(0xABCC));
@@ -79,7 +80,7 @@ TEST(QuorinBlock, IsChainedToTheChecksumBefore) {
 
 // Every byte of the header and the payload counts, and both of the checksum; the end byte does not.
 TEST(QuorinBlock, FailsItsChecksumAfterAnyDamage) {
-  const std::string good = BlockStream::Make(0x02, 1, TestContent(512), 0xABCD);
+  const std::string good = BlockStream::Make(0x02, 1, Content(512), 0xABCD);
   for (size_t i = 0; i < good.size() - 1; ++i) {
     std::string damaged = good;
     damaged[i] = static_cast<char>(damaged[i] ^ 0x10);

@@ -12,6 +12,7 @@
 #include "tests/quorin/block_stream.h"
 #include "tests/quorin/quorin_driver.h"
 #include "tests/support/aborting_connection.h"
+#include "tests/support/content.h"
 #include "tests/support/memory_stream.h"
 
 namespace {
@@ -22,7 +23,7 @@ constexpr DWORD kUsb = 0;  // a link without a speed
 
 sim::FileStore OneFile() {
   sim::FileStore files;
-  files.Add(kName, sim::ToBytes(TestContent(kSize)), 600000000);
+  files.Add(kName, sim::ToBytes(Content(kSize)), 600000000);
   return files;
 }
 
@@ -77,7 +78,7 @@ class QuorinDownloadAbort
   size_t CountCalls() const {
     Bench bench(HowWritesAreCancelled(), HostSpeed());
     EXPECT_EQ(bench.Download(), S_OK);
-    EXPECT_EQ(bench.stream.bytes, TestContent(kSize));
+    EXPECT_EQ(bench.stream.bytes, Content(kSize));
     return bench.connection->calls;
   }
 };
@@ -96,7 +97,7 @@ TEST_P(QuorinDownloadAbort, EndsItInOrderAtAnyCall) {
     EXPECT_EQ(bench.connection->Speed(), HostSpeed());
     EXPECT_TRUE(IsFreeForOthers(bench.driver));
     // The received bytes are the beginning of the file.
-    EXPECT_TRUE(TestContent(kSize).starts_with(bench.stream.bytes));
+    EXPECT_TRUE(Content(kSize).starts_with(bench.stream.bytes));
     if (testing::Test::HasFailure()) FAIL() << bench.log.str();
   }
 }
@@ -115,7 +116,7 @@ TEST_P(QuorinDownloadAbort, DoesNotDisturbWhatFollows) {
     SysFreeString(info.bstrModel);
     bench.stream.bytes.clear();
     EXPECT_EQ(bench.Download(), S_OK);
-    EXPECT_TRUE(bench.stream.bytes == TestContent(kSize));
+    EXPECT_TRUE(bench.stream.bytes == Content(kSize));
     EXPECT_EQ(bench.driver.DeleteFile(L"A0101.log"), S_OK);
     if (testing::Test::HasFailure()) FAIL() << bench.log.str();
   }

@@ -11,6 +11,7 @@
 
 #include "tests/quorin/block_stream.h"
 #include "tests/quorin/quorin_driver.h"
+#include "tests/support/content.h"
 #include "tests/support/memory_stream.h"
 #include "tests/support/report_capture.h"
 
@@ -54,7 +55,7 @@ class QuorinDownloadTest : public QuorinDriverTest {
     EXPECT_THAT(Said(), testing::ElementsAreArray(Joined(parts)));
   }
 
-  const std::string content = TestContent(600);
+  const std::string content = Content(600);
   MemoryStream stream;
   const ReportCapture report;
 };

@@ -11,6 +11,7 @@
 #include "simulator/quorin/receiver.h"
 #include "tests/quorin/block_stream.h"
 #include "tests/quorin/quorin_driver.h"
+#include "tests/support/content.h"
 #include "tests/support/memory_stream.h"
 #include "tests/support/simulated_connection.h"
 
@@ -20,7 +21,7 @@ struct SimulatedDownload {
   explicit SimulatedDownload(const sim::QuorinOptions& options,
                              size_t size = kUsualSize,
                              DWORD host_speed = 9600)
-      : content(TestContent(size)),
+      : content(Content(size)),
         receiver(options, Files(content), &transcript),
         connection(new SimulatedConnection(receiver, host_speed)),
         driver(std::unique_ptr<CIConnection>(connection)) {}

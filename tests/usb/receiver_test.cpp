@@ -5,6 +5,7 @@
 #include <string>
 
 #include "tests/host/support/simulated_usb.h"
+#include "tests/support/content.h"
 #include "tests/usb/usb_host.h"
 
 namespace {
@@ -18,12 +19,6 @@ constexpr size_t kPayloadLength = 512;
 constexpr char kLastBlock = 4;
 constexpr const char* kAck = "\x06";
 constexpr const char* kNak = "\x15";
-
-std::string Content(size_t size) {
-  std::string content(size, '\0');
-  for (size_t i = 0; i < size; ++i) content[i] = static_cast<char>(i * 7 + i / kPayloadLength);
-  return content;
-}
 
 void Say(const Connected& host, const std::string& text) {
   ASSERT_EQ(host.writer.Write(text).error, DWORD{ERROR_SUCCESS});

@@ -10,6 +10,7 @@
 #include "platform/hresult.h"
 #include "simulator/velmar/receiver.h"
 #include "tests/support/aborting_connection.h"
+#include "tests/support/content.h"
 #include "tests/support/manual_clock.h"
 #include "tests/support/memory_stream.h"
 #include "velmar/velmar_protocol.h"
@@ -20,16 +21,9 @@ constexpr wchar_t kName[] = L"A0101.pdc";
 constexpr size_t kSize = 3000;  // three chunks
 constexpr DWORD kSpeed = 9600;
 
-std::string Content() {
-  std::string content;
-  while (content.size() < kSize) content += std::to_string(content.size()) + " ";
-  content.resize(kSize);
-  return content;
-}
-
 sim::FileStore OneFile() {
   sim::FileStore files;
-  files.Add("A0101.pdc", sim::ToBytes(Content()), 600000000);
+  files.Add("A0101.pdc", sim::ToBytes(Content(kSize)), 600000000);
   return files;
 }
 
@@ -74,7 +68,7 @@ class VelmarDownloadAbort
   size_t CountCalls() const {
     Bench bench(HowWritesAreCancelled(), Options());
     EXPECT_EQ(bench.Download(), S_OK);
-    EXPECT_EQ(bench.stream.bytes, Content());
+    EXPECT_EQ(bench.stream.bytes, Content(kSize));
     bench.ExpectLinkAtOldSpeed();
     return bench.connection->calls;
   }
@@ -99,7 +93,7 @@ TEST_P(VelmarDownloadAbort, LeavesBothEndsAtTheOldSpeed) {
   AbortAtEachCall([](Bench& bench, HRESULT result) {
     EXPECT_GE(result, S_OK);
     bench.ExpectLinkAtOldSpeed();
-    EXPECT_TRUE(Content().starts_with(bench.stream.bytes));
+    EXPECT_TRUE(Content(kSize).starts_with(bench.stream.bytes));
   });
 }
 
@@ -117,7 +111,7 @@ TEST_P(VelmarDownloadAbort, DoesNotDisturbTheNextDownload) {
   AbortAtEachCall([](Bench& bench, HRESULT) {
     bench.stream.bytes.clear();
     EXPECT_EQ(bench.Download(), S_OK);
-    EXPECT_TRUE(bench.stream.bytes == Content());
+    EXPECT_TRUE(bench.stream.bytes == Content(kSize));
     bench.ExpectLinkAtOldSpeed();
   });
 }

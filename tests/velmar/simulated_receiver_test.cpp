@@ -12,6 +12,7 @@
 #include "platform/hresult.h"
 #include "platform/text.h"
 #include "simulator/velmar/receiver.h"
+#include "tests/support/content.h"
 #include "tests/support/manual_clock.h"
 #include "tests/support/memory_stream.h"
 #include "tests/support/simulated_connection.h"
@@ -22,16 +23,6 @@ using rcvlink::UniqueBstr;
 namespace {
 
 using testing::ElementsAre;
-
-std::string Content(size_t size) {
-  std::string content(size, '\0');
-  unsigned state = 12345;
-  for (char& byte : content) {
-    state = state * 1103515245U + 12345U;
-    byte = static_cast<char>(state >> 16);
-  }
-  return content;
-}
 
 // A driver, its link and the receiver, which serves "A.log" and "B.log".
 struct Bench : CIProtocolCallback {

@@ -1,6 +1,5 @@
 #include "tests/host/support/receiver.h"
 
-#include <algorithm>
 #include <chrono>
 #include <thread>
 
@@ -107,16 +106,6 @@ long OpenReceiver::Check() const {
   short answer = 7;
   const long result = devapi::CheckConnection(handle_, nullptr, &answer);
   return result == S_OK ? answer : result;
-}
-
-std::string Content(size_t size) {
-  std::string content(size, '\0');
-  unsigned state = 12345;
-  std::ranges::generate(content, [&] {
-    state = state * 1103515245U + 12345U;
-    return static_cast<char>(state >> 16);
-  });
-  return content;
 }
 
 }  // namespace host

@@ -115,9 +115,6 @@ class UsbReceiver : public OpenReceiver {
   size_t greeting_ = 0;
 };
 
-// Bytes without two equal blocks.
-std::string Content(size_t size);
-
 }  // namespace host
 
 #endif  // RCVLINK_TESTS_HOST_SUPPORT_RECEIVER_H_
