@@ -6,6 +6,7 @@
 #include <gtest/gtest.h>
 
 #include <map>
+#include <memory>
 #include <string>
 #include <vector>
 
@@ -51,6 +52,10 @@ class Cli : public testing::Test {
     arguments.insert(arguments.end(), {"--speed", "9600"});
     return arguments;
   }
+
+  // A Velmar receiver that lists more than the disk of `folder` has room for; null where a list
+  // cannot be so long.
+  std::unique_ptr<bed::SimulatedPort> ReceiverOfMoreThanTheDisk() const;
 
   bool Has(const std::string& name) const { return std::filesystem::exists(folder / name); }
   std::vector<std::string> LocalFiles() const;

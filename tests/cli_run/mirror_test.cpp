@@ -321,18 +321,9 @@ TEST_F(VelmarMirror, ADirectoryThatDidNotFitIsNeverDone) {
 }
 
 TEST_F(VelmarMirror, FilesThatTheDiskHasNoRoomForAreRefusedAtOnce) {
-  constexpr uint64_t kListed = 2'147'483'647;
-  constexpr uint64_t kMostFiles = 60;  // a longer list is cut
-  const uint64_t needed = std::filesystem::space(folder.path()).available / kListed + 1;
-  if (needed > kMostFiles) GTEST_SKIP() << "this disk has room for all that can be listed";
-  std::vector<std::string> simulator = {"velmar"};
-  Files files;
-  for (uint64_t i = 0; i < needed; ++i) {
-    const std::string name = "f" + std::to_string(i);
-    files.emplace(name, "x");
-    simulator.insert(simulator.end(), {"--lie-size", name + "=" + std::to_string(kListed)});
-  }
-  const bed::SimulatedPort receiver(simulator, files);
+  const auto owned = ReceiverOfMoreThanTheDisk();
+  if (!owned) GTEST_SKIP() << "this disk has room for all that can be listed";
+  const bed::SimulatedPort& receiver = *owned;
   const auto result = RunMirror(receiver, {});
   EXPECT_EQ(result.status, kLocalFile);
   EXPECT_THAT(result.errors, HasSubstr("the disk has room for"));

@@ -184,17 +184,9 @@ bool EndsSoon(const std::future<Result>& call) {
 }
 
 // An event that resets itself after a wait.
-class SelfResettingEvent {
- public:
-  SelfResettingEvent() : handle_(CreateEventW(nullptr, FALSE, TRUE, nullptr)) {}
-  SelfResettingEvent(const SelfResettingEvent&) = delete;
-  SelfResettingEvent& operator=(const SelfResettingEvent&) = delete;
-  ~SelfResettingEvent() { CloseHandle(handle_); }
-  HANDLE get() const { return handle_; }
-
- private:
-  HANDLE handle_;
-};
+bed::UniqueHandle SelfResettingEvent() {
+  return bed::UniqueHandle(CreateEventW(nullptr, FALSE, TRUE, nullptr));
+}
 
 // The step that clears the signal must also end the check.
 TEST(ApiAwkwardMoments, SelfResettingEventEndsTheCheckOnAPort) {

@@ -3,20 +3,12 @@
 #include <windows.h>
 
 #include <array>
-#include <memory>
 #include <string>
 
+#include "tests/host/support/handle.h"
 #include "tests/host/support/simulated_port.h"
 
 namespace {
-
-struct HandleCloser {
-  using pointer = HANDLE;
-  void operator()(HANDLE handle) const {
-    if (handle != INVALID_HANDLE_VALUE) CloseHandle(handle);
-  }
-};
-using UniqueHandle = std::unique_ptr<void, HandleCloser>;
 
 HANDLE OpenPort(const std::wstring& path) {
   return CreateFileW(
@@ -54,7 +46,7 @@ class BedTest : public testing::Test {
     return text;
   }
 
-  UniqueHandle port_;
+  bed::UniqueHandle port_;
 };
 
 TEST_F(BedTest, ReceiverAnswersOnItsPort) {

@@ -4,11 +4,11 @@
 #include <windows.h>
 
 #include <bit>
-#include <memory>
 #include <string>
 #include <vector>
 
 #include "rcvlink.h"
+#include "tests/host/support/handle.h"
 #include "tests/host/support/receiver.h"
 #include "tests/host/support/report.h"
 
@@ -17,14 +17,6 @@ using testing::ElementsAreArray;
 using testing::IsEmpty;
 
 namespace {
-
-struct HandleCloser {
-  using pointer = HANDLE;
-  void operator()(HANDLE handle) const {
-    if (handle != INVALID_HANDLE_VALUE) CloseHandle(handle);
-  }
-};
-using UniqueHandle = std::unique_ptr<void, HandleCloser>;
 
 // A port opened as another program would open it.
 class RawPort {
@@ -46,7 +38,7 @@ class RawPort {
   }
 
  private:
-  UniqueHandle handle_;
+  bed::UniqueHandle handle_;
 };
 
 long Create(const bed::SimulatedPort& port,

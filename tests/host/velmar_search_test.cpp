@@ -19,14 +19,11 @@ constexpr const char* kSecondQuestion = R"(unlogall thisport\r)";
 
 class ApiVelmarSearch : public testing::Test {
  protected:
-  ~ApiVelmarSearch() override {
-    if (handle_ != nullptr) devapi::CloseReceiver(handle_);
-  }
-
   long Create(EProtocol protocol) {
     std::wstring name = port_.name();
     DCB settings = host::Settings(CBR_9600);
-    return devapi::CreateReceiverOnSerial(name.data(), protocol, &settings, nullptr, &handle_);
+    return devapi::CreateReceiverOnSerial(
+        name.data(), protocol, &settings, nullptr, receiver_.out());
   }
   host::Lines Sent() const { return host::SentByHost(port_.Transcript()); }
   std::string Told(const std::string& step) const {
@@ -40,19 +37,17 @@ class ApiVelmarSearch : public testing::Test {
 
   const bed::SimulatedPort port_{{"velmar"}};
   const host::Report report_;
-  void* handle_ = nullptr;
+  host::OpenReceiver receiver_;
 };
 
 TEST_F(ApiVelmarSearch, FindsItWithoutAskingTheOtherFamily) {
   ASSERT_EQ(Create(eProtocolVelmar), S_OK);
-  EXPECT_NE(handle_, nullptr);
+  EXPECT_NE(receiver_.get(), nullptr);
   ExpectSteps(
       {"opening serial port", "looking for Velmar receiver", "Velmar receiver found", "OK"});
   EXPECT_THAT(Sent(), ElementsAre(kFirstQuestion, kSecondQuestion));
 
-  short answer = 7;
-  EXPECT_EQ(devapi::CheckConnection(handle_, nullptr, &answer), S_OK);
-  EXPECT_EQ(answer, VARIANT_TRUE);
+  EXPECT_EQ(receiver_.Check(), VARIANT_TRUE);
   EXPECT_THAT(Sent(),
               ElementsAre(kFirstQuestion, kSecondQuestion, kFirstQuestion, kSecondQuestion));
 }
@@ -65,7 +60,7 @@ TEST_F(ApiVelmarSearch, AnyFamilyIsQuorinFirst) {
                "Velmar receiver found",
                "OK"});
   CReceiverInfo info{};
-  ASSERT_EQ(devapi::GetReceiverInfo(handle_, nullptr, &info), S_OK);
+  ASSERT_EQ(devapi::GetReceiverInfo(receiver_.get(), nullptr, &info), S_OK);
   EXPECT_EQ(info.dwProtocol, 2U);
   SysFreeString(info.bstrReceiverId);
   SysFreeString(info.bstrModel);
@@ -73,7 +68,7 @@ TEST_F(ApiVelmarSearch, AnyFamilyIsQuorinFirst) {
 
 TEST_F(ApiVelmarSearch, IsNotAskedWhereQuorinIsWanted) {
   EXPECT_EQ(Create(eProtocolQuorin), S_FALSE);
-  EXPECT_EQ(handle_, nullptr);
+  EXPECT_EQ(receiver_.get(), nullptr);
   ExpectSteps({"opening serial port", "looking for Quorin receiver"});
   const std::string transcript = port_.Transcript();
   EXPECT_NE(transcript.find("dm"), std::string::npos) << "it was not asked at all";

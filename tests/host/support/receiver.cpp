@@ -37,8 +37,6 @@ DCB Settings(DWORD speed) {
   return settings;
 }
 
-Event::Event(bool signalled) : handle_(CreateEventW(nullptr, TRUE, signalled, nullptr)) {}
-
 Receiver::Receiver(const bed::SimulatedPort& port, DWORD speed) : port_(port) {
   std::wstring name = port.name();
   DCB settings = Settings(speed);

@@ -11,6 +11,7 @@
 #include <utility>
 
 #include "rcvlink.h"
+#include "tests/host/support/handle.h"
 #include "tests/host/support/progress.h"
 #include "tests/host/support/simulated_port.h"
 #include "tests/host/support/simulated_usb.h"
@@ -32,16 +33,14 @@ DCB Settings(DWORD speed);
 // A Win32 event that stays signalled once it is.
 class Event {
  public:
-  explicit Event(bool signalled = false);
-  Event(const Event&) = delete;
-  Event& operator=(const Event&) = delete;
-  ~Event() { CloseHandle(handle_); }
+  explicit Event(bool signalled = false)
+      : handle_(CreateEventW(nullptr, TRUE, signalled, nullptr)) {}
 
-  HANDLE get() const { return handle_; }
-  void Set() { SetEvent(handle_); }
+  HANDLE get() const { return handle_.get(); }
+  void Set() { SetEvent(get()); }
 
  private:
-  HANDLE handle_;
+  bed::UniqueHandle handle_;
 };
 
 // A call that runs on a thread of its own.

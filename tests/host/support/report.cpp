@@ -10,6 +10,7 @@
 
 #include "rcvlink.h"
 #include "tests/host/support/bed_connection.h"
+#include "tests/host/support/handle.h"
 
 namespace host {
 namespace {
@@ -43,18 +44,17 @@ std::wstring ReportPath(const std::wstring& name) {
 }
 
 std::string ReadReport(const std::wstring& path) {
-  const HANDLE file = CreateFileW(path.c_str(),
-                                  GENERIC_READ,
-                                  FILE_SHARE_READ | FILE_SHARE_WRITE,
-                                  nullptr,
-                                  OPEN_EXISTING,
-                                  0,
-                                  nullptr);
-  if (file == INVALID_HANDLE_VALUE) return {};
-  std::string text(GetFileSize(file, nullptr), '\0');
+  const bed::UniqueHandle file(CreateFileW(path.c_str(),
+                                           GENERIC_READ,
+                                           FILE_SHARE_READ | FILE_SHARE_WRITE,
+                                           nullptr,
+                                           OPEN_EXISTING,
+                                           0,
+                                           nullptr));
+  if (file.get() == INVALID_HANDLE_VALUE) return {};
+  std::string text(GetFileSize(file.get(), nullptr), '\0');
   DWORD count = 0;
-  ReadFile(file, text.data(), static_cast<DWORD>(text.size()), &count, nullptr);
-  CloseHandle(file);
+  ReadFile(file.get(), text.data(), static_cast<DWORD>(text.size()), &count, nullptr);
   text.resize(count);
   return text;
 }

@@ -5,14 +5,10 @@
 #include <deque>
 #include <mutex>
 #include <sstream>
-#include <thread>
 #include <utility>
 
 namespace bed {
 namespace {
-
-constexpr const char* kTranscript = "transcript.txt";
-constexpr auto kPollInterval = std::chrono::milliseconds(5);
 
 // The ports that this process has.
 class Ports {
@@ -86,7 +82,7 @@ void SimulatedPort::Start(std::vector<std::string> arguments) {
   if (std::find(arguments.begin(), arguments.end(), "--folder") == arguments.end()) {
     arguments.insert(arguments.end(), {"--folder", files_.unix_path()});
   }
-  arguments.insert(arguments.end(), {"--transcript", notes_.unix_path() + "/" + kTranscript});
+  arguments.insert(arguments.end(), {"--transcript", transcript_.unix_path()});
   connection_.Request({{"do", "start"}, {"port", lease_.name()}, {"arguments", arguments}});
   plugged_ = true;
 }
@@ -98,21 +94,6 @@ void SimulatedPort::Resume() { Ask("resume"); }
 std::optional<int> SimulatedPort::Status() {
   const nlohmann::json status = Ask("status").at("status");
   return status.is_null() ? std::nullopt : std::optional(status.get<int>());
-}
-
-std::string SimulatedPort::Transcript() const { return notes_.Read(kTranscript); }
-
-void SimulatedPort::WaitForTranscript(std::string_view text,
-                                      std::chrono::milliseconds timeout) const {
-  const auto end = std::chrono::steady_clock::now() + timeout;
-  std::string transcript = Transcript();
-  while (transcript.find(text) == std::string::npos) {
-    if (std::chrono::steady_clock::now() > end) {
-      throw Error("the transcript does not hold \"" + std::string(text) + "\":\n" + transcript);
-    }
-    std::this_thread::sleep_for(kPollInterval);
-    transcript = Transcript();
-  }
 }
 
 nlohmann::json SimulatedPort::Ask(const char* what) {

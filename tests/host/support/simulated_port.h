@@ -11,6 +11,7 @@
 
 #include "tests/host/support/bed_connection.h"
 #include "tests/host/support/temp_folder.h"
+#include "tests/host/support/transcript_file.h"
 
 namespace bed {
 
@@ -68,17 +69,19 @@ class SimulatedPort {
 
   // What has passed over the line so far, one event a line: "> " from the host, "< " from the
   // receiver, "= " a setting, "- " a remark.
-  std::string Transcript() const;
+  std::string Transcript() const { return transcript_.Text(); }
   // Waits until the transcript holds `text`; raises Error when it does not come.
   void WaitForTranscript(std::string_view text,
-                         std::chrono::milliseconds timeout = std::chrono::seconds(20)) const;
+                         std::chrono::milliseconds timeout = std::chrono::seconds(20)) const {
+    transcript_.WaitFor(text, timeout);
+  }
 
  private:
   nlohmann::json Ask(const char* what);
 
   PortLease lease_;
   TempFolder files_;
-  TempFolder notes_;
+  TranscriptFile transcript_;
   Connection connection_;
   bool plugged_ = false;
 };

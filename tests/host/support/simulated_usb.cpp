@@ -4,14 +4,11 @@
 #include <array>
 #include <atomic>
 #include <mutex>
-#include <thread>
 
 namespace bed {
 namespace {
 
 constexpr wchar_t kProgram[] = L"rcvlink-sim-usb.exe";
-constexpr const char* kTranscript = "transcript.txt";
-constexpr auto kPollInterval = std::chrono::milliseconds(5);
 constexpr UINT kKilled = 1;
 
 std::string NewName() {
@@ -52,8 +49,8 @@ std::filesystem::path ProgramPath() {
 }
 
 struct Pipe {
-  UsbHandle read;
-  UsbHandle write;
+  UniqueHandle read;
+  UniqueHandle write;
 };
 
 Pipe MakePipe() {
@@ -61,17 +58,17 @@ Pipe MakePipe() {
   HANDLE read = nullptr;
   HANDLE write = nullptr;
   if (!CreatePipe(&read, &write, &inherited, 0)) throw Error("no pipe");
-  return {UsbHandle(read), UsbHandle(write)};
+  return {UniqueHandle(read), UniqueHandle(write)};
 }
 
-void KeepToThisProcess(const UsbHandle& handle) {
+void KeepToThisProcess(const UniqueHandle& handle) {
   SetHandleInformation(handle.get(), HANDLE_FLAG_INHERIT, 0);
 }
 
 struct Started {
-  UsbHandle process;
-  UsbHandle input;
-  UsbHandle output;
+  UniqueHandle process;
+  UniqueHandle input;
+  UniqueHandle output;
 };
 
 PROCESS_INFORMATION CreateProgram(const std::wstring& program,
@@ -121,7 +118,7 @@ Started StartProgram(const std::vector<std::string>& arguments) {
   startup.hStdError = output.write.get();
   const PROCESS_INFORMATION started = CreateProgram(program, command, startup);
   CloseHandle(started.hThread);
-  return {UsbHandle(started.hProcess), std::move(input.write), std::move(output.read)};
+  return {UniqueHandle(started.hProcess), std::move(input.write), std::move(output.read)};
 }
 
 // The text before the end of a line or of the output; false at the end of the output.
@@ -182,7 +179,7 @@ void SimulatedUsb::Start(std::vector<std::string> arguments) {
     arguments.insert(arguments.end(), {"--folder", ToUtf8(files_.path())});
   }
   arguments.insert(arguments.end(),
-                   {"--device", name_, "--transcript", ToUtf8(notes_ / kTranscript)});
+                   {"--device", name_, "--transcript", ToUtf8(transcript_.path())});
   Started started = StartProgram(arguments);
   std::string first_line;
   if (!ReadLine(started.output.get(), first_line) || !first_line.starts_with(R"(\\?\)")) {
@@ -208,21 +205,6 @@ int SimulatedUsb::WaitForEnd(std::chrono::milliseconds timeout) const {
     throw Error("rcvlink-sim-usb does not end");
   }
   return ExitStatus(process_.get());
-}
-
-std::string SimulatedUsb::Transcript() const { return notes_.Read(kTranscript); }
-
-void SimulatedUsb::WaitForTranscript(std::string_view text,
-                                     std::chrono::milliseconds timeout) const {
-  const auto end = std::chrono::steady_clock::now() + timeout;
-  std::string transcript = Transcript();
-  while (transcript.find(text) == std::string::npos) {
-    if (std::chrono::steady_clock::now() > end) {
-      throw Error("the transcript does not hold \"" + std::string(text) + "\":\n" + transcript);
-    }
-    std::this_thread::sleep_for(kPollInterval);
-    transcript = Transcript();
-  }
 }
 
 }  // namespace bed

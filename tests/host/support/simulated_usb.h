@@ -6,21 +6,16 @@
 
 #include <chrono>
 #include <map>
-#include <memory>
 #include <optional>
 #include <string>
 #include <string_view>
 #include <vector>
 
+#include "tests/host/support/handle.h"
 #include "tests/host/support/temp_folder.h"
+#include "tests/host/support/transcript_file.h"
 
 namespace bed {
-
-struct UsbHandleCloser {
-  using pointer = HANDLE;
-  void operator()(HANDLE handle) const { CloseHandle(handle); }
-};
-using UsbHandle = std::unique_ptr<HANDLE, UsbHandleCloser>;
 
 // A USB device with a simulated receiver in it. Its name is unique among all processes. The
 // receiver's program ends with this one, even after a crash.
@@ -59,19 +54,21 @@ class SimulatedUsb {
   // The transcript so far, one event per line: "> " from the host, "< " from the receiver, "= " a
   // setting, "- " a remark. It is up to date when a request has ended; a handle is closed a little
   // after CloseHandle has returned.
-  std::string Transcript() const;
+  std::string Transcript() const { return transcript_.Text(); }
   // Waits until the transcript contains `text`; raises Error when it does not come.
   void WaitForTranscript(std::string_view text,
-                         std::chrono::milliseconds timeout = std::chrono::seconds(20)) const;
+                         std::chrono::milliseconds timeout = std::chrono::seconds(20)) const {
+    transcript_.WaitFor(text, timeout);
+  }
 
  private:
   std::string name_;
   TempFolder files_;
-  TempFolder notes_;
-  UsbHandle process_;
+  TranscriptFile transcript_;
+  UniqueHandle process_;
   // The program's standard input, at whose end it ends, and its output.
-  UsbHandle input_;
-  UsbHandle output_;
+  UniqueHandle input_;
+  UniqueHandle output_;
 };
 
 }  // namespace bed

@@ -25,19 +25,14 @@ class Velmar {
       : port(Arguments(std::move(switches), speed), files) {
     std::wstring name = port.name();
     DCB settings = Settings(speed);
-    const long result =
-        devapi::CreateReceiverOnSerial(name.data(), eProtocolVelmar, &settings, nullptr, &handle_);
+    const long result = devapi::CreateReceiverOnSerial(
+        name.data(), eProtocolVelmar, &settings, nullptr, receiver_.out());
     if (result != S_OK) throw bed::Error("no receiver answers:\n" + port.Transcript());
   }
-  Velmar(const Velmar&) = delete;
-  Velmar& operator=(const Velmar&) = delete;
-  ~Velmar() {
-    if (handle_ != nullptr) devapi::CloseReceiver(handle_);
-  }
 
-  void* get() const { return handle_; }
+  void* get() const { return receiver_.get(); }
   // Gives up the ownership of the handle.
-  void* Release() { return std::exchange(handle_, nullptr); }
+  void* Release() { return receiver_.Release(); }
 
   // What the host sent since the handshake.
   Lines Sent() const {
@@ -60,17 +55,16 @@ class Velmar {
     return lines;
   }
   std::vector<std::wstring> Names() const {
-    const FileList list(handle_);
+    const FileList list(get());
     EXPECT_EQ(list.result(), S_OK);
     std::vector<std::wstring> names;
     for (long i = 0; i < list.Count(); ++i) names.push_back(list.At(i).name);
     return names;
   }
-  long Download(std::wstring name, MemoryStream& stream, Progress* progress = nullptr) {
-    return devapi::DownloadFile(
-        handle_, name.data(), &stream, progress == nullptr ? nullptr : progress->record());
+  long Download(const std::wstring& name, MemoryStream& stream, Progress* progress = nullptr) {
+    return receiver_.Download(name, stream, progress);
   }
-  long Delete(std::wstring name) const { return devapi::DeleteFileW(handle_, name.data()); }
+  long Delete(std::wstring name) const { return devapi::DeleteFileW(get(), name.data()); }
 
   bed::SimulatedPort port;
 
@@ -82,7 +76,7 @@ class Velmar {
     return switches;
   }
 
-  void* handle_ = nullptr;
+  OpenReceiver receiver_;  // on `port`, so closed before it
 };
 
 }  // namespace host
