@@ -1,7 +1,6 @@
 // An abort at each call of a whole download, against the simulated receiver.
 #include <gtest/gtest.h>
 
-#include <memory>
 #include <sstream>
 #include <string>
 #include <tuple>
@@ -13,7 +12,7 @@
 #include "tests/quorin/quorin_driver.h"
 #include "tests/support/aborting_connection.h"
 #include "tests/support/content.h"
-#include "tests/support/memory_stream.h"
+#include "tests/support/simulated_driver.h"
 
 namespace {
 
@@ -27,12 +26,9 @@ sim::FileStore OneFile() {
   return files;
 }
 
-// A driver, its link and the receiver at the other end.
-struct Bench {
+struct Bench : SimulatedDriver<QuorinDriver, sim::QuorinReceiver, AbortingConnection> {
   Bench(CancelledWrite cancelled_write, DWORD host_speed, const sim::QuorinOptions& options = {})
-      : receiver(options, OneFile(), &transcript),
-        connection(new AbortingConnection(receiver, cancelled_write, host_speed)),
-        driver(std::unique_ptr<CIConnection>(connection)) {
+      : SimulatedDriver(options, OneFile(), cancelled_write, host_speed) {
     connection->abort = [this] { driver.Abort(); };
   }
 
@@ -43,13 +39,6 @@ struct Bench {
     for (std::string line; std::getline(in, line);) lines.push_back(line);
     return lines;
   }
-
-  std::ostringstream log;
-  sim::Transcript transcript{log};
-  sim::QuorinReceiver receiver;
-  AbortingConnection* connection;  // the driver's
-  QuorinDriver driver;
-  MemoryStream stream;
 };
 
 bool IsControl(const std::string& line) {

@@ -59,7 +59,7 @@ TEST_P(QuorinOvercomes, WithTheWholeFile) {
   EXPECT_EQ(download.Run(), S_OK);
   EXPECT_TRUE(download.HasWholeFile());
   EXPECT_EQ(download.receiver.speed(), 9600U);
-  EXPECT_EQ(download.HostSpeed(), 9600U);
+  EXPECT_EQ(download.connection->Speed(), 9600U);
   EXPECT_FALSE(download.receiver.in_transfer());
   EXPECT_FALSE(download.receiver.echoes());
   if (HasFailure()) FAIL() << download.Log();
@@ -151,7 +151,7 @@ TEST_P(QuorinDownloads, TheWholeFile) {
     EXPECT_EQ(download.Run(), S_OK) << size;
     EXPECT_TRUE(download.HasWholeFile()) << size;
     EXPECT_EQ(download.receiver.speed(), 9600U) << size;
-    EXPECT_EQ(download.HostSpeed(), 9600U) << size;
+    EXPECT_EQ(download.connection->Speed(), 9600U) << size;
     EXPECT_EQ(download.CountInLog("> \\x15"), 1U) << size;
     if (HasFailure()) FAIL() << download.Log();
   }
@@ -187,7 +187,7 @@ TEST(QuorinSimulatedDownload, AtFullSpeedChangesNothing) {
   EXPECT_EQ(download.Run(), S_OK);
   EXPECT_TRUE(download.HasWholeFile());
   EXPECT_EQ(download.CountInLog("rate"), 0U);
-  EXPECT_EQ(download.HostSpeed(), 115200U);
+  EXPECT_EQ(download.connection->Speed(), 115200U);
 }
 
 TEST(QuorinSimulatedDownload, RunsAtFullSpeed) {
@@ -225,7 +225,7 @@ TEST_P(QuorinFailsOn, AFault) {
   EXPECT_TRUE(IsFreeForOthers(download.driver));
   if (GetParam().speed_is_back) {
     EXPECT_EQ(download.receiver.speed(), 9600U);
-    EXPECT_EQ(download.HostSpeed(), 9600U);
+    EXPECT_EQ(download.connection->Speed(), 9600U);
     EXPECT_FALSE(download.receiver.in_transfer());
   }
   if (HasFailure()) FAIL() << download.Log();

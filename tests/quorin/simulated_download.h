@@ -4,35 +4,25 @@
 #define RCVLINK_TESTS_QUORIN_SIMULATED_DOWNLOAD_H_
 
 #include <cstddef>
-#include <memory>
-#include <sstream>
 #include <string>
 
 #include "simulator/quorin/receiver.h"
 #include "tests/quorin/block_stream.h"
 #include "tests/quorin/quorin_driver.h"
 #include "tests/support/content.h"
-#include "tests/support/memory_stream.h"
 #include "tests/support/simulated_connection.h"
+#include "tests/support/simulated_driver.h"
 
-struct SimulatedDownload {
+struct SimulatedDownload : SimulatedDriver<QuorinDriver, sim::QuorinReceiver, SimulatedConnection> {
   static constexpr size_t kUsualSize = 1300;  // two blocks of data and a last one
 
   explicit SimulatedDownload(const sim::QuorinOptions& options,
                              size_t size = kUsualSize,
                              DWORD host_speed = 9600)
-      : content(Content(size)),
-        receiver(options, Files(content), &transcript),
-        connection(new SimulatedConnection(receiver, host_speed)),
-        driver(std::unique_ptr<CIConnection>(connection)) {}
+      : SimulatedDriver(options, Files(Content(size)), host_speed), content(Content(size)) {}
 
   HRESULT Run() { return driver.DownloadFile(L"A0101.log", &stream, nullptr); }
   bool HasWholeFile() const { return stream.bytes == content; }
-  DWORD HostSpeed() {
-    DWORD speed = 0;
-    connection->GetSpeed(&speed);
-    return speed;
-  }
   std::string Log() const { return log.str(); }
   size_t CountInLog(const std::string& text) const {
     const std::string lines = Log();
@@ -51,12 +41,6 @@ struct SimulatedDownload {
   }
 
   const std::string content;
-  std::ostringstream log;
-  sim::Transcript transcript{log};
-  sim::QuorinReceiver receiver;
-  SimulatedConnection* connection;  // the driver's
-  QuorinDriver driver;
-  MemoryStream stream;
 };
 
 #endif  // RCVLINK_TESTS_QUORIN_SIMULATED_DOWNLOAD_H_

@@ -66,11 +66,7 @@ class AbortingConnection : public CIConnection {
     return std::exchange(rule_, rule);
   }
 
-  DWORD Speed() {
-    DWORD speed = 0;
-    inner_.GetSpeed(&speed);
-    return speed;
-  }
+  DWORD Speed() const { return inner_.Speed(); }
 
  private:
   template <typename Operation>

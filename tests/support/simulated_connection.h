@@ -20,6 +20,7 @@ class SimulatedConnection : public CIConnection {
   }
 
   std::function<void()> before_read;  // may be empty; may call Cancel
+  DWORD Speed() const { return speed_; }
   uint64_t Now() const { return port_.Now(); }
 
   HRESULT Disconnect() override { return S_OK; }

@@ -1,8 +1,6 @@
 // Aborts against the simulated receiver: at each call of a whole download, and between operations.
 #include <gtest/gtest.h>
 
-#include <memory>
-#include <sstream>
 #include <string>
 #include <tuple>
 #include <utility>
@@ -11,8 +9,7 @@
 #include "simulator/velmar/receiver.h"
 #include "tests/support/aborting_connection.h"
 #include "tests/support/content.h"
-#include "tests/support/manual_clock.h"
-#include "tests/support/memory_stream.h"
+#include "tests/support/simulated_driver.h"
 #include "velmar/velmar_protocol.h"
 
 namespace {
@@ -27,12 +24,9 @@ sim::FileStore OneFile() {
   return files;
 }
 
-// A driver, its link and the receiver at the other end.
-struct Bench {
+struct Bench : SimulatedDriver<CVelmarProtocol, sim::VelmarReceiver, AbortingConnection> {
   explicit Bench(CancelledWrite cancelled_write, const sim::VelmarOptions& options = {})
-      : receiver(options, OneFile(), &transcript),
-        connection(new AbortingConnection(receiver, cancelled_write)),
-        driver(std::unique_ptr<CIConnection>(connection)) {
+      : SimulatedDriver(options, OneFile(), cancelled_write) {
     connection->abort = [this] { driver.Abort(); };
   }
 
@@ -42,14 +36,6 @@ struct Bench {
     EXPECT_EQ(receiver.speed(), kSpeed);
     EXPECT_EQ(connection->Speed(), kSpeed);
   }
-
-  ManualClock clock;
-  std::ostringstream log;
-  sim::Transcript transcript{log};
-  sim::VelmarReceiver receiver;
-  AbortingConnection* connection;  // the driver's
-  CVelmarProtocol driver;
-  MemoryStream stream;
 };
 
 class VelmarDownloadAbort

@@ -4,8 +4,6 @@
 #include <gtest/gtest.h>
 
 #include <initializer_list>
-#include <memory>
-#include <sstream>
 #include <string>
 #include <vector>
 
@@ -13,9 +11,8 @@
 #include "platform/text.h"
 #include "simulator/velmar/receiver.h"
 #include "tests/support/content.h"
-#include "tests/support/manual_clock.h"
-#include "tests/support/memory_stream.h"
 #include "tests/support/simulated_connection.h"
+#include "tests/support/simulated_driver.h"
 #include "velmar/velmar_protocol.h"
 
 using rcvlink::UniqueBstr;
@@ -24,13 +21,11 @@ namespace {
 
 using testing::ElementsAre;
 
-// A driver, its link and the receiver, which serves "A.log" and "B.log".
-struct Bench : CIProtocolCallback {
+// The receiver serves "A.log" and "B.log".
+struct Bench : SimulatedDriver<CVelmarProtocol, sim::VelmarReceiver, SimulatedConnection>,
+               CIProtocolCallback {
   explicit Bench(const sim::VelmarOptions& options, size_t size = 3000, DWORD host_speed = 9600)
-      : content(Content(size)),
-        receiver(options, Files(content), &transcript),
-        connection(new SimulatedConnection(receiver, host_speed)),
-        driver(std::unique_ptr<CIConnection>(connection)) {
+      : SimulatedDriver(options, Files(Content(size)), host_speed), content(Content(size)) {
     driver.SetCallback(this);
   }
 
@@ -46,25 +41,13 @@ struct Bench : CIProtocolCallback {
     return driver.DownloadFile(name, &stream, nullptr);
   }
   bool HasWholeFile() const { return stream.bytes == content; }
-  DWORD HostSpeed() {
-    DWORD speed = 0;
-    connection->GetSpeed(&speed);
-    return speed;
-  }
   bool IsFound() {
     short answer = 99;
     EXPECT_EQ(driver.CheckConnection(nullptr, &answer), S_OK);
     return answer == VARIANT_TRUE;
   }
 
-  ManualClock clock;
   const std::string content;
-  std::ostringstream log;
-  sim::Transcript transcript{log};
-  sim::VelmarReceiver receiver;
-  SimulatedConnection* connection;  // the driver's
-  CVelmarProtocol driver;
-  MemoryStream stream;
   std::vector<int> percents;
 };
 
@@ -102,7 +85,7 @@ TEST(VelmarSimulatedReceiver, DoesAllInPiecesOfAnySize) {
     EXPECT_STREQ(files.At(1).bstrName, L"B.log");
     EXPECT_EQ(bench.Download(), S_OK);
     EXPECT_TRUE(bench.HasWholeFile());
-    EXPECT_EQ(bench.HostSpeed(), 9600u);
+    EXPECT_EQ(bench.connection->Speed(), 9600u);
     EXPECT_EQ(bench.receiver.speed(), 9600u);
     EXPECT_EQ(bench.driver.DeleteFile(L"A.log"), S_OK);
     EXPECT_EQ(bench.driver.RenameFile(L"B.log", L"C.log"), S_OK);
@@ -300,7 +283,7 @@ TEST(VelmarSimulatedReceiver, WithWrongLengthsIsLeftInOrder) {
         SCOPED_TRACE(testing::Message() << static_cast<int>(kind) << " " << amount << " " << chunk);
         Bench bench(WithFault({.kind = kind, .chunk = chunk, .times = 1, .amount = amount}));
         bench.Download();
-        EXPECT_EQ(bench.HostSpeed(), 9600u) << bench.log.str();
+        EXPECT_EQ(bench.connection->Speed(), 9600u) << bench.log.str();
         EXPECT_EQ(bench.receiver.speed(), 9600u) << bench.log.str();
         bench.stream.bytes.clear();
         EXPECT_EQ(bench.Download(), S_OK);
@@ -337,7 +320,7 @@ TEST(VelmarSimulatedReceiver, WhichVanishesEndsTheDownloadWithWhatCame) {
   Bench bench(options);
   EXPECT_EQ(bench.Download(), S_OK);
   EXPECT_EQ(bench.stream.bytes, bench.content.substr(0, 2048));
-  EXPECT_EQ(bench.HostSpeed(), 9600u);
+  EXPECT_EQ(bench.connection->Speed(), 9600u);
 }
 
 TEST(VelmarSimulatedReceiver, ThatKeepsItsSpeedIsLost) {
@@ -346,7 +329,7 @@ TEST(VelmarSimulatedReceiver, ThatKeepsItsSpeedIsLost) {
   Bench bench(options);
   EXPECT_EQ(bench.Download(), S_OK);
   EXPECT_TRUE(bench.stream.bytes.empty());  // it acknowledged, so the host changed its speed alone
-  EXPECT_EQ(bench.HostSpeed(), 9600u);
+  EXPECT_EQ(bench.connection->Speed(), 9600u);
   EXPECT_TRUE(bench.IsFound());
 }
 
@@ -356,7 +339,7 @@ TEST(VelmarSimulatedReceiver, ThatRefusesTheSpeedSendsAtTheOldOne) {
     Bench bench(WithFault({.kind = kind, .command = "COM", .times = sim::kAlways, .amount = 0}));
     EXPECT_EQ(bench.Download(), S_OK);
     EXPECT_TRUE(bench.HasWholeFile());
-    EXPECT_EQ(bench.HostSpeed(), 9600u);
+    EXPECT_EQ(bench.connection->Speed(), 9600u);
   }
 }
 
