@@ -41,6 +41,7 @@ INSTANTIATE_TEST_SUITE_P(
         Exchange("%8%get,\"A0101.log\":{500,0}\r\n", "ER014%8%{wrong arguments}\r\n"),
         Exchange("%8%get,\"A0101.log\":{500,4097}\r\n", "ER014%8%{wrong arguments}\r\n"),
         Exchange("%8%get,\"A0101.log\":{500,512}x\r\n", "ER014%8%{wrong arguments}\r\n"),
+        Exchange("%8%get,\"A0101.log\":{,512}\r\n", "ER014%8%{wrong arguments}\r\n"),
         Exchange("%9%remove,none\r\n", "ER011%9%{no such file}\r\n"),
         Exchange("%9%dm\r\n", "RE003%9%\r\n"),
         Exchange("%9%#OFF#\r\n", "RE003%9%\r\n"),

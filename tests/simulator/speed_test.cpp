@@ -87,6 +87,12 @@ TEST(SpeedTest, SettingTheTerminalIsAnsweredAtTheOldSpeed) {
   EXPECT_EQ(session.Ask("%2%\r\n"), "RE003%2%\r\n");
 }
 
+TEST(SpeedTest, WithoutATagTheTerminalIsSetAtOnceAndSilently) {
+  Session session;
+  EXPECT_EQ(session.Ask("set,cur/term/rate,115200\r\n"), "");
+  EXPECT_EQ(session.receiver.speed(), 115200U);
+}
+
 TEST(SpeedTest, TheSpeedChangesOnlyWhenTheReplyHasLeft) {
   QuorinOptions options;
   options.line.paced = true;

@@ -66,6 +66,21 @@ TEST(VelmarTransferTest, ALogHasExactlyTheseBytes) {
   EXPECT_EQ(session.FetchFile(), expected);
 }
 
+TEST(VelmarTransferTest, ALogNamesThePortByANumber) {
+  constexpr size_t kPortOffset = 7;
+  for (const auto& [name, number] : {std::pair("COM1", 0x20),
+                                     std::pair("COM3", 0x60),
+                                     std::pair("COM4", 0xA0),
+                                     std::pair("USB1", 0xA0)}) {
+    VelmarOptions options;
+    options.identity.port_name = name;
+    VelmarSession session(options);
+    session.Ask("currentfile A0101.log all");
+    const Bytes reply = ToBytes(session.Ask("log filetransferb"));
+    EXPECT_EQ(reply.at(kAcknowledged + kPortOffset), number) << name;
+  }
+}
+
 TEST(VelmarTransferTest, TheSequenceStaysAtItsMostUntilItFits) {
   VelmarSession session(InChunksOf(1), OneFile(65'600));
   const auto chunks = ReadChunks(session.FetchFile());
