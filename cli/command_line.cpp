@@ -210,7 +210,7 @@ void CheckArguments(const Arguments& arguments, bool needs_port) {
   if ((needs_port && arguments.port.empty()) || control) {
     throw UsageError("the port name is empty or contains a control character");
   }
-  // A speed of the environment is about serial ports only, and nobody asked for it here.
+  // RCVLINK_SPEED is meant for serial ports, and is no mistake with --link usb.
   const bool asked_speed = arguments.speed && std::getenv("RCVLINK_SPEED") == nullptr;
   if (needs_port && arguments.link == eInstanceUSB && (asked_speed || arguments.rts)) {
     throw UsageError("--speed and --rts apply to serial ports, not to --link usb");

@@ -47,13 +47,13 @@ struct Context {
 // How progress is to be shown; never `kAuto`.
 ProgressMode ProgressModeOf(const Context& context);
 
-// A command's end. A command that could do nothing throws its `Failure` instead.
+// How a command ended. One that could do nothing throws its `Failure` instead.
 struct Outcome {
   ExitCode exit = ExitCode::kDone;
   Json document{};  // printed for --json
 };
 
-// {"tried", "port", "code", "meaning", "hint", "exit"}
+// {"tried", "port", "code", "meaning", "hint", "kept", "exit"}; hint and kept only if there are any
 Json ToJson(const Failure& failure);
 
 }  // namespace cli

@@ -21,7 +21,7 @@ class Destination {
   // Returns ERROR_SUCCESS, or the Win32 error.
   virtual DWORD Write(const void* data, DWORD size) = 0;
 
-  // All bytes are there.
+  // Called when all bytes are written.
   // Throws Failure.
   virtual void Complete() {}
 

@@ -180,7 +180,7 @@ class Reader {
     if (!thread.command) return;
     const bool is_failure = next.kind == TraceKind::kFailure || next.kind == TraceKind::kTimeout;
     if (!is_failure && (!thread.sent_ms || next.kind == TraceKind::kRead)) return;
-    // Timers may be a little early.
+    // After a Velmar receiver's reply the library pauses for 500 ms; timers may be a little early.
     constexpr uint64_t kRestMs = 450;
     const uint64_t sent_ms = thread.sent_ms.value_or(next.elapsed_ms);
     const bool is_answered =
@@ -272,7 +272,7 @@ class Reader {
                         " bytes are not part of a report.");
     }
     if (trace.lines.empty()) return;
-    // Reports lose line ends after such characters, so that a missing one is no sign of a cut.
+    // A line with bytes beyond ASCII may have lost its end, so a missing one is no sign of a cut.
     const TraceLine& last = trace.lines.back();
     if (!last.has_end && !IsBeyondAscii(last.bytes)) {
       remarks.push_back("The report ends in the middle of its last line.");

@@ -13,7 +13,7 @@ namespace cli {
 struct Family {
   EProtocol protocol;
   const char* name;  // in small letters it is the word of --protocol
-  // The speeds to try first: the factory setting, or that of a download that raised it.
+  // The speeds to try first: the factory setting, and the one to which a download raises it.
   std::array<unsigned long, 2> usual_speeds;
   // What the family's port settings take for odd and even parity and for one stop bit; two stop
   // bits are one more.

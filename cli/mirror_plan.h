@@ -22,7 +22,7 @@ enum class MirrorStep {
 // `deletes`: whether files are to be deleted on the receiver.
 MirrorStep StepFor(uint64_t size, std::optional<uint64_t> local_size, bool deletes);
 
-// The worse of two exit codes: a cancellation is the worst, a file of this computer the least.
+// The worse of two exit codes. A cancellation is worst, a failure with a local file least bad.
 ExitCode Worse(ExitCode first, ExitCode second);
 
 // How far the files of a mirror are.

@@ -19,8 +19,8 @@ namespace cli {
 // The failure for an invalid command line.
 Failure UsageError(const std::string& meaning);
 
-// Prepares words for the parser: in reverse order, and with a mark before those that it would
-// change.
+// Prepares words for the parser: in reverse order, as it takes them, and with a mark before those
+// that it would change.
 std::vector<std::string> Hidden(const std::vector<std::string>& words);
 
 // Removes the mark: the word as it was typed.

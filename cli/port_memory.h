@@ -24,10 +24,10 @@ class PortMemory {
   // Nothing for a port that is not known, or when the file cannot be read or is damaged.
   std::optional<KnownSetting> Recall(const std::wstring& port) const;
 
-  // Returns false when it could not be written down.
+  // Returns false when the file could not be written.
   bool Remember(const std::wstring& port, const KnownSetting& setting) const;
 
-  // Returns false when it could not be written down.
+  // Returns false when the file could not be written.
   bool Forget(const std::wstring& port) const;
 
  private:

@@ -39,7 +39,7 @@ struct Failure {
 // The meaning of a failure: its own, or that of its code.
 std::string MeaningOf(const Failure& failure);
 
-// What the user can try: the failure's own hint, or the way to the entry of its code.
+// What the user can try: the failure's own hint, or the command that explains its code.
 std::string HintOf(const Failure& failure);
 
 // The failure as lines for a person, each with its line end.

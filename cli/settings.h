@@ -60,7 +60,7 @@ std::string ValueWord(const SettingChange& change);
 // not offer it.
 std::optional<unsigned long> FamilyNumber(const SettingChange& change, EProtocol family);
 
-// Settings for the one try on a port: 8 data bits, no parity, one stop bit.
+// Settings for a try on a port: 8 data bits, no parity, one stop bit.
 // `speed`: bits per second; 0 keeps the port's own.
 DCB PortSettings(unsigned long speed, RtsMode rts);
 

@@ -40,7 +40,7 @@ class Targets {
   // Throws Failure when the name is impossible, or an earlier name has taken the file.
   std::optional<std::filesystem::path> TakeExisting(const std::wstring& name);
 
-  // The folder of all targets; empty for that of a single target named by the user.
+  // The folder of the targets; empty for the current one, and when the user named a file.
   const std::filesystem::path& folder() const { return folder_; }
 
  private:

@@ -1,4 +1,4 @@
-// The end of a command that handles several files, of which some may fail.
+// What a command did with several files, of which some may have failed.
 #ifndef RCVLINK_CLI_COMMANDS_FILE_REPORT_H_
 #define RCVLINK_CLI_COMMANDS_FILE_REPORT_H_
 
@@ -20,14 +20,14 @@ class FileReport {
   // Records a file that failed, and prints the failure.
   void AddFailed(const std::wstring& name, Failure failure);
 
-  // Records that the command ended early.
+  // Records how many files were left when the command ended early.
   void AddUntried(size_t count);
 
   // Records whether the receiver's file list was complete.
   // `doubt`: why not; empty when it was.
   void SetComplete(const std::string& doubt);
 
-  // The command's end: that of the first failure, or of the cancellation.
+  // How the command ended. The first failure counts, unless a later one is a cancellation.
   Outcome Finish() &&;
 
  private:

@@ -35,7 +35,7 @@ Targets TargetsIn(const std::wstring& folder) {
   return targets;
 }
 
-// The mirror of a receiver: goes on after a file that failed, and ends by the worst of all.
+// One execution of `mirror`. It goes on after a file that failed; the worst exit code counts.
 class MirrorRun {
  public:
   MirrorRun(Context& context, const MirrorOptions& options)
@@ -174,6 +174,7 @@ class MirrorRun {
     try {
       files = receiver_.ListFiles().files;
       if (files.empty() && listed_before > asked_to_delete_.size()) {
+        // An empty list is no answer: the files that were not deleted are missing too.
         unread = Failure{.code = ResultOfWin32(ERROR_TIMEOUT),
                          .meaning = "the receiver did not list its files again"};
       }
@@ -238,6 +239,7 @@ class MirrorRun {
   uint64_t new_bytes_ = 0;  // that the disk needs room for
   Summary summary_;
   ExitCode worst_ = ExitCode::kDone;
+  // Reported at the end, when it is known what was deleted.
   std::vector<std::pair<std::wstring, Json>> done_;
   std::vector<std::wstring> asked_to_delete_;
 };

@@ -13,7 +13,6 @@ namespace {
 
 std::string Tried(const std::wstring& name) { return "delete " + Printable(name); }
 
-// The library may not notice a refusal, so the directory is read again.
 std::optional<Failure> WhyStillThere(const std::vector<RemoteFile>& files,
                                      const std::wstring& name) {
   if (!HasFile(files, name)) return std::nullopt;
@@ -22,8 +21,8 @@ std::optional<Failure> WhyStillThere(const std::vector<RemoteFile>& files,
                  .meaning = "the command was sent, but the receiver still has the file"};
 }
 
-// Asks for each file; stops when cancelled.
-// Returns the names that were asked for with success.
+// Deletes each file; stops when cancelled.
+// Returns the names for which the library reported no failure.
 std::vector<std::wstring> RemoveAll(Context& context,
                                     Receiver& receiver,
                                     const std::vector<std::wstring>& names,
@@ -47,6 +46,7 @@ std::vector<std::wstring> RemoveAll(Context& context,
   return removed;
 }
 
+// The library may not notice a refusal, so the directory is read again.
 void Verify(Context& context,
             Receiver& receiver,
             size_t listed_before,

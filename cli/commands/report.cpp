@@ -16,7 +16,7 @@
 namespace cli {
 namespace {
 
-// Reports of long sessions have some 100 kB; a larger part would be of no use.
+// Far more than the report of a long session has, which is some 100 kB.
 constexpr size_t kMostBytes = 16'777'216;
 
 struct Content {

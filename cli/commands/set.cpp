@@ -70,7 +70,7 @@ bool AnswersAt(const Context& context, EProtocol family, const DCB& settings) {
   return true;
 }
 
-// Saves this setting for the next command. Nothing deletes the saved one.
+// Saves the setting for the next command; without one, deletes the saved one.
 void Remember(Context& context, const std::optional<KnownSetting>& setting) {
   const Arguments& arguments = context.arguments;
   const PortMemory memory = MemoryOf(arguments);
@@ -159,7 +159,7 @@ class Set : public Command {
 
  private:
   // Sends the change and closes the receiver.
-  // Returns where it was found, on a serial port
+  // Returns the setting at which it was found; nothing on USB.
   // Throws Failure.
   static std::optional<KnownSetting> Change(Context& context,
                                             const SettingChange& change,
