@@ -1,4 +1,4 @@
-// The command-line form of faults, as far as all families share it. Whatever parses throws
+// The command-line form of faults, as far as all families share it. Functions that parse throw
 // std::invalid_argument with a message for the user when the text does not fit.
 #ifndef SIMULATOR_FAULT_TEXT_H_
 #define SIMULATOR_FAULT_TEXT_H_

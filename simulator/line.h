@@ -64,6 +64,7 @@ class Line {
   // Discards what has not left yet. A change of speed that was to follow it happens now.
   void DropOutput();
 
+  // As those of Receiver.
   std::optional<uint64_t> NextSendTime() const;
   Bytes Send(uint64_t now_ms, uint32_t host_speed);
 

@@ -20,11 +20,11 @@ class Receiver {
  public:
   virtual ~Receiver() = default;
 
-  // Bytes the host sent arrive.
+  // Takes bytes that the host has sent.
   virtual void Receive(std::span<const uint8_t> bytes, uint32_t host_speed, uint64_t now_ms) = 0;
 
   // When the next output is due, or nothing while the receiver has nothing to send. The answer
-  // changes with every call of Receive and Send.
+  // may change with every call of Receive and Send.
   virtual std::optional<uint64_t> NextSendTime() const = 0;
 
   // Gives the output of one write. It may be empty: bytes at a speed that the host does not listen

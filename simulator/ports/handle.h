@@ -8,7 +8,7 @@
 
 namespace sim {
 
-// Closes a kernel object. Files are empty at INVALID_HANDLE_VALUE, other objects at null.
+// Closes a kernel object. A failed open gives INVALID_HANDLE_VALUE for a file, null for others.
 struct HandleCloser {
   using pointer = HANDLE;
   void operator()(HANDLE handle) const {

@@ -6,7 +6,7 @@
 
 namespace sim {
 
-// The speed in bit/s that a terminal is set to, odd ones included; asked on either end of a pty.
+// The speed in bit/s that a terminal is set to, also an unusual one; asked on either end of a pty.
 // Throws std::system_error.
 uint32_t HostSpeed(int terminal);
 

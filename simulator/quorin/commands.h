@@ -37,7 +37,7 @@ struct Answer {
   // The texts of the messages to send, or the error text when not ok.
   std::vector<std::string> texts = {""};
 
-  // What the receiver has to do about it.
+  // What the receiver has to do besides the reply.
   std::optional<uint32_t> speed_at_once = std::nullopt;
   std::optional<uint32_t> speed_after_reply = std::nullopt;
   std::optional<bool> echo = std::nullopt;

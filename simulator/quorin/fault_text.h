@@ -1,4 +1,4 @@
-// The command-line form of the faults of a Quorin receiver. Whatever parses throws
+// The command-line form of the faults of a Quorin receiver. Functions that parse throw
 // std::invalid_argument with a message for the user when the text does not fit.
 #ifndef SIMULATOR_QUORIN_FAULT_TEXT_H_
 #define SIMULATOR_QUORIN_FAULT_TEXT_H_

@@ -25,7 +25,7 @@ enum class BlockFaultKind {
   kSilence,         // The block comes, but late; ACK and NAK before it are discarded.
 };
 
-// Happens the first `times` that a block is sent: once means that the block is right when it is sent
+// Happens the first `times` times that a block is sent: after kOnce it is right when it is sent
 // again.
 struct BlockFault {
   BlockFaultKind kind = BlockFaultKind::kDamagedCrc;
@@ -69,8 +69,7 @@ struct Faults {
   std::optional<uint32_t> vanish_after_block = std::nullopt;
 };
 
-// The fault that is due this time that the block is sent, other than a silence. Counts one
-// occurrence.
+// The fault that is due for a block that is sent now, other than a silence. Counts one occurrence.
 std::optional<BlockFaultKind> TakeBlockFault(Faults& faults, uint32_t block, bool last);
 
 // How long the receiver is silent before it sends the block this time. Counts one occurrence.

@@ -32,13 +32,13 @@ struct Endpoint {
 
 // How a device describes itself. It has one configuration with one interface.
 struct DescriptorOptions {
-  // The receiver is on the first bulk one in and the first one out.
+  // The receiver is on the first bulk endpoint of each direction.
   std::vector<Endpoint> endpoints = {{kDefaultInEndpoint}, {kDefaultOutEndpoint}};
   // Class-specific descriptors stand between the interface and its endpoints.
   bool class_descriptor = false;
   // The length in an endpoint descriptor. A longer one is filled up with zeros.
   uint8_t endpoint_length = kEndpointDescriptorLength;
-  // The whole length in the descriptor, instead of the true one.
+  // The total length that the descriptor gives, instead of the true one.
   std::optional<uint16_t> total_length = std::nullopt;
 };
 

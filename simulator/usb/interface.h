@@ -1,4 +1,4 @@
-// What a host says to the USB driver that real receivers are attached through.
+// What a host says to the driver of real receivers on USB.
 #ifndef SIMULATOR_USB_INTERFACE_H_
 #define SIMULATOR_USB_INTERFACE_H_
 

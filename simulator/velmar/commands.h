@@ -26,7 +26,7 @@ struct VelmarAnswer {
   // The file to send, as binary logs.
   std::optional<FileEntry> transfer = std::nullopt;
 
-  // What the receiver has to do about it.
+  // What the receiver has to do besides the reply.
   std::optional<uint32_t> speed_after_reply = std::nullopt;
   bool stop_logs = false;
   // What the transcript says about a setting that took effect; empty for nothing.
@@ -45,7 +45,8 @@ class VelmarCommandSet {
  public:
   VelmarCommandSet(VelmarIdentity identity, const VelmarListing& listing, FileStore files);
 
-  // `speed` is that of the line; `faults` says which sizes are wrong and which ports are missing.
+  // `speed` is that of the line; `faults` says which sizes are wrong, whether the host's port is
+  // missing, and whether settings change.
   VelmarAnswer Execute(std::string_view command, uint32_t speed, const VelmarFaults& faults);
 
   const FileStore& files() const { return files_; }

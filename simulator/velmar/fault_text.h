@@ -1,5 +1,5 @@
-// The command-line form of the faults and components of a Velmar receiver. Whatever parses throws
-// std::invalid_argument with a message for the user when the text does not fit.
+// The command-line form of the faults and components of a Velmar receiver. Functions that
+// parse throw std::invalid_argument with a message for the user when the text does not fit.
 #ifndef SIMULATOR_VELMAR_FAULT_TEXT_H_
 #define SIMULATOR_VELMAR_FAULT_TEXT_H_
 

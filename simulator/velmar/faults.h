@@ -22,7 +22,7 @@ enum class VelmarChunkFaultKind {
   kSilence,        // The chunk comes `amount` ms late.
 };
 
-// Happens to one chunk of a file, the first `times` that it is sent.
+// Happens to one chunk of a file, the first `times` times that it is sent.
 struct VelmarChunkFault {
   VelmarChunkFaultKind kind = VelmarChunkFaultKind::kDamagedCrc;
   uint32_t chunk = 0;  // Chunks are counted from 0.
@@ -75,7 +75,7 @@ struct VelmarFaults {
   std::optional<uint32_t> vanish_after_chunk = std::nullopt;
 };
 
-// The fault of one kind that is due this time that the chunk is sent. Counts one occurrence.
+// The fault of one kind that is due for a chunk that is sent now. Counts one occurrence.
 std::optional<VelmarChunkFault> TakeChunkFault(VelmarFaults& faults,
                                                VelmarChunkFaultKind kind,
                                                uint64_t chunk);

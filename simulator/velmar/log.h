@@ -27,7 +27,7 @@ std::string FrameAsciiLog(const AsciiLog& log,
                           uint32_t sequence,
                           bool damaged_crc);
 
-// The same log abbreviated, which has no CRC.
+// An abbreviated log, which has no CRC.
 std::string FrameAbbreviatedLog(std::string_view name, std::string_view port_name);
 
 // A binary log, with a header that may be wrong.

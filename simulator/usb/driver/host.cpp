@@ -26,8 +26,8 @@ void NTAPI CancelRequest(DEVICE_OBJECT*, IRP* irp) {
   Complete(irp, STATUS_CANCELLED);
 }
 
-// Puts a request where it waits for the program, or for a transfer. Otherwise it must be completed
-// with the status that this gives.
+// Puts a request where it waits for the program or for a transfer, and gives STATUS_PENDING. With
+// any other status the caller must complete it.
 NTSTATUS Enqueue(HostDevice* device, Pooled<Request> request, Completions& completions) {
   const StateGuard guard;
   Plug* const plug = device->plug;

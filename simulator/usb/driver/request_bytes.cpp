@@ -38,6 +38,7 @@ ULONG InputLength(const Request& request) {
 ULONG Room(const Request& request) {
   switch (request.kind) {
     case RequestKind::kControl:
+      // With METHOD_IN_DIRECT the second buffer is input, too.
       return MethodOf(StackOf(request)) == METHOD_IN_DIRECT
                  ? 0
                  : StackOf(request)->Parameters.DeviceIoControl.OutputBufferLength;

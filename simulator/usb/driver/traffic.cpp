@@ -21,7 +21,7 @@ void EndListed(LIST_ENTRY* list,
     }
     if (request->irp != nullptr && !Claim(request->irp)) {
       RemoveEntryList(&request->link);
-      // Its cancel routine takes it out of a list: from now on one of its own.
+      // Its cancel routine will unlink it, so it is left as a list of its own.
       InitializeListHead(&request->link);
     } else {
       completions.Add(Unlink(request), status);
