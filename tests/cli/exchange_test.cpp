@@ -136,7 +136,7 @@ TEST(ExchangeTest, MidnightPassesAndClocksAreSetBack) {
   EXPECT_EQ(set.remarks, std::vector<std::string>{"The clock was set back during the report."});
 }
 
-// A line with characters of several bytes loses as many at its end, the line end with them.
+// A line with characters of several bytes loses bytes at its end, and so its line end.
 TEST(ExchangeTest, ALineOfAMultiByteCodePageMayRunIntoTheNext) {
   const std::string report =
       "12:00:00.0000      7 CSerialConnection::Open - OK [\x93\xFA\x96\x7B"

@@ -69,7 +69,7 @@ TEST_F(Cli, ANewSpeedIsTried) {
   EXPECT_EQ(result.status, kDone) << result.errors;
   EXPECT_THAT(result.output, HasSubstr("it answers with that setting"));
   EXPECT_THAT(result.output, HasSubstr("--speed 57600"));
-  // The receiver is checked: the ping comes after the change.
+  // The receiver is checked: a handshake comes after the change.
   const std::string transcript = receiver.Transcript();
   EXPECT_NE(transcript.find("> dm", transcript.find("= speed 57600")), std::string::npos);
 }

@@ -101,7 +101,7 @@ TEST_F(Find, ATerminalShowsTheTryAndErasesIt) {
   EXPECT_THAT(result.output, AllOf(HasSubstr("Quorin receiver"), Not(HasSubstr("try 1"))));
 }
 
-// Nothing else is shown after the try that would overwrite it.
+// Nothing that is shown later would overwrite the line of the try.
 TEST_F(Find, AFailedTryIsErased) {
   const bed::SimulatedPort silent({"quorin", "--mute", "*"});
   const auto result =

@@ -18,7 +18,7 @@ using testing::IsEmpty;
 
 namespace {
 
-// Its result. After a failure the record has no strings.
+// The result of GetReceiverInfo. After a failure the record has no strings.
 long GetInfo(void* receiver, HANDLE abort_event = nullptr) {
   CReceiverInfo info{};
   info.bstrModel = info.bstrReceiverId = reinterpret_cast<wchar_t*>(&info);

@@ -34,7 +34,7 @@ class ApiSearch : public testing::Test {
             "CSerialConnection::Flush",
             "CSerialConnection::Open - OK [" + port_ + "]"};
   }
-  // The line at the end of a connection.
+  // The lines at the end of a connection.
   host::Lines LinesOfEnd() const {
     return {"CAbstractConnection::Cancel [" + port_ + "]",
             "CAbstractConnection::Disconnect - disconnected [" + port_ + "]"};

@@ -230,8 +230,7 @@ INSTANTIATE_TEST_SUITE_P(
                     Refusal{"NoResetIn", {"--refuse-reset", "0x81"}, true, 2}),
     [](const auto& refusal) { return refusal.param.name; });
 
-// The device has neither 0x01 nor 0x81 as a bulk pipe of that direction, so binding the defaults
-// fails.
+// The device has neither of the default endpoints, 0x01 and 0x81, so binding fails.
 TEST_F(ApiUsb, WithoutBulkPipesTheUsualAddressesAreTried) {
   const bed::SimulatedUsb usb({"quorin", "--endpoints", "0x83:interrupt,0x02:interrupt"});
   EXPECT_TRUE(FAILED(Create(usb)));

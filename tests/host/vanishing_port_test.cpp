@@ -90,8 +90,8 @@ TEST(ApiVanishingReceiver, EndsATransfer) {
 
 // Waits for the whole time-out of a reply, for three receivers at once.
 //
-// The third one did not follow to the higher speed of a download and would not receive the old
-// speed either: an abort ends its host's second wait.
+// The third one does not follow to the higher speed of a download, so it would not receive the
+// command that puts the speed back either: an abort ends the wait for that reply.
 TEST(ApiSilence, IsATimeOut) {
   bed::SimulatedPort first({"quorin"});
   bed::SimulatedPort second({"quorin"});

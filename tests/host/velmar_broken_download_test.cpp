@@ -111,7 +111,7 @@ TEST_P(ApiVelmarBrokenDownload, ByAnAbortFromAnotherThread) {
   ExpectFilesAreListed();
 }
 
-// But a download does not check the flag: it is complete, and the flag is still set.
+// A download as the next operation does not check the flag: it is complete, and the flag stays set.
 TEST_P(ApiVelmarBrokenDownload, ByAnAbortFromItsOwnProgress) {
   host::Progress progress([&](int percent) {
     if (percent == 1) devapi::Abort(receiver_.get());

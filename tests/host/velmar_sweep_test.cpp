@@ -13,11 +13,10 @@ using testing::ElementsAreArray;
 
 namespace {
 
-// The receiver hears 19200 only and overlooks the first questions that reach it: at the last speed
-// of the first mode, at the same speed as the port's current one in the second mode, and at the
-// last of the second. The third mode begins with that speed once more. (It never answers the first
-// of the two questions: nobody waits for that answer, and a late one could be taken for the second
-// question's.)
+// The receiver is at 19200 bit/s and does not answer the first three times that it is asked: at the
+// end of the first mode, at the beginning of the second, which tries the port's current speed, and
+// at the end of the second. It answers at the beginning of the third. (It never answers the first
+// of the two commands: nobody waits for that reply, and a late one could be taken for the other.)
 TEST(ApiVelmarSweep, FindsAReceiverInTheThirdMode) {
   const bed::SimulatedPort port(
       {"velmar", "--speed", "19200", "--mute", "interfacemode", "--mute", "unlogall@3"});

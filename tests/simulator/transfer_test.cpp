@@ -11,7 +11,7 @@ namespace {
 constexpr unsigned kData = 0x02;
 constexpr unsigned kLast = 0x04;
 
-// The CRCs of a file of 1100 test bytes, computed with another implementation.
+// The CRCs of a file of 1100 test bytes, computed without the simulator's code.
 constexpr unsigned kCrcOfBlock[] = {0xB8C4, 0x8870, 0x6AE6};
 
 TEST(TransferTest, AFileOfThreeBlocksHasTheKnownChainOfCrcs) {

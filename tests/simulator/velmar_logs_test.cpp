@@ -32,7 +32,7 @@ TEST(VelmarLogsTest, TheHeaderHasTenFields) {
   EXPECT_TRUE(logs[0].good_crc);
 }
 
-// The whole reply to the byte; its CRC was computed with another implementation.
+// The whole reply to the byte; its CRC was computed without the simulator's code.
 TEST(VelmarLogsTest, AReplyHasExactlyTheseBytes) {
   FileStore files;
   files.Add("A0101.log", ToBytes("0123456789abcdefghij"), 1'700'000'000);

@@ -53,7 +53,7 @@ INSTANTIATE_TEST_SUITE_P(Sizes,
                                          std::pair(5000, 1992),
                                          std::pair(200'000, 65527)));
 
-// The whole log to the byte; its CRC was computed with another implementation.
+// The whole log to the byte; its CRC was computed without the simulator's code.
 TEST(VelmarTransferTest, ALogHasExactlyTheseBytes) {
   FileStore files;
   files.Add("A0101.log", ToBytes("0123456789abcdefghij"), 0);

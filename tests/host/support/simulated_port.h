@@ -55,7 +55,7 @@ class SimulatedPort {
   // The folder that the receiver serves.
   const TempFolder& files() const { return files_; }
 
-  // Unplugs the receiver in peace and returns its program's exit status. The port is then absent.
+  // Asks the receiver's program to end and returns its exit status. The port is then absent.
   int Stop();
   // Unplugs it in the middle of whatever it does.
   void Kill();
