@@ -3,8 +3,8 @@
 # for the programs that open them.
 #
 # The ports of tests/bed/ports.conf are links in the prefix's folder of devices: COM7 leads to
-# build/ports/com7, and so on. Whoever wants a receiver on a port puts a link to its pseudo-terminal
-# there; no link, no port: opening it then fails with ERROR_FILE_NOT_FOUND. (A port named in Wine's
+# build/ports/com7, and so on. A link there to a receiver's pseudo-terminal puts the receiver on the
+# port. Without it, opening the port fails with ERROR_FILE_NOT_FOUND. (A port named in Wine's
 # registry instead would open although nothing is there.)
 set -euo pipefail
 
