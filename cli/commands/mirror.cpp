@@ -100,8 +100,8 @@ class MirrorRun {
       if (job.step == MirrorStep::kDownload) new_bytes_ += job.file.size;
       total_.files += job.step != MirrorStep::kNothing;
     }
-    context_.PrintStatus(std::to_string(jobs.size()) + " files on the receiver, " +
-                         std::to_string(jobs.size() - total_.files) + " already here; " +
+    context_.PrintStatus("Files to mirror: " + std::to_string(jobs.size()) +
+                         ", already here: " + std::to_string(jobs.size() - total_.files) + "; " +
                          FormatBytes(total_.total) + " to download.\n");
     if (options_.times) {
       context_.PrintStatus("File times are taken as " + InWords(*options_.times) + ".\n");
@@ -259,7 +259,7 @@ class MirrorCommand : public Command {
              kMostNames);
     AddWord<TimeZone>(app,
                       "--times",
-                      "Set file times as on the receiver, which are utc or local",
+                      "Set file times as on the receiver, whose clock is utc or local",
                       "ZONE",
                       {{"utc", TimeZone::kUtc}, {"local", TimeZone::kLocal}},
                       options_.times);
