@@ -59,7 +59,7 @@ constexpr std::array<ReplyFaultOption, 7> kReplyFaults = {{
     {"--bad-length",
      ReplyFaultKind::kWrongLength,
      "BYTES[:COMMAND][@TIMES]",
-     "a reply with a wrong length in its header, by so many bytes (fewer: --bad-length=-3)"},
+     "so many bytes added to the length in the header (negative: --bad-length=-3)"},
 }};
 
 void AddIdentityOptions(CLI::App& command, QuorinOptions& options) {
