@@ -126,7 +126,7 @@ class CheckOfSlowReceiver : public testing::TestWithParam<std::tuple<Link, Event
     return std::count_if(
         lines.begin(), lines.end(), [](const std::string& line) { return line.starts_with("< "); });
   }
-  // The result of the last one.
+  // Where the last one is in the transcript.
   size_t PlaceOfQuestion() const { return slow_->Transcript().rfind(link().question); }
 
   static Link link() { return std::get<0>(GetParam()); }

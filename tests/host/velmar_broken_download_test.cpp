@@ -40,7 +40,7 @@ class ApiVelmarBrokenDownload : public testing::TestWithParam<Behaviour> {
         [this, progress] { return receiver_.Download(L"A.log", stream_, progress); });
   }
 
-  // The receiver is back at its old speed, which it was sent at the higher one, and so is the host.
+  // Both are back at the old speed. The command for that was sent at the higher one.
   void ExpectBothAtTheOldSpeed() {
     receiver_.port.WaitForTranscript("= speed 9600\n");
     host::Lines speeds;
