@@ -73,10 +73,6 @@ std::string PartiesOf(TraceKind kind) {
   }
 }
 
-bool IsTrouble(TraceKind kind) {
-  return kind == TraceKind::kRetry || kind == TraceKind::kTimeout || kind == TraceKind::kFailure;
-}
-
 std::string Gap(uint64_t ms) {
   if (ms == 0) return "";
   return "+" + (ms < kMsPerSecond ? std::to_string(ms) + " ms" : Seconds(ms));

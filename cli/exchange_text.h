@@ -12,9 +12,6 @@ namespace cli {
 // "host -> library": from whom to whom; empty for entries that are no message.
 std::string PartiesOf(TraceKind kind);
 
-// Whether it is a retry, a time-out or a failure.
-bool IsTrouble(TraceKind kind);
-
 // "+15 ms", "+2.5 s"; empty for no time.
 std::string Gap(uint64_t ms);
 
