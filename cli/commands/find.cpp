@@ -79,12 +79,15 @@ class Find : public Command {
   void AddOptions(CLI::App& app, Arguments& arguments) override {
     read_ = &arguments;
     AddPort(app, arguments, Need::kOptional);
+    port_ = app.get_option("PORT");
     AddNames(app, "MORE", "More ports, searched at the same time", more_, 0, kMostNames);
     AddFlag(app, "--all", "Search every COM port and USB device", all_);
   }
 
   void Check() const override {
-    if (all_ != read_->port.empty()) {
+    // The port of RCVLINK_PORT was not named on the command line.
+    const bool is_named = port_->count() != 0;
+    if (all_ ? is_named : read_->port.empty()) {
       throw UsageError("find needs either port names or --all");
     }
   }
@@ -134,7 +137,8 @@ class Find : public Command {
     return places;
   }
 
-  const Arguments* read_ = nullptr;  // while the command line is read
+  const Arguments* read_ = nullptr;  // both while the command line is read
+  const CLI::Option* port_ = nullptr;
   std::vector<std::wstring> more_;
   bool all_ = false;
 };

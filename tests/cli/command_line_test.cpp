@@ -280,6 +280,12 @@ TEST(CommandLineTest, ThePortOfTheEnvironmentLeavesNamesAlone) {
   EXPECT_EQ(Refusal({"ls", "a.jps"}).exit, ExitCode::kUsage);
 }
 
+TEST(CommandLineTest, ThePortOfTheEnvironmentIsNoneOfFindAll) {
+  const Variable port("RCVLINK_PORT", "COM7");
+  EXPECT_NO_THROW(Parse({"find", "--all"}));
+  EXPECT_EQ(Refusal({"find", "COM8", "--all"}).exit, ExitCode::kUsage);
+}
+
 TEST(CommandLineTest, SkippingNeedsFilesThatCanBeHere) {
   EXPECT_EQ(Refusal({"get", "COM7", "a", "-o", "NUL", "--skip-existing"}).exit, ExitCode::kUsage);
   EXPECT_EQ(Refusal({"get", "COM7", "*.jps", "-o", "-"}).exit, ExitCode::kUsage);
