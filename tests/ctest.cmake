@@ -56,8 +56,6 @@ endforeach()
 
 rcvlink_shards(2 unit_tests wine 120)
 rcvlink_shards(1 cli_unit_tests wine 120)
-rcvlink_test(msvc_host wine 120 ${CMAKE_RUNTIME_OUTPUT_DIRECTORY}/msvc_host.exe)
-set_tests_properties(msvc_host PROPERTIES LABELS "")
 # Many small shards: the last ones end at about the same time.
 rcvlink_shards(32 host_tests bed 600)
 rcvlink_shards(32 cli_tests bed 300)
