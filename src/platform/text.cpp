@@ -34,15 +34,33 @@ std::string ToNarrow(std::wstring_view text) {
 
 namespace {
 
-// The length is measured first, since vsprintf_s does not cut a text that is too long, but fails.
-template <typename Character, typename Measure, typename Print>
-std::basic_string<Character> Format(const Character* format, Measure measure, Print print) {
+int CountCharacters(const char* format, va_list arguments) { return _vscprintf(format, arguments); }
+int CountCharacters(const wchar_t* format, va_list arguments) {
+  return _vscwprintf(format, arguments);
+}
+
+void Print(std::string& text, const char* format, va_list arguments) {
+  vsprintf_s(text.data(), text.size(), format, arguments);
+}
+void Print(std::wstring& text, const wchar_t* format, va_list arguments) {
+  vswprintf_s(text.data(), text.size(), format, arguments);
+}
+
+template <typename Character>
+size_t Measure(const Character* format, va_list arguments) {
   if (!format) throw HResultError(E_INVALIDARG);
-  const int length = measure();
+  const int length = CountCharacters(format, arguments);
   if (length < 0) throw HResultError(E_FAIL);
+  return static_cast<size_t>(length);
+}
+
+// The length is measured first, since vsprintf_s does not cut a text that is too long, but fails.
+template <typename Character>
+std::basic_string<Character> Format(const Character* format, va_list arguments) {
+  const size_t length = Measure(format, arguments);
   try {
-    std::basic_string<Character> text(static_cast<size_t>(length) + 1, Character{});
-    print(text.data(), text.size());
+    std::basic_string<Character> text(length + 1, Character{});
+    Print(text, format, arguments);
     text.pop_back();
     return text;
   } catch (const std::bad_alloc&) {
@@ -53,18 +71,16 @@ std::basic_string<Character> Format(const Character* format, Measure measure, Pr
 }  // namespace
 
 std::string FormatArguments(const char* format, va_list arguments) {
-  return Format(
-      format,
-      [&] { return _vscprintf(format, arguments); },
-      [&](char* text, size_t size) { vsprintf_s(text, size, format, arguments); });
+  return Format(format, arguments);
 }
 
 std::wstring FormatArguments(const wchar_t* format, va_list arguments) {
-  return Format(
-      format,
-      [&] { return _vscwprintf(format, arguments); },
-      [&](wchar_t* text, size_t size) { vswprintf_s(text, size, format, arguments); });
+  return Format(format, arguments);
 }
+
+void CheckFormat(const char* format, va_list arguments) { Measure(format, arguments); }
+
+void CheckFormat(const wchar_t* format, va_list arguments) { Measure(format, arguments); }
 
 std::string FormatText(const char* format, ...) {
   va_list arguments;

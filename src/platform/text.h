@@ -34,6 +34,10 @@ std::string FormatText(const char* format, ...);
 std::string FormatArguments(const char* format, va_list arguments);
 std::wstring FormatArguments(const wchar_t* format, va_list arguments);
 
+// Raises what FormatArguments raises for this format, and makes no text.
+void CheckFormat(const char* format, va_list arguments);
+void CheckFormat(const wchar_t* format, va_list arguments);
+
 }  // namespace rcvlink
 
 #endif  // RCVLINK_PLATFORM_TEXT_H_

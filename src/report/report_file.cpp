@@ -5,6 +5,7 @@
 #include <cstdarg>
 #include <cstdio>
 #include <mutex>
+#include <span>
 #include <string>
 #include <string_view>
 #include <vector>
@@ -16,6 +17,7 @@
 #include "platform/text.h"
 #include "platform/win32.h"
 
+using rcvlink::CheckFormat;
 using rcvlink::CriticalSection;
 using rcvlink::FileHandle;
 using rcvlink::FormatArguments;
@@ -34,12 +36,13 @@ class ReportFile {
   void WriteEntry(const wchar_t* format, va_list arguments);
 
  private:
-  void WriteStamp();
   void Write(const char* bytes, size_t length);
 
   CriticalSection lock_;
   FileHandle file_;
 };
+
+constexpr size_t kStampSize = 32;  // more than a stamp with the longest number of a thread
 
 constinit ProcessObject<ReportFile> report;
 
@@ -64,60 +67,66 @@ void ReportFile::Create(const wchar_t* name) {
 
 // A write that fails is ignored: an operation does not fail because it cannot be traced.
 void ReportFile::Write(const char* bytes, size_t length) {
-  if (!file_) return;
   DWORD written = 0;
   WriteFile(file_.get(), bytes, static_cast<DWORD>(length), &written, nullptr);
 }
 
-void ReportFile::WriteStamp() {
-  const std::scoped_lock lock(lock_);
+// The beginning of an entry: the local time and the thread. The milliseconds have four digits: programs
+// that read reports find the text by this width.
+size_t PrintStamp(std::span<char> out) {
   SYSTEMTIME now;
   GetLocalTime(&now);
-  // The milliseconds have four digits: programs that read reports find the stamp by this width.
-  std::array<char, 64> stamp{};
-  const int length = sprintf_s(stamp.data(),
-                               stamp.size(),
+  const int length = sprintf_s(out.data(),
+                               out.size(),
                                "%02u:%02u:%02u.%04u %6lu ",
                                now.wHour,
                                now.wMinute,
                                now.wSecond,
                                now.wMilliseconds,
                                GetCurrentThreadId());
-  Write(stamp.data(), static_cast<size_t>(std::max(length, 0)));
+  return static_cast<size_t>(std::max(length, 0));
 }
 
+// Without a report an entry is not made; but a format that is wrong is raised all the same, so that a
+// host finds its mistake also when nobody traces.
 void ReportFile::WriteEntry(const char* format, va_list arguments) {
   const std::scoped_lock lock(lock_);
-  WriteStamp();
+  if (!file_) return CheckFormat(format, arguments);
   const std::string text = FormatArguments(format, arguments);
-  Write(text.data(), text.size());
+
+  std::string entry(kStampSize + text.size(), '\0');
+  const size_t stamp_length = PrintStamp(entry);
+  std::ranges::copy(text, entry.begin() + static_cast<ptrdiff_t>(stamp_length));
+  Write(entry.data(), stamp_length + text.size());
 }
 
 void ReportFile::WriteEntry(const wchar_t* format, va_list arguments) {
   const std::scoped_lock lock(lock_);
-  WriteStamp();
+  if (!file_) return CheckFormat(format, arguments);
   const std::wstring text = FormatArguments(format, arguments);
 
   // Most entries are short and are converted on the stack.
   constexpr size_t kUsualEntry = 1024;
-  std::array<char, (kUsualEntry + 1) * sizeof(wchar_t)> usual{};
+  std::array<char, kStampSize + (kUsualEntry + 1) * sizeof(wchar_t)> usual;
   std::vector<char> longer;
-  const size_t capacity = (text.size() + 1) * sizeof(wchar_t);
-  if (capacity > usual.size()) longer.resize(capacity);
-  char* const converted = longer.empty() ? usual.data() : longer.data();
+  const size_t size = kStampSize + (text.size() + 1) * sizeof(wchar_t);
+  if (size > usual.size()) longer.resize(size);
+  const std::span<char> entry = longer.empty() ? std::span<char>(usual) : std::span<char>(longer);
+  const size_t stamp_length = PrintStamp(entry.first<kStampSize>());
+  const std::span<char> converted = entry.subspan(stamp_length);
   if (WideCharToMultiByte(CP_THREAD_ACP,
                           0,
                           text.c_str(),
                           static_cast<int>(text.size()) + 1,
-                          converted,
-                          static_cast<int>(capacity),
+                          converted.data(),
+                          static_cast<int>(converted.size()),
                           nullptr,
                           nullptr) == 0) {
     return;
   }
   // As many bytes as the text has characters: with multi-byte characters the end of the line is
   // cut. A host that compares reports byte for byte with those of another version relies on it.
-  Write(converted, text.size());
+  Write(entry.data(), stamp_length + text.size());
 }
 
 }  // namespace

@@ -5,6 +5,7 @@
 #include "platform/hresult.h"
 
 using rcvlink::CatchResult;
+using rcvlink::CheckFormat;
 using rcvlink::CopyBstr;
 using rcvlink::FormatArguments;
 using rcvlink::FormatText;
@@ -20,6 +21,22 @@ std::wstring FormatWide(const wchar_t* format, ...) {
   std::wstring text = FormatArguments(format, arguments);
   va_end(arguments);
   return text;
+}
+
+HRESULT CheckNarrow(const char* format, ...) {
+  va_list arguments;
+  va_start(arguments, format);
+  const HRESULT result = CatchResult([&] { return CheckFormat(format, arguments), S_OK; });
+  va_end(arguments);
+  return result;
+}
+
+HRESULT CheckWide(const wchar_t* format, ...) {
+  va_list arguments;
+  va_start(arguments, format);
+  const HRESULT result = CatchResult([&] { return CheckFormat(format, arguments), S_OK; });
+  va_end(arguments);
+  return result;
 }
 
 TEST(CopyBstr, CopiesText) {
@@ -72,6 +89,18 @@ TEST(FormatText, NeedsAFormat) {
 TEST(FormatArguments, MakesWideText) {
   EXPECT_EQ(FormatWide(L"%ls is %d", L"COM7", 7), L"COM7 is 7");
   EXPECT_EQ(CatchResult([] { return FormatWide(nullptr), S_OK; }), E_INVALIDARG);
+}
+
+TEST(CheckFormat, RaisesWhatTheFormatWouldRaise) {
+  EXPECT_EQ(CheckNarrow("%s is %d", "COM7", 7), S_OK);
+  EXPECT_EQ(CheckWide(L"%s is %d", L"COM7", 7), S_OK);
+  EXPECT_EQ(CheckNarrow(nullptr), E_INVALIDARG);
+  EXPECT_EQ(CheckWide(nullptr), E_INVALIDARG);
+}
+
+// A character that the code page does not have cannot be measured.
+TEST(CheckFormat, RaisesForATextThatCannotBeMeasured) {
+  EXPECT_EQ(CheckNarrow("%ls", L"\xD800"), E_FAIL);
 }
 
 }  // namespace
