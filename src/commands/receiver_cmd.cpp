@@ -4,6 +4,7 @@
 #include <cstring>
 #include <limits>
 #include <new>
+#include <utility>
 
 #include "platform/event.h"
 #include "transport/wait_scope.h"
@@ -42,27 +43,35 @@ bool CReceiverCmd::SetCommandText(const char* text) {
 }
 
 void CReceiverCmd::SetReply(const char* text) {
-  const auto length = static_cast<uint32_t>(std::strlen(text));
-  std::unique_ptr<uint8_t[]> copy = AllocateBytes(length);
-  if (!copy) return;
-  std::copy_n(text, length, copy.get());
-  reply_ = std::move(copy);
-  reply_length_ = length;
+  try {
+    KeepReply(text);
+  } catch (const std::bad_alloc&) {
+    return;
+  }
 }
 
-void CReceiverCmd::FreeReply() { reply_.reset(); }
+void CReceiverCmd::KeepReply(std::string reply) {
+  reply_ = std::move(reply);
+  reply_length_ = static_cast<uint32_t>(reply_.size());
+  has_reply_ = true;
+}
+
+void CReceiverCmd::FreeReply() {
+  reply_ = std::string();
+  has_reply_ = false;
+}
 
 HRESULT CReceiverCmd::AppendReply(const void* bytes, uint32_t length) {
   if (!bytes) return E_INVALIDARG;
   if (length == 0) return S_FALSE;
-  const uint32_t old_length = reply_ ? reply_length_ : 0;
-  if (length > std::numeric_limits<uint32_t>::max() - old_length) return E_OUTOFMEMORY;
-  std::unique_ptr<uint8_t[]> joined = AllocateBytes(old_length + length);
-  if (!joined) return E_OUTOFMEMORY;
-  uint8_t* const end = std::copy_n(reply_.get(), old_length, joined.get());
-  std::copy_n(static_cast<const uint8_t*>(bytes), length, end);
-  reply_ = std::move(joined);
-  reply_length_ = old_length + length;
+  if (length > std::numeric_limits<uint32_t>::max() - reply_.size()) return E_OUTOFMEMORY;
+  try {
+    reply_.append(static_cast<const char*>(bytes), length);
+  } catch (const std::bad_alloc&) {
+    return E_OUTOFMEMORY;
+  }
+  reply_length_ = static_cast<uint32_t>(reply_.size());
+  has_reply_ = true;
   return S_OK;
 }
 
@@ -82,7 +91,9 @@ const uint8_t* CReceiverCmd::GetCommand() const { return command_.get(); }
 
 uint32_t CReceiverCmd::GetReplyLength() const { return reply_length_; }
 
-const uint8_t* CReceiverCmd::GetReply() const { return reply_.get(); }
+const uint8_t* CReceiverCmd::GetReply() const {
+  return has_reply_ ? reinterpret_cast<const uint8_t*>(reply_.data()) : nullptr;
+}
 
 bool CReceiverCmd::IsCancelled(HANDLE abort_event) const {
   return cancelled_ || IsSignalled(abort_event);

@@ -6,6 +6,7 @@
 #include <atomic>
 #include <cstdint>
 #include <memory>
+#include <string>
 
 #include "platform/win32.h"
 #include "transport/connection.h"
@@ -62,6 +63,8 @@ class CReceiverCmd {
 
  protected:
   bool SendsWhole() const { return sends_whole_; }
+  // Takes over a whole reply, also an empty one, without a copy.
+  void KeepReply(std::string reply);
   // Writes bytes with the command's write time-out. Results as those of the connection's Write.
   HRESULT Send(CIConnection* connection, const void* bytes, uint32_t length) const;
 
@@ -71,8 +74,9 @@ class CReceiverCmd {
   uint32_t command_length_ = 0;
   uint32_t write_timeout_ms_;
   uint32_t read_timeout_ms_;
-  std::unique_ptr<uint8_t[]> reply_;
+  std::string reply_;
   uint32_t reply_length_ = 0;
+  bool has_reply_ = false;
   std::atomic<bool> cancelled_ = false;
   bool sends_whole_ = false;
 };

@@ -4,6 +4,7 @@
 #include <array>
 #include <cstring>
 #include <new>
+#include <utility>
 
 #include "platform/clock.h"
 #include "platform/hresult.h"
@@ -80,7 +81,7 @@ class CVelmarCommand::Receiving {
     std::copy(buffer_.begin() + count, buffer_.end(), buffer_.begin());
     held_ -= count;
   }
-  const std::string& kept() const { return kept_; }
+  std::string TakeKept() { return std::move(kept_); }
 
  private:
   std::array<char, kBufferLength> buffer_{};
@@ -119,12 +120,7 @@ HRESULT CVelmarCommand::ReceiveReply(CIConnection* connection, HANDLE abort_even
     receiving.Consume(consumed);
     if (need_data && receiving.IsFull()) break;
   }
-  if (keep_reply) {
-    SetReply("");  // an empty reply is kept too: GetReply is not null
-    const std::string& kept = receiving.kept();
-    const HRESULT result = AppendReply(kept.data(), static_cast<uint32_t>(kept.size()));
-    if (FAILED(result)) return result;
-  }
+  if (keep_reply) KeepReply(receiving.TakeKept());
   CurrentClock().Pause(kPauseMs);
   return S_OK;
 }
