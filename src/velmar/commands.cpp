@@ -116,7 +116,7 @@ HRESULT CReadFileCmd::ParseReply(const char* bytes,
   // has no prompt before it from the second piece on, and is recognised by its first byte.
   const bool at_log = length != 0 && static_cast<uint8_t>(bytes[0]) == BinaryHeader::kSync;
   const bool acknowledged = Response() == RESPONSE_OK && at_log;
-  if (!chunk_ && !acknowledged) return CLogCommand::ParseReply(bytes, length, done, consumed);
+  if (!has_chunk_ && !acknowledged) return CLogCommand::ParseReply(bytes, length, done, consumed);
   const HRESULT result = ParseBinaryLog(bytes, length, done, consumed);
   if (Response() == RESPONSE_OK) *done = false;
   return result;
@@ -140,11 +140,13 @@ HRESULT CReadFileCmd::ParseLogBody(const char* bytes,
   const uint32_t chunk_length = says_its_chunk ? message_length - kBodyBeforeData : kUsualChunk;
   if (length < chunk_length) return S_FALSE;
 
-  std::unique_ptr<uint8_t[]> chunk(new (std::nothrow) uint8_t[chunk_length]);
-  if (!chunk) return E_OUTOFMEMORY;
-  std::copy_n(bytes, chunk_length, chunk.get());
-  chunk_ = std::move(chunk);
-  chunk_length_ = chunk_length;
+  // The memory of the chunk before is used again.
+  try {
+    chunk_.assign(bytes, chunk_length);
+  } catch (const std::bad_alloc&) {
+    return E_OUTOFMEMORY;
+  }
+  has_chunk_ = true;
   if (callback_) {
     if (const HRESULT result = callback_->OnDataReceived(context_); FAILED(result)) return result;
   }
@@ -155,6 +157,10 @@ HRESULT CReadFileCmd::ParseLogBody(const char* bytes,
     *done = true;
   }
   return S_OK;
+}
+
+const uint8_t* CReadFileCmd::GetData() const {
+  return has_chunk_ ? reinterpret_cast<const uint8_t*>(chunk_.data()) : nullptr;
 }
 
 CSetCurrentFileCmd::CSetCurrentFileCmd(const char* name) : CVelmarCommand("", kPlain) {

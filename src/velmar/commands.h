@@ -89,15 +89,15 @@ class CReadFileCmd : public CLogCommand {
   HRESULT ParseLogBody(const char* bytes, uint32_t length, bool* done, uint32_t* consumed) override;
   // Whether the receiver may have begun to send the file: it has answered, and not refused.
   bool HasBegun() const { return has_begun_; }
-  const uint8_t* GetData() const { return chunk_.get(); }  // null before the first
-  uint32_t GetDataSize() const { return chunk_length_; }
+  const uint8_t* GetData() const;  // null before the first
+  uint32_t GetDataSize() const { return static_cast<uint32_t>(chunk_.size()); }
 
  private:
   CReadFileCmdCallback* callback_;
   void* context_;
   bool has_begun_ = false;
-  std::unique_ptr<uint8_t[]> chunk_;
-  uint32_t chunk_length_ = 0;
+  bool has_chunk_ = false;
+  std::string chunk_;
 };
 
 // Makes a file the current one, which the commands for header and transfer then mean. A null name
