@@ -5,6 +5,7 @@
 #include <cstdarg>
 #include <cstdio>
 #include <mutex>
+#include <new>
 #include <span>
 #include <string>
 #include <string_view>
@@ -87,6 +88,14 @@ size_t PrintStamp(std::span<char> out) {
   return static_cast<size_t>(std::max(length, 0));
 }
 
+std::vector<char> AllocateEntry(size_t size) {
+  try {
+    return std::vector<char>(size);
+  } catch (const std::bad_alloc&) {
+    throw HResultError(E_OUTOFMEMORY);
+  }
+}
+
 // Without a report an entry is not made; but a format that is wrong is raised all the same, so that a
 // host finds its mistake also when nobody traces.
 void ReportFile::WriteEntry(const char* format, va_list arguments) {
@@ -94,7 +103,7 @@ void ReportFile::WriteEntry(const char* format, va_list arguments) {
   if (!file_) return CheckFormat(format, arguments);
   const std::string text = FormatArguments(format, arguments);
 
-  std::string entry(kStampSize + text.size(), '\0');
+  std::vector<char> entry = AllocateEntry(kStampSize + text.size());
   const size_t stamp_length = PrintStamp(entry);
   std::ranges::copy(text, entry.begin() + static_cast<ptrdiff_t>(stamp_length));
   Write(entry.data(), stamp_length + text.size());
@@ -110,7 +119,7 @@ void ReportFile::WriteEntry(const wchar_t* format, va_list arguments) {
   std::array<char, kStampSize + (kUsualEntry + 1) * sizeof(wchar_t)> usual;
   std::vector<char> longer;
   const size_t size = kStampSize + (text.size() + 1) * sizeof(wchar_t);
-  if (size > usual.size()) longer.resize(size);
+  if (size > usual.size()) longer = AllocateEntry(size);
   const std::span<char> entry = longer.empty() ? std::span<char>(usual) : std::span<char>(longer);
   const size_t stamp_length = PrintStamp(entry.first<kStampSize>());
   const std::span<char> converted = entry.subspan(stamp_length);
@@ -161,17 +170,31 @@ void CloseReportFile() { TheReport().Close(); }
 
 }  // namespace dump_hlp
 
-void rcvlink::Trace(const wchar_t* format, ...) {
+namespace {
+
+// An operation does not fail because it cannot be traced: when there is no memory for a line, the
+// report goes on without it.
+template <typename Character>
+void WriteOrSkip(const Character* format, va_list arguments) noexcept {
+  try {
+    dump_hlp::DumpReportString(format, arguments);
+  } catch (const HResultError&) {
+  }
+}
+
+}  // namespace
+
+void rcvlink::Trace(const wchar_t* format, ...) noexcept {
   va_list arguments;
   va_start(arguments, format);
-  dump_hlp::DumpReportString(format, arguments);
+  WriteOrSkip(format, arguments);
   va_end(arguments);
 }
 
-void rcvlink::Trace(const char* format, ...) {
+void rcvlink::Trace(const char* format, ...) noexcept {
   va_list arguments;
   va_start(arguments, format);
-  dump_hlp::DumpReportString(format, arguments);
+  WriteOrSkip(format, arguments);
   va_end(arguments);
 }
 

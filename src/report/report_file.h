@@ -12,10 +12,10 @@
 namespace rcvlink {
 
 // Writes one entry; nothing when no report is open. The formats are those of Microsoft's printf (%s
-// in a wide format is a wide string); end the text in "\r\n". Raises E_INVALIDARG for a null
-// format, E_FAIL for an invalid one, and E_OUTOFMEMORY.
-void Trace(const wchar_t* format, ...);
-void Trace(const char* format, ...);
+// in a wide format is a wide string); end the text in "\r\n". An entry for which there is no memory
+// is left out.
+void Trace(const wchar_t* format, ...) noexcept;
+void Trace(const char* format, ...) noexcept;
 
 // Creates the report's object, and with it its lock. Called at load, before there can be a second
 // thread that needs the lock.
