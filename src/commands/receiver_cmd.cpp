@@ -26,7 +26,11 @@ CReceiverCmd::CReceiverCmd(const char* text,
                            uint32_t write_timeout_ms,
                            uint32_t read_timeout_ms)
     : flags_(flags), write_timeout_ms_(write_timeout_ms), read_timeout_ms_(read_timeout_ms) {
-  CReceiverCmd::SetCommand(text, static_cast<uint32_t>(std::strlen(text)));
+  // Without its text a command would send a tag alone, which the receiver would take as the beginning
+  // of the next one.
+  if (!CReceiverCmd::SetCommand(text, static_cast<uint32_t>(std::strlen(text)))) {
+    throw std::bad_alloc();
+  }
 }
 
 bool CReceiverCmd::SetCommand(const void* bytes, uint32_t length) {

@@ -15,7 +15,7 @@
 // uses it; only Cancel may be called from another.
 class CReceiverCmd {
  public:
-  // `text` is sent without its terminating zero.
+  // `text` is sent without its terminating zero. Raises std::bad_alloc.
   CReceiverCmd(const char* text,
                uint32_t flags,
                uint32_t write_timeout_ms,

@@ -163,9 +163,9 @@ const uint8_t* CReadFileCmd::GetData() const {
   return has_chunk_ ? reinterpret_cast<const uint8_t*>(chunk_.data()) : nullptr;
 }
 
-CSetCurrentFileCmd::CSetCurrentFileCmd(const char* name) : CVelmarCommand("", kPlain) {
-  SetCommandText(name ? FormatText("currentfile %s all\r", name).c_str() : "currentfile\r");
-}
+CSetCurrentFileCmd::CSetCurrentFileCmd(const char* name)
+    : CVelmarCommand(name ? FormatText("currentfile %s all\r", name).c_str() : "currentfile\r",
+                     kPlain) {}
 
 HRESULT CSetCurrentFileCmd::ParseReply(const char* bytes,
                                        uint32_t length,
@@ -177,15 +177,14 @@ HRESULT CSetCurrentFileCmd::ParseReply(const char* bytes,
   return S_OK;
 }
 
-CDeleteFileCmd::CDeleteFileCmd(const char* name) : CVelmarCommand("", kPlain) {
+CDeleteFileCmd::CDeleteFileCmd(const char* name)
+    : CVelmarCommand(FormatText("del file %s\r", name).c_str(), kPlain) {
   Trace(L"CDeleteFileCmd::CDeleteFileCmd\r\n");
-  SetCommandText(FormatText("del file %s\r", name).c_str());
 }
 
 CRenameFileCmd::CRenameFileCmd(const char* old_name, const char* new_name)
-    : CVelmarCommand("", kPlain) {
+    : CVelmarCommand(FormatText("rename %s %s\r", old_name, new_name).c_str(), kPlain) {
   Trace(L"CRenameFileCmd::CRenameFileCmd\r\n");
-  SetCommandText(FormatText("rename %s %s\r", old_name, new_name).c_str());
 }
 
 CSetPortParamsCmd::CSetPortParamsCmd(const char*,
@@ -194,15 +193,15 @@ CSetPortParamsCmd::CSetPortParamsCmd(const char*,
                                      uint8_t data_bits,
                                      uint8_t stop_bits,
                                      uint8_t handshake)
-    : CVelmarCommand("", kPlain) {
+    : CVelmarCommand(FormatText("COM %u %s %u %u %s\r",
+                                baud,
+                                ParityWord(parity),
+                                data_bits,
+                                stop_bits,
+                                HandshakeWord(handshake))
+                         .c_str(),
+                     kPlain) {
   Trace(L"CSetPortParamsCmd::CSetPortParamsCmd\r\n");
-  SetCommandText(FormatText("COM %u %s %u %u %s\r",
-                            baud,
-                            ParityWord(parity),
-                            data_bits,
-                            stop_bits,
-                            HandshakeWord(handshake))
-                     .c_str());
 }
 
 CSetPortParamsCmd::CSetPortParamsCmd(const PortConfigLog& settings)
