@@ -33,7 +33,8 @@ BOOL SimulatedComPort::ReadFile(HANDLE, void* buffer, DWORD size, DWORD*, OVERLA
   Follow();
   const uint64_t limit_ms =
       uint64_t{timeouts_.ReadTotalTimeoutMultiplier} * size + timeouts_.ReadTotalTimeoutConstant;
-  pending_ = {static_cast<uint8_t*>(buffer), size, 0, port_.Now() + limit_ms};
+  const uint64_t end_ms = is_usb ? UINT64_MAX : port_.Now() + limit_ms;
+  pending_ = {static_cast<uint8_t*>(buffer), size, 0, end_ms};
   SetLastError(ERROR_IO_PENDING);
   return FALSE;
 }
@@ -63,7 +64,8 @@ DWORD SimulatedComPort::WaitForMultipleObjects(DWORD count,
         Take(pending_.size - pending_.received, std::min(end_ms, patience_ms) - port_.Now());
     std::ranges::copy(bytes, pending_.buffer + pending_.received);
     pending_.received += static_cast<DWORD>(bytes.size());
-    if (!bytes.empty()) {
+    if (!bytes.empty() && is_usb) end_ms = port_.Now();
+    if (!bytes.empty() && !is_usb) {
       end_ms = std::min(pending_.end_ms, port_.Now() + timeouts_.ReadIntervalTimeout);
     }
   }

@@ -23,6 +23,8 @@ class SimulatedComPort : public rcvlink::DeviceCalls {
   // Whether every opening starts with the port's first state, as after a reset. Other ports keep
   // the state of the previous opening.
   bool forgets = false;
+  // Whether it is a USB device instead, whose reads end with the bytes that have come.
+  bool is_usb = false;
   // Whether the line carries anything while the port is in this state; empty for always. Speeds are
   // the receiver's business.
   std::function<bool(const DCB&)> carries;
