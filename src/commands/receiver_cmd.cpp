@@ -60,6 +60,14 @@ void CReceiverCmd::KeepReply(std::string reply) {
   has_reply_ = true;
 }
 
+void CReceiverCmd::ReserveReply(size_t length) {
+  try {
+    reply_.reserve(length);
+  } catch (const std::bad_alloc&) {
+    return;  // AppendReply tries again
+  }
+}
+
 void CReceiverCmd::FreeReply() {
   reply_ = std::string();
   has_reply_ = false;

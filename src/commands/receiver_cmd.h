@@ -63,6 +63,8 @@ class CReceiverCmd {
 
  protected:
   bool SendsWhole() const { return sends_whole_; }
+  // Makes room for a reply of so many bytes at once, if there is memory for it.
+  void ReserveReply(size_t length);
   // Takes over a whole reply, also an empty one, without a copy.
   void KeepReply(std::string reply);
   // Writes bytes with the command's write time-out. Results as those of the connection's Write.

@@ -111,11 +111,10 @@ CGetFileListCmd::CGetFileListCmd(uint32_t flags)
 }
 
 HRESULT CGetFileListCmd::ParseReply(const char* body, uint32_t length, ReplyKind kind, bool* done) {
-  const std::string text(body, length);
   const HRESULT result = CQuorinCommand::ParseReply(body, length, kind, done);
   if (kind != ReplyKind::kReply || FAILED(result)) return result;
 
-  DirectoryMessage message = ParseDirectoryMessage(text);
+  DirectoryMessage message = ParseDirectoryMessage({body, length});
   switch (message.kind) {
     case DirectoryMessage::Kind::kNothing:
       return S_FALSE;

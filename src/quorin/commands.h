@@ -66,12 +66,12 @@ class CGetFileListCmd : public CQuorinCommand {
   explicit CGetFileListCmd(uint32_t flags);
   // One message holds one entry; the last one sets `done`.
   HRESULT ParseReply(const char* body, uint32_t length, ReplyKind kind, bool* done) override;
-  const std::vector<FileEntry>& Entries() const { return entries_; }
+  const FileEntries& Entries() const { return entries_; }
 
  private:
   bool Append(FileEntry entry);
 
-  std::vector<FileEntry> entries_;
+  FileEntries entries_;
 };
 
 // Names are put into the commands unchanged, as the file list gave them.

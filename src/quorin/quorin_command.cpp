@@ -80,6 +80,7 @@ class CQuorinCommand::Receiving {
   }
   void SearchFrom(size_t position) { scan_from_ = position; }
 
+  size_t Received() const { return received_; }
   bool IsFull() const { return Free() == 0; }
   // How many bytes of the message are still to come.
   size_t Missing(const ReplyHeader& header) const {
@@ -117,6 +118,7 @@ HRESULT CQuorinCommand::ReceiveReply(CIConnection* connection,
       result_ = receiving.Read(connection, GetReadTimeout(), &count);
       if (result_ != S_OK) return S_OK;
       if (count == 0) return parse_nothing();
+      ReserveReply(receiving.Received());
     }
     read_needed = true;
 

@@ -105,11 +105,12 @@ HRESULT CAbstractProtocol::UnlockConnection() {
   return connection_lock_.Unlock() ? TRUE : FALSE;
 }
 
-void CAbstractProtocol::AppendEntries(const std::vector<FileEntry>& entries, CFileList& files) {
+void CAbstractProtocol::AppendEntries(const FileEntries& entries, CFileList& files) {
   constexpr DWORD kListRead = 90;
   constexpr DWORD kListCopying = 10;
   ReportProgress(kListRead);
   const auto count = static_cast<DWORD>(entries.size());
+  if (!files.Reserve(entries.size())) throw HResultError(E_OUTOFMEMORY);
   DWORD i = 0;
   for (const FileEntry& entry : entries) {
     if (!files.Append(CopyBstr(entry.name.c_str()), entry.size, entry.time)) {

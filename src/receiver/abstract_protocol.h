@@ -57,7 +57,7 @@ class CAbstractProtocol : public CIProtocol {
 
   // Copies a directory into the host's list and reports the last tenth of the progress. Raises
   // E_OUTOFMEMORY.
-  void AppendEntries(const std::vector<FileEntry>& entries, CFileList& files);
+  void AppendEntries(const FileEntries& entries, CFileList& files);
 
   // Reports progress; a higher percent counts as 100.
   void ReportProgress(DWORD percent);

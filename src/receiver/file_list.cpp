@@ -26,6 +26,15 @@ bool CFileList::Append(UniqueBstr name, DWORD size, const SYSTEMTIME& time) {
   return true;
 }
 
+bool CFileList::Reserve(size_t count) {
+  try {
+    files_.reserve(count);
+  } catch (const std::bad_alloc&) {
+    return false;
+  }
+  return true;
+}
+
 const CFileInfo& CFileList::At(long index) const {
   if (index < 0 || index >= Count()) {
     RaiseException(EXCEPTION_ARRAY_BOUNDS_EXCEEDED, EXCEPTION_NONCONTINUABLE, 0, nullptr);

@@ -19,6 +19,9 @@ class CFileList {
   // False when the list cannot grow; the name is then freed.
   bool Append(rcvlink::UniqueBstr name, DWORD size, const SYSTEMTIME& time);
 
+  // Makes room for so many files at once; false when there is no memory for them.
+  bool Reserve(size_t count);
+
   long Count() const { return static_cast<long>(files_.size()); }
 
   // The record at an index below Count(). Any other raises the structured exception

@@ -43,10 +43,10 @@ class CGetFileListCmd : public CLogCommand {
                         uint32_t length,
                         bool* done,
                         uint32_t* consumed) override;
-  std::vector<FileEntry>& Entries() { return entries_; }
+  FileEntries& Entries() { return entries_; }
 
  private:
-  std::vector<FileEntry> entries_;
+  FileEntries entries_;
 };
 
 // The header of the current file.

@@ -97,7 +97,7 @@ Progress DecodeVersion(std::string_view body, VersionLog& log) {
   return Progress::kComplete;
 }
 
-Progress DecodeDirectory(std::string_view text, std::vector<FileEntry>& entries) {
+Progress DecodeDirectory(std::string_view text, FileEntries& entries) {
   constexpr size_t kLogFields = 16;  // 10 of the header, 5 of the body, the checksum
   entries.clear();
   const std::vector<std::wstring> fields = SplitFields(WithCommasOnly(text));

@@ -33,7 +33,7 @@ Progress DecodeVersion(std::string_view body, VersionLog& log);
 // DIRENT: one log for each file. Their sequence numbers count down to 0. The entries are those of
 // the whole logs, from the first one to number 0, or to the first one after a gap, which is
 // included. They are set also when more logs are to come.
-Progress DecodeDirectory(std::string_view text, std::vector<FileEntry>& entries);
+Progress DecodeDirectory(std::string_view text, FileEntries& entries);
 
 // FILEHDR: the file that is current.
 struct FileHeaderLog {

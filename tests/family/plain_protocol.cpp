@@ -67,7 +67,7 @@ HRESULT CPlainProtocol::GetFiles(CFileList* files) {
     const MutexGuard guard(connection_lock_);
     ReportProgress(0);
     std::istringstream lines(Ask("list"));
-    std::vector<FileEntry> entries;
+    FileEntries entries;
     for (std::string line; std::getline(lines, line);) {
       std::istringstream fields(line);
       FileEntry entry;

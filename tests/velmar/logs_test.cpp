@@ -131,14 +131,14 @@ std::string Entry(const std::string& name, int sequence) {
   return AsciiLog("DIRENTA", "\"" + name + "\",1000,0,20121231,235959", sequence);
 }
 
-std::vector<std::wstring> Names(const std::vector<FileEntry>& entries) {
+std::vector<std::wstring> Names(const FileEntries& entries) {
   std::vector<std::wstring> names;
   for (const FileEntry& entry : entries) names.push_back(entry.name);
   return names;
 }
 
 TEST(DirectoryLogs, ReadNameSizeAndTime) {
-  std::vector<FileEntry> entries;
+  FileEntries entries;
   EXPECT_EQ(DecodeDirectory(Entry("a.pdc", 0), entries), Progress::kComplete);
   ASSERT_EQ(entries.size(), 1u);
   EXPECT_EQ(entries[0].name, L"a.pdc");
@@ -155,7 +155,7 @@ TEST(DirectoryLogs, ReadNameSizeAndTime) {
 }
 
 TEST(DirectoryLogs, ReadEachPartOfDateAndTime) {
-  std::vector<FileEntry> entries;
+  FileEntries entries;
   EXPECT_EQ(DecodeDirectory(AsciiLog("DIRENTA", "plain,2147483647,77,20130709,010203"), entries),
             Progress::kComplete);
   ASSERT_EQ(entries.size(), 1u);
@@ -171,7 +171,7 @@ TEST(DirectoryLogs, ReadEachPartOfDateAndTime) {
 }
 
 TEST(DirectoryLogs, QuotesProtectCommasOfNames) {
-  std::vector<FileEntry> entries;
+  FileEntries entries;
   EXPECT_EQ(DecodeDirectory(AsciiLog("DIRENTA", "\"a,b\",5,0,20130709,010203"), entries),
             Progress::kComplete);
   ASSERT_EQ(entries.size(), 1u);
@@ -181,7 +181,7 @@ TEST(DirectoryLogs, QuotesProtectCommasOfNames) {
 
 // Bytes between the logs are skipped; only the whole name begins a log.
 TEST(DirectoryLogs, AreFoundAmongOtherFields) {
-  std::vector<FileEntry> entries;
+  FileEntries entries;
   const std::string text = "#DIRENTB,x;#direnta*" + Entry("a", 1) + "[COM1],;*\r\n,\r" + "," +
                            Entry("b", 0) + Entry("c", 0);
   EXPECT_EQ(DecodeDirectory(text, entries), Progress::kComplete);
@@ -190,21 +190,21 @@ TEST(DirectoryLogs, AreFoundAmongOtherFields) {
 
 // A file may have the name of the log.
 TEST(DirectoryLogs, NoLogBeginsInsideAnother) {
-  std::vector<FileEntry> entries;
+  FileEntries entries;
   const std::string text = AsciiLog("DIRENTA", "#DIRENTA,1,0,20121231,235959", 1) + Entry("b", 0);
   EXPECT_EQ(DecodeDirectory(text, entries), Progress::kComplete);
   EXPECT_THAT(Names(entries), testing::ElementsAre(L"#DIRENTA", L"b"));
 }
 
 TEST(DirectoryLogs, WithoutALogWaitForMore) {
-  std::vector<FileEntry> entries;
+  FileEntries entries;
   EXPECT_EQ(DecodeDirectory("#", entries), Progress::kMoreLogs);
   EXPECT_EQ(DecodeDirectory("\"#DIRENTA", entries), Progress::kNothing);
 }
 
 // A log that is cut off is distinguished from a complete one that is not the last.
 TEST(DirectoryLogs, WaitForTheRestOfALogOrForTheNext) {
-  std::vector<FileEntry> entries;
+  FileEntries entries;
   const std::string whole = Entry("a", 1);
   EXPECT_EQ(DecodeDirectory(whole, entries), Progress::kMoreLogs);
   EXPECT_EQ(DecodeDirectory(whole + "#DIRENTA,COM1,0", entries), Progress::kMore);
@@ -212,20 +212,20 @@ TEST(DirectoryLogs, WaitForTheRestOfALogOrForTheNext) {
 }
 
 TEST(DirectoryLogs, CountDownToTheLast) {
-  std::vector<FileEntry> entries;
+  FileEntries entries;
   const std::string text = Entry("a", 3) + Entry("b", 2) + Entry("c", 1) + Entry("d", 0);
   EXPECT_EQ(DecodeDirectory(text, entries), Progress::kComplete);
   EXPECT_THAT(Names(entries), testing::ElementsAre(L"a", L"b", L"c", L"d"));
 }
 
 TEST(DirectoryLogs, AGapIsAnErrorAndKeepsWhatWasRead) {
-  std::vector<FileEntry> entries;
+  FileEntries entries;
   EXPECT_EQ(DecodeDirectory(Entry("a", 3) + Entry("b", 1), entries), Progress::kContradiction);
   EXPECT_THAT(Names(entries), testing::ElementsAre(L"a", L"b"));
 }
 
 TEST(DirectoryLogs, SequencesAtTheEndOfTheirRangeDoNotOverflow) {
-  std::vector<FileEntry> entries;
+  FileEntries entries;
   EXPECT_EQ(DecodeDirectory(Entry("a", 2147483647) + Entry("b", 2147483647), entries),
             Progress::kContradiction);
 }
@@ -235,17 +235,17 @@ TEST(DirectoryLogs, EveryBeginningWaitsForMore) {
   const std::string text = Entry("a", 1) + Entry("b", 0);
   const size_t first = Entry("a", 1).size();
   for (size_t length = 0; length < text.size(); ++length) {
-    std::vector<FileEntry> entries;
+    FileEntries entries;
     const Progress progress = DecodeDirectory(text.substr(0, length), entries);
     EXPECT_TRUE(progress == Progress::kMore || progress == Progress::kMoreLogs) << length;
     EXPECT_EQ(entries.size(), length < first ? 0u : 1u) << length;
   }
-  std::vector<FileEntry> entries;
+  FileEntries entries;
   EXPECT_EQ(DecodeDirectory(text, entries), Progress::kComplete);
 }
 
 TEST(DirectoryLogs, TheSameNumberTwiceIsAnError) {
-  std::vector<FileEntry> entries;
+  FileEntries entries;
   EXPECT_EQ(DecodeDirectory(Entry("a", 1) + Entry("b", 1), entries), Progress::kContradiction);
   EXPECT_EQ(DecodeDirectory(Entry("a", 1) + Entry("b", 2), entries), Progress::kContradiction);
   EXPECT_EQ(DecodeDirectory(Entry("a", 1) + Entry("b", -1), entries), Progress::kContradiction);
@@ -253,13 +253,13 @@ TEST(DirectoryLogs, TheSameNumberTwiceIsAnError) {
 
 // A number below 0 is not that of the last log.
 TEST(DirectoryLogs, CountOnBelowZero) {
-  std::vector<FileEntry> entries;
+  FileEntries entries;
   EXPECT_EQ(DecodeDirectory(Entry("a", -1) + Entry("b", -2), entries), Progress::kMoreLogs);
   EXPECT_EQ(entries.size(), 2u);
 }
 
 TEST(DirectoryLogs, StartAgainFromTheFirstByte) {
-  std::vector<FileEntry> entries(5);
+  FileEntries entries(5);
   DecodeDirectory(Entry("a", 0), entries);
   EXPECT_EQ(entries.size(), 1u);
   DecodeDirectory("nothing of it", entries);
