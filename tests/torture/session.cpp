@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <cstdio>
+#include <utility>
 
 #include "platform/text.h"
 #include "simulator/files.h"
@@ -29,11 +30,11 @@ sim::FileStore Files() {
   return files;
 }
 
-std::unique_ptr<sim::Receiver> MakeReceiver(const Link& link) {
+std::unique_ptr<sim::Receiver> MakeReceiver(const Link& link, sim::FileStore files) {
   if (link.family == eProtocolVelmar) {
-    return std::make_unique<sim::VelmarReceiver>(sim::VelmarOptions{}, Files());
+    return std::make_unique<sim::VelmarReceiver>(sim::VelmarOptions{}, std::move(files));
   }
-  return std::make_unique<sim::QuorinReceiver>(sim::QuorinOptions{}, Files());
+  return std::make_unique<sim::QuorinReceiver>(sim::QuorinOptions{}, std::move(files));
 }
 
 }  // namespace
@@ -64,8 +65,10 @@ class Bench::Port : public SimulatedComPort {
   }
 };
 
-Bench::Bench(const Link& link)
-    : receiver_(MakeReceiver(link)),
+Bench::Bench(const Link& link) : Bench(link, Files()) {}
+
+Bench::Bench(const Link& link, sim::FileStore files)
+    : receiver_(MakeReceiver(link, std::move(files))),
       port_(std::make_unique<Port>(*receiver_, clock_, link.instance)),
       faulty_(*port_) {}
 

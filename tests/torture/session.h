@@ -6,6 +6,7 @@
 #include <string>
 
 #include "platform/api_types.h"
+#include "simulator/files.h"
 #include "simulator/receiver.h"
 #include "tests/support/manual_clock.h"
 #include "tests/support/memory_stream.h"
@@ -25,7 +26,9 @@ struct Link {
 // The receiver at the other end, with the Win32 calls through which the library reaches it.
 class Bench {
  public:
+  // The receiver has the files that a session needs, or these.
   explicit Bench(const Link& link);
+  Bench(const Link& link, sim::FileStore files);
 
   static std::string FileContent();
 
