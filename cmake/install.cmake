@@ -11,6 +11,6 @@ install(FILES cmake/rcvlink-config.cmake ${CMAKE_CURRENT_BINARY_DIR}/rcvlink-con
 configure_file(cmake/rcvlink.pc.in rcvlink.pc @ONLY)
 install(FILES ${CMAKE_CURRENT_BINARY_DIR}/rcvlink.pc DESTINATION lib/pkgconfig)
 
-install(FILES README.md CHANGELOG.md LICENSE NOTICE SECURITY.md DESTINATION share/doc/rcvlink)
-install(DIRECTORY docs DESTINATION share/doc/rcvlink)
+install(FILES CHANGELOG.md LICENSE NOTICE SECURITY.md DESTINATION share/doc/rcvlink)
+install(DIRECTORY docs/ DESTINATION share/doc/rcvlink)
 install(FILES examples/download.cpp examples/list.c DESTINATION share/doc/rcvlink/examples)

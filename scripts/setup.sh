@@ -1,5 +1,5 @@
 #!/bin/bash
-# Installs the Debian packages that are missing: `setup.sh demo` or `setup.sh test`.
+# Installs the Debian packages that are missing: `setup.sh demo`, `release` or `test`.
 set -euo pipefail
 
 demo_packages=(
@@ -10,13 +10,15 @@ demo_packages=(
   libcli11-dev nlohmann-json3-dev
   wine wine64
 )
-test_packages=("${demo_packages[@]}" googletest libgtest-dev libgmock-dev clang-14 clang-format-14 clang-tidy-14 lld lld-14 python3)
+release_packages=("${demo_packages[@]}" doxygen python3)
+test_packages=("${release_packages[@]}" googletest libgtest-dev libgmock-dev clang-14 clang-format-14 clang-tidy-14 lld lld-14)
 
 case "${1:-}" in
   demo) packages=("${demo_packages[@]}") ;;
+  release) packages=("${release_packages[@]}") ;;
   test) packages=("${test_packages[@]}") ;;
   *)
-    echo "usage: setup.sh demo|test" >&2
+    echo "usage: setup.sh demo|release|test" >&2
     exit 2
     ;;
 esac
