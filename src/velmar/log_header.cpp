@@ -16,7 +16,7 @@ std::optional<AsciiHeader> ParseHeaderFields(std::string_view text) {
                      .port = fields[1],
                      .sequence = ToInteger(fields[2]),
                      .gps_week = ToInteger(fields[5]),
-                     .gps_seconds = std::wcstod(fields[6].c_str(), nullptr)};
+                     .gps_seconds = _wtof(fields[6].c_str())};
 }
 
 void BinaryHeader::Assign(std::string_view log) {
