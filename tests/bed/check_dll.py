@@ -20,7 +20,7 @@ EXECUTABLE, WRITABLE = 0x20000000, 0x80000000
 # name may be that of a file in the host's current folder.
 DLL_NAME = re.compile(rb"(?:[\w.-]\0){1,40}\.\0[dD]\0[lL]\0[lL]\0|[\w.-]{1,40}\.[dD][lL][lL]")
 
-MOST_BYTES = 384 * 1024  # a host's developer notices a DLL that grows
+MOST_BYTES = 192 * 1024  # a host's developer notices a DLL that grows
 
 
 def read_list(name):
