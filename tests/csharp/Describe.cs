@@ -1,6 +1,6 @@
 // Reads Rcvlink.cs as it was compiled, and prints what it says of the library:
 //   Describe ASSEMBLY HEADER ENTRIES
-// HEADER becomes C++ that compiles when rcvlink.h says the same, ENTRIES the entry points with their methods, one in a line.
+// HEADER becomes C++ that compiles when rcvlink.h says the same, ENTRIES the entry points with their methods.
 using System;
 using System.Collections.Generic;
 using System.IO;
