@@ -10,7 +10,7 @@ demo_packages=(
   libcli11-dev nlohmann-json3-dev
   wine wine64
 )
-test_packages=("${demo_packages[@]}" googletest libgtest-dev libgmock-dev clang-14 clang-format-14 clang-tidy-14 lld lld-14 mono-mcs python3)
+test_packages=("${demo_packages[@]}" googletest libgtest-dev libgmock-dev clang-14 clang-format-14 clang-tidy-14 doxygen lld lld-14 mono-mcs python3)
 
 case "${1:-}" in
   demo) packages=("${demo_packages[@]}") ;;
