@@ -14,5 +14,5 @@ install(FILES ${CMAKE_CURRENT_BINARY_DIR}/rcvlink.pc DESTINATION lib/pkgconfig)
 
 install(FILES README.md CHANGELOG.md LICENSE NOTICE SECURITY.md DESTINATION share/doc/rcvlink)
 install(DIRECTORY docs DESTINATION share/doc/rcvlink)
-install(FILES examples/download.cpp examples/list.c DESTINATION share/doc/rcvlink/examples)
+install(FILES examples/download.cpp examples/guide.h examples/list.c DESTINATION share/doc/rcvlink/examples)
 install(DIRECTORY bindings/csharp DESTINATION share/rcvlink)

@@ -73,8 +73,9 @@
 ///
 /// @par An unplugged cable
 /// Without the cable of a serial port the line is silent. Searches give S_FALSE and
-/// `CheckConnection` the answer 0. The operations on a Quorin receiver give 0x800705B4, once the
-/// times above have passed. Those on a Velmar receiver look as if they had succeeded:
+/// `CheckConnection` the answer 0. The operations on a Quorin receiver give 0x800705B4 once the
+/// times above have passed, but a transfer that has begun has no end. Those on a Velmar receiver
+/// look as if they had succeeded:
 /// `OpenFileList` gives an empty list, `DownloadFile` S_OK and a part of the file, `DeleteFileW`,
 /// `RenameFile` and `DCSetRcv...` S_OK; only `GetReceiverInfo` gives S_FALSE.
 ///
@@ -97,10 +98,10 @@
 /// unloaded already, and a call may wait for a thread that waits for the loader's lock.
 ///
 /// @par Exceptions
-/// The `devapi` functions return their failures, with one exception: `GetFileInfo` raises a
-/// structured exception for a negative index. The functions of the report raise C++ exceptions for
-/// a wrong argument, see `DumpReportString`. When no memory is left, each function that writes a
-/// line to the report may raise the same exception, also while no report is open.
+/// The `devapi` functions return their failures; `GetFileInfo` alone raises a structured exception,
+/// for a negative index. The functions of the report raise C++ exceptions for a wrong argument, see
+/// `DumpReportString`. When no memory is left, each function that writes a line to the report may
+/// raise the same exception, also while no report is open.
 #ifndef RCVLINK_API_RCVLINK_H_
 #define RCVLINK_API_RCVLINK_H_
 
