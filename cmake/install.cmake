@@ -1,4 +1,5 @@
-# The installed tree: bin, include, lib (both import libraries, the package of CMake, pkg-config), share/doc.
+# The installed tree: bin, include, lib (both import libraries, the package of CMake, pkg-config), share/doc,
+# share/rcvlink (the binding for C#).
 include(CMakePackageConfigHelpers)
 
 install(FILES include/rcvlink.h include/rcvlink_c.h DESTINATION include)
@@ -13,4 +14,5 @@ install(FILES ${CMAKE_CURRENT_BINARY_DIR}/rcvlink.pc DESTINATION lib/pkgconfig)
 
 install(FILES CHANGELOG.md LICENSE NOTICE SECURITY.md DESTINATION share/doc/rcvlink)
 install(DIRECTORY docs/ DESTINATION share/doc/rcvlink)
-install(FILES examples/download.cpp examples/list.c DESTINATION share/doc/rcvlink/examples)
+install(FILES examples/download.cpp examples/guide.h examples/list.c DESTINATION share/doc/rcvlink/examples)
+install(DIRECTORY bindings/csharp DESTINATION share/rcvlink)

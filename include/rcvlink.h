@@ -50,6 +50,58 @@
 /// settings of a Quorin receiver (`DCSetRcv...`). To keep other threads out during a series of
 /// operations, call `LockConnection` before it and `UnlockConnection` after it. `Abort` is meant to
 /// be called from another thread than the one that runs the operation.
+///
+/// @par How long a call takes
+/// An operation first waits until those of other threads on the same receiver have ended; only the
+/// functions with an abort event can give up that wait. Then a reply may take 30 s, and the answer
+/// by which a receiver is recognised 8 s. After each answer of a Velmar receiver the library pauses
+/// for 500 ms. When nothing answers:
+///  - `SearchReceiver` and `SearchReceiverOnSerial` make 18 tries of 8 s for each family: about 5
+///    minutes, or 2.5 minutes for one family. `CreateReceiverOnSerial` makes one such try, in 17 s
+///    or less, and `CreateReceiverOnUSB` one of 8 s.
+///  - `CheckConnection` takes 8 s, after an abort half a second more.
+///  - `GetReceiverInfo`, `OpenFileList`, `DeleteFileW`, `RenameFile` and `DCSetRcv...` take 30 s.
+///  - `DownloadFile` takes a minute when nothing answers from the beginning. When a receiver falls
+///    silent during the transfer it takes 2 minutes over USB; with Velmar 30 s, and up to a minute
+///    for the steps after it; with Quorin on a serial port it has no end.
+///
+/// A receiver that sends something else than the answer can make it a minute for each reply of a
+/// Quorin receiver, and of a Velmar one as long as bytes come. A line that is held by flow control
+/// makes it up to 3 s more for each command.
+///
+/// All other functions return at once, apart from `LockConnection`, which waits for the lock.
+///
+/// @par An unplugged cable
+/// Without the cable of a serial port the line is silent. Searches give S_FALSE and
+/// `CheckConnection` the answer 0. The operations on a Quorin receiver give 0x800705B4 once the
+/// times above have passed, but a transfer that has begun has no end. Those on a Velmar receiver
+/// look as if they had succeeded:
+/// `OpenFileList` gives an empty list, `DownloadFile` S_OK and a part of the file, `DeleteFileW`,
+/// `RenameFile` and `DCSetRcv...` S_OK; only `GetReceiverInfo` gives S_FALSE.
+///
+/// When a serial adapter or a USB device is unplugged, its driver fails every exchange from then
+/// on, and the operations give its error: 0x8007xxxx, or 0xExxxxxxx of the USBIO driver.
+/// `CheckConnection` answers 0. The receiver does not recover when the cable is plugged in again:
+/// close it, and search. A search gives 0x80070002 for a COM port that is gone.
+///
+/// The functions that only use handles, locks, lists and the report work without the cable.
+///
+/// @par In the progress function
+/// It runs inside `DownloadFile`, whose thread has locked the receiver. It may call `Abort`,
+/// `CloseReceiver`, `OpenReceiver`, `GetFilesCount`, `GetFileInfo` and `DumpReportString`. Any
+/// other operation on the same receiver would not wait, since its thread has the lock, and would
+/// send its command into the transfer. Operations on other receivers are possible; two threads that
+/// do so with each other's receivers wait without end.
+///
+/// @par In DllMain
+/// Call no function of the library from a DllMain: the library may not be initialised yet, or be
+/// unloaded already, and a call may wait for a thread that waits for the loader's lock.
+///
+/// @par Exceptions
+/// The `devapi` functions return their failures; `GetFileInfo` alone raises a structured exception,
+/// for a negative index. The functions of the report raise C++ exceptions for a wrong argument, see
+/// `DumpReportString`. When no memory is left, each function that writes a line to the report may
+/// raise the same exception, also while no report is open.
 #ifndef RCVLINK_API_RCVLINK_H_
 #define RCVLINK_API_RCVLINK_H_
 
@@ -112,8 +164,12 @@ struct CReceiverInfo {
   unsigned int dwVariant;
 };
 
-/// One entry of a file list. 56 bytes. The times of a Velmar receiver have no day of the week:
-/// wDayOfWeek is 0.
+/// One entry of a file list. 56 bytes.
+///
+/// The times are in the zone of the receiver's clock, which no reply names. A Velmar receiver sends
+/// date and time as they stand here; their wDayOfWeek is 0. A Quorin receiver sends seconds since
+/// 1988-01-01, which the C runtime counts in this computer's zone. So the time here is an hour off
+/// when that zone had daylight saving time on one of the two dates alone.
 struct CFileInfo {
   unsigned int dwSize;            ///< size in bytes
   unsigned int dwPadding;         ///< zero
@@ -127,8 +183,8 @@ struct CFileInfo {
 /// 16 bytes; the host owns it and keeps it alive until the transfer returns.
 ///
 /// The function runs on the thread that runs the transfer, with a lock of the receiver held: it
-/// must return quickly and must not start another transfer of the same receiver. It may call
-/// `Abort`. It must not throw.
+/// must return quickly and must not throw. The beginning of this file says which functions it may
+/// call. Two downloads of one receiver at once share one function, see `devapi::DownloadFile`.
 struct CProgressCallback {
   void (*pfnProgress)(void* pContext, unsigned char percent);  ///< may be null
   void* pContext;                                              ///< passed to the function unchanged
@@ -191,10 +247,14 @@ RCVLINK_API long SearchReceiver(
 /// Makes one try on a serial port with settings that the host knows. Parameters as in
 /// `SearchReceiver`. It does not look for a receiver that is registered already, so two calls make
 /// two receivers where the port can be opened twice.
+/// @param port     name of the COM port
+/// @param protocol the family to ask for
 /// @param settings Win32's DCB. Its baud rate in bit/s (0 keeps the port's speed), byte size,
 ///                 parity, stop bits and the flags fBinary, fParity, fOutxCtsFlow, fOutxDsrFlow,
 ///                 fDtrControl, fDsrSensitivity, fRtsControl and fAbortOnError are used. The host
 ///                 keeps it.
+/// @param abortEvent   as in `SearchReceiver`
+/// @param[out] receiver the handle
 /// @retval S_OK          found; *receiver holds the handle
 /// @retval S_FALSE       no receiver answered, or aborted
 /// @retval E_INVALIDARG  `port`, `settings` or `receiver` is null
@@ -206,6 +266,9 @@ RCVLINK_API long CreateReceiverOnSerial(
 /// Makes one try on a USB device of the USBIO driver. It asks for a Quorin receiver whatever
 /// `protocol` says, since no other family is reached over USB. Parameters as in `SearchReceiver`.
 /// @param device path of the device, as CreateFileW takes it; no prefix is added
+/// @param protocol not read
+/// @param abortEvent   as in `SearchReceiver`
+/// @param[out] receiver the handle
 /// @retval S_OK          found; *receiver holds the handle
 /// @retval S_FALSE       no receiver answered, the device could not be opened, its descriptors have
 ///                       another layout than those of the receivers, or aborted
@@ -220,6 +283,7 @@ RCVLINK_API long CreateReceiverOnUSB(wchar_t* device,
 
 /// Finds a receiver that is registered already and counts one more user of it.
 /// @param port name under which it was registered; letter case counts
+/// @param[out] receiver the handle
 /// @retval S_OK         *receiver holds the handle, which the host closes with `CloseReceiver`
 /// @retval S_FALSE      none of that name; *receiver is not changed
 /// @retval E_INVALIDARG `receiver` is null
@@ -228,6 +292,7 @@ RCVLINK_API long OpenReceiver(wchar_t* port, void** receiver);
 /// Removes one user of the receiver. When none is left, the receiver's operation is aborted, its
 /// handle becomes unknown, and its port is closed. A call that still runs on another thread keeps
 /// the receiver and its port open until it returns; `CloseReceiver` does not wait for it.
+/// @param receiver handle
 /// @retval S_OK         the receiver was removed
 /// @retval S_FALSE      other users remain
 /// @retval E_INVALIDARG unknown handle
@@ -236,6 +301,7 @@ RCVLINK_API long CloseReceiver(void* receiver);
 /// Closes a receiver by its name, for a host that lost its handles. Each receiver of that name
 /// loses one user, in no fixed order, until one of them has none left and is removed. An operation
 /// that runs on that one is aborted; as with `CloseReceiver`, the call does not wait for it.
+/// @param port name under which it was registered; letter case counts
 /// @retval S_OK         a receiver was removed
 /// @retval S_FALSE      none was removed
 /// @retval E_INVALIDARG `port` is null
@@ -248,6 +314,7 @@ RCVLINK_API long DestroyReceiver(wchar_t* port);
 /// @{
 
 /// Reads the receiver's identity: its id and model, and what its family offers.
+/// @param receiver handle
 /// @param abortEvent Win32 event that ends the wait for a receiver that another thread has locked;
 ///                   null: nothing ends that wait. The host owns it.
 /// @param[out] info  filled on success. On failure `bstrReceiverId` and `bstrModel` are null.
@@ -264,6 +331,7 @@ RCVLINK_API long DestroyReceiver(wchar_t* port);
 RCVLINK_API long GetReceiverInfo(void* receiver, void* abortEvent, CReceiverInfo* info);
 
 /// Asks whether the receiver still answers.
+/// @param receiver handle
 /// @param abortEvent Win32 event that ends the check, and the wait for a receiver that another
 ///                   thread has locked. Null: only `Abort` ends the check, and nothing ends that
 ///                   wait.
@@ -276,6 +344,7 @@ RCVLINK_API long CheckConnection(void* receiver, void* abortEvent, short* answer
 
 /// Locks the receiver for the calling thread until `UnlockConnection`. The lock counts: the same
 /// thread releases it as often as it took it.
+/// @param receiver handle
 /// @param abortEvent Win32 event that ends the wait; null: wait without limit
 /// @retval S_OK    the calling thread holds the receiver
 /// @retval S_FALSE the event was signalled first
@@ -285,6 +354,7 @@ RCVLINK_API long CheckConnection(void* receiver, void* abortEvent, short* answer
 RCVLINK_API long LockConnection(void* receiver, void* abortEvent);
 
 /// Releases the lock once.
+/// @param receiver handle
 /// @retval S_OK also when the calling thread did not hold it
 RCVLINK_API long UnlockConnection(void* receiver);
 
@@ -299,14 +369,18 @@ RCVLINK_API long UnlockConnection(void* receiver);
 ///
 /// `CheckConnection` and the download of a Velmar receiver end too, but do not clear the abort: the
 /// next operation other than these two ends with S_FALSE as well.
+/// @param receiver handle
 /// @retval S_OK for every known handle
 RCVLINK_API long Abort(void* receiver);
 
 /// Copies a file of the receiver into a stream.
+/// @param receiver handle
 /// @param name     name as in the file list; it is sent in the thread's ANSI code page
 /// @param stream   COM stream that the host owns. Its Write is called on the calling thread; with a
 ///                 Velmar receiver also AddRef before the transfer and Release after it.
-/// @param progress may be null
+/// @param progress may be null. It takes effect before the wait for another operation: while two
+///                 threads download from one receiver, the function of the later call gets the
+///                 percents of both, and none gets any once the first has ended.
 /// @retval S_OK         finished, or failed: compare the byte count with the size in the file list.
 ///                      A Quorin receiver on a serial port gives it also when the stream's Write
 ///                      failed. A Velmar receiver gives it also for a file that it does not have
@@ -332,6 +406,10 @@ RCVLINK_API long DownloadFile(void* receiver,
                               CProgressCallback* progress);
 
 /// Reserved: no family of receivers takes files.
+/// @param receiver handle
+/// @param info     not read
+/// @param stream   not read
+/// @param progress not called
 /// @retval E_NOTIMPL for every known handle
 RCVLINK_API long UploadFile(void* receiver,
                             const CFileInfo* info,
@@ -339,6 +417,7 @@ RCVLINK_API long UploadFile(void* receiver,
                             CProgressCallback* progress);
 
 /// Deletes a file of the receiver.
+/// @param receiver handle
 /// @param name name as in the file list; it is sent in the thread's ANSI code page
 /// @retval S_OK         a Quorin receiver deleted it. A Velmar receiver gives it also when it
 ///                      refused or did not answer: to be certain, read the file list again.
@@ -350,10 +429,13 @@ RCVLINK_API long UploadFile(void* receiver,
 RCVLINK_API long DeleteFileW(void* receiver, wchar_t* name);
 
 /// Renames a file of a Velmar receiver. Names are sent in the thread's ANSI code page.
+/// @param receiver handle
+/// @param oldName name as in the file list
+/// @param newName name that the file gets
 /// @retval S_OK         renamed, refused, or not answered, as with `DeleteFileW`
 /// @retval S_FALSE      aborted; the receiver may have renamed the file all the same
 /// @retval E_INVALIDARG a name is null
-/// @retval E_NOTIMPL    a Quorin receiver: its family does not rename
+/// @retval E_NOTIMPL    a Quorin receiver, with any names: its family does not rename
 /// @return otherwise the failure of the connection
 RCVLINK_API long RenameFile(void* receiver, wchar_t* oldName, wchar_t* newName);
 /// @}
@@ -370,20 +452,28 @@ RCVLINK_API long RenameFile(void* receiver, wchar_t* oldName, wchar_t* newName);
 /// @{
 
 /// Sets the speed.
+/// @param receiver handle
 /// @param baudRate bits per second
+/// @return one of the results above
 RCVLINK_API long DCSetRcvBaudrate(void* receiver, unsigned long baudRate);
 
 /// Sets the parity. The two families number it differently.
+/// @param receiver handle
 /// @param parity Quorin: 1 odd, 2 even. Velmar: 1 even, 2 odd. Any other value: none.
+/// @return one of the results above
 RCVLINK_API long DCSetRcvParity(void* receiver, unsigned char parity);
 
 /// Sets the RTS line.
+/// @param receiver handle
 /// @param rts 0 off, any other value on
 /// @retval E_NOTIMPL a Velmar receiver: its family does not control the line
+/// @return otherwise one of the results above
 RCVLINK_API long DCSetRcvRTSControl(void* receiver, unsigned char rts);
 
 /// Sets the number of stop bits.
+/// @param receiver handle
 /// @param stopBits Quorin: 0 for one stop bit, any other value for two. Velmar: their number.
+/// @return one of the results above
 RCVLINK_API long DCSetRcvStopbits(void* receiver, unsigned char stopBits);
 /// @}
 
@@ -394,6 +484,7 @@ RCVLINK_API long DCSetRcvStopbits(void* receiver, unsigned char stopBits);
 /// @{
 
 /// Reads the receiver's directory.
+/// @param receiver handle
 /// @param[out] fileList the list's handle, which the host closes with `CloseFileList`
 /// @retval S_OK          read
 /// @retval E_INVALIDARG  `fileList` is null, or the receiver's handle is unknown
@@ -408,12 +499,14 @@ RCVLINK_API long DCSetRcvStopbits(void* receiver, unsigned char stopBits);
 RCVLINK_API long OpenFileList(void* receiver, void** fileList);
 
 /// Counts the entries of a file list.
+/// @param fileList handle of the list
 /// @param[out] count number of files
 /// @retval S_OK         `count` is set
 /// @retval E_INVALIDARG unknown list, or `count` is null
 RCVLINK_API long GetFilesCount(void* fileList, long* count);
 
 /// Copies one entry.
+/// @param fileList handle of the list
 /// @param index 0 to count - 1. A negative index is a programming error: it raises the structured
 ///              exception EXCEPTION_ARRAY_BOUNDS_EXCEEDED (0xC000008C).
 /// @param[out] info the entry; `bstrName` is a copy that the host frees
@@ -423,6 +516,7 @@ RCVLINK_API long GetFilesCount(void* fileList, long* count);
 RCVLINK_API long GetFileInfo(void* fileList, long index, CFileInfo* info);
 
 /// Frees a file list. Copies that `GetFileInfo` gave stay the host's.
+/// @param fileList handle of the list
 /// @retval S_OK         the handle is unknown from now on
 /// @retval E_INVALIDARG unknown list
 RCVLINK_API long CloseFileList(void* fileList);
@@ -442,7 +536,8 @@ namespace dump_hlp {
 /// @warning Do not call it while another thread is inside the library: it takes no lock. A name
 ///          that is null or cannot be converted raises a C++ exception, see `DumpReportString`.
 RCVLINK_API void CreateReportFile(const char* name);
-/// The same with a wide name. A null name only closes the report that is open.
+/// The same with a wide name.
+/// @param name file name without a folder; null only closes the report that is open
 RCVLINK_API void CreateReportFile(const wchar_t* name);
 
 /// Writes one entry with a time stamp. No line end is added: end the text in "\r\n". Without a
@@ -453,6 +548,8 @@ RCVLINK_API void CreateReportFile(const wchar_t* name);
 /// @param arguments the va_list of the caller
 RCVLINK_API void DumpReportString(const char* format, char* arguments);
 /// The same with a wide format.
+/// @param format    format of Microsoft's printf
+/// @param arguments the va_list of the caller
 RCVLINK_API void DumpReportString(const wchar_t* format, char* arguments);
 
 /// Closes the report; without one it does nothing.
@@ -462,14 +559,22 @@ RCVLINK_API void CloseReportFile();
 }  // namespace dump_hlp
 
 /// The search of `devapi::SearchReceiver` on a serial port, without the look for a registered
-/// receiver. Parameters and results as there.
+/// receiver. Results as there.
+/// @param port       name of the COM port
+/// @param protocol   the family to ask for
+/// @param abortEvent may be null
+/// @param[in,out] receiver set *receiver to null before the call
+/// @return as `SearchReceiver` with `eInstanceSerial`
 RCVLINK_API long SearchReceiverOnSerial(wchar_t* port,
                                         EProtocol protocol,
                                         void* abortEvent,
                                         void** receiver);
 
 /// Reserved: a host does not get at connections.
-/// @retval E_NOTIMPL always; `connection` is not written
+/// @param name not read
+/// @param type not read
+/// @param connection not written
+/// @retval E_NOTIMPL always
 RCVLINK_API long GetConnection(wchar_t* name, EInstanceType type, CIConnection** connection);
 
 #endif  // RCVLINK_API_RCVLINK_H_

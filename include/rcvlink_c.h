@@ -20,6 +20,7 @@
 #include <string.h>
 
 #ifndef RCVLINK_API_RCVLINK_H_  // a C++ host may include both headers, rcvlink.h first
+/// @cond of the reference, which has these records from rcvlink.h
 
 enum EInstanceType { eInstanceAny = 0, eInstanceSerial = 1, eInstanceUSB = 2 };
 
@@ -52,12 +53,14 @@ struct CProgressCallback {
   void* pContext;
 };
 
+/// @endcond
 #endif
 
 struct IStream;  // COM's stream (objidl.h)
 
-/// The functions of the library.
+/// The functions of the library, by the names that they have in rcvlink.h.
 struct RcvlinkFunctions {
+  /// @cond of the reference, which has these functions from rcvlink.h
   long (*SearchReceiver)(wchar_t* port,
                          enum EInstanceType type,
                          enum EProtocol protocol,
@@ -108,6 +111,7 @@ struct RcvlinkFunctions {
                                  void* abortEvent,
                                  void** receiver);
   long (*GetConnection)(wchar_t* name, enum EInstanceType type, void** connection);
+  /// @endcond
 };
 
 /// How many functions there are.
@@ -155,8 +159,11 @@ static const char* const kRcvlinkNames[RCVLINK_FUNCTION_COUNT][2] = {
     {"_Z13GetConnectionPw13EInstanceTypePP12CIConnection",
      "?GetConnection@@YAJPEA_WW4EInstanceType@@PEAPEAVCIConnection@@@Z"}};
 
-/// Fills the table from a loaded rcvlink.dll. Nonzero: every function is there. 0: `module` is null or
-/// another DLL, and the table may be filled in part.
+/// Fills the table from a loaded rcvlink.dll.
+/// @param module    may be null, as LoadLibraryW gives it
+/// @param functions the table
+/// @return nonzero: every function is there. 0: `module` is null or another DLL, and the table may be
+///         filled in part.
 static inline int RcvlinkLoad(HMODULE module, struct RcvlinkFunctions* functions) {
   char* const table = (char*)functions;
   size_t i;

@@ -2,7 +2,8 @@
 set(folder ${CMAKE_BINARY_DIR}/package)
 set(tree ${folder}/tree)
 file(GLOB installed CONFIGURE_DEPENDS
-  ${PROJECT_SOURCE_DIR}/include/* ${PROJECT_SOURCE_DIR}/cmake/* ${PROJECT_SOURCE_DIR}/docs/*)
+  ${PROJECT_SOURCE_DIR}/include/* ${PROJECT_SOURCE_DIR}/cmake/* ${PROJECT_SOURCE_DIR}/docs/*
+  ${PROJECT_SOURCE_DIR}/bindings/csharp/*)
 add_custom_command(
   OUTPUT ${folder}/tree.stamp
   COMMAND ${CMAKE_COMMAND} -E rm -rf ${tree}

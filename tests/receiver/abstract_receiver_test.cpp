@@ -153,6 +153,28 @@ TEST_F(Receiver, ProgressReachesTheHostDuringATransferOnly) {
   EXPECT_TRUE(report.Has("CAbstractReceiver::DownloadFile"));
 }
 
+// The function is set before a transfer waits for the receiver's lock.
+TEST_F(Receiver, TheLaterOfTwoTransfersGetsTheProgressOfBoth) {
+  std::vector<int> first, second;
+  CProgressCallback to_first = {Collect, &first};
+  CProgressCallback to_second = {Collect, &second};
+  EXPECT_CALL(*driver, DownloadFile(testing::StrEq(L"second"), _, _))
+      .WillOnce([this](const wchar_t*, IStream*, CProgressCallback*) {
+        callback->OnProgress(20);
+        return S_OK;
+      });
+  EXPECT_CALL(*driver, DownloadFile(testing::StrEq(L"first"), _, _))
+      .WillOnce([&](const wchar_t*, IStream*, CProgressCallback*) {
+        callback->OnProgress(1);
+        receiver->DownloadFile(L"second", &stream, &to_second);
+        callback->OnProgress(2);
+        return S_OK;
+      });
+  receiver->DownloadFile(L"first", &stream, &to_first);
+  EXPECT_EQ(first, std::vector<int>{1});
+  EXPECT_EQ(second, std::vector<int>{20});
+}
+
 TEST_F(Receiver, ProgressReachesTheHostDuringAnUpload) {
   std::vector<int> percents;
   CProgressCallback progress = {Collect, &percents};
