@@ -13,6 +13,9 @@ configure_file(cmake/rcvlink.pc.in rcvlink.pc @ONLY)
 install(FILES ${CMAKE_CURRENT_BINARY_DIR}/rcvlink.pc DESTINATION lib/pkgconfig)
 
 install(FILES CHANGELOG.md LICENSE NOTICE SECURITY.md DESTINATION share/doc/rcvlink)
-install(DIRECTORY docs/ DESTINATION share/doc/rcvlink)
-install(FILES examples/download.cpp examples/guide.h examples/list.c DESTINATION share/doc/rcvlink/examples)
+# The folders are those of the sources, so that the documents find each other.
+install(DIRECTORY docs DESTINATION share/doc/rcvlink)
+install(FILES simulator/README.md DESTINATION share/doc/rcvlink/simulator)
+install(DIRECTORY examples DESTINATION share/doc/rcvlink PATTERN CMakeLists.txt EXCLUDE)
+install(FILES kit/examples.cmake DESTINATION share/doc/rcvlink/examples RENAME CMakeLists.txt)
 install(DIRECTORY bindings/csharp DESTINATION share/rcvlink)

@@ -99,9 +99,8 @@
 ///
 /// @par Exceptions
 /// The `devapi` functions return their failures; `GetFileInfo` alone raises a structured exception,
-/// for a negative index. The functions of the report raise C++ exceptions for a wrong argument, see
-/// `DumpReportString`. When no memory is left, each function that writes a line to the report may
-/// raise the same exception, also while no report is open.
+/// for a negative index. The functions of the report raise C++ exceptions for a wrong argument and
+/// when no memory is left, see `DumpReportString`.
 #ifndef RCVLINK_API_RCVLINK_H_
 #define RCVLINK_API_RCVLINK_H_
 

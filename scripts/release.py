@@ -3,7 +3,7 @@
 
 usage: release.py ROOT
 
-ROOT is the folder of the sources. The preset `release` is built and Doxygen has run there. ROOT/build/kit becomes
+ROOT is the folder of the sources. The preset `release` is built and Doxygen has run with kit/Doxyfile. ROOT/build/kit becomes
 a folder with
 
   rcvlink-VERSION-win64.zip          what a developer of a host needs
@@ -123,7 +123,7 @@ def make_release(root):
 
     stage = os.path.join(output, name)
     install(build, stage)
-    shutil.copytree(os.path.join(root, "build", "doxygen"), os.path.join(stage, "share/doc/rcvlink/reference"))
+    shutil.copytree(os.path.join(root, "build", "kit-reference"), os.path.join(stage, "share/doc/rcvlink/reference"))
     for source in ("kit/README.md", "CHANGELOG.md", "LICENSE", "NOTICE"):
         shutil.copy(os.path.join(root, source), stage)
     with open(os.path.join(stage, "bom.json"), "w", encoding="utf-8") as file:

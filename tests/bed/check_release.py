@@ -18,7 +18,7 @@ NEEDED = (
     "include/rcvlink.h", "include/rcvlink_c.h",
     "lib/librcvlink.dll.a", "lib/rcvlink.lib",
     "lib/cmake/rcvlink/rcvlink-config.cmake", "lib/pkgconfig/rcvlink.pc",
-    "share/doc/rcvlink/reference/index.html", "share/doc/rcvlink/known-behaviour.md",
+    "share/doc/rcvlink/reference/index.html", "share/doc/rcvlink/docs/known-behaviour.md",
 )
 LINK = re.compile(r"\]\(([^)#:]+)(?:#[^)]*)?\)")
 
@@ -40,11 +40,11 @@ def build_again():
     shutil.copytree(ROOT, COPY, ignore=shutil.ignore_patterns("build", ".git", "__pycache__"))
     run(COPY, "cmake", "--preset", "release", "-DBUILD_TESTING=OFF")
     run(COPY, "cmake", "--build", "--preset", "release", "-j", "1")
-    run(COPY, "doxygen")
 
 
 def release_of(root):
     """The files of a release by name: their bytes."""
+    run(root, "doxygen", "kit/Doxyfile")
     run(root, sys.executable, "-B", os.path.join(root, "scripts", "release.py"), root)
     folder = os.path.join(root, "build", "kit")
     files = {}
