@@ -13,17 +13,14 @@ void AbortSwitch::Abort() {
 }
 
 bool AbortSwitch::Take() {
+  if (!aborted_) return false;  // nearly always: a download tests three times a block
   const std::scoped_lock lock(lock_);
-  if (!aborted_) return false;
-  aborted_ = false;
+  if (!aborted_.exchange(false)) return false;
   connection_->ClearCancel();
   return true;
 }
 
-bool AbortSwitch::IsSet() {
-  const std::scoped_lock lock(lock_);
-  return aborted_;
-}
+bool AbortSwitch::IsSet() const { return aborted_; }
 
 void AbortSwitch::ClearCancel() {
   const std::scoped_lock lock(lock_);

@@ -4,6 +4,8 @@
 #ifndef RCVLINK_RECEIVER_ABORT_SWITCH_H_
 #define RCVLINK_RECEIVER_ABORT_SWITCH_H_
 
+#include <atomic>
+
 #include "commands/receiver_cmd.h"
 #include "platform/critical_section.h"
 #include "transport/connection.h"
@@ -24,7 +26,7 @@ class AbortSwitch {
   bool Take();
 
   // Tests the flag and does not clear it.
-  bool IsSet();
+  bool IsSet() const;
 
   // Clears a cancel that has not ended a wait yet, so that it ends no wait of the next step. The
   // flag stays.
@@ -51,7 +53,7 @@ class AbortSwitch {
   // Guards the two members below, and keeps the steps of an abort together: without it, Take could
   // clear the flag and leave the cancel for the next operation.
   CriticalSection lock_;
-  bool aborted_ = false;
+  std::atomic<bool> aborted_ = false;  // read without the lock, written under it
   CReceiverCmd* current_command_ = nullptr;
 };
 
