@@ -1,7 +1,7 @@
 # The installed tree: bin, include, lib (both import libraries, the package of CMake, pkg-config), share/doc.
 include(CMakePackageConfigHelpers)
 
-install(FILES include/rcvlink.h include/rcvlink_c.h DESTINATION include)
+install(FILES include/rcvlink.h include/rcvlink.hpp include/rcvlink_c.h DESTINATION include)
 install(TARGETS rcvlink rcvlink-cli RUNTIME DESTINATION bin ARCHIVE DESTINATION lib)
 install(FILES ${RCVLINK_MSVC_LIBRARY} DESTINATION lib)
 
@@ -13,4 +13,4 @@ install(FILES ${CMAKE_CURRENT_BINARY_DIR}/rcvlink.pc DESTINATION lib/pkgconfig)
 
 install(FILES README.md CHANGELOG.md LICENSE NOTICE SECURITY.md DESTINATION share/doc/rcvlink)
 install(DIRECTORY docs DESTINATION share/doc/rcvlink)
-install(FILES examples/download.cpp examples/list.c DESTINATION share/doc/rcvlink/examples)
+install(DIRECTORY examples DESTINATION share/doc/rcvlink FILES_MATCHING PATTERN *.cpp PATTERN *.c)
