@@ -214,8 +214,8 @@ class Receiver {
   ///
   /// Of a Velmar receiver's directory only the first 8192 bytes are read, about 70 files. When the list
   /// may be longer than that, the end of it is waited for, up to two minutes. An empty list is read
-  /// twice, since a lost reply looks the same; one that was refused twice cannot be told from a receiver
-  /// without files.
+  /// twice, since a refusal and a lost reply look the same; a minute may pass. One that was refused twice
+  /// cannot be told from a receiver without files.
   /// @throws std::system_error Error::kTimedOut when it does not answer; Error::kRefusedOrLost;
   ///         Error::kCancelled
   std::vector<File> Files(const std::stop_token& stop = {});
@@ -498,11 +498,36 @@ std::optional<File::Time> ToTime(const SystemTime& time) {
          milliseconds(time.wMilliseconds);
 }
 
-// The library's table of file lists has no lock of its own.
-inline std::timed_mutex& FileListMutex() {
-  static std::timed_mutex mutex;
-  return mutex;
-}
+// The right to use the library's table of file lists, which has no lock of its own.
+class FileListTurn {
+ public:
+  FileListTurn(const std::stop_token& stop, const std::string& tried) {
+    std::unique_lock lock(Queue().mutex);
+    Queue().freed.wait(lock, stop, [] { return !Queue().taken; });
+    ThrowIfStopped(stop, tried);
+    Queue().taken = true;
+  }
+  FileListTurn(const FileListTurn&) = delete;
+  FileListTurn& operator=(const FileListTurn&) = delete;
+  ~FileListTurn() {
+    {
+      const std::scoped_lock lock(Queue().mutex);
+      Queue().taken = false;
+    }
+    Queue().freed.notify_one();
+  }
+
+ private:
+  struct State {
+    std::mutex mutex;
+    std::condition_variable_any freed;
+    bool taken = false;
+  };
+  static State& Queue() {
+    static State state;
+    return state;
+  }
+};
 
 inline constexpr std::chrono::milliseconds kPoll{100};
 
@@ -689,8 +714,7 @@ inline bool Receiver::Answers(const std::stop_token& stop) {
 
 inline std::vector<File> Receiver::ReadDirectory(const std::stop_token& stop) {
   constexpr const char* kTried = "list the receiver's files";
-  std::unique_lock table(detail::FileListMutex(), std::defer_lock);
-  while (!table.try_lock_for(detail::kPoll)) detail::ThrowIfStopped(stop, kTried);
+  const detail::FileListTurn turn(stop, kTried);
   UniqueFileList list;
   const long result = Run(stop, [&] {
     void* opened = nullptr;
