@@ -283,15 +283,15 @@ TEST_F(HppDownload, AReceiverAnswersAfterAnAbort) {
 
 // The time in the host's own function is no silence of the receiver.
 TEST_F(HppDownload, ASlowSinkIsNoSilence) {
-  const auto port = Port({}, {{"a.jps", Content(1000)}});
+  const auto port = Port({}, {{"a.jps", Content(100)}});
   auto receiver = Open(port);
-  receiver.Download({.name = L"a.jps", .size = 1000},
+  receiver.Download({.name = L"a.jps", .size = 100},
                     [&](std::span<const std::byte> bytes) {
-                      std::this_thread::sleep_for(std::chrono::milliseconds(1500));
+                      std::this_thread::sleep_for(kMoreThanACommand + std::chrono::seconds(1));
                       Collect()(bytes);
                     },
-                    {.silence = std::chrono::milliseconds(700)});
-  EXPECT_EQ(bytes_, Content(1000));
+                    {.silence = kMoreThanACommand});
+  EXPECT_EQ(bytes_, Content(100));
 }
 
 TEST_F(HppDownload, OfMoreThanTheProtocolCanNumberIsRefusedAtOnce) {
