@@ -87,9 +87,11 @@ inline std::error_code make_error_code(Error error) noexcept {
 
 }  // namespace rcvlink
 
-/// Lets a std::error_code be made of, and compared with, a rcvlink::Error.
+/// @cond
+// Lets a std::error_code be made of, and compared with, a rcvlink::Error.
 template <>
 struct std::is_error_code_enum<rcvlink::Error> : std::true_type {};
+/// @endcond
 
 namespace rcvlink {
 
@@ -224,7 +226,7 @@ class Receiver {
   /// @throws std::system_error Error::kNotFound when the receiver lists none; as `Files`
   File FindFile(const std::wstring& name, const std::stop_token& stop = {});
 
-  /// Downloads a file into a function. It takes as long as the line needs: about 90 s for a MB at
+  /// Downloads a file into a function. It takes as long as the line needs: at least 90 s for a MB at
   /// 115200 bit/s.
   ///
   /// The sink never gets more bytes than were listed. It gets them before it is known whether all come:
@@ -316,6 +318,7 @@ class Report {
 };
 
 // --- What follows is no part of the interface.
+/// @cond
 
 namespace detail {
 
@@ -493,7 +496,8 @@ template <typename SystemTime>  // SYSTEMTIME, or the record of that layout in r
 std::optional<File::Time> ToTime(const SystemTime& time) {
   using namespace std::chrono;
   const year_month_day day(year(time.wYear), month(time.wMonth), std::chrono::day(time.wDay));
-  if (!day.ok()) return std::nullopt;  // an unknown time has month 0
+  // An unknown time has month 0. Windows has no times before 1601.
+  if (!day.ok() || day.year() < year(1601)) return std::nullopt;
   return local_days(day) + hours(time.wHour) + minutes(time.wMinute) + seconds(time.wSecond) +
          milliseconds(time.wMilliseconds);
 }
@@ -1027,6 +1031,8 @@ inline void Receiver::SetRts(bool on) {
     return devapi::DCSetRcvRTSControl(handle(), on ? 1 : 0);
   });
 }
+
+/// @endcond
 
 }  // namespace rcvlink
 

@@ -218,7 +218,6 @@ TEST(HppLock, AStopEndsTheWait) {
   const bed::SimulatedPort port({"quorin"});
   auto receiver = OpenHpp(port);
   const rcvlink::Lock lock(receiver);
-  const host::Report report;
   std::stop_source source;
   auto waiting =
       host::OnThread([&] { return CodeOf([&] { receiver.Files(source.get_token()); }); });
@@ -262,8 +261,10 @@ TEST(HppFiles, HaveNamesSizesAndTimes) {
   EXPECT_EQ(files[0].time, local_days(2024y / February / 29) + 23h + 59min + 58s);
 }
 
-TEST(HppFiles, AMonthOfZeroIsNoTime) {
+TEST(HppFiles, TimesThatWindowsDoesNotHaveAreNone) {
   EXPECT_EQ(rcvlink::detail::ToTime(SYSTEMTIME{}), std::nullopt);
+  EXPECT_EQ(rcvlink::detail::ToTime(SYSTEMTIME{1600, 12, 0, 31, 0, 0, 0, 0}), std::nullopt);
+  EXPECT_NE(rcvlink::detail::ToTime(SYSTEMTIME{1601, 1, 0, 1, 0, 0, 0, 0}), std::nullopt);
 }
 
 TEST(HppFiles, OneIsFoundByItsName) {
@@ -311,23 +312,29 @@ TEST(HppFiles, TheEndOfALongVelmarListIsAwaited) {
   EXPECT_EQ(receiver.Identify().id, L"VM00731") << "the next command met the end of the list";
 }
 
-// The library's table of lists may not be used by two threads at once.
-TEST(HppFiles, AreListedFromSeveralThreads) {
-  const bed::SimulatedPort first({"quorin"}, {{"A.log", "a"}});
-  const bed::SimulatedPort second({"velmar"}, {{"B.log", "b"}});
-  const auto list = [](const bed::SimulatedPort& port) {
-    return host::OnThread([&port] {
-      auto receiver = OpenHpp(port);
-      std::vector<std::wstring> names;
-      constexpr int kTimes = 5;
-      for (int i = 0; i < kTimes; ++i) names = NamesOf(receiver.Files());
-      return names;
-    });
+// The library's table of lists may not be used by two threads at once: the second waits.
+TEST(HppFiles, AreListedFromOneReceiverAtATime) {
+  const bed::SimulatedPort slow({"quorin", "--reply-silence", "600:print,/log@1"},
+                                {{"A.log", "a"}});
+  const bed::SimulatedPort port({"quorin"}, {{"B.log", "b"}});
+  const host::Receiver raw(port);
+  auto first = OpenHpp(slow);
+  rcvlink::Receiver second(host::SecondUser(port));
+  std::stop_source stop_of_first;
+  std::stop_source stop_of_second;
+  const auto list = [](rcvlink::Receiver& receiver, std::stop_source& source) {
+    return host::OnThread([&] { return CodeOf([&] { receiver.Files(source.get_token()); }); });
   };
-  auto names_of_first = list(first);
-  auto names_of_second = list(second);
-  EXPECT_THAT(names_of_first.get(), ElementsAre(L"A.log"));
-  EXPECT_THAT(names_of_second.get(), ElementsAre(L"B.log"));
+  auto of_first = list(first, stop_of_first);
+  slow.WaitForTranscript("print,/log");
+  auto of_second = list(second, stop_of_second);
+  EXPECT_EQ(of_second.wait_for(std::chrono::seconds(1)), std::future_status::timeout);
+  EXPECT_THAT(raw.SentSince(), IsEmpty());
+  stop_of_second.request_stop();
+  EXPECT_EQ(of_second.get(), Error::kCancelled);
+  stop_of_first.request_stop();
+  EXPECT_EQ(of_first.get(), Error::kCancelled);
+  EXPECT_THAT(NamesOf(second.Files()), ElementsAre(L"B.log"));
 }
 
 TEST(HppFiles, AStopEndsTheReading) {
