@@ -267,20 +267,6 @@ TEST_P(HppDownloadOf, SetsTheTimeThatIsListed) {
   EXPECT_EQ(rcvlink::detail::ToTime(time), file.time);
 }
 
-// The abort that ended a Velmar download ends the next question, too.
-TEST_F(HppDownload, AReceiverAnswersAfterAnAbort) {
-  way_ = {"Velmar", "velmar", CBR_115200};
-  const auto port = Port({}, {{"a.jps", Content(kSize)}});
-  auto receiver = Open(port);
-  const auto fail = [](int percent) {
-    if (percent >= 20) throw HostsOwn{};
-  };
-  EXPECT_THROW(receiver.Download(
-                   {.name = L"a.jps", .size = kSize}, Collect(), DownloadOptions{.progress = fail}),
-               HostsOwn);
-  EXPECT_TRUE(receiver.Answers());
-}
-
 // The time in the host's own function is no silence of the receiver.
 TEST_F(HppDownload, ASlowSinkIsNoSilence) {
   const auto port = Port({}, {{"a.jps", Content(100)}});
