@@ -2,7 +2,7 @@
 # share/rcvlink (the binding for C#).
 include(CMakePackageConfigHelpers)
 
-install(FILES include/rcvlink.h include/rcvlink_c.h DESTINATION include)
+install(FILES include/rcvlink.h include/rcvlink.hpp include/rcvlink_c.h DESTINATION include)
 install(TARGETS rcvlink rcvlink-cli RUNTIME DESTINATION bin ARCHIVE DESTINATION lib)
 install(FILES ${RCVLINK_MSVC_LIBRARY} DESTINATION lib)
 

@@ -3,7 +3,8 @@ set(folder ${CMAKE_BINARY_DIR}/package)
 set(tree ${folder}/tree)
 file(GLOB installed CONFIGURE_DEPENDS
   ${PROJECT_SOURCE_DIR}/include/* ${PROJECT_SOURCE_DIR}/cmake/* ${PROJECT_SOURCE_DIR}/docs/*
-  ${PROJECT_SOURCE_DIR}/bindings/csharp/*)
+  ${PROJECT_SOURCE_DIR}/bindings/csharp/* ${PROJECT_SOURCE_DIR}/examples/*
+  ${PROJECT_SOURCE_DIR}/kit/*)
 add_custom_command(
   OUTPUT ${folder}/tree.stamp
   COMMAND ${CMAKE_COMMAND} -E rm -rf ${tree}
@@ -18,6 +19,9 @@ find_library(KERNEL32_IMPORTS kernel32 REQUIRED)
 get_filename_component(windows_imports ${KERNEL32_IMPORTS} DIRECTORY)
 foreach(compiler mingw msvc)
   set(program ${CMAKE_RUNTIME_OUTPUT_DIRECTORY}/package_${compiler}.exe)
+  if(compiler STREQUAL mingw)
+    list(APPEND program ${CMAKE_RUNTIME_OUTPUT_DIRECTORY}/package_hpp.exe)
+  endif()
   add_custom_command(
     OUTPUT ${program}
     COMMAND ${CMAKE_COMMAND} -S ${CMAKE_CURRENT_SOURCE_DIR}/package -B ${folder}/${compiler} -G Ninja
@@ -25,7 +29,7 @@ foreach(compiler mingw msvc)
             -DHOST_NAME=package_${compiler} -DWINDOWS_IMPORTS=${windows_imports}
             -DCMAKE_RUNTIME_OUTPUT_DIRECTORY=${CMAKE_RUNTIME_OUTPUT_DIRECTORY}
     COMMAND ${CMAKE_COMMAND} --build ${folder}/${compiler} --clean-first
-    DEPENDS ${folder}/tree.stamp package/CMakeLists.txt package/host.cpp ${toolchain_${compiler}}
+    DEPENDS ${folder}/tree.stamp package/CMakeLists.txt package/host.cpp package/hpp_host.cpp ${toolchain_${compiler}}
     VERBATIM)
   list(APPEND programs ${program})
 endforeach()

@@ -13,7 +13,7 @@ FORMATTER = "clang-format-14"
 def sources():
     for folder in FOLDERS:
         for path, _, names in os.walk(os.path.join(ROOT, folder)):
-            yield from (os.path.join(path, name) for name in names if name.endswith((".h", ".c", ".cpp")))
+            yield from (os.path.join(path, name) for name in names if name.endswith((".h", ".hpp", ".c", ".cpp")))
 
 
 def main():

@@ -36,7 +36,7 @@ LAYERED_AREAS = ("src", "simulator")
 SEEN_BY = {"include": ("src", "cli")}
 INCLUDE_FOLDERS = ["", "src", "include"]
 INCLUDE = re.compile(r'^\s*#\s*include\s*["<]([^">]+)[">]')
-SOURCE_ENDINGS = (".h", ".cpp", ".in", ".inc")
+SOURCE_ENDINGS = (".h", ".hpp", ".cpp", ".in", ".inc")
 
 
 def sources(folder):

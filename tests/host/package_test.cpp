@@ -59,4 +59,8 @@ TEST(InstalledPackage, ServesBothCompilersAlike) {
   EXPECT_THAT(output, testing::EndsWith("DestroyReceiver 0x00000000\n"));
 }
 
+TEST(InstalledPackage, ServesHostsOfTheHeaderForCpp20) {
+  EXPECT_EQ(OutputOf("package_hpp.exe"), "QR9 QU7 3000\n");
+}
+
 }  // namespace
