@@ -49,6 +49,10 @@ LineEvent ParseLineEvent(LineEventKind kind, std::string_view text) {
   const auto [word, number] = SplitAt(when, '=');
   LineEvent event;
   event.kind = kind;
+  if (number.empty()) {
+    throw std::invalid_argument("'" + std::string(text) +
+                                "' does not begin with time=, byte= or block= and a number");
+  }
   if (word == kTime) {
     event.start = LineEventStart::kTime;
     event.at = ParseSeconds(number);
@@ -56,8 +60,7 @@ LineEvent ParseLineEvent(LineEventKind kind, std::string_view text) {
     event.start = word == kByte ? LineEventStart::kByte : LineEventStart::kBlock;
     event.at = ParseNumber<uint64_t>(number, "number");
   } else {
-    throw std::invalid_argument("'" + std::string(text) +
-                                "' does not begin with time=, byte= or block=");
+    throw std::invalid_argument("'" + std::string(word) + "' is none of time, byte and block");
   }
   if (when.size() < text.size()) {
     event.duration_ms = ParseSeconds(duration);
