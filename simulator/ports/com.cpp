@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <optional>
+#include <stdexcept>
 #include <utility>
 #include <vector>
 
@@ -107,6 +108,10 @@ void ComPort::TakeInput(Receiver& receiver) {
   const std::optional<size_t> count = read_.Finish();
   if (!count) {
     ThrowLastError("cannot read from the port");
+  }
+  // A read without a time-out ends empty only when the port is gone.
+  if (*count == 0) {
+    throw std::runtime_error("the port has been removed");
   }
   receiver.Receive(read_.bytes().first(*count), /*host_speed=*/0, clock_.NowMs());
   StartRead();

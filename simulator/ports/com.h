@@ -21,8 +21,8 @@ class ComPort {
   // `name` is COM8. Throws std::system_error when it cannot be opened.
   explicit ComPort(const std::wstring& name);
 
-  // Carries bytes until the event `stop` is set or the receiver is gone. Throws std::system_error
-  // when the port fails.
+  // Carries bytes until the event `stop` is set or the receiver is gone. Throws
+  // std::runtime_error when the port fails.
   void Serve(Receiver& receiver, HANDLE stop);
 
  private:

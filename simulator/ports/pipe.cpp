@@ -50,27 +50,26 @@ Bytes PipeEnd::Step() {
     write_.Finish();
     WriteWaiting();
   }
-  if (!IsSet(read_.event())) {
-    return {};
+  Bytes heard;
+  while (IsSet(read_.event())) {
+    const std::optional<size_t> count = read_.Finish();
+    if (!std::exchange(connected_, true)) {
+      StartRead();
+    } else if (!count) {
+      WaitForHost();
+    } else {
+      const auto bytes = read_.bytes().first(*count);
+      heard.insert(heard.end(), bytes.begin(), bytes.end());
+      StartRead();
+    }
   }
-  const std::optional<size_t> count = read_.Finish();
-  if (!std::exchange(connected_, true)) {
-    StartRead();
-    return {};
-  }
-  if (!count) {
-    WaitForHost();
-    return {};
-  }
-  const auto bytes = read_.bytes().first(*count);
-  Bytes heard(bytes.begin(), bytes.end());
-  StartRead();
   return heard;
 }
 
 void PipeEnd::WaitForHost() {
   connected_ = false;
   waiting_.clear();
+  read_.Cancel();
   write_.Cancel();
   do {
     DisconnectNamedPipe(pipe_.get());
@@ -142,6 +141,8 @@ void PipePort::Serve(Receiver& receiver, HANDLE stop) {
       }
     }
     if (!receiver.plugged()) {
+      // First those without a host, so that one that is hung up finds none of them.
+      std::erase_if(ends_, [](const auto& end) { return !end->connected(); });
       ends_.clear();
     } else {
       PlugIn();

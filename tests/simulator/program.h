@@ -56,6 +56,7 @@ class TcpHost {
   explicit TcpHost(const std::string& address);
 
   bool connected() const { return connected_; }
+  // That the connection has been closed shows when nothing can be read.
   void Write(std::string_view text);
   // So many bytes, or fewer at the end of the connection.
   std::string Read(size_t size);
