@@ -21,7 +21,10 @@ class ProgramTest : public testing::Test {
   // What the program says, and how it ends.
   std::pair<int, std::string> Run(const std::vector<std::string>& arguments) const {
     Program program(arguments);
-    std::string output = program.ReadAll();
+    std::string output = program.ReadLine();
+    // It should have refused.
+    if (output.starts_with("/dev/")) program.Terminate();
+    output += '\n' + program.ReadAll();
     return {program.Wait(), std::move(output)};
   }
 
