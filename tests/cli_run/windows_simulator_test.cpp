@@ -142,14 +142,19 @@ TEST_F(PipeSimulator, AHostThatComesAgainAtOnceIsServed) {
 // A Velmar receiver sends a file without being asked for more.
 TEST_F(PipeSimulator, AStreamWaitsForASlowHost) {
   constexpr size_t kSize = 3'000'000;
-  Start({"velmar", "--chunk", "60000"}, {{"a.log", Content(kSize)}});
+  Start({"velmar", "--chunk", "60000", "--mute", "x"}, {{"a.log", Content(kSize)}});
   const auto writer = Open(GENERIC_WRITE);
   const auto reader = Open(GENERIC_READ);
   ASSERT_TRUE(writer && reader);
   constexpr std::string_view kOk = "\r\n<OK\r\n[COM1]";
   EXPECT_EQ(Ask(writer.get(), reader.get(), "currentfile a.log all\r", kOk.size()), kOk);
-  // The other handle's buffer is full by now, and this one's as well.
   EXPECT_EQ(Ask(writer.get(), reader.get(), "log filetransferb\r", kOk.size()), kOk);
+  // It hears each of these, and has time to send a chunk, of which there are 50.
+  for (int i = 0; i < 60; ++i) {
+    const std::string line = "x " + std::to_string(i);
+    Ask(writer.get(), reader.get(), line + "\r", 0);
+    transcript.WaitFor("> " + line + "\\r", std::chrono::seconds(20));
+  }
   EXPECT_THAT(transcript.Text(), Not(HasSubstr("seq=0 ")));
   constexpr size_t kFrame = 28 + 8 + 4;
   EXPECT_EQ(Ask(writer.get(), reader.get(), "", kSize + kSize / 60000 * kFrame).size(),
