@@ -3,7 +3,7 @@
 include(CMakePackageConfigHelpers)
 
 install(FILES include/rcvlink.h include/rcvlink.hpp include/rcvlink_c.h DESTINATION include)
-install(TARGETS rcvlink rcvlink-cli RUNTIME DESTINATION bin ARCHIVE DESTINATION lib)
+install(TARGETS rcvlink rcvlink-cli rcvlink-sim RUNTIME DESTINATION bin ARCHIVE DESTINATION lib)
 install(FILES ${RCVLINK_MSVC_LIBRARY} DESTINATION lib)
 
 write_basic_package_version_file(rcvlink-config-version.cmake COMPATIBILITY SameMajorVersion)

@@ -34,6 +34,16 @@ class Receiver {
   // True once the receiver has gone from the link for good, as when its plug is pulled.
   virtual bool gone() const = 0;
 
+  // The speed in bit/s that its own end of the link is set to.
+  virtual uint32_t speed() const = 0;
+
+  // The number of the block or chunk of a file that it has sent last, from 0; nothing before the
+  // first one.
+  virtual std::optional<uint64_t> last_block() const = 0;
+
+  // False while its plug is out. Then no byte passes, and a port that can tell its hosts does so.
+  virtual bool plugged() const { return true; }
+
   // The length of `bytes` up to the end of the last command that changes the line speed; 0 if there
   // is none. Some ports cannot tell whether bytes were sent before or after the host changed its own
   // speed. They take the command that asks for a change, and all before it, as sent before.

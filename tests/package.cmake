@@ -10,7 +10,7 @@ add_custom_command(
   COMMAND ${CMAKE_COMMAND} -E rm -rf ${tree}
   COMMAND ${CMAKE_COMMAND} --install ${PROJECT_BINARY_DIR} --prefix ${tree}
   COMMAND ${CMAKE_COMMAND} -E touch ${folder}/tree.stamp
-  DEPENDS rcvlink rcvlink-cli rcvlink_msvc_library ${installed}
+  DEPENDS rcvlink rcvlink-cli rcvlink-sim rcvlink_msvc_library ${installed}
   VERBATIM)
 
 set(toolchain_mingw ${PROJECT_SOURCE_DIR}/cmake/mingw-w64.cmake)

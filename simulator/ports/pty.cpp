@@ -11,6 +11,7 @@
 #include <cerrno>
 #include <ctime>
 #include <optional>
+#include <stdexcept>
 #include <system_error>
 #include <utility>
 
@@ -54,17 +55,22 @@ int OpenSlave(const std::string& name) {
 
 }  // namespace
 
-Descriptor::~Descriptor() { close(fd_); }
-
 PortLink::PortLink(std::filesystem::path path, std::filesystem::path target)
     : path_(std::move(path)), target_(std::move(target)) {
   if (path_.empty()) {
     return;
   }
+  std::error_code error;
+  std::filesystem::create_symlink(target_, path_, error);
+  if (!error) {
+    return;
+  }
+  if (error == std::errc::file_exists && !std::filesystem::is_symlink(path_)) {
+    throw std::runtime_error(path_.string() + " exists already and is no link");
+  }
   std::filesystem::path temporary = path_;
   temporary += "." + std::to_string(getpid());
   std::filesystem::create_symlink(target_, temporary);
-  std::error_code error;
   std::filesystem::rename(temporary, path_, error);
   if (error) {
     std::error_code ignored;

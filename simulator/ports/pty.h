@@ -11,29 +11,16 @@
 #include <string>
 
 #include "simulator/bytes.h"
+#include "simulator/ports/descriptor.h"
 #include "simulator/receiver.h"
 
 namespace sim {
 
-// Owns a file descriptor.
-class Descriptor {
- public:
-  explicit Descriptor(int fd) : fd_(fd) {}
-  ~Descriptor();
-  Descriptor(const Descriptor&) = delete;
-  Descriptor& operator=(const Descriptor&) = delete;
-
-  int get() const { return fd_; }
-
- private:
-  int fd_;
-};
-
-// A symbolic link that lives as long as the object. It replaces a link or file of that name in one
-// step. At the end it is removed, unless another link has replaced it.
+// A symbolic link that lives as long as the object. It replaces a link of that name in one step, but
+// nothing else. At the end it is removed, unless another link has replaced it.
 class PortLink {
  public:
-  // Makes no link when `path` is empty. Throws std::filesystem::filesystem_error.
+  // Makes no link when `path` is empty. Throws std::runtime_error.
   PortLink(std::filesystem::path path, std::filesystem::path target);
   ~PortLink();
   PortLink(const PortLink&) = delete;

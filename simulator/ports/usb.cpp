@@ -6,22 +6,11 @@
 #include <system_error>
 
 #include "simulator/ports/driver_service.h"
+#include "simulator/ports/overlapped.h"
 #include "simulator/usb/driver/bus.h"
 
 namespace sim {
 namespace {
-
-[[noreturn]] void ThrowLastError(const char* what) {
-  throw std::system_error(static_cast<int>(GetLastError()), std::system_category(), what);
-}
-
-UniqueHandle MakeEvent() {
-  UniqueHandle event(CreateEventW(nullptr, /*bManualReset=*/TRUE, FALSE, nullptr));
-  if (event.get() == nullptr) {
-    ThrowLastError("cannot make an event");
-  }
-  return event;
-}
 
 std::span<const uint8_t> BytesOf(const std::wstring& text) {
   return {reinterpret_cast<const uint8_t*>(text.data()), text.size() * sizeof(wchar_t)};

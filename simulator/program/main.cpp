@@ -1,21 +1,23 @@
-#include <signal.h>
-
 #include <CLI/CLI.hpp>
+#include <algorithm>
 #include <array>
 #include <cstdio>
 #include <exception>
 #include <fstream>
 #include <functional>
-#include <iostream>
 #include <memory>
 #include <string>
 #include <utility>
+#include <vector>
 
+#include "simulator/damaged_line.h"
 #include "simulator/files.h"
 #include "simulator/line.h"
-#include "simulator/ports/pty.h"
+#include "simulator/program/damage_options.h"
+#include "simulator/program/platform.h"
 #include "simulator/program/port_options.h"
 #include "simulator/program/quorin_program.h"
+#include "simulator/program/script.h"
 #include "simulator/program/velmar_program.h"
 #include "simulator/quorin/receiver.h"
 #include "simulator/receiver.h"
@@ -24,38 +26,16 @@
 
 namespace {
 
-volatile std::sig_atomic_t stop_requested = 0;
-
-void RequestStop(int) { stop_requested = 1; }
-
-// Blocks the signals that end the program; gives the mask that lets them in, for the waits.
-sigset_t CatchSignals() {
-  sigset_t ending;
-  sigemptyset(&ending);
-  struct sigaction action {};
-  action.sa_handler = RequestStop;
-  for (const int number : {SIGINT, SIGTERM, SIGHUP}) {
-    sigaddset(&ending, number);
-    sigaction(number, &action, nullptr);
-  }
-  sigset_t before;
-  sigprocmask(SIG_BLOCK, &ending, &before);
-  for (const int number : {SIGINT, SIGTERM, SIGHUP}) {
-    sigdelset(&before, number);
-  }
-  return before;
-}
-
 struct PortOptions {
   sim::FileOptions files;
-  std::string link;
+  sim::PortChoice choice;
+  sim::DamageOptions damage;
 };
 
 void AddPortOptions(CLI::App& command, PortOptions& port, sim::LineOptions& line) {
   sim::AddFileOptions(command, port.files);
-  command.add_option("--link", port.link, "a symbolic link to the port, removed at the end")
-      ->type_name("PATH")
-      ->group(sim::kPortGroup);
+  sim::AddScriptOption(command);
+  sim::AddPortChoice(command, port.choice);
   command.add_option("--speed", line.speed, "the line speed at the start, bit/s")
       ->capture_default_str()
       ->check(CLI::PositiveNumber)
@@ -69,6 +49,7 @@ void AddPortOptions(CLI::App& command, PortOptions& port, sim::LineOptions& line
   command.add_flag("--pace", line.paced, "send no faster than the line speed")
       ->group(sim::kPortGroup);
   sim::AddPieceOptions(command, line);
+  sim::AddDamageOptions(command, port.damage);
 }
 
 using MakeReceiver = std::function<std::unique_ptr<sim::Receiver>(sim::FileStore files,
@@ -103,24 +84,30 @@ constexpr std::array kFamilies = {
            "a Velmar receiver",
            AddOptions<sim::VelmarReceiver, sim::VelmarOptions, sim::AddVelmarOptions>}};
 
-void Run(const MakeReceiver& make_receiver, const PortOptions& port_options) {
-  const sigset_t wait_mask = CatchSignals();
-  std::ofstream file = sim::OpenTranscript(port_options.files.transcript);
+void Run(const MakeReceiver& make_receiver, const PortOptions& options) {
+  sim::CatchInterrupts();
+  std::ofstream file = sim::OpenTranscript(options.files.transcript);
   sim::Transcript transcript = file.is_open() ? sim::Transcript(file) : sim::Transcript();
-  const std::unique_ptr<sim::Receiver> receiver = make_receiver(
-      sim::FileStore::FromFolder(sim::ToPath(port_options.files.folder)), &transcript);
-  sim::PtyPort port(port_options.link);
-  std::cout << port.slave_name() << std::endl;
-  port.Serve(*receiver, stop_requested, wait_mask);
+  const std::unique_ptr<sim::Receiver> receiver =
+      make_receiver(sim::FileStore::FromFolder(sim::ToPath(options.files.folder)), &transcript);
+  sim::DamagedLine line(options.damage, *receiver, &transcript);
+  sim::ServePort(options.choice, line);
+}
+
+int Fail(const std::exception& error) {
+  std::fprintf(stderr, "rcvlink-sim: %s\n", error.what());
+  return sim::kExitFailure;
 }
 
 }  // namespace
 
 int main(int argc, char** argv) {
   CLI::App app(
-      "Simulated GNSS receivers on a pseudo-terminal. The first line of the output is the "
-      "port to open; the program runs until it is interrupted.");
+      "Simulated GNSS receivers. The first line of the output is the port to open; the program "
+      "runs until it is interrupted.",
+      "rcvlink-sim");
   app.require_subcommand(1);
+  app.set_version_flag("--version", "rcvlink-sim " RCVLINK_VERSION);
 
   PortOptions port;
   MakeReceiver make_receiver;
@@ -130,12 +117,20 @@ int main(int argc, char** argv) {
         [&make_receiver, make = family.add_options(*command, port)] { make_receiver = make; });
   }
 
-  CLI11_PARSE(app, argc, argv);
+  try {
+    std::vector<std::string> words = sim::WithScript(sim::CommandLineWords(argc, argv), app);
+    // CLI11 takes them from the end.
+    std::reverse(words.begin(), words.end());
+    app.parse(words);
+  } catch (const CLI::ParseError& error) {
+    return app.exit(error);
+  } catch (const std::exception& error) {
+    return Fail(error);
+  }
   try {
     Run(make_receiver, port);
   } catch (const std::exception& error) {
-    std::fprintf(stderr, "rcvlink-sim: %s\n", error.what());
-    return sim::kExitFailure;
+    return Fail(error);
   }
   return 0;
 }

@@ -37,6 +37,10 @@ void AddPieceOptions(CLI::App& command, LineOptions& line) {
 std::ofstream OpenTranscript(const std::string& path) {
   std::ofstream file;
   if (!path.empty()) {
+    // Files only: a device or a pipe is there before it is written to.
+    if (std::filesystem::is_regular_file(ToPath(path))) {
+      throw std::runtime_error("the transcript " + path + " exists already");
+    }
     file.open(ToPath(path), std::ios::binary | std::ios::trunc);
     if (!file) {
       throw std::runtime_error("cannot write the transcript " + path);

@@ -28,7 +28,8 @@ void AddFileOptions(CLI::App& command, FileOptions& files);
 // Sending in pieces, which every port can do.
 void AddPieceOptions(CLI::App& command, LineOptions& line);
 
-// A stream that is not open when there is no path. Throws std::runtime_error.
+// A stream that is not open when there is no path. Throws std::runtime_error, also when there is such
+// a file already.
 std::ofstream OpenTranscript(const std::string& path);
 
 }  // namespace sim

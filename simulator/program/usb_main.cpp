@@ -1,22 +1,20 @@
 #include <windows.h>
 
-#include <shellapi.h>
-
 #include <CLI/CLI.hpp>
+#include <algorithm>
 #include <array>
 #include <cstdio>
 #include <exception>
-#include <filesystem>
 #include <fstream>
 #include <iostream>
-#include <memory>
 #include <string>
 #include <thread>
 #include <vector>
 
 #include "simulator/files.h"
-#include "simulator/ports/handle.h"
 #include "simulator/ports/usb.h"
+#include "simulator/program/interrupt.h"
+#include "simulator/program/platform.h"
 #include "simulator/program/port_options.h"
 #include "simulator/program/quorin_program.h"
 #include "simulator/program/usb_options.h"
@@ -28,34 +26,6 @@ namespace {
 
 constexpr const char* kUsbPortName = "/dev/usb";
 
-struct LocalFreer {
-  void operator()(wchar_t** memory) const { LocalFree(memory); }
-};
-
-// The words after the program's name in UTF-8, from the last to the first.
-std::vector<std::string> CommandLineWords() {
-  int count = 0;
-  const std::unique_ptr<wchar_t*, LocalFreer> words(CommandLineToArgvW(GetCommandLineW(), &count));
-  std::vector<std::string> reversed;
-  for (int i = count - 1; i > 0; --i) {
-    const std::u8string word = std::filesystem::path(words.get()[i]).u8string();
-    reversed.emplace_back(word.begin(), word.end());
-  }
-  return reversed;
-}
-
-// Lives as long as the program: the system and a thread may set it at any time.
-HANDLE StopEvent() {
-  static const sim::UniqueHandle event(
-      CreateEventW(nullptr, /*bManualReset=*/TRUE, FALSE, nullptr));
-  return event.get();
-}
-
-BOOL WINAPI StopForControl(DWORD) {
-  SetEvent(StopEvent());
-  return TRUE;
-}
-
 // The parent ends the program by closing its input. That also happens when the parent dies.
 void StopAtEndOfInput() {
   const HANDLE input = GetStdHandle(STD_INPUT_HANDLE);
@@ -64,7 +34,7 @@ void StopAtEndOfInput() {
   while (ReadFile(input, ignored.data(), static_cast<DWORD>(ignored.size()), &count, nullptr) &&
          count > 0) {
   }
-  SetEvent(StopEvent());
+  SetEvent(sim::StopEvent());
 }
 
 struct PortOptions {
@@ -82,19 +52,20 @@ void Run(const sim::QuorinOptions& options,
   sim::UsbDevice device(usb_options, receiver, transcript);
   sim::UsbPort port(std::wstring(port_options.device.begin(), port_options.device.end()));
   std::cout << "\\\\?\\" << port_options.device << std::endl;
-  SetConsoleCtrlHandler(StopForControl, TRUE);
+  sim::CatchInterrupts();
   std::thread(StopAtEndOfInput).detach();
-  port.Serve(device, receiver, StopEvent());
+  port.Serve(device, receiver, sim::StopEvent());
 }
 
 }  // namespace
 
-int main() {
+int main(int argc, char** argv) {
   CLI::App app(
       "Simulated GNSS receivers on a simulated USB device. The first line of the output is the "
       "path to open; the program runs until its standard input ends or it is interrupted.",
       "rcvlink-sim-usb");
   app.require_subcommand(1);
+  app.set_version_flag("--version", "rcvlink-sim-usb " RCVLINK_VERSION);
 
   PortOptions port;
   sim::UsbOptions usb;
@@ -111,7 +82,10 @@ int main() {
   sim::AddQuorinOptions(*command, quorin);
 
   try {
-    app.parse(CommandLineWords());
+    std::vector<std::string> words = sim::CommandLineWords(argc, argv);
+    // CLI11 takes them from the end.
+    std::reverse(words.begin(), words.end());
+    app.parse(words);
   } catch (const CLI::ParseError& error) {
     return app.exit(error);
   }

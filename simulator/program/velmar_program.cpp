@@ -25,9 +25,13 @@ struct ChunkFaultOption {
   const char* help;
 };
 
-constexpr std::array<ChunkFaultOption, 7> kChunkFaults = {{
+constexpr std::array<ChunkFaultOption, 8> kChunkFaults = {{
     {"--bad-crc", VelmarChunkFaultKind::kDamagedCrc, "CHUNK[@TIMES]", "a damaged CRC"},
     {"--flipped-bit", VelmarChunkFaultKind::kFlippedBit, "CHUNK[@TIMES]", "a wrong bit of data"},
+    {"--forged-bit",
+     VelmarChunkFaultKind::kForgedBit,
+     "CHUNK[@TIMES]",
+     "a wrong bit of data, and the CRC fits"},
     {"--bad-sync", VelmarChunkFaultKind::kWrongSync, "CHUNK[@TIMES]", "wrong sync bytes 2 and 3"},
     {"--message-length",
      VelmarChunkFaultKind::kMessageLength,

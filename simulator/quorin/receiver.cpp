@@ -229,6 +229,7 @@ void QuorinReceiver::SendBlock(uint64_t now_ms) {
     return;
   }
   block_crc_ = block->crc;
+  last_block_ = number;
   const uint64_t due_ms = now_ms + TakeBlockSilence(faults_, number);
   const auto fault = TakeBlockFault(faults_, number, transfer_->at_last_block());
   QueueBlock(fault ? transfer_->Spoil(*block, *fault) : *block, fault, due_ms);

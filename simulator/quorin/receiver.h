@@ -44,9 +44,10 @@ class QuorinReceiver : public Receiver {
   std::optional<uint64_t> NextSendTime() const override;
   Bytes Send(uint64_t now_ms, uint32_t host_speed) override;
   bool gone() const override { return gone_; }
+  uint32_t speed() const override { return line_.speed(); }
+  std::optional<uint64_t> last_block() const override { return last_block_; }
   size_t EndOfSpeedCommand(std::span<const uint8_t> bytes) const override;
 
-  uint32_t speed() const { return line_.speed(); }
   bool echoes() const { return echo_; }
   bool in_transfer() const { return transfer_.has_value(); }
   const FileStore& files() const { return commands_.files(); }
@@ -81,6 +82,7 @@ class QuorinReceiver : public Receiver {
   std::optional<Transfer> transfer_;
   // The right CRC of the block that was sent last, or nothing before the first one.
   std::optional<uint16_t> block_crc_;
+  std::optional<uint64_t> last_block_;
 };
 
 }  // namespace sim

@@ -56,8 +56,9 @@ uint32_t ParseAmount(VelmarChunkFaultKind kind, std::string_view text) {
 }  // namespace
 
 bool HasAmount(VelmarChunkFaultKind kind) {
-  return kind != VelmarChunkFaultKind::kDamagedCrc && kind != VelmarChunkFaultKind::kFlippedBit &&
-         kind != VelmarChunkFaultKind::kWrongSync;
+  return kind == VelmarChunkFaultKind::kMessageLength ||
+         kind == VelmarChunkFaultKind::kBodyLength || kind == VelmarChunkFaultKind::kHeaderLength ||
+         kind == VelmarChunkFaultKind::kSilence;
 }
 
 bool HasAmount(VelmarReplyFaultKind kind) {

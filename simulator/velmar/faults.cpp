@@ -43,6 +43,8 @@ std::string_view FaultName(VelmarChunkFaultKind kind) {
       return "crc";
     case VelmarChunkFaultKind::kFlippedBit:
       return "bit";
+    case VelmarChunkFaultKind::kForgedBit:
+      return "forged";
     case VelmarChunkFaultKind::kWrongSync:
       return "sync";
     case VelmarChunkFaultKind::kMessageLength:

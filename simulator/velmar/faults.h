@@ -15,6 +15,7 @@ namespace sim {
 enum class VelmarChunkFaultKind {
   kDamagedCrc,
   kFlippedBit,  // The last bit of the data is wrong on the wire; the CRC is that of the right one.
+  kForgedBit,   // The last bit of the data is wrong, and the CRC is that of the wrong data.
   kWrongSync,   // The first of the three sync bytes is right, the others are not; the CRC fits.
   kMessageLength,  // The header says `amount`, the body is unchanged; the CRC fits.
   kBodyLength,     // The body has `amount` bytes, cut off or filled up with 0; header and CRC fit.

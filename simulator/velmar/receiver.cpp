@@ -250,6 +250,7 @@ void VelmarReceiver::SendChunk() {
     return;
   }
   line_.Queue({std::move(chunk->wire), silent_until_ms_, std::move(chunk->description)});
+  last_block_ = transfer_->chunk_number();
   vanishes_ = faults_.vanish_after_chunk == transfer_->chunk_number();
   if (vanishes_ || transfer_->at_last_chunk()) {
     transfer_.reset();

@@ -48,9 +48,10 @@ class VelmarReceiver : public Receiver {
   std::optional<uint64_t> NextSendTime() const override;
   Bytes Send(uint64_t now_ms, uint32_t host_speed) override;
   bool gone() const override { return gone_; }
+  uint32_t speed() const override { return line_.speed(); }
+  std::optional<uint64_t> last_block() const override { return last_block_; }
   size_t EndOfSpeedCommand(std::span<const uint8_t> bytes) const override;
 
-  uint32_t speed() const { return line_.speed(); }
   bool in_transfer() const { return transfer_.has_value(); }
   const FileStore& files() const { return commands_.files(); }
   const VelmarPortSettings& port_settings() const { return commands_.port_settings(); }
@@ -83,6 +84,7 @@ class VelmarReceiver : public Receiver {
   bool gone_ = false;
 
   std::optional<VelmarTransfer> transfer_;
+  std::optional<uint64_t> last_block_;
   // How long the line is silent before the current chunk, and when that is over.
   uint64_t silence_ms_ = 0;
   uint64_t silent_until_ms_ = 0;

@@ -64,6 +64,10 @@ std::optional<VelmarChunk> VelmarTransfer::CurrentChunk(VelmarFaults& faults) co
     }
     return fault;
   };
+  // An empty file has no bit to forge.
+  if (length > 0 && take(VelmarChunkFaultKind::kForgedBit)) {
+    log.body.back() ^= 1;
+  }
   if (const auto fault = take(VelmarChunkFaultKind::kBodyLength)) {
     log.body.resize(fault->amount);
   }

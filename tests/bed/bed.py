@@ -13,6 +13,8 @@ Simulated receivers, by port name ("COM12"):
   {"do": "pause", "port": P}, {"do": "resume", "port": P}     SIGSTOP, SIGCONT
   {"do": "status", "port": P}                        -> {"status": exit status, null while it runs}
 
+  {"do": "join", "ports": [P, P]}                    makes both, with a null modem between them and no receiver
+
 Windows programs (paths relative to the folder of the release build's programs):
   {"do": "run", "program": "rcvlink-cli.exe", "arguments": [...], "output": "pipe", "folder": DIR}
       -> {"job": N}. DIR, the folder to run in, may be left out. Its output is a "pipe", one whose
@@ -42,6 +44,7 @@ import tempfile
 import threading
 
 from jobs import Job, TerminalJob
+from pairs import Pair
 from processes import Refused
 from simulators import Simulator
 
@@ -56,6 +59,7 @@ class Connection(socketserver.StreamRequestHandler):
         super().setup()
         self._simulators = {}
         self._jobs = {}
+        self._pairs = []
         self._folders = []
 
     def handle(self):
@@ -74,6 +78,8 @@ class Connection(socketserver.StreamRequestHandler):
             simulator.stop()
         for job in self._jobs.values():
             job.kill()
+        for pair in self._pairs:
+            pair.close()
         for folder in self._folders:
             shutil.rmtree(folder, ignore_errors=True)
         super().finish()
@@ -86,6 +92,7 @@ class Connection(socketserver.StreamRequestHandler):
             "pause": self._pause,
             "resume": self._resume,
             "status": self._status,
+            "join": self._join,
             "run": self._run,
             "expect": self._expect,
             "interrupt": self._interrupt,
@@ -102,13 +109,21 @@ class Connection(socketserver.StreamRequestHandler):
             raise Refused(f"no receiver was started on {request['port']}")
         return self._simulators[request["port"]]
 
-    def _start(self, request):
-        port = request["port"]
+    @staticmethod
+    def _free_link(port):
         if not re.fullmatch(r"COM\d+", port):
             raise Refused(f"{port!r} is not a COM port")
         link = os.path.join(BUILD, "ports", port.lower())
         if os.path.islink(link):
             raise Refused(f"{port} is in use")
+        return link
+
+    def _join(self, request):
+        self._pairs.append(Pair([self._free_link(port) for port in request["ports"]]))
+
+    def _start(self, request):
+        port = request["port"]
+        link = self._free_link(port)
         program = self.server.simulator
         self._simulators[port] = Simulator(program, link, request["arguments"])
 

@@ -37,6 +37,25 @@ TEST(VelmarChunkFaultsTest, AFlippedBitDoesNotFitTheCrc) {
   EXPECT_EQ(Contents(chunks), expected);
 }
 
+TEST(VelmarChunkFaultsTest, AForgedBitFitsTheCrc) {
+  VelmarSession session(WithChunkFault({Kind::kForgedBit, 1}));
+  const auto chunks = ReadChunks(session.FetchFile());
+  ASSERT_EQ(chunks.size(), 3U);
+  EXPECT_TRUE(chunks[1].good_crc);
+  Bytes expected = TestPayload(2100);
+  expected.at(2 * 1024 - 1) ^= 1;
+  EXPECT_EQ(Contents(chunks), expected);
+  EXPECT_NE(session.log.str().find("bytes=1064 fault=forged\n"), std::string::npos);
+  EXPECT_EQ(Contents(ReadChunks(session.FetchFile())), TestPayload(2100));
+}
+
+TEST(VelmarChunkFaultsTest, AnEmptyFileHasNoBitToForge) {
+  VelmarSession session(WithChunkFault({Kind::kForgedBit, 0, kAlways}), OneFile(0));
+  const auto chunks = ReadChunks(session.FetchFile());
+  ASSERT_EQ(chunks.size(), 1U);
+  EXPECT_EQ(chunks[0].length, 0U);
+}
+
 TEST(VelmarChunkFaultsTest, AFaultMayHappenEveryTime) {
   VelmarSession session(WithChunkFault({Kind::kDamagedCrc, 1, kAlways}));
   EXPECT_FALSE(ReadChunks(session.FetchFile()).at(1).good_crc);

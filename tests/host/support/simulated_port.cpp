@@ -82,6 +82,7 @@ void SimulatedPort::Start(std::vector<std::string> arguments) {
   if (std::find(arguments.begin(), arguments.end(), "--folder") == arguments.end()) {
     arguments.insert(arguments.end(), {"--folder", files_.unix_path()});
   }
+  transcript_.Clear();
   arguments.insert(arguments.end(), {"--transcript", transcript_.unix_path()});
   connection_.Request({{"do", "start"}, {"port", lease_.name()}, {"arguments", arguments}});
   plugged_ = true;

@@ -178,6 +178,7 @@ void SimulatedUsb::Start(std::vector<std::string> arguments) {
   if (std::find(arguments.begin(), arguments.end(), "--folder") == arguments.end()) {
     arguments.insert(arguments.end(), {"--folder", ToUtf8(files_.path())});
   }
+  transcript_.Clear();
   arguments.insert(arguments.end(),
                    {"--device", name_, "--transcript", ToUtf8(transcript_.path())});
   Started started = StartProgram(arguments);

@@ -14,6 +14,8 @@ std::filesystem::path TranscriptFile::path() const { return folder_ / kName; }
 
 std::string TranscriptFile::unix_path() const { return folder_.unix_path() + "/" + kName; }
 
+void TranscriptFile::Clear() const { std::filesystem::remove(path()); }
+
 std::string TranscriptFile::Text() const { return folder_.Read(kName); }
 
 void TranscriptFile::WaitFor(std::string_view text, std::chrono::milliseconds timeout) const {

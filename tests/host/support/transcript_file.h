@@ -17,6 +17,9 @@ class TranscriptFile {
   std::filesystem::path path() const;
   std::string unix_path() const;
 
+  // Removes it: the program does not replace a file.
+  void Clear() const;
+
   std::string Text() const;
   // Waits until it contains `text`; raises Error when that does not come.
   void WaitFor(std::string_view text, std::chrono::milliseconds timeout) const;
