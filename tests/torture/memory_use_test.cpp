@@ -9,21 +9,6 @@
 namespace torture {
 namespace {
 
-wchar_t port[] = L"COM7";
-
-// A receiver that was found, closed in the end.
-class Found {
- public:
-  Found() { devapi::SearchReceiver(port, eInstanceSerial, eProtocolAny, nullptr, &handle_); }
-  Found(const Found&) = delete;
-  Found& operator=(const Found&) = delete;
-  ~Found() { devapi::CloseReceiver(handle_); }
-  void* handle() const { return handle_; }
-
- private:
-  void* handle_ = nullptr;
-};
-
 // Discards what it gets.
 class Sink : public MemoryStream {
  public:
@@ -38,8 +23,9 @@ size_t BytesOfList(size_t count) {
   for (size_t i = 0; i < count; ++i) {
     files.Add("LOG" + std::to_string(100'000 + i) + ".JPS", sim::Bytes(10), 1'700'000'000);
   }
-  Bench bench({"", eInstanceSerial, eProtocolQuorin}, std::move(files));
-  const Found receiver;
+  const Link link = {"", eInstanceSerial, eProtocolQuorin};
+  Bench bench(link, std::move(files));
+  const Found receiver(link);
   const Allocations allocations;
   void* list = nullptr;
   EXPECT_EQ(devapi::OpenFileList(receiver.handle(), &list), S_OK);
@@ -60,8 +46,9 @@ TEST(MemoryUse, OfAQuorinDirectoryGrowsWithItsFiles) {
 size_t AllocationsOfDownload(EProtocol family, size_t size) {
   sim::FileStore files;
   files.Add("A.LOG", sim::Bytes(size, 'x'), 1'700'000'000);
-  Bench bench({"", eInstanceSerial, family}, std::move(files));
-  const Found receiver;
+  const Link link = {"", eInstanceSerial, family};
+  Bench bench(link, std::move(files));
+  const Found receiver(link);
   Sink sink;
   wchar_t name[] = L"A.LOG";
   const Allocations allocations;

@@ -2,6 +2,9 @@
 
 #include <algorithm>
 #include <cstdio>
+#include <functional>
+#include <optional>
+#include <span>
 #include <utility>
 
 #include "platform/text.h"
@@ -9,6 +12,7 @@
 #include "simulator/quorin/receiver.h"
 #include "simulator/velmar/receiver.h"
 #include "tests/support/content.h"
+#include "tests/support/simulated_com_port.h"
 #include "tests/transport/descriptor_bytes.h"
 #include "transport/usbio.h"
 
@@ -39,9 +43,42 @@ std::unique_ptr<sim::Receiver> MakeReceiver(const Link& link, sim::FileStore fil
 
 }  // namespace
 
+// The line to the receiver. It is good until Damage is called.
+class Bench::Line : public sim::Receiver {
+ public:
+  explicit Line(sim::Receiver& receiver) : end_(&receiver) {}
+
+  void Damage(const sim::DamageOptions& options) {
+    damaged_.emplace(options, *end_);
+    end_ = &*damaged_;
+  }
+
+  void Receive(std::span<const uint8_t> bytes, uint32_t host_speed, uint64_t now_ms) override {
+    end_->Receive(bytes, host_speed, now_ms);
+  }
+  std::optional<uint64_t> NextSendTime() const override { return end_->NextSendTime(); }
+  sim::Bytes Send(uint64_t now_ms, uint32_t host_speed) override {
+    return end_->Send(now_ms, host_speed);
+  }
+  bool gone() const override { return end_->gone(); }
+  uint32_t speed() const override { return end_->speed(); }
+  std::optional<uint64_t> last_block() const override { return end_->last_block(); }
+
+ private:
+  sim::Receiver* end_;
+  std::optional<sim::DamagedLine> damaged_;
+};
+
 // A COM port, or a USB device with the usual two endpoints.
 class Bench::Port : public SimulatedComPort {
  public:
+  std::function<void()> before_wait;  // may be empty
+
+  DWORD WaitForMultipleObjects(DWORD count, const HANDLE* handles, DWORD timeout_ms) override {
+    if (before_wait) before_wait();
+    return SimulatedComPort::WaitForMultipleObjects(count, handles, timeout_ms);
+  }
+
   Port(sim::Receiver& receiver, ManualClock& clock, EInstanceType instance)
       : SimulatedComPort(receiver, clock) {
     is_usb = instance == eInstanceUSB;
@@ -69,8 +106,24 @@ Bench::Bench(const Link& link) : Bench(link, Files()) {}
 
 Bench::Bench(const Link& link, sim::FileStore files)
     : receiver_(MakeReceiver(link, std::move(files))),
-      port_(std::make_unique<Port>(*receiver_, clock_, link.instance)),
+      line_(std::make_unique<Line>(*receiver_)),
+      port_(std::make_unique<Port>(*line_, clock_, link.instance)),
       faulty_(*port_) {}
+
+Bench::~Bench() = default;
+
+void Bench::Damage(const sim::DamageOptions& options) { line_->Damage(options); }
+
+void Bench::AbortAfter(void* receiver, DWORD milliseconds) {
+  port_->before_wait = [this, receiver, end = clock_.now + milliseconds] {
+    if (clock_.now >= end) devapi::Abort(receiver);
+  };
+}
+
+Found::Found(const Link& link) {
+  wchar_t* const name = link.instance == eInstanceUSB ? device_name : port_name;
+  devapi::SearchReceiver(name, link.instance, eProtocolAny, nullptr, &handle_);
+}
 
 std::string Bench::FileContent() { return Content(kFileSize); }
 

@@ -6,11 +6,11 @@
 #include <string>
 
 #include "platform/api_types.h"
+#include "simulator/damaged_line.h"
 #include "simulator/files.h"
 #include "simulator/receiver.h"
 #include "tests/support/manual_clock.h"
 #include "tests/support/memory_stream.h"
-#include "tests/support/simulated_com_port.h"
 #include "tests/torture/faulty_calls.h"
 #include "transport/device_calls.h"
 
@@ -30,19 +30,40 @@ class Bench {
   explicit Bench(const Link& link);
   Bench(const Link& link, sim::FileStore files);
 
+  ~Bench();
+
   static std::string FileContent();
 
   FaultyCalls& calls() { return faulty_; }
-  ManualClock& clock() { return clock_; }
+
+  // From now on the line damages what it carries.
+  void Damage(const sim::DamageOptions& options);
+  // Aborts the operations of the receiver from that time on, as a host does that has lost patience.
+  void AbortAfter(void* receiver, DWORD milliseconds);
 
  private:
+  class Line;
   class Port;
 
   ManualClock clock_;
   std::unique_ptr<sim::Receiver> receiver_;
-  std::unique_ptr<SimulatedComPort> port_;
+  std::unique_ptr<Line> line_;
+  std::unique_ptr<Port> port_;
   FaultyCalls faulty_;
   rcvlink::SystemCallsOverride override_{faulty_};
+};
+
+// A receiver that a search has found, closed in the end.
+class Found {
+ public:
+  explicit Found(const Link& link);
+  Found(const Found&) = delete;
+  Found& operator=(const Found&) = delete;
+  ~Found() { devapi::CloseReceiver(handle_); }
+  void* handle() const { return handle_; }
+
+ private:
+  void* handle_ = nullptr;
 };
 
 // The results of the operations; those that were not called have kNotCalled.
