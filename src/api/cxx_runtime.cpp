@@ -16,11 +16,16 @@ void __gnu_cxx::__verbose_terminate_handler() { std::abort(); }
 // these defined twice, the library has begun to use another function of the same source: add it here.
 namespace std {
 
+// The names are the standard library's, and it has declared them.
+// NOLINTBEGIN(bugprone-reserved-identifier,readability-redundant-declaration)
+
 void __throw_bad_alloc() { throw std::bad_alloc(); }
 void __throw_bad_array_new_length() { throw std::bad_alloc(); }
 void __throw_bad_function_call() { throw std::exception(); }
 void __throw_length_error(const char*) { throw std::exception(); }
 void __throw_logic_error(const char*) { throw std::exception(); }
 void __throw_out_of_range_fmt(const char*, ...) { throw std::exception(); }
+
+// NOLINTEND(bugprone-reserved-identifier,readability-redundant-declaration)
 
 }  // namespace std
