@@ -1,6 +1,6 @@
 # Windows sources as native code on Wine's functions, with Clang's sanitizers. wineg++ links: NAME is a script that starts
 # Wine, NAME.so the program.
-add_compile_options(-fPIC -fshort-wchar -g1 -fsanitize=address -shared-libasan)
+add_compile_options(-Wno-unknown-warning-option -fPIC -fshort-wchar -g1 -fsanitize=address -shared-libasan)
 
 # What is tested, beside the tests.
 add_library(rcvlink_sanitizers INTERFACE)

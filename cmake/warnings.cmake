@@ -4,4 +4,4 @@
 add_library(rcvlink_warnings INTERFACE)
 target_compile_options(rcvlink_warnings INTERFACE
   -Wall -Wextra -Wpedantic -Wconversion -Wsign-conversion -Wshadow -Woverloaded-virtual
-  -Wold-style-cast -Wcast-qual -Werror $<$<CXX_COMPILER_ID:GNU>:-Wno-restrict>)
+  -Wold-style-cast -Wcast-qual -Werror -Wno-restrict)

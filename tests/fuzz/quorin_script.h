@@ -61,7 +61,8 @@ class QuorinScript {
         break;
       case 6: {
         const uint16_t field = input_.Word();
-        connection_.GiveRead(blocks_.Next(input_.Byte(), field, input_.Text()));
+        const uint8_t type = input_.Byte();
+        connection_.GiveRead(blocks_.Next(type, field, input_.Text()));
         break;
       }
       default:  // the write fails
