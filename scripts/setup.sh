@@ -11,7 +11,8 @@ demo_packages=(
   wine wine64
 )
 release_packages=("${demo_packages[@]}" doxygen python3)
-test_packages=("${release_packages[@]}" googletest libgtest-dev libgmock-dev clang-14 clang-format-14 clang-tidy-14 lld lld-14 mono-mcs)
+test_packages=("${release_packages[@]}" googletest libgtest-dev libgmock-dev clang-14 clang-format-14 clang-tidy-14 lld lld-14 mono-mcs
+  wine64-tools libwine-dev libclang-rt-14-dev)
 
 case "${1:-}" in
   demo) packages=("${demo_packages[@]}") ;;

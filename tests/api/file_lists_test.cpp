@@ -19,7 +19,7 @@ using rcvlink::UniqueBstr;
 
 namespace {
 
-constexpr long kInvalid = static_cast<long>(0x80070057);
+constexpr HRESULT kInvalid = static_cast<HRESULT>(0x80070057);
 const SYSTEMTIME kTime = {2026, 3, 0, 1, 12, 30, 59, 0};
 
 class FileListHandles : public testing::Test {

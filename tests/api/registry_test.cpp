@@ -24,7 +24,7 @@ namespace {
 using testing::ElementsAre;
 using testing::IsEmpty;
 
-constexpr long kInvalid = static_cast<long>(0x80070057);
+constexpr HRESULT kInvalid = static_cast<HRESULT>(0x80070057);
 
 // The functions take names that are not constant, as hosts have them.
 wchar_t* Name(const wchar_t* text) {
@@ -276,10 +276,10 @@ TEST(Registry, ACallInFlightKeepsTheReceiverAlive) {
 TEST(GetConnection, IsNotOfferedAndWritesNothing) {
   auto* connection = reinterpret_cast<CIConnection*>(0x10);
   EXPECT_EQ(GetConnection(Name(L"COM7"), eInstanceSerial, &connection),
-            static_cast<long>(0x80004001));
+            static_cast<HRESULT>(0x80004001));
   EXPECT_EQ(connection, reinterpret_cast<CIConnection*>(0x10));
   EXPECT_EQ(GetConnection(nullptr, static_cast<EInstanceType>(3), nullptr),
-            static_cast<long>(0x80004001));
+            static_cast<HRESULT>(0x80004001));
 }
 
 }  // namespace

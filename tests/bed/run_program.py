@@ -3,9 +3,9 @@
 
 usage: run_program.py NAME KIND SECONDS COMMAND...
 
-NAME is that of the log and of the results in build/test-logs. KIND is "native" or "wine", or "bed" for a program
-of Windows that needs the bed server and a set of serial ports; ctest's resource says which set. After SECONDS the
-program is ended. A log without the tests that passed is printed when one failed.
+NAME is that of the log and of the results in build/test-logs. KIND is "native" or "wine", "sanitized" for a
+program of the preset sanitize, or "bed" for a program of Windows that needs the bed server and a set of serial
+ports; ctest's resource says which set. After SECONDS the program is ended. A log without the tests that passed is printed when one failed.
 
   run_program.py --start-wine      makes the prefix, starts Wine's server: a program then starts in 50 ms
   run_program.py --end-wine        ends it
@@ -33,6 +33,26 @@ def wine_environment():
         LC_ALL="C.UTF-8",
     )
     return environment
+
+
+# Wine's loader for a program of Linux that calls Wine's functions. The sanitizer must see it before Wine does.
+SANITIZED_LOADER = "/usr/lib/wine/wine64"
+
+
+def sanitized_environment():
+    """Wine handles the signals, and a test may replace operator new with malloc. The C++ library is preloaded so that
+    the sanitizer finds its exceptions."""
+    runtime = subprocess.run(
+        ["clang++-14", "--print-file-name=libclang_rt.asan-x86_64.so"], stdout=subprocess.PIPE, check=True, text=True
+    ).stdout.strip()
+    return dict(
+        wine_environment(),
+        WINELOADERNOEXEC="1",
+        LD_PRELOAD=f"{os.path.basename(runtime)}:libstdc++.so.6",
+        LD_LIBRARY_PATH=os.path.dirname(runtime),
+        ASAN_OPTIONS="detect_leaks=0:handle_segv=0:use_sigaltstack=0:alloc_dealloc_mismatch=0",
+        UBSAN_OPTIONS="print_stacktrace=1",
+    )
 
 
 def quietly(*command):
@@ -119,13 +139,14 @@ def run(name, kind, time_limit, command):
     results = os.path.join(LOGS, f"{name}.json")
     with contextlib.suppress(FileNotFoundError):
         os.remove(results)
-    environment = dict(os.environ) if kind == "native" else wine_environment()
+    environments = {"native": os.environ.copy, "sanitized": sanitized_environment}
+    environment = environments.get(kind, wine_environment)()
     # Relative, because under Wine a path that starts with a slash has no drive.
     environment["GTEST_OUTPUT"] = f"json:{os.path.relpath(results, ROOT)}"
     with contextlib.ExitStack() as stack:
         if kind == "bed":
             environment = stack.enter_context(bed_server(environment))
-        prefix = [] if kind == "native" else ["wine"]
+        prefix = {"native": [], "sanitized": [SANITIZED_LOADER]}.get(kind, ["wine"])
         status = run_limited(prefix + command, environment, log, time_limit)
     with open(log, encoding="utf-8", errors="replace") as file:
         text = file.read()

@@ -301,8 +301,8 @@ TEST_F(VelmarDownload, TheHostGoesBackWhateverTheReceiverAnswers) {
     Serve(1);
     connection->speed = 9600;
     const std::string usual = answers[command];
-    before_command = [&](const std::string& now) {
-      if (now == kRead) answers[command] = answer;
+    before_command = [&, changed = command, to = answer](const std::string& now) {
+      if (now == kRead) answers[changed] = to;
     };
     EXPECT_EQ(Download(), S_OK);
     EXPECT_EQ(connection->speed, 9600u);

@@ -1,0 +1,91 @@
+#!/usr/bin/env python3
+"""Runs the fuzz targets from their committed corpus.
+
+usage: run_fuzz.py [SECONDS] [TARGET]
+
+All targets together run SECONDS (60), one on each processor at a time. An input that fails is kept in
+build/test-logs. The results are in build/test-logs/fuzz.json, in the form of GoogleTest.
+"""
+
+import concurrent.futures
+import glob
+import json
+import os
+import re
+import subprocess
+import sys
+
+import run_program
+
+ROOT = run_program.ROOT
+FUZZ = os.path.join(ROOT, "tests", "fuzz")
+PROGRAMS = os.path.join(run_program.BUILD, "sanitize", "bin")
+# Beside its fuzzing a target starts, and reads its corpus.
+START_SECONDS = 60
+
+
+def targets():
+    sources = sorted(glob.glob(os.path.join(FUZZ, "*.cpp")))
+    return [name for name in (os.path.splitext(os.path.basename(path))[0] for path in sources) if name != "main"]
+
+
+def options(target, seconds):
+    artifacts = os.path.join(run_program.LOGS, f"fuzz-{target}-")
+    listed = [f"-max_total_time={seconds}", "-handle_segv=0", "-timeout=20", "-max_len=4096", "-print_final_stats=1",
+              f"-artifact_prefix={artifacts}"]
+    dictionary = os.path.join(FUZZ, target.split("_")[0] + ".dict")
+    if os.path.exists(dictionary):
+        listed.append(f"-dict={dictionary}")
+    return listed
+
+
+def run(target, seconds):
+    """Whether the target found nothing, and its executions a second and edges."""
+    grown = os.path.join(run_program.BUILD, "fuzz-corpus", target)  # what it found in earlier runs
+    os.makedirs(grown, exist_ok=True)
+    command = [
+        run_program.SANITIZED_LOADER,
+        os.path.join(PROGRAMS, f"fuzz_{target}.exe.so"),
+        *options(target, seconds),
+        grown,
+        os.path.join(FUZZ, "corpus", target),
+    ]
+    log = os.path.join(run_program.LOGS, f"fuzz-{target}.log")
+    status = run_program.run_limited(
+        command, run_program.sanitized_environment(), log, seconds + START_SECONDS
+    )
+    with open(log, encoding="utf-8", errors="replace") as file:
+        text = file.read()
+    executions = re.findall(r"stat::number_of_executed_units: (\d+)", text)
+    edges = re.findall(r" cov: (\d+)", text)
+    # Without the counts the fuzzer did not come to its end.
+    passed = status == 0 and bool(executions)
+    if not passed:
+        print(text[-8000:])
+    rate = int(executions[-1]) // seconds if executions else 0
+    print(f"{target:24} {rate:7} executions/s {edges[-1] if edges else '?':>6} edges  {'ok' if passed else 'FAILED'}",
+          flush=True)
+    return passed
+
+
+def main(arguments):
+    if arguments[:1] in (["-h"], ["--help"]) or len(arguments) > 2:
+        print(__doc__.strip())
+        return 2
+    total = int(arguments[0]) if arguments else 60
+    chosen = arguments[1:] or targets()
+    os.makedirs(run_program.LOGS, exist_ok=True)
+    seconds = max(1, total // len(chosen))
+    with concurrent.futures.ThreadPoolExecutor(os.cpu_count()) as pool:
+        passed = list(pool.map(lambda target: run(target, seconds), chosen))
+    cases = [
+        {"name": name, "status": "RUN", "result": "COMPLETED", **({} if good else {"failures": []})}
+        for name, good in zip(chosen, passed)
+    ]
+    with open(os.path.join(run_program.LOGS, "fuzz.json"), "w", encoding="utf-8") as file:
+        json.dump({"testsuites": [{"name": "Fuzz", "testsuite": cases}]}, file)
+    return 0 if all(passed) else 1
+
+
+if __name__ == "__main__":
+    sys.exit(main(sys.argv[1:]))

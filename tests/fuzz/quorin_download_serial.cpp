@@ -1,0 +1,4 @@
+// A whole download from a Quorin receiver on a serial port.
+#include "tests/fuzz/quorin_download.h"
+
+void fuzz::Target(std::span<const uint8_t> bytes) { Download(bytes, eInstanceSerial); }
