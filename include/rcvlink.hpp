@@ -139,11 +139,10 @@ using Sink = std::function<void(std::span<const std::byte> bytes)>;
 /// Called with 0 to 100 as a download proceeds. The same rules as for `Sink`.
 using Progress = std::function<void(int percent)>;
 
-/// Where and how to search.
+/// How to search.
 struct SearchOptions {
-  EInstanceType link = eInstanceSerial;  ///< the kind of link
-  EProtocol family = eProtocolAny;       ///< the family to ask for
-  std::stop_token stop{};                ///< ends the search
+  EProtocol family = eProtocolAny;  ///< the family to ask for
+  std::stop_token stop{};           ///< ends the search
 };
 
 /// How to download.
@@ -187,8 +186,8 @@ class Receiver {
  public:
   /// Finds the receiver on a port, as `devapi::SearchReceiver`: one that is open already at once,
   /// otherwise in seconds; on a silent port minutes pass.
-  /// @param port such as L"COM7", or the path of a USB device with `link` eInstanceUSB
-  /// @param options what to search for
+  /// @param port such as L"COM7", or the path of a USB device, which begins with two backslashes
+  /// @param options family, stop
   /// @throws std::system_error Error::kNoResult when no receiver answers; Error::kNotFound when there
   ///         is no such port; std::errc::permission_denied when another program has it;
   ///         Error::kCancelled
@@ -198,7 +197,7 @@ class Receiver {
   /// Makes one try with known settings, as `devapi::CreateReceiverOnSerial`. It takes seconds.
   /// @param port    such as L"COM7"
   /// @param settings of the port
-  /// @param options `link` is not used
+  /// @param options family, stop
   /// @throws std::system_error as `Find`
   /// @return the receiver
   static Receiver FindAt(std::wstring port, DCB settings, const SearchOptions& options = {});
@@ -701,8 +700,9 @@ void Receiver::Execute(const char* tried, const std::stop_token& stop, Operation
 inline Receiver Receiver::Find(std::wstring port, const SearchOptions& options) {
   const detail::StopEvent stopped(options.stop);
   void* handle = nullptr;
+  const EInstanceType link = port.starts_with(L"\\\\") ? eInstanceUSB : eInstanceSerial;
   const long result =
-      devapi::SearchReceiver(port.data(), options.link, options.family, stopped.get(), &handle);
+      devapi::SearchReceiver(port.data(), link, options.family, stopped.get(), &handle);
   return detail::Found(result, handle, options.stop, port);
 }
 

@@ -12,10 +12,12 @@ import zipfile
 
 ROOT = os.path.realpath(os.path.join(os.path.dirname(os.path.abspath(__file__)), "..", ".."))
 COPY = os.path.join(ROOT, "build", "release-again", "in-a-folder-of-another-name")
+INSTALLED = ("rcvlink", "rcvlink_msvc_library", "rcvlink-cli", "rcvlink-sim")  # the targets
 NEEDED = (
     "README.md", "CHANGELOG.md", "LICENSE", "NOTICE", "SHA256SUMS", "bom.json",
     "bin/rcvlink.dll", "bin/rcvlink-cli.exe",
-    "include/rcvlink.h", "include/rcvlink_c.h",
+    "bin/rcvlink-sim.exe", "include/rcvlink.h", "include/rcvlink.hpp", "include/rcvlink_c.h",
+    "share/rcvlink/csharp/Rcvlink.cs", "share/doc/rcvlink/examples/download.cpp",
     "lib/librcvlink.dll.a", "lib/rcvlink.lib",
     "lib/cmake/rcvlink/rcvlink-config.cmake", "lib/pkgconfig/rcvlink.pc",
     "share/doc/rcvlink/reference/index.html", "share/doc/rcvlink/docs/known-behaviour.md",
@@ -39,7 +41,7 @@ def build_again():
     shutil.rmtree(COPY, ignore_errors=True)
     shutil.copytree(ROOT, COPY, ignore=shutil.ignore_patterns("build", ".git", "__pycache__"))
     run(COPY, "cmake", "--preset", "release", "-DBUILD_TESTING=OFF")
-    run(COPY, "cmake", "--build", "--preset", "release", "-j", "1")
+    run(COPY, "cmake", "--build", "--preset", "release", "-j", "1", "--target", *INSTALLED)
 
 
 def release_of(root):

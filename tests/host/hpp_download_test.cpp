@@ -394,7 +394,7 @@ TEST_F(HppDownload, LeavesNoHandle) {
 
 TEST(HppDownloadOverUsb, GivesAFunctionTheBytesOrThrows) {
   const bed::SimulatedUsb usb({"quorin"}, {{"a.jps", Content(kSize)}});
-  auto receiver = rcvlink::Receiver::Find(usb.device(), {.link = eInstanceUSB});
+  auto receiver = rcvlink::Receiver::Find(usb.device());
   std::string bytes;
   const auto collect = [&](std::span<const std::byte> piece) {
     bytes.append(reinterpret_cast<const char*>(piece.data()), piece.size());
