@@ -1,0 +1,1 @@
+def text(f,p): return ''
