@@ -32,6 +32,7 @@ class ReportFile {
  public:
   void Create(const wchar_t* name);
   void Close() { file_.Reset(); }
+  bool IsOpen();
 
   void WriteEntry(const char* format, va_list arguments);
   void WriteEntry(const wchar_t* format, va_list arguments);
@@ -64,6 +65,11 @@ void ReportFile::Create(const wchar_t* name) {
                                  CREATE_ALWAYS,
                                  FILE_ATTRIBUTE_HIDDEN,
                                  nullptr));
+}
+
+bool ReportFile::IsOpen() {
+  const std::scoped_lock lock(lock_);
+  return static_cast<bool>(file_);
 }
 
 // A write that fails is ignored: an operation does not fail because it cannot be traced.
@@ -173,9 +179,11 @@ void CloseReportFile() { TheReport().Close(); }
 namespace {
 
 // An operation does not fail because it cannot be traced: when there is no memory for a line, the
-// report goes on without it.
+// report goes on without it. The library's own formats need no check, so without a report a line costs
+// only the look for one.
 template <typename Character>
 void WriteOrSkip(const Character* format, va_list arguments) noexcept {
+  if (!TheReport().IsOpen()) return;
   try {
     dump_hlp::DumpReportString(format, arguments);
   } catch (const HResultError&) {

@@ -6,7 +6,7 @@ import subprocess
 import sys
 
 ROOT = os.path.realpath(os.path.join(os.path.dirname(os.path.abspath(__file__)), "..", ".."))
-FOLDERS = ("include", "src", "cli", "simulator", "tests", "examples")
+FOLDERS = ("include", "src", "cli", "simulator", "tests", "examples", "bench")
 FORMATTER = "clang-format-14"
 
 

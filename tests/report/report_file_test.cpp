@@ -56,6 +56,14 @@ HRESULT CodeOf(const std::function<void()>& action) {
   return S_OK;
 }
 
+// A line that nobody reads costs nothing: the text would be read to measure it.
+TEST(Report, WithoutOneTheTextsOfALineAreNotRead) {
+  void* const unreadable = VirtualAlloc(nullptr, 1, MEM_RESERVE, PAGE_NOACCESS);
+  Trace(L"a line [%s]\r\n", static_cast<const wchar_t*>(unreadable));
+  Trace("a line [%s]\r\n", static_cast<const char*>(unreadable));
+  VirtualFree(unreadable, 0, MEM_RELEASE);
+}
+
 TEST(Report, StampsEachEntry) {
   const ReportCapture report;
   Trace(L"an event [%u] [%s]\r\n", 7u, L"COM7");

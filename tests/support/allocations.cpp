@@ -1,7 +1,9 @@
 #include "tests/support/allocations.h"
 
+#include <malloc.h>
 #include <windows.h>
 
+#include <algorithm>
 #include <atomic>
 #include <cstdlib>
 #include <new>
@@ -16,6 +18,8 @@ size_t count = 0;
 size_t bytes = 0;
 size_t failing = Allocations::kNone;
 ptrdiff_t live = 0;
+ptrdiff_t live_bytes = 0;
+ptrdiff_t most_bytes = 0;
 
 bool IsCounted() { return counted_thread.load() == GetCurrentThreadId() && uncounted_scopes == 0; }
 
@@ -27,12 +31,17 @@ void* Allocate(size_t size) {
   if (counted) {
     bytes += size;
     ++live;
+    live_bytes += static_cast<ptrdiff_t>(_msize(memory));
+    most_bytes = std::max(most_bytes, live_bytes);
   }
   return memory;
 }
 
 void Free(void* memory) {
-  if (memory && IsCounted()) --live;
+  if (memory && IsCounted()) {
+    --live;
+    live_bytes -= static_cast<ptrdiff_t>(_msize(memory));
+  }
   std::free(memory);
 }
 
@@ -42,6 +51,8 @@ Allocations::Allocations(size_t number) {
   count = 0;
   bytes = 0;
   live = 0;
+  live_bytes = 0;
+  most_bytes = 0;
   failing = number;
   counted_thread = GetCurrentThreadId();
 }
@@ -53,6 +64,10 @@ size_t Allocations::Count() { return count; }
 size_t Allocations::Bytes() { return bytes; }
 
 ptrdiff_t Allocations::Live() { return live; }
+
+size_t Allocations::LiveBytes() { return static_cast<size_t>(std::max<ptrdiff_t>(live_bytes, 0)); }
+
+size_t Allocations::MostBytes() { return static_cast<size_t>(most_bytes); }
 
 bool Allocations::HasFailed() { return count > failing; }
 

@@ -17,9 +17,11 @@ class Allocations {
   Allocations& operator=(const Allocations&) = delete;
   ~Allocations();
 
-  static size_t Count();    // how many there were
-  static size_t Bytes();    // of how many bytes
-  static ptrdiff_t Live();  // how many of them were not freed, less those of before that were
+  static size_t Count();      // how many there were
+  static size_t Bytes();      // of how many bytes
+  static ptrdiff_t Live();    // how many of them were not freed, less those of before that were
+  static size_t LiveBytes();  // of how many bytes these are
+  static size_t MostBytes();  // the most that LiveBytes was
   static bool HasFailed();
 };
 

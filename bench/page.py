@@ -1,0 +1,234 @@
+"""The text of docs/performance.md."""
+
+LIMIT = 11520  # bytes a second at 115200 bit/s, 10 bits a byte
+NAMES = {"quorin": "Quorin", "velmar": "Velmar"}
+
+
+def number(value):
+    return f"{value:,.0f}"
+
+
+def table(head, rows):
+    lines = ["| " + " | ".join(head) + " |", "|---|" + "---:|" * (len(head) - 1)]
+    return "\n".join([*lines, *("| " + " | ".join(map(str, row)) + " |" for row in rows)])
+
+
+def line_table(figures):
+    delays = list(next(iter(figures["rates"].values())))
+    rows = []
+    for protocol, rates in figures["rates"].items():
+        cells = [f"{number(rates[delay])} ({rates[delay] / LIMIT:.1%})" for delay in delays]
+        rows.append([NAMES.get(protocol, protocol), *cells])
+    return table(["Protocol", *(f"{delay} ms" for delay in delays)], rows)
+
+
+def get_table(figures):
+    rows = []
+    for row in figures["table"]:
+        carried = max(row["to_host"], row["from_host"]) / LIMIT
+        rest = row["used_s"] - row["silent_s"] - carried
+        rows.append(
+            [
+                f"{NAMES[row['family']]}, {number(row['size'])}",
+                f"{row['total_s']:.2f}",
+                f"{carried:.2f}",
+                f"{row['silent_s']:.2f} ({row['silences']})",
+                f"{rest:.2f}",
+                f"{row['total_s'] - row['used_s']:.2f}",
+            ]
+        )
+    return table(
+        ["Family, bytes", "Total, s", "The line carries, s", "Silences, s", "Other exchange, s", "Program, s"], rows
+    )
+
+
+def library_table(figures):
+    fastest = figures["crc_eight_bytes_ns"]
+    rows = [
+        ["Checksum of a block, eight bytes a step", f"{fastest:.0f} ns", "1.0"],
+        ["one byte a step", f"{figures['crc_byte_ns']:.0f} ns", f"{figures['crc_byte_ns'] / fastest:.1f}"],
+        ["bit by bit", f"{figures['crc_bit_ns']:.0f} ns", f"{figures['crc_bit_ns'] / fastest:.1f}"],
+    ]
+    closed = figures["trace_closed_ns"]
+    for name, key in (
+        ("Line of the report, no report open", "trace_closed_ns"),
+        ("the same, only formatted", "trace_formatted_ns"),
+        ("the same, written to a report", "trace_open_ns"),
+    ):
+        rows.append([name, f"{figures[key]:.0f} ns", f"{figures[key] / closed:.1f}"])
+    return table(["", "Time", "Ratio"], rows)
+
+
+def registry_table(figures):
+    rows = [
+        [number(count), f"{figures[f'registry_handle_{count}_ns']:.0f} ns", f"{figures[f'registry_name_{count}_ns'] / 1000:.1f} us"]
+        for count in (1, 100, 10_000)
+    ]
+    return table(["Receivers", "By handle", "By name (`OpenReceiver`)"], rows)
+
+
+def memory_table(figures):
+    rows = [
+        ["allocations for each file of a directory", *(f"{figures[f'{f}_entry_allocations']:.2f}" for f in NAMES)],
+        ["bytes of these, all together", *(figures[f"{f}_entry_bytes"] for f in NAMES)],
+        ["allocations for each block or chunk", *(f"{figures[f'{f}_piece_allocations']:.2f}" for f in NAMES)],
+        ["bytes that a found receiver holds", *(number(figures[f"{f}_receiver_bytes"]) for f in NAMES)],
+        ["most bytes that a download holds besides", *(number(figures[f"{f}_download_bytes"]) for f in NAMES)],
+        ["pauses in a search at the right speed, ms", *(figures[f"{f}_search_pauses_ms"] for f in NAMES)],
+        ["pauses in a file list, ms", *(figures[f"{f}_list_pauses_ms"] for f in NAMES)],
+        ["pauses in a download that raises the speed, ms", *(figures[f"{f}_download_pauses_ms"] for f in NAMES)],
+    ]
+    return table(["", *NAMES.values()], rows)
+
+
+def calls_table(figures):
+    functions = sorted({name for family in figures.values() for name in family} - {"bytes"})
+    rows = [[f"`{name}`", *(f"{figures[f].get(name, 0):.2f}" for f in NAMES)] for name in functions]
+    rows.append(["all", *(f"{sum(v for k, v in figures[f].items() if k != 'bytes'):.2f}" for f in NAMES)])
+    return table(["Function", *NAMES.values()], rows)
+
+
+def many_table(figures):
+    mib = 1024 * 1024
+    rows = []
+    for row in figures["table"]:
+        rows.append(
+            [
+                row["receivers"],
+                f"{row['seconds']:.2f} s",
+                f"{row['processor_s'] / (row['bytes'] / mib):.2f} s",
+                f"{(row['working_set_found'] - row['working_set_empty']) / 1024 / row['receivers']:,.0f} KiB",
+            ]
+        )
+    return table(
+        ["Receivers", "Elapsed", "Processor time for a MiB", "Working set for each"], rows
+    )
+
+
+def size_table(figures):
+    total = figures["dll"]
+    rows = [[name, number(size), f"{size / total:.1%}"] for name, size in sorted(
+        figures["parts"].items(), key=lambda part: -part[1])]
+    rows.append(["all", number(total), "100.0%"])
+    return table(["`rcvlink.dll`", "Bytes", "Share"], rows)
+
+
+def program_table(figures):
+    rows = [[name, number(size)] for name, size in sorted(figures["program_parts"].items(), key=lambda part: -part[1])]
+    rows.insert(1, ["of the C++ runtime: streams and locales", number(figures["program_streams"])])
+    return table(["`rcvlink-cli.exe`", "Bytes"], rows)
+
+
+def text(figures, processor):
+    library, size = figures["library"], figures["size"]
+    block_ms = 1000 * 518 / LIMIT
+    cores = {1: "one core", 2: "two cores"}.get(processor["cores"], f"{processor['cores']} cores")
+    speed = f" of {processor['ghz']} GHz" if processor["ghz"] else ""
+    return f"""# Performance
+
+`bench/run` measured all of this and wrote this page; `bench/run PART` repeats one part. Nothing here is a test: no
+run fails because it was slow.
+
+- The machine has {cores}{speed}, and builds of other programs ran on it at the same time. So absolute times are
+  noisy, and ratios are what counts: their sides were measured in turns or side by side in one run. Each figure is
+  the median of all turns, unless it says something else.
+- The library and its programs ran under Wine 8 on Linux, not on Windows. A call that enters Wine's server costs
+  several times as much as on Windows. The programs of lrzsz ran as they are on Linux.
+- The receivers are simulated. A real one takes time to read its storage, which none of these figures contain.
+
+## Protocols on the same line
+
+`bench/run line`
+
+A file of {number(figures['line']['bytes'])} bytes over two pseudo-terminals and a relay (`bench/relay.cpp`) that
+carries 115200 bit/s in each direction, 10 bits a byte, so at most {number(LIMIT)} bytes a second. What the host
+sends arrives 0, 1, 5 or 16 ms late, as with a USB adapter that collects bytes. All protocols ran at the same time,
+each on a line of its own. The figures are bytes of the file a second in the middle of the transfer (between 10 and
+90 % of the bytes on the line), without what comes before and after it, and in brackets the share of the line's limit.
+
+{line_table(figures['line'])}
+
+Quorin sends a block of 512 bytes and waits for the answer, so a late answer costs it twice as much as XMODEM-1K and
+YMODEM with blocks of 1024. Of 518 bytes on the line 512 are the file's, so 98.8 % is the most that it can have.
+ZMODEM and Velmar do not wait for answers. The block length is the receiver's, and cannot be raised by the library.
+
+## Whole downloads
+
+`bench/run get`
+
+`rcvlink-cli get PORT NAME --speed 115200 --no-memory` on that line without a delay; the run of 1 MiB is a single
+one. A silence is a time of 0.4 s or more in which neither side sends, with their number in brackets. "The line
+carries" is the time of the bytes alone, "program" what is before the first byte and after the last one: the start of
+Wine's process and its end.
+
+{get_table(figures['get'])}
+
+Both families ask for a reply of unknown length by a read for a whole buffer, which the port ends 1 s after the last
+byte: COM ports are opened with this interval (`src/transport/serial_connection.cpp`). So each reply of a Quorin
+receiver costs 1 s: its two at the start, one of the list, and one for the file's size and its beginning each. The
+last chunks of a Velmar file wait as long. Velmar has half a second more after each reply, since its receivers need a
+moment before they take the next command. The blocks of Quorin have a known length, and no such wait. Before a download,
+`get` asks for the list of files.
+
+## What the library costs
+
+`bench/run library`
+
+{library_table(library)}
+
+A block that is whole costs the library {library['block_ns']:.0f} ns, with its checksum and without the Win32 calls.
+The line carries it in {block_ms:.0f} ms. A line without a report makes {library['trace_closed_allocations']}
+allocations.
+
+{registry_table(library)}
+
+Names are compared one by one by Windows' own function, which is what hosts' names need; a host opens a receiver by
+name once, and every call finds it by its handle.
+
+{memory_table(library)}
+
+The receivers are in memory, and allocations are those of C++'s `new`. The most bytes of a download are not those of
+its transfer: a Quorin command has a buffer of 64 KiB for its reply. A Velmar command has 8 KiB more on its stack. The
+pauses are those that the library makes by its clock, without the ends of reads.
+
+## Win32 calls for each 512 bytes
+
+`bench/run calls`
+
+Calls of `rcvlink.dll` to other DLLs, counted at its import table: what a download of 200 KiB has more than one of
+100 KiB, for each 512 bytes. The port is a COM port of Wine, on which a write of one byte ends at once; one that does
+not takes a `GetLastError`, a `WaitForMultipleObjects` and a `GetOverlappedResult` more.
+
+{calls_table(figures['calls'])}
+
+A block takes two reads and a write. Each needs its `ReadFile` or `WriteFile`, and each read that is not over at once
+`GetLastError`, a wait and the result. Of the rest, the `ResetEvent` is a rule of connections: each transfer begins with
+its event cleared. A block takes no lock and no allocation. Velmar reads up to 8 KiB at once.
+
+## Many receivers at once
+
+`bench/run many`
+
+Each receiver is a process with a pseudo-terminal of its own, and a thread of the host downloads {number(figures['many']['table'][0]['bytes'])}
+bytes from it. The speed is raised for the transfer and set back, with replies of 1 s each; the lines are not paced. So
+the elapsed time is silence but for the last row's. Processor time is that of the host's process alone,
+without Wine's server and the receivers. The working set is what a search of all receivers added to it, for each
+receiver. Most of it for a single one is what Wine and the C runtime load at the first use.
+
+{many_table(figures['many'])}
+
+## Sizes
+
+`bench/run size`
+
+The bytes of the DLL, by the linker's map of a second link with the same objects. A layer's row is its code; its
+constants, such as the texts of the report and the tables of checksums, are one row of all.
+
+{size_table(size)}
+
+{program_table(size)}
+
+The program has {number(size['program'])} bytes. CLI11 reads and writes by streams, and they bring libstdc++'s
+streams and locales into a program that is linked statically. The DLL has none of them. `rcvlink-sim` has
+{number(size['simulator'])} bytes, with symbols.
+"""
