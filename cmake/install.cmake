@@ -14,7 +14,9 @@ install(FILES ${CMAKE_CURRENT_BINARY_DIR}/rcvlink.pc DESTINATION lib/pkgconfig)
 
 install(FILES CHANGELOG.md LICENSE NOTICE SECURITY.md DESTINATION share/doc/rcvlink)
 # The folders are those of the sources, so that the documents find each other.
-install(DIRECTORY docs DESTINATION share/doc/rcvlink)
+# What is for those who change the library stays out.
+install(DIRECTORY docs DESTINATION share/doc/rcvlink
+        REGEX "/(adding-a-family|architecture|performance|testing)\\.md$" EXCLUDE)
 install(FILES simulator/README.md DESTINATION share/doc/rcvlink/simulator)
 install(DIRECTORY examples DESTINATION share/doc/rcvlink PATTERN CMakeLists.txt EXCLUDE)
 install(FILES kit/examples.cmake DESTINATION share/doc/rcvlink/examples RENAME CMakeLists.txt)
