@@ -5,6 +5,7 @@
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
+#include <malloc.h>
 
 #include <algorithm>
 #include <array>
@@ -45,6 +46,8 @@
 #define __declspec_dllimport
 #define __declspec_dllexport
 #define __declspec_align(x) __attribute__((aligned(x)))
+
+#define _msize malloc_usable_size
 
 #define WIN32_LEAN_AND_MEAN
 #define NOMINMAX
