@@ -145,6 +145,7 @@ carries 115200 bit/s in each direction, 10 bits a byte, so at most {number(LIMIT
 sends arrives 0, 1, 5 or 16 ms late, as with a USB adapter that collects bytes. All protocols ran at the same time,
 each on a line of its own. The figures are bytes of the file a second in the middle of the transfer (between 10 and
 90 % of the bytes on the line), without what comes before and after it, and in brackets the share of the line's limit.
+A transfer of lrzsz that failed was repeated once.
 
 {line_table(figures['line'])}
 
@@ -156,8 +157,8 @@ ZMODEM and Velmar do not wait for answers. The block length is the receiver's, a
 
 `bench/run get`
 
-`rcvlink-cli get PORT NAME --speed 115200 --no-memory` on that line without a delay; the run of 1 MiB is a single
-one. A silence is a time of 0.4 s or more in which neither side sends, with their number in brackets. "The line
+`rcvlink-cli get PORT NAME --speed 115200 --no-memory` on that line without a delay, once for each of the
+larger files. A silence is a time of 0.4 s or more in which neither side sends, with their number in brackets. "The line
 carries" is the time of the bytes alone, "program" what is before the first byte and after the last one: the start of
 Wine's process and its end.
 
@@ -168,7 +169,8 @@ byte: COM ports are opened with this interval (`src/transport/serial_connection.
 receiver costs 1 s: its two at the start, one of the list, and one for the file's size and its beginning each. The
 last chunks of a Velmar file wait as long. Velmar has half a second more after each reply, since its receivers need a
 moment before they take the next command. The blocks of Quorin have a known length, and no such wait. Before a download,
-`get` asks for the list of files.
+`get` asks for the list of files. Nothing smaller than 4 bytes is here: the library waits for more of a Velmar file
+of fewer, until it is aborted.
 
 ## What the library costs
 
