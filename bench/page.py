@@ -132,8 +132,8 @@ run fails because it was slow.
 - The machine has {cores}{speed}, and builds of other programs ran on it at the same time. So absolute times are
   noisy, and ratios are what counts: their sides were measured in turns or side by side in one run. Each figure is
   the median of all turns, unless it says something else.
-- The library and its programs ran under Wine 8 on Linux, not on Windows. A call that enters Wine's server costs
-  several times as much as on Windows. The programs of lrzsz ran as they are on Linux.
+- The library and its programs ran under Wine 8 on Linux, not on Windows, and lrzsz as a program of Linux. So the
+  time that a block of Quorin takes beyond the line's has Wine's in it, and lrzsz has no such part.
 - The receivers are simulated. A real one takes time to read its storage, which none of these figures contain.
 
 ## Protocols on the same line
@@ -145,19 +145,21 @@ carries 115200 bit/s in each direction, 10 bits a byte, so at most {number(LIMIT
 sends arrives 0, 1, 5 or 16 ms late, as with a USB adapter that collects bytes. All protocols ran at the same time,
 each on a line of its own. The figures are bytes of the file a second in the middle of the transfer (between 10 and
 90 % of the bytes on the line), without what comes before and after it, and in brackets the share of the line's limit.
+A transfer of lrzsz that failed was repeated once.
 
 {line_table(figures['line'])}
 
 Quorin sends a block of 512 bytes and waits for the answer, so a late answer costs it twice as much as XMODEM-1K and
 YMODEM with blocks of 1024. Of 518 bytes on the line 512 are the file's, so 98.8 % is the most that it can have.
-ZMODEM and Velmar do not wait for answers. The block length is the receiver's, and cannot be raised by the library.
+ZMODEM and Velmar do not wait for answers. The library asks for blocks of 512 bytes, the only ones
+that it takes.
 
 ## Whole downloads
 
 `bench/run get`
 
-`rcvlink-cli get PORT NAME --speed 115200 --no-memory` on that line without a delay; the run of 1 MiB is a single
-one. A silence is a time of 0.4 s or more in which neither side sends, with their number in brackets. "The line
+`rcvlink-cli get PORT NAME --speed 115200 --no-memory` on that line without a delay, once for each of the
+larger files. A silence is a time of 0.4 s or more in which neither side sends, with their number in brackets. "The line
 carries" is the time of the bytes alone, "program" what is before the first byte and after the last one: the start of
 Wine's process and its end.
 
@@ -165,10 +167,12 @@ Wine's process and its end.
 
 Both families ask for a reply of unknown length by a read for a whole buffer, which the port ends 1 s after the last
 byte: COM ports are opened with this interval (`src/transport/serial_connection.cpp`). So each reply of a Quorin
-receiver costs 1 s: its two at the start, one of the list, and one for the file's size and its beginning each. The
-last chunks of a Velmar file wait as long. Velmar has half a second more after each reply, since its receivers need a
-moment before they take the next command. The blocks of Quorin have a known length, and no such wait. Before a download,
-`get` asks for the list of files.
+receiver costs 1 s: two of the search, one of the list, three before the first block. Velmar has half a second more after
+each reply, since its receivers need a moment before they take the next command, and the silences of its search, which
+asks for a Quorin receiver first. The end of a Velmar file waits in the same way, and counts as "program" here. The
+blocks of Quorin have a known length, and no such wait; "other exchange" is what passes between them. Before a download,
+`get` asks for the list of files. Nothing smaller than 4 bytes is here: the library waits for more of a Velmar file
+of fewer, until it is aborted.
 
 ## What the library costs
 
@@ -187,8 +191,8 @@ name once, and every call finds it by its handle.
 
 {memory_table(library)}
 
-The receivers are in memory, and allocations are those of C++'s `new`. The most bytes of a download are not those of
-its transfer: a Quorin command has a buffer of 64 KiB for its reply. A Velmar command has 8 KiB more on its stack. The
+The receivers are in memory, and allocations are those of C++'s `new`. The most bytes of a Quorin
+download are those of a command before it: each has a buffer of 64 KiB for its reply. A Velmar command has 8 KiB more on its stack. The
 pauses are those that the library makes by its clock, without the ends of reads.
 
 ## Win32 calls for each 512 bytes
@@ -210,10 +214,10 @@ its event cleared. A block takes no lock and no allocation. Velmar reads up to 8
 `bench/run many`
 
 Each receiver is a process with a pseudo-terminal of its own, and a thread of the host downloads {number(figures['many']['table'][0]['bytes'])}
-bytes from it. The speed is raised for the transfer and set back, with replies of 1 s each; the lines are not paced. So
-the elapsed time is silence but for the last row's. Processor time is that of the host's process alone,
+bytes from it. The speed is raised for the transfer and set back, and the silences of these replies are in the elapsed
+time; the lines are not paced. Processor time is that of the host's process alone,
 without Wine's server and the receivers. The working set is what a search of all receivers added to it, for each
-receiver. Most of it for a single one is what Wine and the C runtime load at the first use.
+receiver; what is loaded once is in it, so it falls with their number.
 
 {many_table(figures['many'])}
 
