@@ -4,4 +4,8 @@
 add_library(rcvlink_warnings INTERFACE)
 target_compile_options(rcvlink_warnings INTERFACE
   -Wall -Wextra -Wpedantic -Wconversion -Wsign-conversion -Wshadow -Woverloaded-virtual
-  -Wold-style-cast -Wcast-qual -Werror -Wno-restrict)
+  -Wold-style-cast -Wcast-qual -Wno-restrict)
+# A project that includes this one may have a compiler with further warnings.
+if(PROJECT_IS_TOP_LEVEL)
+  target_compile_options(rcvlink_warnings INTERFACE -Werror)
+endif()

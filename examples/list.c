@@ -35,9 +35,10 @@ int wmain(int argc, wchar_t** argv) {
     puts("that is no rcvlink.dll");
     return 1;
   }
+  /* The path of a USB device begins with backslashes, the name of a serial port does not. */
+  const enum EInstanceType link = argv[2][0] == L'\\' ? eInstanceUSB : eInstanceSerial;
   void* receiver = NULL; /* the search reads it */
-  const long result =
-      rcvlink.SearchReceiver(argv[2], eInstanceSerial, eProtocolAny, NULL, &receiver);
+  const long result = rcvlink.SearchReceiver(argv[2], link, eProtocolAny, NULL, &receiver);
   if (result != S_OK) {
     printf("no receiver: 0x%08lX\n", (unsigned long)result);
     return 1;

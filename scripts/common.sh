@@ -1,5 +1,5 @@
 # shellcheck shell=bash
-# Sourced by ./test and ./demo, which set `root` to the repository's folder first.
+# Sourced by ./test, ./demo and ./release, which set `root` to the repository's folder first.
 
 build="${root:?}/build"
 mkdir -p "$build"

@@ -3,8 +3,7 @@
 
 usage: release.py ROOT
 
-ROOT is the folder of the sources. The preset `release` is built and Doxygen has run with kit/Doxyfile. ROOT/build/kit becomes
-a folder with
+ROOT is the folder of the sources, where the preset `release` is built. ROOT/build/kit becomes a folder with
 
   rcvlink-VERSION-win64.zip          what a developer of a host needs
   rcvlink-VERSION-win64-symbols.zip  the symbols of its programs, for a debugger
@@ -123,7 +122,10 @@ def make_release(root):
 
     stage = os.path.join(output, name)
     install(build, stage)
-    shutil.copytree(os.path.join(root, "build", "kit-reference"), os.path.join(stage, "share/doc/rcvlink/reference"))
+    reference = os.path.join(root, "build", "kit-reference")
+    shutil.rmtree(reference, ignore_errors=True)  # Doxygen leaves pages of an earlier run
+    subprocess.run(["doxygen", "kit/Doxyfile"], cwd=root, check=True)
+    shutil.copytree(reference, os.path.join(stage, "share/doc/rcvlink/reference"))
     for source in ("kit/README.md", "CHANGELOG.md", "LICENSE", "NOTICE"):
         shutil.copy(os.path.join(root, source), stage)
     with open(os.path.join(stage, "bom.json"), "w", encoding="utf-8") as file:

@@ -110,10 +110,10 @@ namespace Rcvlink
         /// that falls silent may be asked again without end.</summary>
         public TimeSpan QuietLimit { get; set; }
 
-        /// <summary>Finds the receiver on a port. Null: none answered. On a silent serial port that
-        /// takes minutes.</summary>
+        /// <summary>Finds the receiver on a port, such as COM7, or at the path of a USB device, which
+        /// begins with two backslashes. Null: none answered. On a silent serial port that takes
+        /// minutes.</summary>
         public static Receiver Find(string port,
-                                    EInstanceType type = EInstanceType.eInstanceSerial,
                                     EProtocol protocol = EProtocol.eProtocolAny,
                                     CancellationToken cancel = default(CancellationToken))
         {
@@ -121,6 +121,8 @@ namespace Rcvlink
             cancel.ThrowIfCancellationRequested();
             var handle = new ReceiverHandle();
             IntPtr found = IntPtr.Zero;  // the search reads it
+            bool isPath = port.StartsWith(@"\\", StringComparison.Ordinal);
+            EInstanceType type = isPath ? EInstanceType.eInstanceUSB : EInstanceType.eInstanceSerial;
             int result;
             using (var ended = new AbortEvent(cancel))
             {

@@ -22,6 +22,7 @@ NEEDED = (
     "lib/cmake/rcvlink/rcvlink-config.cmake", "lib/pkgconfig/rcvlink.pc",
     "share/doc/rcvlink/reference/index.html", "share/doc/rcvlink/docs/known-behaviour.md",
 )
+SYMBOLS = ("bin/rcvlink.dll.debug", "bin/rcvlink-cli.exe.debug", "bin/rcvlink-sim.exe.debug")
 LINK = re.compile(r"\]\(([^)#:]+)(?:#[^)]*)?\)")
 
 
@@ -46,7 +47,6 @@ def build_again():
 
 def release_of(root):
     """The files of a release by name: their bytes."""
-    run(root, "doxygen", "kit/Doxyfile")
     run(root, sys.executable, "-B", os.path.join(root, "scripts", "release.py"), root)
     folder = os.path.join(root, "build", "kit")
     files = {}
@@ -97,6 +97,8 @@ def main():
     name = next(name for name in tested if name.endswith("-win64.zip"))
     contents = contents_of(name)
     mistakes += [f"{needed} is missing" for needed in NEEDED if needed not in contents]
+    symbols = contents_of(name.replace("-win64", "-win64-symbols"))
+    mistakes += [f"{needed} is missing" for needed in SYMBOLS if needed not in symbols]
     if not mistakes:
         mistakes += sum_mistakes(contents) + link_mistakes(contents)
     with open(os.path.join(ROOT, "build", "release", "bin", "rcvlink.dll"), "rb") as file:

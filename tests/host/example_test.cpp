@@ -114,6 +114,22 @@ TEST_F(CancelExample, SavesWhenNobodyCancels) {
   EXPECT_EQ(folder.Read("copy.jps"), Content(3000));
 }
 
+TEST(SeveralExample, DescribesFourAtOnce) {
+  std::vector<std::unique_ptr<bed::SimulatedPort>> receivers;
+  std::vector<std::string> ports;
+  std::string expected;
+  for (const char* id : {"QU1", "QU2", "QU3", "QU4"}) {
+    receivers.push_back(std::make_unique<bed::SimulatedPort>(
+        std::vector<std::string>{"quorin", "--id", id, "--model", "QR9"},
+        std::map<std::string, std::string>{{"a.jps", "a"}}));
+    ports.push_back(host::Narrow(receivers.back()->name()));
+    expected += ports.back() + ": QR9 " + id + ", 1 files, 1 bytes\n";
+  }
+  const auto result = bed::Program("several_example.exe", ports).Finish();
+  EXPECT_EQ(result.status, 0);
+  EXPECT_EQ(result.output, expected);
+}
+
 TEST(SeveralExample, DescribesEachReceiver) {
   const bed::SimulatedPort first({"quorin", "--id", "QU7", "--model", "QR9"},
                                  {{"a.jps", Content(3000)}, {"b.jps", "b"}});
