@@ -240,6 +240,8 @@ namespace devapi {
 ///         0x80070005 when another program has it. A USB device that cannot be opened gives
 ///         S_FALSE; one whose pipes cannot be used gives the error of the pipe. With `eInstanceAny`
 ///         the result is that of the USB device when the port has no receiver or cannot be opened.
+/// @note Up to 5 minutes on a silent port, at once when it is registered. Without the cable:
+/// S_FALSE. Not in the progress function.
 RCVLINK_API long SearchReceiver(
     wchar_t* port, EInstanceType type, EProtocol protocol, void* abortEvent, void** receiver);
 
@@ -259,6 +261,8 @@ RCVLINK_API long SearchReceiver(
 /// @retval E_INVALIDARG  `port`, `settings` or `receiver` is null
 /// @retval E_OUTOFMEMORY an allocation failed
 /// @return otherwise why the port could not be opened
+/// @note Up to 17 s when nothing answers. Without the cable: S_FALSE. Not in the progress
+/// function.
 RCVLINK_API long CreateReceiverOnSerial(
     wchar_t* port, EProtocol protocol, _DCB* settings, void* abortEvent, void** receiver);
 
@@ -275,6 +279,8 @@ RCVLINK_API long CreateReceiverOnSerial(
 /// @retval E_OUTOFMEMORY an allocation failed
 /// @return otherwise why the device's pipes could not be used: an HRESULT of a Win32 error, or one
 ///         of the USBIO driver's own errors (0xE.......)
+/// @note Up to 8 s when nothing answers. Without the device: S_FALSE. Not in the progress
+/// function.
 RCVLINK_API long CreateReceiverOnUSB(wchar_t* device,
                                      EProtocol protocol,
                                      void* abortEvent,
@@ -286,6 +292,7 @@ RCVLINK_API long CreateReceiverOnUSB(wchar_t* device,
 /// @retval S_OK         *receiver holds the handle, which the host closes with `CloseReceiver`
 /// @retval S_FALSE      none of that name; *receiver is not changed
 /// @retval E_INVALIDARG `receiver` is null
+/// @note At once, also without the cable and in the progress function.
 RCVLINK_API long OpenReceiver(wchar_t* port, void** receiver);
 
 /// Removes one user of the receiver. When none is left, the receiver's operation is aborted, its
@@ -295,6 +302,7 @@ RCVLINK_API long OpenReceiver(wchar_t* port, void** receiver);
 /// @retval S_OK         the receiver was removed
 /// @retval S_FALSE      other users remain
 /// @retval E_INVALIDARG unknown handle
+/// @note At once, also without the cable and in the progress function.
 RCVLINK_API long CloseReceiver(void* receiver);
 
 /// Closes a receiver by its name, for a host that lost its handles. Each receiver of that name
@@ -304,6 +312,7 @@ RCVLINK_API long CloseReceiver(void* receiver);
 /// @retval S_OK         a receiver was removed
 /// @retval S_FALSE      none was removed
 /// @retval E_INVALIDARG `port` is null
+/// @note At once, also without the cable. Not in the progress function.
 RCVLINK_API long DestroyReceiver(wchar_t* port);
 /// @}
 
@@ -327,6 +336,8 @@ RCVLINK_API long DestroyReceiver(wchar_t* port);
 ///          receiver's lock: call `UnlockConnection` after a result other than S_OK. A Velmar
 ///          receiver's lock is released also after a failure; a lock that the host took itself with
 ///          `LockConnection` stays, unless `abortEvent` is no valid handle.
+/// @note Up to 30 s a reply. Without the cable: 0x800705B4, from a Velmar receiver S_FALSE. Not
+/// in the progress function of the same receiver.
 RCVLINK_API long GetReceiverInfo(void* receiver, void* abortEvent, CReceiverInfo* info);
 
 /// Asks whether the receiver still answers.
@@ -339,6 +350,8 @@ RCVLINK_API long GetReceiverInfo(void* receiver, void* abortEvent, CReceiverInfo
 /// @retval S_FALSE      aborted while another thread held the receiver; `answer` is not written
 /// @retval E_INVALIDARG `answer` is null
 /// @return otherwise the Win32 error of the wait for the lock, as `LockConnection`
+/// @note Up to 8 s. Without the cable: S_OK and the answer 0. Not in the progress function of the
+/// same receiver.
 RCVLINK_API long CheckConnection(void* receiver, void* abortEvent, short* answer);
 
 /// Locks the receiver for the calling thread until `UnlockConnection`. The lock counts: the same
@@ -350,11 +363,14 @@ RCVLINK_API long CheckConnection(void* receiver, void* abortEvent, short* answer
 /// @return otherwise the Win32 error of the wait. When a thread ended while it held the lock, the
 ///         next call gives the last error of the calling thread, and yet takes the lock: call
 ///         `UnlockConnection`.
+/// @note Waits for the other threads. It works without the cable. Not in the progress function of
+/// the same receiver.
 RCVLINK_API long LockConnection(void* receiver, void* abortEvent);
 
 /// Releases the lock once.
 /// @param receiver handle
 /// @retval S_OK also when the calling thread did not hold it
+/// @note At once, also without the cable. Not in the progress function of the same receiver.
 RCVLINK_API long UnlockConnection(void* receiver);
 
 /// Ends the operation that another thread runs on the receiver: its wait ends at once, and the
@@ -370,6 +386,7 @@ RCVLINK_API long UnlockConnection(void* receiver);
 /// next operation other than these two ends with S_FALSE as well.
 /// @param receiver handle
 /// @retval S_OK for every known handle
+/// @note At once, also without the cable and in the progress function.
 RCVLINK_API long Abort(void* receiver);
 
 /// Copies a file of the receiver into a stream.
@@ -399,6 +416,9 @@ RCVLINK_API long Abort(void* receiver);
 ///       time-out.
 /// @note Quorin blocks are numbered with 16 bits: the download of a file of more than 65536 blocks
 ///       of 512 bytes (33554432 bytes) does not finish.
+/// @note As long as the line needs; 30 s a reply. Without the cable: 0x800705B4, from a Velmar
+/// receiver S_OK and a part of the file, and a Quorin receiver on a serial port is asked until
+/// `Abort`. Not in the progress function of the same receiver.
 RCVLINK_API long DownloadFile(void* receiver,
                               wchar_t* name,
                               IStream* stream,
@@ -410,6 +430,7 @@ RCVLINK_API long DownloadFile(void* receiver,
 /// @param stream   not read
 /// @param progress not called
 /// @retval E_NOTIMPL for every known handle
+/// @note At once, also without the cable. Not in the progress function of the same receiver.
 RCVLINK_API long UploadFile(void* receiver,
                             const CFileInfo* info,
                             IStream* stream,
@@ -425,6 +446,8 @@ RCVLINK_API long UploadFile(void* receiver,
 /// @retval 0x8007048F   a Quorin receiver refused
 /// @retval 0x800705B4   a Quorin receiver did not answer in time
 /// @return otherwise the failure of the connection
+/// @note Up to 30 s. Without the cable: 0x800705B4, from a Velmar receiver S_OK. Not in the
+/// progress function of the same receiver.
 RCVLINK_API long DeleteFileW(void* receiver, wchar_t* name);
 
 /// Renames a file of a Velmar receiver. Names are sent in the thread's ANSI code page.
@@ -436,6 +459,7 @@ RCVLINK_API long DeleteFileW(void* receiver, wchar_t* name);
 /// @retval E_INVALIDARG a name is null
 /// @retval E_NOTIMPL    a Quorin receiver, with any names: its family does not rename
 /// @return otherwise the failure of the connection
+/// @note Up to 30 s. Without the cable: S_OK. Not in the progress function of the same receiver.
 RCVLINK_API long RenameFile(void* receiver, wchar_t* oldName, wchar_t* newName);
 /// @}
 
@@ -454,12 +478,15 @@ RCVLINK_API long RenameFile(void* receiver, wchar_t* oldName, wchar_t* newName);
 /// @param receiver handle
 /// @param baudRate bits per second
 /// @return one of the results above
+/// @note Up to 30 s. Without the cable: 0x800705B4, from a Velmar receiver S_OK. Not in the
+/// progress function of the same receiver.
 RCVLINK_API long DCSetRcvBaudrate(void* receiver, unsigned long baudRate);
 
 /// Sets the parity. The two families number it differently.
 /// @param receiver handle
 /// @param parity Quorin: 1 odd, 2 even. Velmar: 1 even, 2 odd. Any other value: none.
 /// @return one of the results above
+/// @note As `DCSetRcvBaudrate`. Not in the progress function of the same receiver.
 RCVLINK_API long DCSetRcvParity(void* receiver, unsigned char parity);
 
 /// Sets the RTS line.
@@ -467,12 +494,15 @@ RCVLINK_API long DCSetRcvParity(void* receiver, unsigned char parity);
 /// @param rts 0 off, any other value on
 /// @retval E_NOTIMPL a Velmar receiver: its family does not control the line
 /// @return otherwise one of the results above
+/// @note Up to 30 s. Without the cable: 0x800705B4. Not in the progress function of the same
+/// receiver.
 RCVLINK_API long DCSetRcvRTSControl(void* receiver, unsigned char rts);
 
 /// Sets the number of stop bits.
 /// @param receiver handle
 /// @param stopBits Quorin: 0 for one stop bit, any other value for two. Velmar: their number.
 /// @return one of the results above
+/// @note As `DCSetRcvBaudrate`. Not in the progress function of the same receiver.
 RCVLINK_API long DCSetRcvStopbits(void* receiver, unsigned char stopBits);
 /// @}
 
@@ -495,6 +525,8 @@ RCVLINK_API long DCSetRcvStopbits(void* receiver, unsigned char stopBits);
 /// @note A Velmar receiver's directory is read through a buffer of 8192 bytes, which holds about 70
 ///       files: of a longer directory the list has the first part. A receiver that does not answer
 ///       gives an empty list.
+/// @note Up to 30 s. Without the cable: 0x800705B4, from a Velmar receiver an empty list. Not in
+/// the progress function of the same receiver.
 RCVLINK_API long OpenFileList(void* receiver, void** fileList);
 
 /// Counts the entries of a file list.
@@ -502,6 +534,7 @@ RCVLINK_API long OpenFileList(void* receiver, void** fileList);
 /// @param[out] count number of files
 /// @retval S_OK         `count` is set
 /// @retval E_INVALIDARG unknown list, or `count` is null
+/// @note At once, also without the cable and in the progress function.
 RCVLINK_API long GetFilesCount(void* fileList, long* count);
 
 /// Copies one entry.
@@ -512,12 +545,14 @@ RCVLINK_API long GetFilesCount(void* fileList, long* count);
 /// @retval S_OK          `info` is filled
 /// @retval E_INVALIDARG  unknown list, `info` is null, or `index` is not below the count
 /// @retval E_OUTOFMEMORY the name could not be copied; `bstrName` is null
+/// @note At once, also without the cable and in the progress function.
 RCVLINK_API long GetFileInfo(void* fileList, long index, CFileInfo* info);
 
 /// Frees a file list. Copies that `GetFileInfo` gave stay the host's.
 /// @param fileList handle of the list
 /// @retval S_OK         the handle is unknown from now on
 /// @retval E_INVALIDARG unknown list
+/// @note At once, also without the cable. Not in the progress function.
 RCVLINK_API long CloseFileList(void* fileList);
 /// @}
 
@@ -534,9 +569,11 @@ namespace dump_hlp {
 ///             folder of GetTempPath
 /// @warning Do not call it while another thread is inside the library: it takes no lock. A name
 ///          that is null or cannot be converted raises a C++ exception, see `DumpReportString`.
+/// @note At once. Not while another thread is inside the library.
 RCVLINK_API void CreateReportFile(const char* name);
 /// The same with a wide name.
 /// @param name file name without a folder; null only closes the report that is open
+/// @note At once. Not while another thread is inside the library.
 RCVLINK_API void CreateReportFile(const wchar_t* name);
 
 /// Writes one entry with a time stamp. No line end is added: end the text in "\r\n". Without a
@@ -545,14 +582,17 @@ RCVLINK_API void CreateReportFile(const wchar_t* name);
 ///          library's own runtime, which a host of another compiler cannot catch.
 /// @param format    format of Microsoft's printf
 /// @param arguments the va_list of the caller
+/// @note At once, also in the progress function.
 RCVLINK_API void DumpReportString(const char* format, char* arguments);
 /// The same with a wide format.
 /// @param format    format of Microsoft's printf
 /// @param arguments the va_list of the caller
+/// @note At once, also in the progress function.
 RCVLINK_API void DumpReportString(const wchar_t* format, char* arguments);
 
 /// Closes the report; without one it does nothing.
 /// @warning Do not call it while another thread is inside the library: it takes no lock.
+/// @note At once. Not while another thread is inside the library.
 RCVLINK_API void CloseReportFile();
 
 }  // namespace dump_hlp
@@ -564,6 +604,8 @@ RCVLINK_API void CloseReportFile();
 /// @param abortEvent may be null
 /// @param[in,out] receiver set *receiver to null before the call
 /// @return as `SearchReceiver` with `eInstanceSerial`
+/// @note Up to 5 minutes on a silent port. Without the cable: S_FALSE. Not in the progress
+/// function.
 RCVLINK_API long SearchReceiverOnSerial(wchar_t* port,
                                         EProtocol protocol,
                                         void* abortEvent,
@@ -574,6 +616,7 @@ RCVLINK_API long SearchReceiverOnSerial(wchar_t* port,
 /// @param type not read
 /// @param connection not written
 /// @retval E_NOTIMPL always
+/// @note At once. Not in the progress function.
 RCVLINK_API long GetConnection(wchar_t* name, EInstanceType type, CIConnection** connection);
 
 #endif  // RCVLINK_API_RCVLINK_H_
