@@ -108,10 +108,11 @@ TEST(BedFolder, IsSeenFromBothSides) {
   EXPECT_EQ(bed::ToUnixPath(folder.path()), folder.unix_path());
 }
 
-TEST(BedPorts, AreThreeAShard) {
+TEST(BedPorts, AreFourAShard) {
   const bed::PortLease first;
   const bed::PortLease second;
   const bed::PortLease third;
+  const bed::PortLease fourth;
   EXPECT_NE(first.name(), second.name());
   EXPECT_THROW(bed::PortLease(), bed::Error);
 }
