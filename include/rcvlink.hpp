@@ -504,26 +504,50 @@ struct HandleCloser {
 };
 using UniqueHandle = std::unique_ptr<HANDLE, HandleCloser>;
 
+// How often a stop is looked for.
+inline constexpr std::chrono::milliseconds kPoll{50};
+
+inline HANDLE MakeEvent() {
+  const HANDLE event = CreateEventW(nullptr, TRUE, FALSE, nullptr);
+  if (event == nullptr) ThrowWin32(GetLastError(), "make an event");
+  return event;
+}
+
+// Calls a function on a thread of its own, at once and again after each kPoll, until it is destroyed.
+// Whether a stop is requested is asked in this way. In GNU's library for Windows a std::stop_callback
+// that is destroyed at the moment of the request may wait for ever, and so may a wait that takes a token.
+class Ticker {
+ public:
+  explicit Ticker(std::function<void()> tick)
+      : end_(MakeEvent()), thread_([end = end_.get(), tick = std::move(tick)] {
+          do {
+            tick();
+          } while (WaitForSingleObject(end, DWORD{kPoll.count()}) == WAIT_TIMEOUT);
+        }) {}
+  Ticker(const Ticker&) = delete;
+  Ticker& operator=(const Ticker&) = delete;
+  ~Ticker() { SetEvent(end_.get()); }
+
+ private:
+  UniqueHandle end_;
+  std::jthread thread_;  // ends before all that it uses
+};
+
 // The abort event of a call: null for a token that cannot be stopped.
 class StopEvent {
  public:
-  explicit StopEvent(const std::stop_token& stop)
-      : event_(stop.stop_possible() ? Make() : nullptr), signal_(stop, Signal{event_.get()}) {}
+  explicit StopEvent(const std::stop_token& stop) {
+    if (!stop.stop_possible()) return;
+    event_.reset(MakeEvent());
+    ticker_ = std::make_unique<Ticker>([stop, event = event_.get()] {
+      if (stop.stop_requested()) SetEvent(event);
+    });
+  }
   HANDLE get() const noexcept { return event_.get(); }
 
  private:
-  struct Signal {
-    HANDLE event;
-    void operator()() const noexcept { SetEvent(event); }
-  };
-  static HANDLE Make() {
-    const HANDLE event = CreateEventW(nullptr, TRUE, FALSE, nullptr);
-    if (event == nullptr) ThrowWin32(GetLastError(), "make an event");
-    return event;
-  }
-
   UniqueHandle event_;
-  std::stop_callback<Signal> signal_;
+  std::unique_ptr<Ticker> ticker_;
 };
 
 template <typename SystemTime>  // SYSTEMTIME, or the record of that layout in rcvlink.h
@@ -541,8 +565,9 @@ class FileListTurn {
  public:
   FileListTurn(const std::stop_token& stop, const std::string& tried) {
     std::unique_lock lock(Queue().mutex);
-    Queue().freed.wait(lock, stop, [] { return !Queue().taken; });
-    ThrowIfStopped(stop, tried);
+    do {
+      ThrowIfStopped(stop, tried);
+    } while (!Queue().freed.wait_for(lock, kPoll, [] { return !Queue().taken; }));
     Queue().taken = true;
   }
   FileListTurn(const FileListTurn&) = delete;
@@ -558,7 +583,7 @@ class FileListTurn {
  private:
   struct State {
     std::mutex mutex;
-    std::condition_variable_any freed;
+    std::condition_variable freed;
     bool taken = false;
   };
   static State& Queue() {
@@ -566,8 +591,6 @@ class FileListTurn {
     return state;
   }
 };
-
-inline constexpr std::chrono::milliseconds kPoll{100};
 
 inline bool HasFile(const std::vector<File>& files, const std::wstring& name) {
   return std::any_of(
@@ -627,31 +650,26 @@ class Receiver::Watch {
       : receiver_(receiver), stop_(stop), activity_(activity) {
     const bool counts = activity_ != nullptr && activity_->silence.count() > 0;
     if (counts || stop_.stop_possible()) {
-      thread_ = std::jthread([this](const std::stop_token& ended) { Work(ended); });
+      ticker_ = std::make_unique<detail::Ticker>([this] { Look(); });
     }
   }
 
   // Ends the watch. Returns whether it has aborted.
   bool Finish() {
-    thread_.request_stop();
-    if (thread_.joinable()) thread_.join();
-    return aborted_;
+    ticker_.reset();
+    return aborted_at_.has_value();
   }
 
  private:
   using Clock = std::chrono::steady_clock;
 
-  void Work(const std::stop_token& ended) {
+  void Look() {
     constexpr std::chrono::milliseconds kAgain{1000};
-    std::unique_lock lock(mutex_);
-    while (!ended.stop_requested()) {
-      const bool due = stop_.stop_requested() || IsSilent();
-      if (due) {
-        aborted_ = true;
-        devapi::Abort(receiver_);
-      }
-      ended_.wait_for(lock, ended, due ? kAgain : detail::kPoll, [] { return false; });
-    }
+    if (!stop_.stop_requested() && !IsSilent()) return;
+    const Clock::time_point now = Clock::now();
+    if (aborted_at_ && now - *aborted_at_ < kAgain) return;
+    aborted_at_ = now;
+    devapi::Abort(receiver_);
   }
 
   bool IsSilent() {
@@ -671,10 +689,8 @@ class Receiver::Watch {
   Activity* const activity_;
   std::uint64_t calls_ = 0;
   Clock::time_point last_news_ = Clock::now();
-  bool aborted_ = false;
-  std::mutex mutex_;
-  std::condition_variable_any ended_;
-  std::jthread thread_;  // ends before all that it uses
+  std::optional<Clock::time_point> aborted_at_;
+  std::unique_ptr<detail::Ticker> ticker_;  // ends before all that it uses
 };
 
 // Executes an operation of the locked receiver, for which a stop may be requested. When it was ended by
