@@ -415,7 +415,7 @@ RCVLINK_API long Abort(void* receiver);
 ///       until the host calls `Abort`: Windows ends such a read as a success of 0 bytes, not as a
 ///       time-out.
 /// @note Quorin blocks are numbered with 16 bits: the download of a file of more than 65536 blocks
-///       of 512 bytes (33554432 bytes) does not finish.
+///       of 512 bytes (33554432 bytes) does not finish; over USB it ends with 0x800705B4.
 /// @note As long as the line needs; 30 s a reply. Without the cable: 0x800705B4, from a Velmar
 /// receiver S_OK and a part of the file, and a Quorin receiver on a serial port is asked until
 /// `Abort`. Not in the progress function of the same receiver.

@@ -3,6 +3,7 @@
 #include <span>
 #include <utility>
 
+#include "platform/clock.h"
 #include "platform/hresult.h"
 #include "quorin/quorin_command.h"
 #include "report/report_file.h"
@@ -41,6 +42,7 @@ BlockDownload::BlockDownload(CIConnection* connection,
 
 HRESULT BlockDownload::Run() {
   if (!stream_ || size_ < 1) return E_INVALIDARG;
+  accepted_at_ = CurrentClock().Ticks();
   for (;;) {
     if (const auto ended = TakeBlock()) return *ended;
   }
@@ -83,6 +85,7 @@ std::optional<HRESULT> BlockDownload::TakeBlock() {
 
 std::optional<HRESULT> BlockDownload::Accept(const Block& block, size_t payload_length) {
   crc_ = block.Crc();
+  accepted_at_ = CurrentClock().Ticks();
   const HRESULT store_result = WriteToStream(stream_, block.Payload().first(payload_length));
   if (FAILED(store_result)) {
     if (policy_.TellsWhy()) {
@@ -136,7 +139,16 @@ std::optional<HRESULT> BlockDownload::AskAgain() {
 
 std::optional<HRESULT> BlockDownload::AskAgain(const wchar_t* why) {
   TraceWhy(why);
+  if (IsHopeless()) {
+    TraceText(L"no valid block has come for too long");
+    return kTimedOut;
+  }
   return AskAgain();
+}
+
+bool BlockDownload::IsHopeless() const {
+  const DWORD limit = policy_.LongestWithoutBlockMs();
+  return limit != INFINITE && CurrentClock().Ticks() - accepted_at_ > limit;
 }
 
 HRESULT BlockDownload::EndCancelled() {

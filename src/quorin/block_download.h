@@ -36,8 +36,9 @@ class BlockDownload {
 
   // Runs the transfer, after the caller has asked for the first block. S_OK: the transfer ended
   // (over a serial line also when the stream failed); S_FALSE: aborted, or ended by the receiver;
-  // E_INVALIDARG: no stream, or a size below 1; kTimedOut; kNotConnected: a last block of an
-  // invalid length; else the failure of the connection, or over USB that of the stream.
+  // E_INVALIDARG: no stream, or a size below 1; kTimedOut: no block came, or none that could be
+  // accepted; kNotConnected: a last block of an invalid length; else the failure of the connection,
+  // or over USB that of the stream.
   HRESULT Run();
 
  private:
@@ -48,6 +49,7 @@ class BlockDownload {
   std::optional<HRESULT> AfterFailedRead(HRESULT failure);
   std::optional<HRESULT> AskAgain();
   std::optional<HRESULT> AskAgain(const wchar_t* why);
+  bool IsHopeless() const;
 
   HRESULT EndCancelled();
   HRESULT EndTransfer();
@@ -68,6 +70,7 @@ class BlockDownload {
   uint32_t delivered_ = 0;
   uint8_t percent_ = 0;  // the last that was computed, also when it was not reported
   int timeouts_ = 0;
+  DWORD accepted_at_ = 0;  // when the last block was, or the transfer began; in ticks of the clock
 };
 
 }  // namespace rcvlink

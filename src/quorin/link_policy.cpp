@@ -3,6 +3,7 @@
 #include <algorithm>
 
 #include "platform/clock.h"
+#include "platform/hresult.h"
 
 namespace rcvlink {
 namespace {
@@ -49,15 +50,24 @@ HRESULT UsbPolicy::ReadHeader(Block& block) {
 HRESULT UsbPolicy::ReadRest(Block&) { return read_result_; }
 
 // Reads pieces of at most one bulk packet, until the block is whole, a read fails or an abort came.
-// A receiver may send a packet that holds only a part of the block.
+// A receiver may send a packet that holds only a part of the block. A device that answers with no
+// bytes is as silent as one that does not answer.
 HRESULT UsbPolicy::ReadWhole(Block& block) {
   constexpr DWORD kMaxPiece = 512;
+  Clock& clock = CurrentClock();
+  DWORD last_byte_at = clock.Ticks();
   DWORD held = 0;
   while (held < kBlockLength && !abort_.IsSet()) {
     const DWORD piece = std::min<DWORD>(kBlockLength - held, kMaxPiece);
     DWORD count = 0;
     const HRESULT result = connection_->Read(block.data() + held, piece, &count, read_timeout_ms_);
     if (result != S_OK) return result;
+    const DWORD now = clock.Ticks();
+    if (count != 0) {
+      last_byte_at = now;
+    } else if (now - last_byte_at > read_timeout_ms_) {
+      return kTimedOut;
+    }
     held += std::min(count, piece);
   }
   return S_OK;

@@ -31,6 +31,11 @@ class LinkPolicy {
   // stream what it has written, over USB they look at the result.
   virtual bool PassesResultsOn() const = 0;
 
+  // How long blocks may be refused, one after the other, before the transfer ends; INFINITE for
+  // ever. A host ends a transfer over a serial line when it has waited long enough: on a bad line a
+  // block may need many tries. A USB link has no noise, so there the receiver does not send blocks.
+  virtual DWORD LongestWithoutBlockMs() const = 0;
+
   virtual uint8_t Percent(uint32_t delivered, uint32_t size) const = 0;
   // Whether a percent that has changed is reported now; if not, it is left out.
   virtual bool IsTimeToTell() = 0;
@@ -52,6 +57,7 @@ class SerialPolicy : public LinkPolicy {
   HRESULT ReadRest(Block& block) override;
   bool CountsTimeoutsPerBlock() const override { return true; }
   bool PassesResultsOn() const override { return false; }
+  DWORD LongestWithoutBlockMs() const override { return INFINITE; }
   uint8_t Percent(uint32_t delivered, uint32_t size) const override;
   bool IsTimeToTell() override { return true; }
   const wchar_t* Name() const override { return L"DownloadOverSerial"; }
@@ -72,6 +78,7 @@ class UsbPolicy : public LinkPolicy {
   HRESULT ReadRest(Block& block) override;
   bool CountsTimeoutsPerBlock() const override { return false; }
   bool PassesResultsOn() const override { return true; }
+  DWORD LongestWithoutBlockMs() const override { return 120000; }
   uint8_t Percent(uint32_t delivered, uint32_t size) const override;
   bool IsTimeToTell() override;
   const wchar_t* Name() const override { return L"DownloadOverUSB"; }

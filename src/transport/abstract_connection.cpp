@@ -1,5 +1,6 @@
 #include "transport/abstract_connection.h"
 
+#include <algorithm>
 #include <array>
 #include <utility>
 
@@ -15,21 +16,23 @@ using rcvlink::KernelHandle;
 using rcvlink::kNotConnected;
 using rcvlink::kTimedOut;
 using rcvlink::Trace;
+using rcvlink::Transfer;
 using rcvlink::WaitRule;
 
 namespace {
 
-HRESULT CreateEventIfMissing(KernelHandle& event, BOOL manual_reset) {
-  if (!event) event = KernelHandle(CreateEventW(nullptr, manual_reset, FALSE, nullptr));
-  return event ? S_OK : HResultFromError(GetLastError());
-}
+// From the request to end a transfer to its end. Drivers take milliseconds; one that takes longer
+// than this hangs, as that of an adapter that was unplugged may do.
+constexpr DWORD kCancelLimitMs = 5000;
 
 }  // namespace
 
 HRESULT CAbstractConnection::CreateEvents() {
-  HRESULT result = CreateEventIfMissing(cancel_event_, FALSE);
-  if (SUCCEEDED(result)) result = CreateEventIfMissing(write_event_, FALSE);
-  if (SUCCEEDED(result)) result = CreateEventIfMissing(read_event_, TRUE);
+  if (!cancel_event_) cancel_event_ = KernelHandle(CreateEventW(nullptr, FALSE, FALSE, nullptr));
+  if (!cancel_event_) return HResultFromError(GetLastError());
+  HRESULT result = S_OK;
+  if (!writing_) result = Transfer::Create(/*manual_reset=*/FALSE, writing_);
+  if (SUCCEEDED(result) && !reading_) result = Transfer::Create(/*manual_reset=*/TRUE, reading_);
   return result;
 }
 
@@ -45,42 +48,43 @@ HRESULT CAbstractConnection::Disconnect() {
 
 HRESULT CAbstractConnection::Read(void* buffer, DWORD size, DWORD* bytes_read, DWORD timeout_ms) {
   *bytes_read = 0;
-  if (!read_event_) return kNotConnected;
-  if (!ResetEvent(read_event_.get())) return HResultFromError(GetLastError());
+  if (!reading_) return kNotConnected;
+  if (const HRESULT result = reading_->Prepare(size); FAILED(result)) return result;
 
   const HANDLE handle = GetReadHandle();
-  OVERLAPPED overlapped{};
-  overlapped.hEvent = read_event_.get();
-  if (calls_.ReadFile(handle, buffer, size, bytes_read, &overlapped)) return S_OK;
+  if (calls_.ReadFile(handle, reading_->bytes(), size, bytes_read, reading_->record())) {
+    std::copy_n(reading_->bytes(), std::min(*bytes_read, size), static_cast<uint8_t*>(buffer));
+    return S_OK;
+  }
   if (const DWORD error = GetLastError(); error != ERROR_IO_PENDING) {
     Trace(L"CAbstractConnection::Read - read failed [%u] [%s]\r\n", error, name_.get());
     return HResultFromError(error);
   }
 
-  const HRESULT result = WaitForTransfer(handle, overlapped, timeout_ms, wait_rule_.watched);
+  const HRESULT result = WaitForTransfer(handle, reading_, timeout_ms, wait_rule_.watched);
   if (result == kTimedOut) {
     Trace(L"CAbstractConnection::Read - wait timeout [%s]\r\n", name_.get());
   }
   if (result != S_OK) return result;
-  if (!calls_.GetOverlappedResult(handle, &overlapped, bytes_read, FALSE)) {
+  if (!calls_.GetOverlappedResult(handle, reading_->record(), bytes_read)) {
     const DWORD error = GetLastError();
     Trace(L"CAbstractConnection::Read - GetOverlappedResult is failed [%u] [%s]\r\n",
           error,
           name_.get());
     return HResultFromError(error);
   }
+  std::copy_n(reading_->bytes(), std::min(*bytes_read, size), static_cast<uint8_t*>(buffer));
   return S_OK;
 }
 
 HRESULT CAbstractConnection::Write(const void* buffer, DWORD size, DWORD timeout_ms) {
-  if (!write_event_) return kNotConnected;
-  if (!ResetEvent(write_event_.get())) return HResultFromError(GetLastError());
+  if (!writing_) return kNotConnected;
+  if (const HRESULT result = writing_->Prepare(size); FAILED(result)) return result;
+  std::copy_n(static_cast<const uint8_t*>(buffer), size, writing_->bytes());
 
   const HANDLE handle = GetWriteHandle();
-  OVERLAPPED overlapped{};
-  overlapped.hEvent = write_event_.get();
   DWORD written = 0;
-  if (calls_.WriteFile(handle, buffer, size, &written, &overlapped)) return S_OK;
+  if (calls_.WriteFile(handle, writing_->bytes(), size, &written, writing_->record())) return S_OK;
   if (const DWORD error = GetLastError(); error != ERROR_IO_PENDING) {
     Trace(L"CAbstractConnection::Write - write failed [%u] [%s]\r\n", error, name_.get());
     return HResultFromError(error);
@@ -89,17 +93,17 @@ HRESULT CAbstractConnection::Write(const void* buffer, DWORD size, DWORD timeout
   if (timeout_ms != 0) {
     // No watched event ends a write: the receiver would take half a line as the beginning of the
     // next command.
-    const HRESULT result = WaitForTransfer(handle, overlapped, timeout_ms, nullptr);
+    const HRESULT result = WaitForTransfer(handle, writing_, timeout_ms, nullptr);
     if (result == kTimedOut) {
       Trace(L"CAbstractConnection::Write - wait timeout [0x%08X] [%s]\r\n", result, name_.get());
     }
     if (result != S_OK) return result;
   }
-  if (!calls_.GetOverlappedResult(handle, &overlapped, &written, FALSE)) {
+  if (!calls_.GetOverlappedResult(handle, writing_->record(), &written)) {
     const DWORD error = GetLastError();
-    // A write that was not waited for may still be running. It is ended here, since the caller
-    // frees the buffer next.
-    if (error == ERROR_IO_INCOMPLETE) CancelTransfer(handle, overlapped);
+    // A write that was not waited for may still be running. It is ended here, since the next one
+    // uses the same memory.
+    if (error == ERROR_IO_INCOMPLETE) CancelTransfer(handle, writing_);
     Trace(L"CAbstractConnection::Write - GetOverlappedResult is failed [%u] [%s]\r\n",
           error,
           name_.get());
@@ -109,7 +113,7 @@ HRESULT CAbstractConnection::Write(const void* buffer, DWORD size, DWORD timeout
 }
 
 HRESULT CAbstractConnection::WaitForTransfer(HANDLE handle,
-                                             OVERLAPPED& overlapped,
+                                             std::unique_ptr<Transfer>& transfer,
                                              DWORD timeout_ms,
                                              HANDLE watched) {
   // What ends the wait early comes first: Windows reports the first signalled handle, and an abort
@@ -118,7 +122,7 @@ HRESULT CAbstractConnection::WaitForTransfer(HANDLE handle,
   DWORD done = 0;
   if (!wait_rule_.shielded) events[done++] = GetAbortEvent();
   if (watched) events[done++] = watched;
-  events[done] = overlapped.hEvent;
+  events[done] = transfer->event();
   const DWORD ended = calls_.WaitForMultipleObjects(done + 1, events.data(), timeout_ms);
   if (ended == WAIT_OBJECT_0 + done) return S_OK;
 
@@ -128,16 +132,18 @@ HRESULT CAbstractConnection::WaitForTransfer(HANDLE handle,
   } else if (ended > WAIT_OBJECT_0 + done) {
     result = HResultFromError(GetLastError());
   }
-  CancelTransfer(handle, overlapped);
+  CancelTransfer(handle, transfer);
   return result;
 }
 
-void CAbstractConnection::CancelTransfer(HANDLE handle, OVERLAPPED& overlapped) {
+void CAbstractConnection::CancelTransfer(HANDLE handle, std::unique_ptr<Transfer>& transfer) {
   calls_.CancelIo(handle);
-  // Waits until the transfer has ended: before, the device may still write to the record and to the
-  // buffer.
-  DWORD bytes = 0;
-  calls_.GetOverlappedResult(handle, &overlapped, &bytes, TRUE);
+  // Before its end the driver may still write to the record and to the bytes.
+  calls_.WaitForSingleObject(transfer->event(), kCancelLimitMs);
+  if (transfer->HasEnded()) return;
+  Trace(L"CAbstractConnection::CancelTransfer - the driver does not end a transfer [%s]\r\n",
+        name_ ? name_.get() : L"");
+  Transfer::Abandon(std::move(transfer));
 }
 
 HRESULT CAbstractConnection::Flush() { return S_FALSE; }

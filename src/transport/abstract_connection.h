@@ -3,10 +3,13 @@
 #ifndef RCVLINK_TRANSPORT_ABSTRACT_CONNECTION_H_
 #define RCVLINK_TRANSPORT_ABSTRACT_CONNECTION_H_
 
+#include <memory>
+
 #include "platform/handle.h"
 #include "platform/text.h"
 #include "transport/connection.h"
 #include "transport/device_calls.h"
+#include "transport/transfer.h"
 
 class CAbstractConnection : public CIConnection {
  public:
@@ -40,21 +43,29 @@ class CAbstractConnection : public CIConnection {
   // Whether a Cancel has not ended a wait yet; it still will.
   bool IsCancelPending() const;
 
+  // Ends a transfer on the device. A driver that does not end it within 5 s keeps it for ever, and
+  // `transfer` is null then.
+  void CancelTransfer(HANDLE handle, std::unique_ptr<rcvlink::Transfer>& transfer);
+
   rcvlink::DeviceCalls& calls_;
   rcvlink::FileHandle device_;
   rcvlink::UniqueBstr name_;
 
  private:
   // Waits for a pending transfer; `watched` (may be null) ends the wait as well. Whatever ends the
-  // wait, the transfer has ended when this returns, so that its record and its buffer may be freed.
-  // S_OK only when the transfer's own event ended the wait.
-  HRESULT WaitForTransfer(HANDLE handle, OVERLAPPED& overlapped, DWORD timeout_ms, HANDLE watched);
-  void CancelTransfer(HANDLE handle, OVERLAPPED& overlapped);
+  // wait, the transfer has ended when this returns, or it is null. S_OK only when the transfer's own
+  // event ended the wait.
+  HRESULT WaitForTransfer(HANDLE handle,
+                          std::unique_ptr<rcvlink::Transfer>& transfer,
+                          DWORD timeout_ms,
+                          HANDLE watched);
 
-  rcvlink::KernelHandle write_event_;   // auto-reset
-  rcvlink::KernelHandle read_event_;    // manual-reset; Read resets it before each transfer
-  rcvlink::KernelHandle cancel_event_;  // auto-reset: one Cancel ends one wait
-  HANDLE abort_event_ = nullptr;        // the caller's
+  // Null before the first opening, and when the driver has kept one: nothing is read or written
+  // then until the link is opened again.
+  std::unique_ptr<rcvlink::Transfer> writing_;  // its event is auto-reset
+  std::unique_ptr<rcvlink::Transfer> reading_;  // its event is manual-reset
+  rcvlink::KernelHandle cancel_event_;          // auto-reset: one Cancel ends one wait
+  HANDLE abort_event_ = nullptr;                // the caller's
   rcvlink::WaitRule wait_rule_;
 };
 

@@ -2,8 +2,6 @@
 
 #include <atomic>
 
-#include "platform/handle.h"
-
 namespace rcvlink {
 namespace {
 
@@ -26,34 +24,26 @@ BOOL DeviceCalls::WriteFile(
   return ::WriteFile(device, buffer, size, written, overlapped);
 }
 
-BOOL DeviceCalls::GetOverlappedResult(HANDLE device,
-                                      OVERLAPPED* overlapped,
-                                      DWORD* bytes,
-                                      BOOL wait) {
-  return ::GetOverlappedResult(device, overlapped, bytes, wait);
+BOOL DeviceCalls::GetOverlappedResult(HANDLE device, OVERLAPPED* overlapped, DWORD* bytes) {
+  return ::GetOverlappedResult(device, overlapped, bytes, FALSE);
 }
 
 BOOL DeviceCalls::CancelIo(HANDLE device) { return ::CancelIo(device); }
 
 BOOL DeviceCalls::DeviceIoControl(HANDLE device,
                                   DWORD code,
-                                  const void* input,
+                                  void* input,
                                   DWORD input_size,
                                   void* output,
                                   DWORD output_size,
-                                  DWORD* returned) {
-  const KernelHandle done(CreateEventW(nullptr, TRUE, FALSE, nullptr));
-  if (!done) return FALSE;
-  // Devices are opened for overlapped transfers, so Windows wants a record of every transfer.
-  OVERLAPPED overlapped{};
-  overlapped.hEvent = done.get();
-  void* const in = const_cast<void*>(input);  // it is only read, but Win32's parameter is not const
-  if (::DeviceIoControl(device, code, in, input_size, output, output_size, returned, &overlapped)) {
-    return TRUE;
-  }
-  if (GetLastError() != ERROR_IO_PENDING) return FALSE;
-  // Closing `done` does not change the last error.
-  return ::GetOverlappedResult(device, &overlapped, returned, TRUE);
+                                  DWORD* returned,
+                                  OVERLAPPED* overlapped) {
+  return ::DeviceIoControl(
+      device, code, input, input_size, output, output_size, returned, overlapped);
+}
+
+DWORD DeviceCalls::WaitForSingleObject(HANDLE handle, DWORD timeout_ms) {
+  return ::WaitForSingleObject(handle, timeout_ms);
 }
 
 DWORD DeviceCalls::WaitForMultipleObjects(DWORD count, const HANDLE* handles, DWORD timeout_ms) {

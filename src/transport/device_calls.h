@@ -18,17 +18,18 @@ class DeviceCalls {
       HANDLE device, void* buffer, DWORD size, DWORD* read, OVERLAPPED* overlapped);
   virtual BOOL WriteFile(
       HANDLE device, const void* buffer, DWORD size, DWORD* written, OVERLAPPED* overlapped);
-  virtual BOOL GetOverlappedResult(HANDLE device, OVERLAPPED* overlapped, DWORD* bytes, BOOL wait);
+  // Does not wait.
+  virtual BOOL GetOverlappedResult(HANDLE device, OVERLAPPED* overlapped, DWORD* bytes);
   virtual BOOL CancelIo(HANDLE device);
-  // Waits until the device has answered. `*returned` is the number of bytes that it wrote to
-  // `output`.
   virtual BOOL DeviceIoControl(HANDLE device,
                                DWORD code,
-                               const void* input,
+                               void* input,
                                DWORD input_size,
                                void* output,
                                DWORD output_size,
-                               DWORD* returned);
+                               DWORD* returned,
+                               OVERLAPPED* overlapped);
+  virtual DWORD WaitForSingleObject(HANDLE handle, DWORD timeout_ms);
   // Waits for any of `count` handles.
   virtual DWORD WaitForMultipleObjects(DWORD count, const HANDLE* handles, DWORD timeout_ms);
 

@@ -1,24 +1,37 @@
 #include "transport/usb_connection.h"
 
+#include <algorithm>
 #include <array>
 #include <vector>
 
+#include "platform/clock.h"
 #include "platform/hresult.h"
 #include "report/report_file.h"
 #include "transport/usbio.h"
 #include "transport/wait_scope.h"
 
 using rcvlink::BulkEndpoints;
+using rcvlink::Clock;
 using rcvlink::CopyBstr;
+using rcvlink::CurrentClock;
 using rcvlink::FileHandle;
 using rcvlink::FindBulkEndpoints;
 using rcvlink::HResultFromError;
 using rcvlink::kConfigurationDescriptorLength;
 using rcvlink::TotalLength;
 using rcvlink::Trace;
+using rcvlink::Transfer;
 using rcvlink::WaitScope;
 
 namespace {
+
+// A device takes a request within milliseconds. The driver waits for some seconds when a device does
+// not answer its own requests.
+constexpr DWORD kRequestLimitMs = 10000;
+
+// Of a flush: a receiver that was sending a file still has some blocks under way, which take
+// milliseconds.
+constexpr DWORD kDiscardLimitMs = 3000;
 
 template <typename Record>
 std::span<const uint8_t> BytesOf(const Record& record) {
@@ -124,15 +137,44 @@ DWORD CUSBConnection::Request(HANDLE handle,
                               std::span<const uint8_t> input,
                               std::span<uint8_t> output,
                               DWORD* returned) {
-  DWORD ignored = 0;
-  const BOOL succeeded = calls_.DeviceIoControl(handle,
-                                                code,
-                                                input.data(),
-                                                static_cast<DWORD>(input.size()),
-                                                output.data(),
-                                                static_cast<DWORD>(output.size()),
-                                                returned ? returned : &ignored);
-  return succeeded ? ERROR_SUCCESS : GetLastError();
+  std::unique_ptr<Transfer> request;
+  const HRESULT result = Transfer::Create(/*manual_reset=*/TRUE, request);
+  if (FAILED(result) || FAILED(request->Prepare(input.size() + output.size()))) {
+    return ERROR_OUTOFMEMORY;
+  }
+  uint8_t* const answer = std::ranges::copy(input, request->bytes()).out;
+  DWORD count = 0;
+  DWORD error = ERROR_SUCCESS;
+  if (!calls_.DeviceIoControl(handle,
+                              code,
+                              request->bytes(),
+                              static_cast<DWORD>(input.size()),
+                              answer,
+                              static_cast<DWORD>(output.size()),
+                              &count,
+                              request->record())) {
+    error = GetLastError();
+  }
+  if (error == ERROR_IO_PENDING) error = Await(handle, code, request, &count);
+  if (error == ERROR_SUCCESS) {
+    std::copy_n(answer, std::min<size_t>(count, output.size()), output.data());
+  }
+  if (returned) *returned = count;
+  return error;
+}
+
+// Waits for the driver's answer.
+DWORD CUSBConnection::Await(HANDLE handle,
+                            uint32_t code,
+                            std::unique_ptr<Transfer>& request,
+                            DWORD* count) {
+  if (calls_.WaitForSingleObject(request->event(), kRequestLimitMs) != WAIT_OBJECT_0) {
+    Trace(L"CUSBConnection::Request - no answer to 0x%08X\r\n", code);
+    CancelTransfer(handle, request);
+    return ERROR_TIMEOUT;
+  }
+  return calls_.GetOverlappedResult(handle, request->record(), count) ? ERROR_SUCCESS
+                                                                      : GetLastError();
 }
 
 HRESULT CUSBConnection::Disconnect() {
@@ -153,10 +195,16 @@ HRESULT CUSBConnection::Flush() {
   // These reads do not wait, so a cancel is not meant for them: it ends the flush, and stays for
   // the wait of the command that follows.
   const WaitScope shield = WaitScope::Shielded(this);
+  Clock& clock = CurrentClock();
+  const DWORD start = clock.Ticks();
   while (!IsCancelPending()) {
     uint8_t waiting = 0;
     DWORD count = 0;
     if (Read(&waiting, sizeof(waiting), &count, 0) != S_OK || count != sizeof(waiting)) break;
+    if (clock.Ticks() - start > kDiscardLimitMs) {
+      Trace(L"CUSBConnection::Flush - the device does not stop sending [%s]\r\n", name_.get());
+      break;
+    }
   }
   return S_OK;
 }

@@ -4,6 +4,7 @@
 #define RCVLINK_TRANSPORT_USB_CONNECTION_H_
 
 #include <cstdint>
+#include <memory>
 #include <span>
 
 #include "transport/abstract_connection.h"
@@ -17,7 +18,8 @@ class CUSBConnection : public CAbstractConnection {
 
   HRESULT Disconnect() override;
   HRESULT Write(const void* buffer, DWORD size, DWORD timeout_ms) override;
-  // Reads what is waiting, byte by byte, and discards it. Always S_OK.
+  // Reads what is waiting, byte by byte, and discards it; for 3 s at most, if a device does not stop
+  // sending. Always S_OK.
   HRESULT Flush() override;
   HRESULT GetInstanceType(EInstanceType* type) override;
   // A USB link has no baud rate: 0 and S_FALSE.
@@ -50,13 +52,17 @@ class CUSBConnection : public CAbstractConnection {
   // S_OK and the endpoints, or the result with which the open ends.
   HRESULT ReadEndpoints(rcvlink::BulkEndpoints* endpoints);
   HRESULT BindPipes(const rcvlink::BulkEndpoints& endpoints);
-  // Sends one request to the driver and gives the Win32 error, 0 for none. `*returned` is the
-  // number of bytes in `output`.
+  // Sends one request to the driver and gives the Win32 error, 0 for none; ERROR_TIMEOUT when the
+  // driver has not answered after 10 s. `*returned` is the number of bytes in `output`.
   DWORD Request(HANDLE handle,
                 uint32_t code,
                 std::span<const uint8_t> input = {},
                 std::span<uint8_t> output = {},
                 DWORD* returned = nullptr);
+  DWORD Await(HANDLE handle,
+              uint32_t code,
+              std::unique_ptr<rcvlink::Transfer>& request,
+              DWORD* count);
 
   rcvlink::FileHandle read_handle_;  // the base's device_ is for writing
 };

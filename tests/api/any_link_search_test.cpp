@@ -46,7 +46,7 @@ class Port : public SimulatedComPort {
     if (on_wait) on_wait(timeout_ms);
     return SimulatedComPort::WaitForMultipleObjects(count, handles, timeout_ms);
   }
-  BOOL DeviceIoControl(HANDLE, DWORD, const void*, DWORD, void*, DWORD, DWORD*) override {
+  BOOL DeviceIoControl(HANDLE, DWORD, void*, DWORD, void*, DWORD, DWORD*, OVERLAPPED*) override {
     ++usb_requests;
     SetLastError(usb_error);
     return FALSE;

@@ -41,7 +41,15 @@ BOOL FakeDevice::Answer(const std::string& call) {
   return call == failing_call ? Fail(failure) : TRUE;
 }
 
-BOOL FakeDevice::StartTransfer(const std::string& call, HANDLE handle, DWORD size, DWORD* count) {
+BOOL FakeDevice::Start(DWORD error, OVERLAPPED* block) const {
+  constexpr ULONG_PTR kPending = 0x103;  // STATUS_PENDING
+  if (error == ERROR_SUCCESS) return TRUE;
+  if (error == ERROR_IO_PENDING && hangs) block->Internal = kPending;
+  return Fail(error);
+}
+
+BOOL FakeDevice::StartTransfer(
+    const std::string& call, HANDLE handle, DWORD size, DWORD* count, OVERLAPPED* block) {
   calls.push_back(call);
   transfer_calls.push_back({call, handle, size});
   TransferAnswer answer{transfer_error, transferred};
@@ -49,24 +57,23 @@ BOOL FakeDevice::StartTransfer(const std::string& call, HANDLE handle, DWORD siz
     answer = transfers.front();
     transfers.pop_front();
   }
-  if (answer.error != ERROR_SUCCESS) return Fail(answer.error);
+  if (!Start(answer.error, block)) return FALSE;
   *count = answer.count;
   return TRUE;
 }
 
-BOOL FakeDevice::ReadFile(HANDLE handle, void*, DWORD size, DWORD* read, OVERLAPPED*) {
-  return StartTransfer("ReadFile", handle, size, read);
+BOOL FakeDevice::ReadFile(HANDLE handle, void*, DWORD size, DWORD* read, OVERLAPPED* block) {
+  return StartTransfer("ReadFile", handle, size, read, block);
 }
 
-BOOL FakeDevice::WriteFile(HANDLE handle, const void*, DWORD size, DWORD* written, OVERLAPPED*) {
-  return StartTransfer("WriteFile", handle, size, written);
+BOOL FakeDevice::WriteFile(
+    HANDLE handle, const void*, DWORD size, DWORD* written, OVERLAPPED* block) {
+  return StartTransfer("WriteFile", handle, size, written, block);
 }
 
-BOOL FakeDevice::GetOverlappedResult(HANDLE handle, OVERLAPPED*, DWORD* bytes, BOOL wait) {
-  const std::string call = wait ? "GetOverlappedResult waiting" : "GetOverlappedResult";
-  calls.push_back(call);
-  transfer_calls.push_back({call, handle, 0});
-  if (wait) return Fail(ERROR_OPERATION_ABORTED);
+BOOL FakeDevice::GetOverlappedResult(HANDLE handle, OVERLAPPED*, DWORD* bytes) {
+  calls.push_back("GetOverlappedResult");
+  transfer_calls.push_back({"GetOverlappedResult", handle, 0});
   if (overlapped_error != ERROR_SUCCESS) return Fail(overlapped_error);
   *bytes = transferred;
   return TRUE;
@@ -79,11 +86,12 @@ BOOL FakeDevice::CancelIo(HANDLE handle) {
 
 BOOL FakeDevice::DeviceIoControl(HANDLE handle,
                                  DWORD code,
-                                 const void* input,
+                                 void* input,
                                  DWORD input_size,
                                  void* output,
                                  DWORD output_size,
-                                 DWORD* returned) {
+                                 DWORD* returned,
+                                 OVERLAPPED* block) {
   char name[32] = {};
   std::snprintf(name, sizeof(name), "DeviceIoControl %08lX", code);
   calls.push_back(name);
@@ -95,11 +103,17 @@ BOOL FakeDevice::DeviceIoControl(HANDLE handle,
     answer = std::move(answers.front());
     answers.pop_front();
   }
-  if (answer.error != ERROR_SUCCESS) return Fail(answer.error);
+  if (!Start(answer.error, block)) return FALSE;
   const size_t count = std::min<size_t>(answer.output.size(), output_size);
   std::copy_n(answer.output.begin(), count, static_cast<char*>(output));
   *returned = static_cast<DWORD>(count);
   return TRUE;
+}
+
+DWORD FakeDevice::WaitForSingleObject(HANDLE, DWORD timeout_ms) {
+  calls.push_back("WaitForEnd");
+  end_timeouts.push_back(timeout_ms);
+  return hangs ? WAIT_TIMEOUT : WAIT_OBJECT_0;
 }
 
 DWORD FakeDevice::WaitForMultipleObjects(DWORD count, const HANDLE* handles, DWORD timeout_ms) {

@@ -54,10 +54,13 @@ class FakeDevice : public rcvlink::DeviceCalls {
   DWORD wait_answer = kDone;
   std::function<void(DWORD count, const HANDLE* handles)> on_wait;
   DWORD wait_timeout = 0;
-  DWORD overlapped_error = ERROR_SUCCESS;  // of GetOverlappedResult without waiting
+  DWORD overlapped_error = ERROR_SUCCESS;  // of GetOverlappedResult
+  // Whether pending transfers and requests do not end, not even when they are cancelled.
+  bool hangs = false;
+  std::vector<DWORD> end_timeouts;  // of all waits for the end of one
 
   // Requests to the driver: its answers to each code, in order; after that, success without output.
-  // The names in `calls` contain the code.
+  // ERROR_IO_PENDING is waited for. The names in `calls` contain the code.
   struct RequestAnswer {
     DWORD error = ERROR_SUCCESS;
     std::string output = {};
@@ -94,15 +97,17 @@ class FakeDevice : public rcvlink::DeviceCalls {
   BOOL ReadFile(HANDLE, void* buffer, DWORD size, DWORD* read, OVERLAPPED* block) override;
   BOOL WriteFile(
       HANDLE, const void* buffer, DWORD size, DWORD* written, OVERLAPPED* block) override;
-  BOOL GetOverlappedResult(HANDLE, OVERLAPPED* block, DWORD* bytes, BOOL wait) override;
+  BOOL GetOverlappedResult(HANDLE, OVERLAPPED* block, DWORD* bytes) override;
   BOOL CancelIo(HANDLE) override;
   BOOL DeviceIoControl(HANDLE device,
                        DWORD code,
-                       const void* input,
+                       void* input,
                        DWORD input_size,
                        void* output,
                        DWORD output_size,
-                       DWORD* returned) override;
+                       DWORD* returned,
+                       OVERLAPPED* block) override;
+  DWORD WaitForSingleObject(HANDLE, DWORD timeout_ms) override;
   DWORD WaitForMultipleObjects(DWORD count, const HANDLE* handles, DWORD timeout_ms) override;
   BOOL SetCommMask(HANDLE, DWORD mask) override;
   BOOL SetupComm(HANDLE, DWORD input_queue, DWORD output_queue) override;
@@ -114,7 +119,9 @@ class FakeDevice : public rcvlink::DeviceCalls {
 
  private:
   BOOL Answer(const std::string& call);
-  BOOL StartTransfer(const std::string& call, HANDLE handle, DWORD size, DWORD* count);
+  BOOL StartTransfer(
+      const std::string& call, HANDLE handle, DWORD size, DWORD* count, OVERLAPPED* block);
+  BOOL Start(DWORD error, OVERLAPPED* block) const;
 };
 
 #endif  // RCVLINK_TESTS_SUPPORT_FAKE_DEVICE_H_

@@ -36,8 +36,9 @@ class SimulatedComPort : public rcvlink::DeviceCalls {
   BOOL ReadFile(HANDLE, void* buffer, DWORD size, DWORD* read, OVERLAPPED* block) override;
   BOOL WriteFile(
       HANDLE, const void* buffer, DWORD size, DWORD* written, OVERLAPPED* block) override;
-  BOOL GetOverlappedResult(HANDLE, OVERLAPPED* block, DWORD* bytes, BOOL wait) override;
+  BOOL GetOverlappedResult(HANDLE, OVERLAPPED* block, DWORD* bytes) override;
   BOOL CancelIo(HANDLE) override;
+  DWORD WaitForSingleObject(HANDLE, DWORD timeout_ms) override;
   DWORD WaitForMultipleObjects(DWORD count, const HANDLE* handles, DWORD timeout_ms) override;
   BOOL SetCommMask(HANDLE, DWORD mask) override;
   BOOL SetupComm(HANDLE, DWORD input_queue, DWORD output_queue) override;

@@ -29,22 +29,29 @@ class FaultyCalls : public rcvlink::DeviceCalls {
       HANDLE device, const void* buffer, DWORD size, DWORD* written, OVERLAPPED* block) override {
     return Call([&] { return calls_.WriteFile(device, buffer, size, written, block); });
   }
-  BOOL GetOverlappedResult(HANDLE device, OVERLAPPED* block, DWORD* bytes, BOOL wait) override {
-    return Call([&] { return calls_.GetOverlappedResult(device, block, bytes, wait); });
+  BOOL GetOverlappedResult(HANDLE device, OVERLAPPED* block, DWORD* bytes) override {
+    return Call([&] { return calls_.GetOverlappedResult(device, block, bytes); });
   }
   BOOL CancelIo(HANDLE device) override {
     return Call([&] { return calls_.CancelIo(device); });
   }
   BOOL DeviceIoControl(HANDLE device,
                        DWORD code,
-                       const void* input,
+                       void* input,
                        DWORD input_size,
                        void* output,
                        DWORD output_size,
-                       DWORD* returned) override {
+                       DWORD* returned,
+                       OVERLAPPED* block) override {
     return Call([&] {
-      return calls_.DeviceIoControl(device, code, input, input_size, output, output_size, returned);
+      return calls_.DeviceIoControl(
+          device, code, input, input_size, output, output_size, returned, block);
     });
+  }
+  DWORD WaitForSingleObject(HANDLE handle, DWORD timeout_ms) override {
+    if (Fails()) return WAIT_FAILED;
+    const UncountedAllocations own;
+    return calls_.WaitForSingleObject(handle, timeout_ms);
   }
   DWORD WaitForMultipleObjects(DWORD handles, const HANDLE* events, DWORD timeout_ms) override {
     if (Fails()) return WAIT_FAILED;

@@ -88,11 +88,12 @@ class Bench::Port : public SimulatedComPort {
 
   BOOL DeviceIoControl(HANDLE,
                        DWORD code,
-                       const void*,
+                       void*,
                        DWORD,
                        void* output,
                        DWORD output_size,
-                       DWORD* returned) override {
+                       DWORD* returned,
+                       OVERLAPPED*) override {
     if (code != usbio::kGetDescriptor) return TRUE;
     const std::string descriptors =
         DeviceBytes({EndpointBytes(0x02, kBulk), EndpointBytes(0x83, kBulk)});
