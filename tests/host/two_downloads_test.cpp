@@ -143,7 +143,7 @@ class ApiTwoDownloads : public testing::Test {
     return turns;
   }
 
-  const Link link_;
+  const Link link_{};
   const host::Report report_;
 };
 

@@ -58,7 +58,6 @@ Counts DownloadAgainAndAgain(const Link& link, double rate) {
 class Noise : public testing::TestWithParam<Link> {};
 
 TEST_P(Noise, NeverMakesAnotherFileThatLooksComplete) {
-  Counts previous;
   for (const double rate : kRates) {
     const Counts counts = DownloadAgainAndAgain(GetParam(), rate);
     std::printf("%s at %g: %d complete, %d failed, %d of another size, %d with other bytes\n",
