@@ -11,6 +11,7 @@
 
 #include "tests/host/support/library_copy.h"
 #include "tests/host/support/receiver.h"
+#include "tests/races/options.h"
 #include "tests/support/resources.h"
 
 namespace {
@@ -81,18 +82,22 @@ TEST_F(ApiUnload, ResourcesAreCounted) {
 
 TEST_F(ApiUnload, LeavesNothingOfManyTimes) {
   constexpr int kFirstTimes = 3;  // the system keeps something of a first time
-  constexpr int kTimes = 1200;    // more than a process has TLS slots
   constexpr size_t kSmall = 16384;
+  constexpr size_t kSmallSet = 256 * 1024;
+  // More than a process has TLS slots.
+  const int times = static_cast<int>(1200 * races::Times());
   LoadAndUnload(kFirstTimes);
   LoadAndUnloadOnThread(kFirstTimes);
   const Resources before = CountResources();
   const size_t bytes_before = HeapBytes();
+  const size_t set_before = WorkingSetBytes();
 
-  LoadAndUnload(kTimes);
+  LoadAndUnload(times);
   EXPECT_EQ(CountResources(), before);
-  LoadAndUnloadOnThread(kTimes);
+  LoadAndUnloadOnThread(times);
   EXPECT_EQ(CountResources(), before);
   EXPECT_LT(HeapBytes(), bytes_before + kSmall);
+  EXPECT_LT(WorkingSetBytes(), set_before + kSmallSet);
 }
 
 // What the library keeps for a thread that raised an exception is freed when the library is
