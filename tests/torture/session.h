@@ -39,6 +39,7 @@ class Bench {
   static std::string FileContent();
 
   FaultyCalls& calls() { return faulty_; }
+  ManualClock& clock() { return clock_; }
 
   // From now on the line damages what it carries.
   void Damage(const sim::DamageOptions& options);
