@@ -2,16 +2,28 @@
 //
 //   bench-host calls PORT SMALL LARGE      the calls that the DLL makes for each 512 bytes: downloads the two files
 //                                          of the receiver and compares. SMALL has 100 KiB, LARGE 200 KiB.
-//   bench-host many NAME PORT...           downloads the file from all receivers at once
+//   bench-host many FILE PORT...           downloads the file of that name from all receivers at once; once more while
+//                                          other threads open and close the receivers, and compares with FILE
+//   bench-host aborts OPERATION NAME COUNT PORT
+//                                          milliseconds from Abort to the return of a list, a check, or a download of
+//                                          the file, COUNT times
 #include <windows.h>
 
 #include <psapi.h>
 
+#include <algorithm>
+#include <array>
 #include <atomic>
 #include <chrono>
 #include <cstdint>
 #include <cstdio>
+#include <cstdlib>
 #include <cstring>
+#include <filesystem>
+#include <fstream>
+#include <functional>
+#include <iterator>
+#include <random>
 #include <stdexcept>
 #include <string>
 #include <thread>
@@ -159,7 +171,10 @@ size_t WorkingSet() {
   return counters.WorkingSetSize;
 }
 
-void Many(const char* name, int ports, char** port) {
+constexpr int kOpeners = 4;
+
+void Many(const char* path, int ports, char** port) {
+  const std::string name = std::filesystem::path(path).filename().string();
   std::vector<void*> receivers(static_cast<size_t>(ports));
   std::atomic<size_t> failures = 0;
   const auto at_once = [&](const auto& work) {
@@ -180,11 +195,37 @@ void Many(const char* name, int ports, char** port) {
   std::atomic<size_t> bytes = 0;
   const double before = ProcessorSeconds();
   const auto start = std::chrono::steady_clock::now();
-  at_once([&](size_t i) { bytes += Download(receivers[i], Wide(name)); });
+  at_once([&](size_t i) { bytes += Download(receivers[i], Wide(name.c_str())); });
   const std::chrono::duration<double> passed = std::chrono::steady_clock::now() - start;
   const double used = ProcessorSeconds() - before;
+
+  std::ifstream file(path, std::ios::binary);
+  const std::string content{std::istreambuf_iterator<char>(file), {}};
+  std::atomic<bool> over = false;
+  std::vector<std::jthread> openers;
+  for (int n = 0; n < kOpeners; ++n) {
+    openers.emplace_back([&, n] {
+      for (size_t i = static_cast<size_t>(n); !over; ++i) {
+        std::wstring wanted = Wide(port[i % receivers.size()]);
+        void* receiver = nullptr;
+        if (devapi::OpenReceiver(wanted.data(), &receiver) != S_OK) ++failures;
+        if (devapi::CloseReceiver(receiver) != S_FALSE) ++failures;
+      }
+    });
+  }
+  at_once([&](size_t i) {
+    MemoryStream stream;
+    std::wstring wanted = Wide(name.c_str());
+    if (devapi::DownloadFile(receivers[i], wanted.data(), &stream, nullptr) != S_OK ||
+        stream.bytes != content) {
+      ++failures;
+    }
+  });
+  over = true;
+  openers.clear();
+  // One user of each is left.
   for (void* receiver : receivers) {
-    if (receiver) devapi::CloseReceiver(receiver);
+    if (devapi::CloseReceiver(receiver) != S_OK) ++failures;
   }
   std::printf(
       "{\"receivers\": %d, \"failures\": %zu, \"bytes\": %zu, \"seconds\": %.3f, \"processor_s\": "
@@ -199,12 +240,90 @@ void Many(const char* name, int ports, char** port) {
       found);
 }
 
+// How long an operation takes to return after its abort, in milliseconds, `count` times, each at another moment.
+std::vector<double> AbortAgainAndAgain(void* receiver,
+                                       int count,
+                                       const std::function<void()>& operate) {
+  using Clock = std::chrono::steady_clock;
+  using Milliseconds = std::chrono::duration<double, std::milli>;
+  constexpr double kLongest = 3000;  // no download ends before
+  const auto recover = [&] {
+    // The abort may end one more operation.
+    long result = S_FALSE;
+    while (result == S_FALSE) {
+      void* list = nullptr;
+      result = devapi::OpenFileList(receiver, &list);
+      if (list) devapi::CloseFileList(list);
+    }
+    if (result != S_OK) throw std::runtime_error("no list after an abort");
+  };
+  std::mt19937 random;
+  double longest = kLongest;
+  std::vector<double> times;
+  while (times.size() < static_cast<size_t>(count)) {
+    Clock::time_point end;
+    const auto begin = Clock::now();
+    std::thread worker([&] {
+      operate();
+      end = Clock::now();
+    });
+    std::this_thread::sleep_for(
+        Milliseconds(std::uniform_real_distribution<double>(0, longest)(random)));
+    const auto aborted = Clock::now();
+    devapi::Abort(receiver);
+    worker.join();
+    if (end > aborted) {
+      times.push_back(Milliseconds(end - aborted).count());
+    } else {
+      longest = std::min(longest, Milliseconds(end - begin).count());
+    }
+    recover();
+  }
+  return times;
+}
+
+void Aborts(const std::string& operation, const char* name, int count, const char* port) {
+  std::wstring wanted = Wide(port);
+  std::wstring file = Wide(name);
+  void* receiver = nullptr;
+  DCB settings{};
+  settings.BaudRate = CBR_115200;
+  settings.fBinary = TRUE;
+  settings.ByteSize = 8;
+  if (devapi::CreateReceiverOnSerial(wanted.data(), eProtocolAny, &settings, nullptr, &receiver) !=
+      S_OK) {
+    throw std::runtime_error("no receiver");
+  }
+  const auto operate = [&] {
+    if (operation == "check") {
+      short answer = 0;
+      devapi::CheckConnection(receiver, nullptr, &answer);
+    } else if (operation == "list") {
+      void* list = nullptr;
+      devapi::OpenFileList(receiver, &list);
+      if (list) devapi::CloseFileList(list);
+    } else {
+      Sink sink;
+      devapi::DownloadFile(receiver, file.data(), &sink, nullptr);
+    }
+  };
+  const std::vector<double> times = AbortAgainAndAgain(receiver, count, operate);
+  std::printf("{\"milliseconds\": [");
+  for (size_t n = 0; n < times.size(); ++n) std::printf("%s%.2f", n == 0 ? "" : ", ", times[n]);
+  std::printf("]}\n");
+  devapi::CloseReceiver(receiver);
+}
+
 }  // namespace
 
 int main(int argc, char** argv) try {
   if (argc == 5 && std::strcmp(argv[1], "calls") == 0) return CountCalls(argv + 2), 0;
   if (argc >= 4 && std::strcmp(argv[1], "many") == 0) return Many(argv[2], argc - 3, argv + 3), 0;
-  std::puts("usage: bench-host calls PORT SMALL LARGE | many NAME PORT...");
+  if (argc == 6 && std::strcmp(argv[1], "aborts") == 0)
+    return Aborts(argv[2], argv[3], std::atoi(argv[4]), argv[5]), 0;
+  std::puts(
+      "usage: bench-host calls PORT SMALL LARGE | many FILE PORT... | aborts OPERATION NAME COUNT "
+      "PORT");
   return 2;
 } catch (const std::exception& error) {
   std::printf("bench-host: %s\n", error.what());

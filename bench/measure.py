@@ -33,8 +33,12 @@ REPEATS = 3
 # Of a file of fewer than 4 bytes the library does not see the end of a Velmar receiver's log.
 GET_FILES = {"TINY.DAT": 4, "SMALL.DAT": 200 * KIB, "LARGE.DAT": 1024 * KIB}
 CALL_FILES = {"SMALL.DAT": 100 * KIB, "LARGE.DAT": 200 * KIB}
-MANY_FILE, MANY_BYTES = "MANY.DAT", 64 * KIB
+# So large that the time of the processor, which is counted in steps of 10 ms, is that of many steps.
+MANY_FILE, MANY_BYTES = "MANY.DAT", 512 * KIB
 MANY = (1, 8, 64)
+ABORTS = 50  # of each operation of each family
+ABORT_FILE, ABORT_BYTES = "LONG.DAT", 1024 * KIB  # takes a minute and a half
+ABORT_OPERATIONS = ("list", "check", "download")
 FIRST_PORT = 100  # of those that this makes; the tests have others
 MODE = ("--speed", "115200", "--no-memory")
 
@@ -82,9 +86,10 @@ def port_link(number):
 
 
 @contextlib.contextmanager
-def simulator(family, files, link, speed=9600):
+def simulator(family, files, link, *switches, speed=9600):
     process = subprocess.Popen(
-        [os.path.join(NATIVE, "rcvlink-sim"), family, "--folder", files, "--speed", str(speed), "--link", link],
+        [os.path.join(NATIVE, "rcvlink-sim"), family, "--folder", files, "--speed", str(speed), "--link", link]
+        + [*switches],
         stdout=subprocess.PIPE,
         stdin=subprocess.DEVNULL,
     )
@@ -268,7 +273,7 @@ def run_windows(program, *arguments):
         stdin=subprocess.DEVNULL,
         stdout=subprocess.PIPE,
         stderr=subprocess.DEVNULL,
-        timeout=400,
+        timeout=900,
         check=False,
     ).stdout.decode()
     try:
@@ -292,8 +297,23 @@ def measure_calls():
     return figures
 
 
+def measure_aborts():
+    files = folder("aborts", {ABORT_FILE: ABORT_BYTES})
+
+    def measure(family, operation, number):
+        with simulator(family, files, port_link(number), "--pace", speed=115200):
+            figures = run_windows("bench-host.exe", "aborts", operation, ABORT_FILE, str(ABORTS), f"COM{number}")
+        return {"family": family, "operation": operation} | figures
+
+    print("aborts ...", flush=True)
+    pairs = [(family, operation) for family in FAMILIES for operation in ABORT_OPERATIONS]
+    jobs = [lambda p=pair, n=FIRST_PORT + lane: measure(*p, n) for lane, pair in enumerate(pairs)]
+    return {"table": at_once(jobs)}
+
+
 def measure_many():
     files = folder("many", {MANY_FILE: MANY_BYTES})
+    path = os.path.relpath(os.path.join(files, MANY_FILE), ROOT)
     runs = {count: [] for count in MANY}
     for repeat in range(REPEATS):
         for count in MANY:
@@ -303,7 +323,7 @@ def measure_many():
                 for number in numbers:
                     stack.enter_context(simulator("quorin", files, port_link(number)))
                 ports = [f"COM{number}" for number in numbers]
-                runs[count].append(run_windows("bench-host.exe", "many", MANY_FILE, *ports))
+                runs[count].append(run_windows("bench-host.exe", "many", path, *ports))
     table = [sorted(figures, key=lambda run: run["processor_s"])[len(figures) // 2] for figures in runs.values()]
     if any(row["failures"] or row["bytes"] != row["receivers"] * MANY_BYTES for row in table):
         raise RuntimeError(f"downloads failed: {table}")
@@ -320,6 +340,7 @@ PARTS = {
     "get": measure_get,
     "library": measure_library,
     "calls": measure_calls,
+    "aborts": measure_aborts,
     "many": measure_many,
     "size": measure_size,
 }

@@ -56,7 +56,7 @@ endforeach()
 # It compiles for minutes at a low priority, so it begins first and leaves the processor to the others.
 set_tests_properties(check_release PROPERTIES PROCESSORS 1 COST 2000 TIMEOUT 1200)
 
-rcvlink_shards(2 unit_tests wine 120)
+rcvlink_shards(2 unit_tests wine 300)
 rcvlink_shards(1 cli_unit_tests wine 120)
 # Of the preset sanitize. They are here because this preset starts Wine. What they need is compiled at a low
 # priority while other tests wait for their ports.

@@ -14,8 +14,8 @@
 #include "tests/host/support/hpp.h"
 #include "tests/host/support/progress.h"
 #include "tests/host/support/report.h"
-#include "tests/host/support/resources.h"
 #include "tests/support/content.h"
+#include "tests/support/resources.h"
 
 using host::CodeOf;
 using host::OpenHpp;
@@ -386,10 +386,10 @@ TEST_F(HppDownload, LeavesNoHandle) {
   };
   constexpr int kFirstTimes = 2;
   for (int i = 0; i < kFirstTimes; ++i) use();
-  const size_t handles = host::HandleCount();
+  const size_t handles = HandleCount();
   constexpr int kTimes = 3;
   for (int i = 0; i < kTimes; ++i) use();
-  EXPECT_EQ(host::HandleCount(), handles);
+  EXPECT_EQ(HandleCount(), handles);
 }
 
 TEST(HppDownloadOverUsb, GivesAFunctionTheBytesOrThrows) {

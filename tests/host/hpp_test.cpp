@@ -14,8 +14,8 @@
 #include "tests/host/support/hpp.h"
 #include "tests/host/support/lock.h"
 #include "tests/host/support/report.h"
-#include "tests/host/support/resources.h"
 #include "tests/support/content.h"
+#include "tests/support/resources.h"
 
 using host::CodeOf;
 using host::OpenHpp;
@@ -478,14 +478,14 @@ TEST(HppManyTimes, LeaveNoHandleAndNoMemory) {
   };
   constexpr int kFirstTimes = 2;
   for (int i = 0; i < kFirstTimes; ++i) use();
-  const size_t handles = host::HandleCount();
-  const size_t bytes = host::HeapBytes();
+  const size_t handles = HandleCount();
+  const size_t bytes = HeapBytes();
   constexpr int kTimes = 3;
   for (int i = 0; i < kTimes; ++i) use();
-  EXPECT_EQ(host::HandleCount(), handles);
+  EXPECT_EQ(HandleCount(), handles);
   // A list or a string that is lost each time has more.
   constexpr size_t kLessThanOneEachTime = 100 * kTimes;
-  EXPECT_LT(host::HeapBytes(), bytes + kLessThanOneEachTime);
+  EXPECT_LT(HeapBytes(), bytes + kLessThanOneEachTime);
 }
 
 }  // namespace

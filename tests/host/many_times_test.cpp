@@ -7,7 +7,7 @@
 #include "rcvlink.h"
 #include "tests/host/support/receiver.h"
 #include "tests/host/support/report.h"
-#include "tests/host/support/resources.h"
+#include "tests/support/resources.h"
 
 namespace {
 
@@ -17,16 +17,16 @@ template <typename Operation>
 void ExpectNothingIsLeft(const char* name, int times, Operation operation) {
   constexpr int kFirstTimes = 3;
   for (int i = 0; i < kFirstTimes; ++i) operation();
-  const size_t before = host::HandleCount();
+  const size_t before = HandleCount();
   for (int i = 0; i < times; ++i) operation();
-  EXPECT_EQ(host::HandleCount(), before) << name;
+  EXPECT_EQ(HandleCount(), before) << name;
 }
 
 TEST(ApiManyTimes, HandlesAreCounted) {
-  const size_t before = host::HandleCount();
+  const size_t before = HandleCount();
   const host::Event first;
   const host::Event second;
-  EXPECT_EQ(host::HandleCount(), before + 2);
+  EXPECT_EQ(HandleCount(), before + 2);
 }
 
 TEST(ApiManyTimes, WithoutAReceiver) {

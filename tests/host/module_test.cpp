@@ -10,7 +10,7 @@
 #include "tests/host/support/library_copy.h"
 #include "tests/host/support/receiver.h"
 #include "tests/host/support/report.h"
-#include "tests/host/support/resources.h"
+#include "tests/support/resources.h"
 
 using testing::ElementsAre;
 using testing::HasSubstr;
@@ -49,7 +49,7 @@ class ApiModuleWithReceiver : public testing::Test {
   // stay open.
   long LoadAndUnload() {
     DeleteFileW(path_.c_str());
-    const size_t before = host::HandleCount();
+    const size_t before = HandleCount();
     {
       host::LibraryCopy copy;
       EXPECT_TRUE(copy.Load());
@@ -57,7 +57,7 @@ class ApiModuleWithReceiver : public testing::Test {
       void* handle = nullptr;
       EXPECT_EQ(copy.CreateReceiver(port_.name(), &handle), S_OK);
     }
-    return static_cast<long>(host::HandleCount()) - static_cast<long>(before);
+    return static_cast<long>(HandleCount()) - static_cast<long>(before);
   }
 
   const bed::SimulatedPort port_{{"quorin"}};

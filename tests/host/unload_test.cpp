@@ -11,7 +11,8 @@
 
 #include "tests/host/support/library_copy.h"
 #include "tests/host/support/receiver.h"
-#include "tests/host/support/resources.h"
+#include "tests/races/options.h"
+#include "tests/support/resources.h"
 
 namespace {
 
@@ -62,17 +63,17 @@ class ApiUnload : public testing::Test {
 };
 
 TEST_F(ApiUnload, ResourcesAreCounted) {
-  const host::Resources before = host::CountResources();
-  const size_t bytes_before = host::HeapBytes();
+  const Resources before = CountResources();
+  const size_t bytes_before = HeapBytes();
   const host::Event event;
   const DWORD tls_slot = TlsAlloc();
   const DWORD fls_slot = FlsAlloc(nullptr);
   const std::vector<char> bytes(1000);
-  EXPECT_GE(host::HeapBytes(), bytes_before + bytes.size());
-  EXPECT_EQ(host::CountResources(),
-            (host::Resources{.handles = before.handles + 1,
-                             .free_tls_slots = before.free_tls_slots - 1,
-                             .free_fls_slots = before.free_fls_slots - 1}));
+  EXPECT_GE(HeapBytes(), bytes_before + bytes.size());
+  EXPECT_EQ(CountResources(),
+            (Resources{.handles = before.handles + 1,
+                       .free_tls_slots = before.free_tls_slots - 1,
+                       .free_fls_slots = before.free_fls_slots - 1}));
   TlsFree(tls_slot);
   FlsFree(fls_slot);
   EXPECT_GT(before.free_tls_slots, 0U);
@@ -81,18 +82,22 @@ TEST_F(ApiUnload, ResourcesAreCounted) {
 
 TEST_F(ApiUnload, LeavesNothingOfManyTimes) {
   constexpr int kFirstTimes = 3;  // the system keeps something of a first time
-  constexpr int kTimes = 1200;    // more than a process has TLS slots
   constexpr size_t kSmall = 16384;
+  constexpr size_t kSmallSet = 256 * 1024;
+  // More than a process has TLS slots.
+  const int times = static_cast<int>(1200 * races::Times());
   LoadAndUnload(kFirstTimes);
   LoadAndUnloadOnThread(kFirstTimes);
-  const host::Resources before = host::CountResources();
-  const size_t bytes_before = host::HeapBytes();
+  const Resources before = CountResources();
+  const size_t bytes_before = HeapBytes();
+  const size_t set_before = WorkingSetBytes();
 
-  LoadAndUnload(kTimes);
-  EXPECT_EQ(host::CountResources(), before);
-  LoadAndUnloadOnThread(kTimes);
-  EXPECT_EQ(host::CountResources(), before);
-  EXPECT_LT(host::HeapBytes(), bytes_before + kSmall);
+  LoadAndUnload(times);
+  EXPECT_EQ(CountResources(), before);
+  LoadAndUnloadOnThread(times);
+  EXPECT_EQ(CountResources(), before);
+  EXPECT_LT(HeapBytes(), bytes_before + kSmall);
+  EXPECT_LT(WorkingSetBytes(), set_before + kSmallSet);
 }
 
 // What the library keeps for a thread that raised an exception is freed when the library is
@@ -117,9 +122,9 @@ TEST_F(ApiUnload, LeavesNothingForThreadsThatLiveOn) {
     unloaded.Set();
   };
   unload_under_threads();
-  const host::Resources before = host::CountResources();
+  const Resources before = CountResources();
   unload_under_threads();
-  EXPECT_EQ(host::CountResources(), before);
+  EXPECT_EQ(CountResources(), before);
 }
 
 // What it keeps for a thread that raised an exception is freed when the thread ends.
@@ -132,11 +137,11 @@ TEST_F(ApiUnload, ThreadsThatRaisedLeaveNothing) {
   ASSERT_TRUE(copy_.Load());
   raise_on_thread();
   raise_on_thread();
-  const host::Resources before = host::CountResources();
-  const size_t bytes_before = host::HeapBytes();
+  const Resources before = CountResources();
+  const size_t bytes_before = HeapBytes();
   for (int i = 0; i < kThreads; ++i) raise_on_thread();
-  EXPECT_EQ(host::CountResources(), before);
-  EXPECT_LT(host::HeapBytes(), bytes_before + kThreads * kLeastOfAThread);
+  EXPECT_EQ(CountResources(), before);
+  EXPECT_LT(HeapBytes(), bytes_before + kThreads * kLeastOfAThread);
 }
 
 }  // namespace

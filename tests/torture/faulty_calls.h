@@ -1,8 +1,9 @@
-// The Win32 calls of a simulated port, of which one fails.
+// The Win32 calls of a simulated port: one may fail, and a test may act at each.
 #ifndef RCVLINK_TESTS_TORTURE_FAULTY_CALLS_H_
 #define RCVLINK_TESTS_TORTURE_FAULTY_CALLS_H_
 
 #include <cstdint>
+#include <functional>
 
 #include "tests/support/allocations.h"
 #include "transport/device_calls.h"
@@ -14,8 +15,9 @@ class FaultyCalls : public rcvlink::DeviceCalls {
   explicit FaultyCalls(rcvlink::DeviceCalls& calls) : calls_(calls) {}
 
   static constexpr DWORD kError = ERROR_GEN_FAILURE;
-  size_t failing = SIZE_MAX;  // the call of this number, from 0
-  size_t count = 0;           // calls so far
+  size_t failing = SIZE_MAX;      // the call of this number, from 0
+  size_t count = 0;               // calls so far
+  std::function<void()> on_call;  // comes before each call; may be empty
 
   HANDLE CreateFile(const wchar_t* path, DWORD access, DWORD share, DWORD flags) override {
     if (Fails()) return INVALID_HANDLE_VALUE;
@@ -82,6 +84,7 @@ class FaultyCalls : public rcvlink::DeviceCalls {
 
  private:
   bool Fails() {
+    if (on_call) on_call();
     if (count++ != failing) return false;
     SetLastError(kError);
     return true;

@@ -21,7 +21,6 @@ using rcvlink::UniqueBstr;
 namespace torture {
 namespace {
 
-constexpr long kFiles = 3;
 constexpr size_t kFileSize = 1500;  // three Quorin blocks, two Velmar chunks
 wchar_t port_name[] = L"COM7";
 wchar_t device_name[] = L"\\\\?\\device";
@@ -42,6 +41,8 @@ std::unique_ptr<sim::Receiver> MakeReceiver(const Link& link, sim::FileStore fil
 }
 
 }  // namespace
+
+wchar_t* Link::port() const { return instance == eInstanceUSB ? device_name : port_name; }
 
 // The line to the receiver. It is good until Damage is called.
 class Bench::Line : public sim::Receiver {
@@ -122,16 +123,14 @@ void Bench::AbortAfter(void* receiver, DWORD milliseconds) {
 }
 
 Found::Found(const Link& link) {
-  wchar_t* const name = link.instance == eInstanceUSB ? device_name : port_name;
-  devapi::SearchReceiver(name, link.instance, eProtocolAny, nullptr, &handle_);
+  devapi::SearchReceiver(link.port(), link.instance, eProtocolAny, nullptr, &handle_);
 }
 
 std::string Bench::FileContent() { return Content(kFileSize); }
 
 void Session::Run(const Link& link, IStream* stream, bool removes) {
-  wchar_t* const name = link.instance == eInstanceUSB ? device_name : port_name;
   void* receiver = nullptr;
-  search = devapi::SearchReceiver(name, link.instance, eProtocolAny, nullptr, &receiver);
+  search = devapi::SearchReceiver(link.port(), link.instance, eProtocolAny, nullptr, &receiver);
   if (!receiver) return;
 
   CReceiverInfo identity{};
@@ -160,7 +159,7 @@ void Session::Run(const Link& link, IStream* stream, bool removes) {
 }
 
 bool Session::IsWhole(const std::string& bytes) const {
-  return search == S_OK && info == S_OK && list == S_OK && count >= kFiles - 1 &&
+  return search == S_OK && info == S_OK && list == S_OK && count >= Bench::kFiles - 1 &&
          download == S_OK && (remove == S_OK || remove == kNotCalled) && close == S_OK &&
          bytes == Bench::FileContent();
 }

@@ -21,6 +21,8 @@ struct Link {
   const char* name;  // for the test
   EInstanceType instance;
   EProtocol family;
+
+  wchar_t* port() const;  // the name under which a search finds it
 };
 
 // The receiver at the other end, with the Win32 calls through which the library reaches it.
@@ -32,9 +34,12 @@ class Bench {
 
   ~Bench();
 
+  // What a session needs: three files with this content.
+  static constexpr long kFiles = 3;
   static std::string FileContent();
 
   FaultyCalls& calls() { return faulty_; }
+  ManualClock& clock() { return clock_; }
 
   // From now on the line damages what it carries.
   void Damage(const sim::DamageOptions& options);

@@ -1,6 +1,8 @@
-#include "tests/host/support/resources.h"
+#include "tests/support/resources.h"
 
 #include <windows.h>
+
+#include <psapi.h>
 
 #include <algorithm>
 #include <array>
@@ -9,7 +11,6 @@
 #include <span>
 #include <vector>
 
-namespace host {
 namespace {
 
 // Handles are multiples of four, and the lowest free one is given out first.
@@ -67,4 +68,8 @@ size_t HeapBytes() {
   return bytes;
 }
 
-}  // namespace host
+size_t WorkingSetBytes() {
+  PROCESS_MEMORY_COUNTERS counters{};
+  K32GetProcessMemoryInfo(GetCurrentProcess(), &counters, sizeof(counters));
+  return counters.WorkingSetSize;
+}

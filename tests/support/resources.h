@@ -1,11 +1,9 @@
 // The limited resources that this process uses.
-#ifndef RCVLINK_TESTS_HOST_SUPPORT_RESOURCES_H_
-#define RCVLINK_TESTS_HOST_SUPPORT_RESOURCES_H_
+#ifndef RCVLINK_TESTS_SUPPORT_RESOURCES_H_
+#define RCVLINK_TESTS_SUPPORT_RESOURCES_H_
 
 #include <cstddef>
 #include <iosfwd>
-
-namespace host {
 
 // The handles that are open. Asks for each handle value: Wine does not count
 // (GetProcessHandleCount gives 0 there).
@@ -26,6 +24,7 @@ Resources CountResources();
 // The bytes in use on all heaps of the process.
 size_t HeapBytes();
 
-}  // namespace host
+// The bytes of memory that the process holds.
+size_t WorkingSetBytes();
 
-#endif  // RCVLINK_TESTS_HOST_SUPPORT_RESOURCES_H_
+#endif  // RCVLINK_TESTS_SUPPORT_RESOURCES_H_
