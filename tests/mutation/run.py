@@ -257,11 +257,12 @@ def main():
     random.Random(choice.seed).shuffle(order)
     sample = order[:choice.sample]
     if not choice.table:
-        signal.signal(signal.SIGTERM, lambda number, frame: sys.exit(128 + number))
+        signal.signal(signal.SIGTERM, lambda received, frame: sys.exit(128 + received))
         prepare()
         if choice.dll and not build("rcvlink", *DLL_PROGRAMS, "rcvlink-cli", "rcvlink-sim-usb", "rcvlink-sim"):
             sys.exit("the tests of the DLL do not build")
-        for number, place in enumerate(sample, 1):
+        # A header is compiled into many sources, so what is in one comes last.
+        for number, place in sorted(enumerate(sample, 1), key=lambda numbered: numbered[1].path.endswith(".h")):
             known = results.get(place.key)
             wanted = known is None or known[0] == choice.again or (choice.dll and known[0] == "survived")
             if not wanted or choice.only not in place.key:
