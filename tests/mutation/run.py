@@ -212,7 +212,8 @@ def judged():
     if os.path.exists(JUDGED):
         for line in read(JUDGED).splitlines():
             if line and not line.startswith("#"):
-                path, text, mistake, reason = (part.strip() for part in line.split(" | "))
+                path, rest = line.split(" | ", 1)
+                text, mistake, reason = rest.rsplit(" | ", 2)
                 reasons[path, text, mistake] = reason
     return reasons
 
@@ -228,15 +229,17 @@ def table(sample, results):
         counts[outcome] += 1
         by_operator.setdefault(place.operator, collections.Counter())[outcome] += 1
         if outcome in ("survived", "judged"):
-            survivors.append(f"| `{place.path}:{place.line}` | `{place.line_text}` | {place.shown} | {reason or ''} |")
+            cells = (f"`{place.path}:{place.line}`", f"`{place.line_text}`", f"`{place.shown}`", reason or "")
+            survivors.append("| " + " | ".join(cell.replace("|", "\\|") for cell in cells) + " |")
     outcomes = ("killed", "survived", "judged", "not compiled", "not tried")
     lines = ["| Mistake | " + " | ".join(outcomes) + " |", "|---" * (len(outcomes) + 1) + "|"]
     for operator, own in sorted(by_operator.items()):
         lines.append(f"| {operator} | " + " | ".join(str(own[outcome]) for outcome in outcomes) + " |")
     lines.append("| all | " + " | ".join(str(counts[outcome]) for outcome in outcomes) + " |")
-    compiled = counts["killed"] + counts["survived"] + counts["judged"]
-    if compiled:
-        lines.append(f"\n{100 * counts['killed'] / compiled:.1f} % of {compiled} that compiled are killed")
+    seen = counts["killed"] + counts["survived"]
+    if seen:
+        lines.append(f"\nKilled: {100 * counts['killed'] / seen:.1f} % of the {seen} that compiled and are not judged, "
+                     f"{100 * counts['killed'] / (seen + counts['judged']):.1f} % of all that compiled.")
     lines += ["", "| Survivor | Line | Mistake | Reason |", "|---|---|---|---|", *survivors]
     return "\n".join(lines) + "\n"
 
