@@ -1,15 +1,22 @@
 // The directory's logs where a mistake in a number or a lack of memory would show.
+#include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include <cstdint>
+#include <new>
 #include <string>
+#include <vector>
 
 #include "tests/support/allocations.h"
 #include "tests/velmar/velmar_replies.h"
+#include "velmar/commands.h"
 #include "velmar/logs.h"
 
 namespace {
 
 using namespace VelmarCommands;
+using testing::Contains;
+using testing::Not;
 
 SYSTEMTIME TimeOfEntry(const std::string& date_and_time) {
   FileEntries entries;
@@ -39,29 +46,51 @@ TEST(DirectoryLogTimes, HaveTheLastOfEachPart) {
   EXPECT_EQ(time.wSecond, 59);
 }
 
-// Whichever allocation fails, the directory is not taken as complete.
-TEST(DirectoryLogMemory, ADirectoryThatIsReadIsWhole) {
-  const std::string text = AsciiLog("DIRENTA", "\"a name of some length\",1,0,20121231,235959");
-  bool said_so = false;
-  bool completed = false;
-  for (size_t failing = 0; !completed; ++failing) {
-    FileEntries entries;
-    Progress progress = Progress::kNothing;
-    bool has_failed = false;
+const std::string kLog = AsciiLog("DIRENTA", "\"a name of some length\",1,0,20121231,235959");
+
+// Runs the function with each of its allocations failing, then with none; an exception leaves the
+// value as it was.
+template <typename Value, typename Function>
+std::vector<Value> WithEachAllocationFailing(Value value_of_exception, Function function) {
+  std::vector<Value> values;
+  for (bool has_failed = true; has_failed;) {
+    Value value = value_of_exception;
     {
-      const Allocations allocations(failing);
+      const Allocations allocations(values.size());
       try {
-        progress = DecodeDirectory(text, entries);
+        value = function();
       } catch (const std::bad_alloc&) {
-        progress = Progress::kNothing;
       }
       has_failed = Allocations::HasFailed();
     }
-    completed = !has_failed;
-    EXPECT_EQ(progress == Progress::kComplete, completed) << "allocation " << failing;
-    said_so = said_so || progress == Progress::kNoMemory;
+    values.push_back(value);
   }
-  EXPECT_TRUE(said_so);
+  return values;
+}
+
+// Whichever allocation fails, the directory is not taken as complete.
+TEST(DirectoryLogMemory, ADirectoryThatIsReadIsWhole) {
+  std::vector<Progress> all = WithEachAllocationFailing(Progress::kNothing, [] {
+    FileEntries entries;
+    return DecodeDirectory(kLog, entries);
+  });
+  EXPECT_EQ(all.back(), Progress::kComplete);
+  all.pop_back();
+  EXPECT_THAT(all, Contains(Progress::kNoMemory));
+  EXPECT_THAT(all, Not(Contains(Progress::kComplete)));
+}
+
+TEST(DirectoryLogMemory, TheCommandEndsWithoutIt) {
+  std::vector<HRESULT> all = WithEachAllocationFailing(S_FALSE, [] {
+    CGetFileListCmd command;
+    bool done = false;
+    uint32_t consumed = 0;
+    return command.ParseAsciiLog(kLog.data(), static_cast<uint32_t>(kLog.size()), &done, &consumed);
+  });
+  EXPECT_EQ(all.back(), S_OK);
+  all.pop_back();
+  EXPECT_THAT(all, Contains(E_OUTOFMEMORY));
+  EXPECT_THAT(all, Not(Contains(S_OK)));
 }
 
 }  // namespace
