@@ -7,7 +7,7 @@ All places where a mistake can be made are listed (places.py), put into an order
 are tried. The sources are copied to build/mutation, which has builds and a Wine prefix of its own. Results are kept in
 build/mutation/results.json, so a run that was stopped goes on where it was; one of another seed uses them too.
 
-  --again survived   tries these once more, after tests were added
+  --again survived   tries these once more, after tests were added; not those of judged.txt
   --only TEXT        only mistakes with this text in their line of the table
   --dll              tries survivors with the tests that load the DLL as well (host_tests, usb_tests, cli_tests)
   --table            prints the table of what is known and tries nothing
@@ -268,7 +268,8 @@ def main():
         for number, place in sorted(enumerate(sample, 1), key=lambda numbered: numbered[1].path.endswith(".h")):
             known = results.get(place.key)
             wanted = known is None or known[0] == choice.again or (choice.dll and known[0] == "survived")
-            if not wanted or choice.only not in place.key:
+            is_judged = (place.path, place.line_text, place.shown) in judged()
+            if not wanted or (known and is_judged) or choice.only not in place.key:
                 continue
             start = time.monotonic()
             results[place.key] = (try_dll if choice.dll else try_mistake)(place)
