@@ -1,5 +1,5 @@
 #!/bin/bash
-# Installs the Debian packages that are missing: `setup.sh demo`, `release`, `test` or `bench`.
+# Installs the Debian packages that are missing: `setup.sh demo`, `release`, `test`, `coverage` or `bench`.
 set -euo pipefail
 
 demo_packages=(
@@ -13,15 +13,17 @@ demo_packages=(
 release_packages=("${demo_packages[@]}" doxygen python3)
 test_packages=("${release_packages[@]}" googletest libgtest-dev libgmock-dev clang-14 clang-format-14 clang-tidy-14 lld lld-14 mono-mcs
   wine64-tools libwine-dev libclang-rt-14-dev)
+coverage_packages=("${test_packages[@]}" gcovr)
 bench_packages=("${demo_packages[@]}" lrzsz python3)
 
 case "${1:-}" in
   demo) packages=("${demo_packages[@]}") ;;
   release) packages=("${release_packages[@]}") ;;
   test) packages=("${test_packages[@]}") ;;
+  coverage) packages=("${coverage_packages[@]}") ;;
   bench) packages=("${bench_packages[@]}") ;;
   *)
-    echo "usage: setup.sh demo|release|test|bench" >&2
+    echo "usage: setup.sh demo|release|test|coverage|bench" >&2
     exit 2
     ;;
 esac

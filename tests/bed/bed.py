@@ -15,7 +15,7 @@ Simulated receivers, by port name ("COM12"):
 
   {"do": "join", "ports": [P, P]}                    makes both, with a null modem between them and no receiver
 
-Windows programs (paths relative to the folder of the release build's programs):
+Windows programs (paths relative to the folder of the programs of the preset RCVLINK_PRESET, or else release):
   {"do": "run", "program": "rcvlink-cli.exe", "arguments": [...], "output": "pipe", "folder": DIR}
       -> {"job": N}. DIR, the folder to run in, may be left out. Its output is a "pipe", one whose
       reader has "closed" it, or a "terminal" (a console on a pseudo-terminal of 100 columns).
@@ -50,6 +50,7 @@ from simulators import Simulator
 
 ROOT = os.path.realpath(os.path.join(os.path.dirname(os.path.abspath(__file__)), "..", ".."))
 BUILD = os.path.join(ROOT, "build")
+PROGRAMS = os.path.join(BUILD, os.environ.get("RCVLINK_PRESET", "release"), "bin")
 
 
 class Connection(socketserver.StreamRequestHandler):
@@ -146,7 +147,7 @@ class Connection(socketserver.StreamRequestHandler):
         return {"status": self._simulator(request).status()}
 
     def _run(self, request):
-        program = os.path.join(BUILD, "release", "bin", request["program"])
+        program = os.path.join(PROGRAMS, request["program"])
         if not os.path.exists(program):
             raise Refused(f"there is no {program}")
         number = len(self._jobs) + 1

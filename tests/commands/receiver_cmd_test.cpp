@@ -5,6 +5,7 @@
 #include <string>
 
 #include "platform/handle.h"
+#include "tests/support/allocations.h"
 
 using rcvlink::KernelHandle;
 
@@ -89,6 +90,33 @@ TEST(ReceiverCmd, AppendReplyReturnsWhatItDid) {
   EXPECT_EQ(command.AppendReply("cd", 0), S_FALSE);
   EXPECT_EQ(command.AppendReply("cd", 2), S_OK);
   EXPECT_EQ(Reply(command), "abcd");
+}
+
+// A length has 32 bits. Nothing is copied, so the bytes need not be there.
+TEST(ReceiverCmd, AReplyThatWouldBeTooLongIsRefused) {
+  TestCommand command("x");
+  ASSERT_EQ(command.AppendReply("abc", 3), S_OK);
+  EXPECT_EQ(command.AppendReply("", 0xFFFF'FFFD), E_OUTOFMEMORY);
+  EXPECT_EQ(Reply(command), "abc");
+}
+
+TEST(ReceiverCmd, WithoutMemoryTheReplyStaysAsItWas) {
+  const std::string longer(100, 'x');
+  TestCommand command("x");
+  command.SetReply("abc");
+  {
+    const Allocations failing(0);
+    command.SetReply(longer.c_str());
+    EXPECT_TRUE(Allocations::HasFailed());
+  }
+  EXPECT_EQ(Reply(command), "abc");
+  HRESULT result = S_OK;
+  {
+    const Allocations failing(0);
+    result = command.AppendReply(longer.data(), static_cast<uint32_t>(longer.size()));
+  }
+  EXPECT_EQ(result, E_OUTOFMEMORY);
+  EXPECT_EQ(Reply(command), "abc");
 }
 
 TEST(ReceiverCmd, FreeReplyLeavesTheLength) {

@@ -116,6 +116,12 @@ TEST_F(Receiver, AbortAlwaysSucceeds) {
   EXPECT_TRUE(report.Has("CAbstractReceiver::Abort"));
 }
 
+TEST_F(Receiver, StopAbortsWithoutALine) {
+  EXPECT_CALL(*driver, Abort());
+  receiver->Stop();
+  EXPECT_TRUE(report.Lines().empty());
+}
+
 TEST_F(Receiver, LocksWithoutALine) {
   EXPECT_CALL(*driver, LockConnection(event)).WillOnce(Return(S_FALSE));
   EXPECT_EQ(receiver->LockConnection(event), S_FALSE);
@@ -220,6 +226,11 @@ TEST_F(Receiver, AbortMayComeFromTheProgressFunction) {
         return S_OK;
       });
   receiver->DownloadFile(L"a", &stream, &progress);
+}
+
+TEST(ReceiverWithoutDriver, HasNothingToStop) {
+  CAbstractReceiver receiver(nullptr);
+  EXPECT_NO_FATAL_FAILURE(receiver.Stop());
 }
 
 TEST(ReceiverWithoutDriver, IsNotConnected) {

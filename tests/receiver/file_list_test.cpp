@@ -6,6 +6,7 @@
 #include <string>
 
 #include "platform/handle.h"
+#include "tests/support/allocations.h"
 
 using rcvlink::CopyBstr;
 using rcvlink::KernelHandle;
@@ -29,6 +30,23 @@ TEST(FileList, KeepsRecordsInOrder) {
   EXPECT_EQ(file.qwReserved, 0u);
   EXPECT_EQ(file.stTime1.wYear, 2026);
   EXPECT_EQ(file.stTime2.wSecond, 59);
+}
+
+TEST(FileList, WithoutMemoryItStaysAsItWas) {
+  CFileList files;
+  bool appended = true;
+  bool reserved = true;
+  {
+    const Allocations failing(0);
+    appended = files.Append(CopyBstr(L"a"), 1, kTime);
+  }
+  {
+    const Allocations failing(0);
+    reserved = files.Reserve(10);
+  }
+  EXPECT_FALSE(appended);
+  EXPECT_FALSE(reserved);
+  EXPECT_EQ(files.Count(), 0);
 }
 
 // A thread of its own: the start-up code wraps main in a handler that would swallow the exception.

@@ -132,6 +132,17 @@ TEST_F(VelmarAbortedPutBack, DoesNotInterruptTheLine) {
               ElementsAre("flush", "speed 9600"));
 }
 
+// Nobody waited for the answer to the line, so it may still come.
+TEST_F(VelmarAbortedPutBack, TheNextCommandWaitsForTheAnswerToTheLine) {
+  DownloadAndAbortAt(kConfig);
+  before_command = nullptr;
+  answers["del file a\r"] = kOkPrompt;
+  const DWORD paused = clock.paused;
+  driver.DeleteFile(L"a");
+  EXPECT_EQ(clock.paused - paused, 500u + 500u)
+      << "once before it, and after it as after every command";
+}
+
 TEST_F(VelmarDownload, AnAbortThatEndedItDoesNotDisturbThePutBack) {
   Serve(3);
   connection->speed = 9600;

@@ -3,6 +3,7 @@
 #include <gtest/gtest.h>
 
 #include <string>
+#include <string_view>
 
 #include "tests/velmar/velmar_replies.h"
 
@@ -58,6 +59,14 @@ TEST(VelmarResponse, IsTakenForUnknownOnceEnoughHasCome) {
   EXPECT_EQ(TypeOf(other.substr(0, 10)), RESPONSE_UNKNOWN);
   EXPECT_EQ(TypeOf("\r\n<ERROR:x"), RESPONSE_UNKNOWN);
   EXPECT_EQ(TypeOf("\r\n<ERROR ["), RESPONSE_UNKNOWN);
+}
+
+// The reply is a part of a buffer; behind it may be the rest of an earlier one.
+TEST(VelmarResponse, WhatIsBehindTheReplyIsNotRead) {
+  constexpr std::string_view kBuffer = "\r\n<OK\r\n[COM1]";
+  for (size_t length = 0; length < kBuffer.size(); ++length) {
+    EXPECT_EQ(RecogniseResponse(kBuffer.substr(0, length)).type, RESPONSE_INCOMPLETE) << length;
+  }
 }
 
 TEST(VelmarResponse, ThePromptEndsAtItsFirstBracket) {

@@ -8,6 +8,7 @@
 
 #include "tests/support/guarded_bytes.h"
 #include "tests/velmar/velmar_replies.h"
+#include "velmar/commands.h"
 #include "velmar/velmar_command.h"
 
 namespace {
@@ -39,6 +40,21 @@ TEST(VelmarCommandParse, ParsesNothingOfNothing) {
   EXPECT_EQ(command.Response(), RESPONSE_OK);  // unchanged
   EXPECT_EQ(command.ParseReply("x", 1, &done, &consumed), S_FALSE);
   EXPECT_EQ(command.Response(), RESPONSE_UNKNOWN);
+}
+
+TEST(VelmarCommandParse, AnAnswerThatIsNoneIsUnknownAlsoAfterOne) {
+  CLogConfigCommand command;
+  uint32_t consumed = 0;
+  bool done = true;
+  EXPECT_EQ(command.ParseReply(
+                kOkPrompt.data(), static_cast<uint32_t>(kOkPrompt.size()), &done, &consumed),
+            S_OK);
+  EXPECT_EQ(command.Response(), RESPONSE_OK);
+  EXPECT_FALSE(done);
+  done = true;
+  EXPECT_EQ(command.ParseReply("x", 1, &done, &consumed), S_OK);
+  EXPECT_EQ(command.Response(), RESPONSE_UNKNOWN);
+  EXPECT_FALSE(done);
 }
 
 TEST(VelmarCommandParse, AStreamedReplyConsumesThePromptOnceMoreHasCome) {
