@@ -58,17 +58,13 @@ set_tests_properties(check_release PROPERTIES PROCESSORS 1 COST 2000 TIMEOUT 120
 
 rcvlink_shards(2 unit_tests wine 300)
 rcvlink_shards(1 cli_unit_tests wine 120)
-# Of the preset sanitize. They are here because this preset starts Wine. What they need is compiled at a low
-# priority while other tests wait for their ports.
-set(sanitize ${PROJECT_SOURCE_DIR}/build/sanitize)
-add_test(NAME sanitize.build
-         COMMAND nice -n 15 ${CMAKE_COMMAND} --build ${sanitize} --target sanitized_tests fuzz)
-set_tests_properties(sanitize.build PROPERTIES FIXTURES_SETUP sanitize PROCESSORS 1 COST 3000 TIMEOUT 1200)
-rcvlink_test(sanitized_tests sanitized 300 ${sanitize}/bin/sanitized_tests.exe.so)
-set_tests_properties(sanitized_tests PROPERTIES LABELS gtest FIXTURES_REQUIRED "wine;sanitize")
+# Of the preset sanitize. It is here because this preset starts Wine.
+rcvlink_test(sanitized_tests sanitized 300 ${PROJECT_SOURCE_DIR}/build/sanitize/bin/sanitized_tests.exe.so)
+set_tests_properties(sanitized_tests PROPERTIES LABELS gtest)
+# It computes while other tests wait for a port.
 add_test(NAME fuzz COMMAND ${Python3_EXECUTABLE} -B ${folder}/run_fuzz.py 60)
 set_tests_properties(fuzz PROPERTIES
-  FIXTURES_REQUIRED "wine;sanitize" PROCESSORS ${computing} COST 1000 TIMEOUT 600)
+  FIXTURES_REQUIRED wine PROCESSORS ${computing} COST 1000 TIMEOUT 600)
 # Many small shards: the last ones end at about the same time.
 rcvlink_shards(32 host_tests bed 600)
 rcvlink_shards(32 cli_tests bed 300)
