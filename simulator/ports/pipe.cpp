@@ -34,7 +34,8 @@ UniqueHandle MakePipe(const std::wstring& path, bool first) {
 
 PipeEnd::PipeEnd(const std::wstring& path, bool first)
     : pipe_(MakePipe(path, first)), read_(pipe_.get()), write_(pipe_.get()) {
-  WaitForHost();
+  // A host may have opened it already, so it is not disconnected first.
+  Connect();
 }
 
 std::vector<HANDLE> PipeEnd::Events() const {
@@ -71,10 +72,15 @@ void PipeEnd::WaitForHost() {
   waiting_.clear();
   read_.Cancel();
   write_.Cancel();
-  do {
+  DisconnectNamedPipe(pipe_.get());
+  Connect();
+}
+
+void PipeEnd::Connect() {
+  // A host may have come and gone by now.
+  while (!read_.StartConnect() && GetLastError() == ERROR_NO_DATA) {
     DisconnectNamedPipe(pipe_.get());
-    // A host may have come and gone by now.
-  } while (!read_.StartConnect() && GetLastError() == ERROR_NO_DATA);
+  }
   if (!read_.on_its_way()) {
     ThrowLastError("cannot wait for a host");
   }

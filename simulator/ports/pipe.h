@@ -34,6 +34,7 @@ class PipeEnd {
 
  private:
   void WaitForHost();
+  void Connect();
   void StartRead();
   void WriteWaiting();
 
