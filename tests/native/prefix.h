@@ -106,9 +106,6 @@
   list = values_of_##list.data()
 #define va_end(list)
 
-// Wine has it, but not in its headers.
-extern "C" BOOL WINAPI GetProcessHandleCount(HANDLE process, DWORD* count);
-
 // Microsoft's C runtime, which Wine has in a DLL (runtime.cpp).
 int _vscprintf(const char* format, va_list arguments);
 int _vscwprintf(const wchar_t* format, va_list arguments);
