@@ -539,9 +539,11 @@ class StopEvent {
   explicit StopEvent(const std::stop_token& stop) {
     if (!stop.stop_possible()) return;
     event_.reset(MakeEvent());
-    ticker_ = std::make_unique<Ticker>([stop, event = event_.get()] {
+    const auto look = [stop, event = event_.get()] {
       if (stop.stop_requested()) SetEvent(event);
-    });
+    };
+    look();  // nothing is sent when the stop came before
+    ticker_ = std::make_unique<Ticker>(look);
   }
   HANDLE get() const noexcept { return event_.get(); }
 
