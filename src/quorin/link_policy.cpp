@@ -73,6 +73,12 @@ HRESULT UsbPolicy::ReadWhole(Block& block) {
   return S_OK;
 }
 
+// As long as the four reads of a silent receiver take.
+DWORD UsbPolicy::LongestWithoutBlockMs() const {
+  constexpr DWORD kTwoMinutes = 120000;
+  return kTwoMinutes;
+}
+
 // In floating point, so it is right for files of any size.
 uint8_t UsbPolicy::Percent(uint32_t delivered, uint32_t size) const {
   return static_cast<uint8_t>(static_cast<uint64_t>(delivered * 99.0 / size + 1.0));

@@ -33,7 +33,8 @@ class LinkPolicy {
 
   // How long blocks may be refused, one after the other, before the transfer ends; INFINITE for
   // ever. A host ends a transfer over a serial line when it has waited long enough: on a bad line a
-  // block may need many tries. A USB link has no noise, so there the receiver does not send blocks.
+  // block may need many tries. A USB link has no noise: a receiver whose blocks are refused for so
+  // long does not send the file.
   virtual DWORD LongestWithoutBlockMs() const = 0;
 
   virtual uint8_t Percent(uint32_t delivered, uint32_t size) const = 0;
@@ -78,7 +79,7 @@ class UsbPolicy : public LinkPolicy {
   HRESULT ReadRest(Block& block) override;
   bool CountsTimeoutsPerBlock() const override { return false; }
   bool PassesResultsOn() const override { return true; }
-  DWORD LongestWithoutBlockMs() const override { return 120000; }
+  DWORD LongestWithoutBlockMs() const override;
   uint8_t Percent(uint32_t delivered, uint32_t size) const override;
   bool IsTimeToTell() override;
   const wchar_t* Name() const override { return L"DownloadOverUSB"; }

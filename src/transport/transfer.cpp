@@ -1,6 +1,7 @@
 #include "transport/transfer.h"
 
 #include <new>
+#include <utility>
 
 #include "platform/hresult.h"
 
