@@ -42,12 +42,9 @@ TEST_P(LongUse, LeavesNothing) {
   EXPECT_LT(HeapBytes(), bytes_before + cycles * kLeastOfACycle);
 }
 
-INSTANTIATE_TEST_SUITE_P(Links,
-                         LongUse,
-                         testing::Values(Link{"QuorinOnSerial", eInstanceSerial, eProtocolQuorin},
-                                         Link{"VelmarOnSerial", eInstanceSerial, eProtocolVelmar},
-                                         Link{"QuorinOnUsb", eInstanceUSB, eProtocolQuorin}),
-                         [](const auto& link) { return link.param.name; });
+INSTANTIATE_TEST_SUITE_P(Links, LongUse, testing::ValuesIn(torture::kLinks), [](const auto& link) {
+  return link.param.name;
+});
 
 }  // namespace
 }  // namespace races

@@ -551,12 +551,9 @@ TEST_P(Races, OperationsMeetOtherThreads) {
   }
 }
 
-INSTANTIATE_TEST_SUITE_P(Links,
-                         Races,
-                         testing::Values(Link{"QuorinOnSerial", eInstanceSerial, eProtocolQuorin},
-                                         Link{"VelmarOnSerial", eInstanceSerial, eProtocolVelmar},
-                                         Link{"QuorinOnUsb", eInstanceUSB, eProtocolQuorin}),
-                         [](const auto& link) { return link.param.name; });
+INSTANTIATE_TEST_SUITE_P(Links, Races, testing::ValuesIn(torture::kLinks), [](const auto& link) {
+  return link.param.name;
+});
 
 }  // namespace
 }  // namespace races

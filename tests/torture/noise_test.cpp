@@ -77,12 +77,9 @@ TEST_P(Noise, NeverMakesAnotherFileThatLooksComplete) {
   }
 }
 
-INSTANTIATE_TEST_SUITE_P(Links,
-                         Noise,
-                         testing::Values(Link{"QuorinOnSerial", eInstanceSerial, eProtocolQuorin},
-                                         Link{"VelmarOnSerial", eInstanceSerial, eProtocolVelmar},
-                                         Link{"QuorinOnUsb", eInstanceUSB, eProtocolQuorin}),
-                         [](const auto& link) { return link.param.name; });
+INSTANTIATE_TEST_SUITE_P(Links, Noise, testing::ValuesIn(kLinks), [](const auto& link) {
+  return link.param.name;
+});
 
 }  // namespace
 }  // namespace torture

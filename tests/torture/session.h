@@ -25,6 +25,10 @@ struct Link {
   wchar_t* port() const;  // the name under which a search finds it
 };
 
+inline constexpr Link kLinks[] = {{"QuorinOnSerial", eInstanceSerial, eProtocolQuorin},
+                                  {"VelmarOnSerial", eInstanceSerial, eProtocolVelmar},
+                                  {"QuorinOnUsb", eInstanceUSB, eProtocolQuorin}};
+
 // The receiver at the other end, with the Win32 calls through which the library reaches it.
 class Bench {
  public:

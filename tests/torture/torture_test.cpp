@@ -17,10 +17,6 @@
 namespace torture {
 namespace {
 
-constexpr Link kLinks[] = {{"QuorinOnSerial", eInstanceSerial, eProtocolQuorin},
-                           {"VelmarOnSerial", eInstanceSerial, eProtocolVelmar},
-                           {"QuorinOnUsb", eInstanceUSB, eProtocolQuorin}};
-
 // A host's stream: what it allocates is not the library's.
 class HostStream : public MemoryStream {
  public:
