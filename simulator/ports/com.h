@@ -34,8 +34,8 @@ class ComPort {
 
   UniqueHandle port_;
   // After the port, so that they end first.
-  Transfer read_;
-  Transfer write_;
+  OverlappedTransfer read_;
+  OverlappedTransfer write_;
   uint32_t speed_ = 0;
   PortClock clock_;
 };

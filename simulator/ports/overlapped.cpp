@@ -29,28 +29,28 @@ void WaitForEvents(const std::vector<HANDLE>& events, std::optional<uint64_t> wa
 
 bool IsSet(HANDLE event) { return WaitForSingleObject(event, 0) == WAIT_OBJECT_0; }
 
-void Transfer::Cancel() {
+void OverlappedTransfer::Cancel() {
   if (on_its_way_) {
     CancelIoEx(file_, &overlapped_);
     Finish();
   }
 }
 
-bool Transfer::StartConnect() { return Started(ConnectNamedPipe(file_, Prepare())); }
+bool OverlappedTransfer::StartConnect() { return Started(ConnectNamedPipe(file_, Prepare())); }
 
-bool Transfer::StartRead(size_t count) {
+bool OverlappedTransfer::StartRead(size_t count) {
   bytes_.resize(count);
   return Started(
       ReadFile(file_, bytes_.data(), static_cast<DWORD>(bytes_.size()), nullptr, Prepare()));
 }
 
-bool Transfer::StartWrite(Bytes bytes) {
+bool OverlappedTransfer::StartWrite(Bytes bytes) {
   bytes_ = std::move(bytes);
   return Started(
       WriteFile(file_, bytes_.data(), static_cast<DWORD>(bytes_.size()), nullptr, Prepare()));
 }
 
-std::optional<size_t> Transfer::Finish() {
+std::optional<size_t> OverlappedTransfer::Finish() {
   DWORD length = 0;
   const BOOL done = GetOverlappedResult(file_, &overlapped_, &length, /*bWait=*/TRUE);
   on_its_way_ = false;
@@ -61,13 +61,13 @@ std::optional<size_t> Transfer::Finish() {
   return length;
 }
 
-OVERLAPPED* Transfer::Prepare() {
+OVERLAPPED* OverlappedTransfer::Prepare() {
   overlapped_ = {};
   overlapped_.hEvent = event_.get();
   return &overlapped_;
 }
 
-bool Transfer::Started(BOOL done) {
+bool OverlappedTransfer::Started(BOOL done) {
   const DWORD error = done ? ERROR_SUCCESS : GetLastError();
   if (error == ERROR_PIPE_CONNECTED) {
     // Nothing is pending, and nobody sets the event.

@@ -26,13 +26,13 @@ void WaitForEvents(const std::vector<HANDLE>& events, std::optional<uint64_t> wa
 bool IsSet(HANDLE event);
 
 // One transfer at a time on a handle. What it does may be pending for a while.
-class Transfer {
+class OverlappedTransfer {
  public:
   // `file` must outlive the object.
-  explicit Transfer(HANDLE file) : file_(file), event_(MakeEvent()) {}
-  Transfer(const Transfer&) = delete;
-  Transfer& operator=(const Transfer&) = delete;
-  ~Transfer() { Cancel(); }
+  explicit OverlappedTransfer(HANDLE file) : file_(file), event_(MakeEvent()) {}
+  OverlappedTransfer(const OverlappedTransfer&) = delete;
+  OverlappedTransfer& operator=(const OverlappedTransfer&) = delete;
+  ~OverlappedTransfer() { Cancel(); }
 
   bool on_its_way() const { return on_its_way_; }
   // Set when it has ended.

@@ -40,8 +40,8 @@ class PipeEnd {
 
   UniqueHandle pipe_;
   // After the pipe, so that they end first.
-  Transfer read_;
-  Transfer write_;
+  OverlappedTransfer read_;
+  OverlappedTransfer write_;
   bool connected_ = false;
   Bytes waiting_;
 };
