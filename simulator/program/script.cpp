@@ -78,7 +78,7 @@ std::vector<std::string> ScriptWords(std::string_view json, const CLI::App& comm
   ordered_json script;
   try {
     script = ordered_json::parse(json);
-  } catch (const ordered_json::parse_error& error) {
+  } catch (const ordered_json::exception& error) {  // a number that is too large is no parse_error
     throw std::invalid_argument(error.what());
   }
   if (!script.is_object()) {

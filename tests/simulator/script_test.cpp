@@ -80,6 +80,10 @@ TEST_F(ScriptTest, AMistakeIsReportedWithItsKey) {
   EXPECT_EQ(ErrorOf(R"({"bad-crc": [[1]]})"), "bad-crc: [1] is no text and no number");
 }
 
+TEST_F(ScriptTest, ANumberThatIsTooLargeIsReported) {
+  EXPECT_NE(ErrorOf(R"({"delay": 5e6666})").find("5e6666"), std::string::npos);
+}
+
 TEST_F(ScriptTest, WhatIsNoObjectIsRefused) {
   EXPECT_EQ(ErrorOf("[1]"), "it is no JSON object");
   EXPECT_NE(ErrorOf("{\"id\":").find("line 1, column 7"), std::string::npos) << ErrorOf("{\"id\":");
