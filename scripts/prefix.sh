@@ -36,6 +36,8 @@ mkdir -p "$root/build/ports"
 . "$root/tests/bed/ports.conf"
 for number in "$DEMO_PORT" $(seq "$FIRST_PORT" $((FIRST_PORT + PORT_SETS * PORTS_PER_SET - 1))); do
   ln -sfn "$root/build/ports/com$number" "$WINEPREFIX/dosdevices/com$number"
+  # Left by a run that was killed: its pseudo-terminal may be another program's by now.
+  rm -f "$root/build/ports/com$number"
 done
 
 mkdir -p "$root/build/bed"
