@@ -1,0 +1,98 @@
+// DllMain is called here as Windows calls it when the DLL is loaded and unloaded.
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <memory>
+#include <string>
+
+#include "api/exception_state.h"
+#include "api/registry.h"
+#include "platform/hresult.h"
+#include "platform/text.h"
+#include "tests/support/report_capture.h"
+#include "tests/support/stub_receiver.h"
+
+using rcvlink::Receivers;
+
+extern "C" BOOL WINAPI DllMain(HINSTANCE module, DWORD reason, void* process_ends);
+
+namespace {
+
+int freed_states = 0;
+
+}  // namespace
+
+// The state itself is that of the DLL's own C++ runtime, which a program does not have.
+void rcvlink::FreeExceptionState() { ++freed_states; }
+
+namespace {
+
+using testing::ElementsAre;
+using testing::IsEmpty;
+using testing::MatchesRegex;
+
+constexpr HRESULT kInvalid = static_cast<HRESULT>(0x80070057);
+
+// What Windows passes for a process that ends.
+void* ProcessEnds() {
+  static int any = 0;
+  return &any;
+}
+
+TEST(Module, LoadWritesThePathAndTheProductVersion) {
+  const ReportCapture report;
+  EXPECT_TRUE(DllMain(GetModuleHandleW(L"kernel32.dll"), DLL_PROCESS_ATTACH, nullptr));
+  EXPECT_THAT(report.Lines(),
+              ElementsAre(MatchesRegex(
+                  "Module is loaded \\[.*kernel32\\.dll\\] \\[\\d+\\.\\d+\\.\\d+\\.\\d+\\]")));
+}
+
+TEST(Module, LoadOfAModuleWithoutAVersionWritesNothing) {
+  const ReportCapture report;
+  EXPECT_TRUE(DllMain(GetModuleHandleW(nullptr), DLL_PROCESS_ATTACH, nullptr));
+  EXPECT_THAT(report.Lines(), IsEmpty());
+}
+
+TEST(Module, LoadOfAModuleWithoutAPathWritesNothing) {
+  const ReportCapture report;
+  const auto no_module = reinterpret_cast<HINSTANCE>(&freed_states);
+  EXPECT_TRUE(DllMain(no_module, DLL_PROCESS_ATTACH, nullptr));
+  EXPECT_THAT(report.Lines(), IsEmpty());
+}
+
+TEST(Module, UnloadClosesWhatTheHostLeftOpen) {
+  bool destroyed = false;
+  auto receiver = std::make_shared<StubReceiver>();
+  receiver->destroyed = &destroyed;
+  receiver->fill = [](CFileList&) {};
+  void* handle = nullptr;
+  ASSERT_EQ(Receivers().Insert(L"COM7", std::move(receiver), &handle), S_OK);
+  void* list = nullptr;
+  ASSERT_EQ(devapi::OpenFileList(handle, &list), S_OK);
+  const ReportCapture report;
+  EXPECT_TRUE(DllMain(nullptr, DLL_PROCESS_DETACH, nullptr));
+  EXPECT_THAT(report.Lines(), ElementsAre("Bye!"));
+  EXPECT_TRUE(destroyed);
+  EXPECT_EQ(devapi::CloseReceiver(handle), kInvalid);
+  EXPECT_EQ(devapi::CloseFileList(list), kInvalid);
+}
+
+// Another thread may have been stopped in the middle of an allocation.
+TEST(Module, UnloadFreesTheExceptionStateUnlessTheProcessEnds) {
+  freed_states = 0;
+  EXPECT_TRUE(DllMain(nullptr, DLL_PROCESS_DETACH, ProcessEnds()));
+  EXPECT_EQ(freed_states, 0);
+  EXPECT_TRUE(DllMain(nullptr, DLL_PROCESS_DETACH, nullptr));
+  EXPECT_EQ(freed_states, 1);
+}
+
+TEST(Module, ThreadsOfTheHostChangeNothing) {
+  const ReportCapture report;
+  freed_states = 0;
+  EXPECT_TRUE(DllMain(nullptr, DLL_THREAD_ATTACH, nullptr));
+  EXPECT_TRUE(DllMain(nullptr, DLL_THREAD_DETACH, nullptr));
+  EXPECT_THAT(report.Lines(), IsEmpty());
+  EXPECT_EQ(freed_states, 0);
+}
+
+}  // namespace
