@@ -39,7 +39,7 @@ MANY = (1, 8, 64)
 ABORTS = 50  # of each operation of each family
 ABORT_FILE, ABORT_BYTES = "LONG.DAT", 1024 * KIB  # takes a minute and a half
 ABORT_OPERATIONS = ("list", "check", "download")
-FIRST_PORT = 100  # of those that this makes; the tests have others
+FIRST_PORT = 140  # of those that this makes; the tests have others
 MODE = ("--speed", "115200", "--no-memory")
 
 # The programs of lrzsz for each protocol: the sender with its switches, the receiver with its.
