@@ -11,6 +11,7 @@
 #include "report/report_file.h"
 #include "velmar/block_crc32.h"
 
+using rcvlink::Clock;
 using rcvlink::CurrentClock;
 using rcvlink::kTimedOut;
 using rcvlink::Trace;
@@ -20,6 +21,9 @@ namespace {
 
 // Holds a whole reply. A longer one ends the exchange with what has come of it.
 constexpr uint32_t kBufferLength = 8192;
+// A receiver that sends byte by byte would never reach a time-out. At 300 bit/s the buffer is full
+// after 273 s.
+constexpr DWORD kLongestPieceMs = 300000;
 // Receivers need a moment after a reply before they take the next command.
 constexpr DWORD kPauseMs = 500;
 
@@ -92,6 +96,8 @@ class CVelmarCommand::Receiving {
 HRESULT CVelmarCommand::ReceiveReply(CIConnection* connection, HANDLE abort_event) {
   const bool keep_reply = (GetFlags() & kStreamed) == 0;
   Receiving receiving;
+  Clock& clock = CurrentClock();
+  DWORD piece_began_at = clock.Ticks();
   bool need_data = true;
   bool done = false;
   while (!done) {
@@ -118,10 +124,15 @@ HRESULT CVelmarCommand::ReceiveReply(CIConnection* connection, HANDLE abort_even
     }
     need_data = consumed == 0;
     receiving.Consume(consumed);
+    if (!need_data) piece_began_at = clock.Ticks();
     if (need_data && receiving.IsFull()) break;
+    if (!done && clock.Ticks() - piece_began_at > kLongestPieceMs) {
+      Trace(L"CVelmarCommand::Execute - the answer does not end\r\n");
+      break;
+    }
   }
   if (keep_reply) KeepReply(receiving.TakeKept());
-  CurrentClock().Pause(kPauseMs);
+  clock.Pause(kPauseMs);
   return S_OK;
 }
 

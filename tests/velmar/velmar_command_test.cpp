@@ -276,6 +276,29 @@ TEST_F(VelmarCommand, ABufferThatIsFullEndsIt) {
   EXPECT_GT(connection.AnswersLeft(), 80u);
 }
 
+// No read of a receiver that sends byte by byte times out.
+TEST_F(VelmarCommand, AnAnswerThatDoesNotEndEndsItAfter5Minutes) {
+  const std::string prompt = "\r\n<OK\r\n[" + std::string(100, 'C');
+  for (const char byte : prompt) {
+    connection.Give({S_OK, {byte}, [this] { clock.now += 20000; }});
+  }
+  CVelmarCommand command("x", 0);
+  EXPECT_EQ(command.Execute(&connection, nullptr), S_OK);
+  EXPECT_EQ(command.Response(), RESPONSE_INCOMPLETE);
+  EXPECT_TRUE(report.Has("CVelmarCommand::Execute - the answer does not end"));
+  EXPECT_GT(clock.now, 300000u);
+  EXPECT_LE(clock.now, 321000u);
+}
+
+TEST_F(VelmarCommand, AnAnswerThatEndsLateIsRead) {
+  connection.Give({S_OK, kOkPrompt.substr(0, 1), [this] { clock.now += 299000; }});
+  connection.Give({S_OK, kOkPrompt.substr(1), [this] { clock.now += 29000; }});
+  CVelmarCommand command("x", 0);
+  EXPECT_EQ(command.Execute(&connection, nullptr), S_OK);
+  EXPECT_EQ(command.Response(), RESPONSE_OK);
+  EXPECT_FALSE(report.Has("CVelmarCommand::Execute - the answer does not end"));
+}
+
 TEST_F(VelmarCommand, APromptOfMegabytesEndsItWithTheFirstBuffer) {
   connection.GiveRead("\r\n<OK\r\n[" + std::string(3 << 20, 'C'));
   CVelmarCommand command("x", 0);
@@ -431,6 +454,17 @@ TEST_F(VelmarCommand, AFullBufferThatIsConsumedGoesOn) {
   command.done_at = 3;
   EXPECT_EQ(command.Execute(&connection, nullptr), S_OK);
   EXPECT_EQ(command.seen.back(), "b");
+}
+
+// What was consumed has come; the next piece has the whole time again.
+TEST_F(VelmarCommand, ALongFileMayTakeLong) {
+  for (int i = 0; i < 10; ++i) {
+    connection.Give({S_OK, "abc", [this] { clock.now += 200000; }});
+  }
+  Eater command({3, 0, 3, 0, 3, 0, 3, 0, 3, 0, 3, 0, 3, 0, 3, 0, 3, 0, 3}, kStreamed);
+  command.done_at = 20;
+  EXPECT_EQ(command.Execute(&connection, nullptr), S_OK);
+  EXPECT_EQ(connection.AnswersLeft(), 0u);
 }
 
 // The parser's failure has priority over the other values that it set.
