@@ -132,6 +132,10 @@ std::optional<HRESULT> BlockDownload::AfterFailedRead(HRESULT failure) {
 // Discards what is left of the block and asks for it again. A NAK that cannot be sent ends the
 // transfer: the receiver would not know that it is to send.
 std::optional<HRESULT> BlockDownload::AskAgain() {
+  if (IsHopeless()) {
+    TraceText(L"no valid block has come for too long");
+    return kTimedOut;
+  }
   connection_->Flush();
   const HRESULT result = WriteControl(connection_, kNak);
   return FAILED(result) ? std::optional(result) : std::nullopt;
@@ -139,10 +143,6 @@ std::optional<HRESULT> BlockDownload::AskAgain() {
 
 std::optional<HRESULT> BlockDownload::AskAgain(const wchar_t* why) {
   TraceWhy(why);
-  if (IsHopeless()) {
-    TraceText(L"no valid block has come for too long");
-    return kTimedOut;
-  }
   return AskAgain();
 }
 

@@ -51,11 +51,12 @@ HRESULT UsbPolicy::ReadRest(Block&) { return read_result_; }
 
 // Reads pieces of at most one bulk packet, until the block is whole, a read fails or an abort came.
 // A receiver may send a packet that holds only a part of the block. A device that answers with no
-// bytes is as silent as one that does not answer.
+// bytes is as silent as one that does not answer, and one that sends byte by byte sends no block.
 HRESULT UsbPolicy::ReadWhole(Block& block) {
   constexpr DWORD kMaxPiece = 512;
   Clock& clock = CurrentClock();
-  DWORD last_byte_at = clock.Ticks();
+  const DWORD began_at = clock.Ticks();
+  DWORD last_byte_at = began_at;
   DWORD held = 0;
   while (held < kBlockLength && !abort_.IsSet()) {
     const DWORD piece = std::min<DWORD>(kBlockLength - held, kMaxPiece);
@@ -69,6 +70,7 @@ HRESULT UsbPolicy::ReadWhole(Block& block) {
       return kTimedOut;
     }
     held += std::min(count, piece);
+    if (held < kBlockLength && now - began_at > LongestWithoutBlockMs()) return kTimedOut;
   }
   return S_OK;
 }

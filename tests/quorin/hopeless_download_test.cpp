@@ -70,6 +70,15 @@ TEST_F(QuorinHopelessUsb, BlocksThatAreNeverValidEndItAfter2Minutes) {
   EXPECT_LE(clock.now, 123000U);
 }
 
+// No read of a device that sends byte by byte times out.
+TEST_F(QuorinHopelessUsb, ABlockThatComesByteByByteEndsItAfter2Minutes) {
+  GiveForEver("\x02", 29000);
+  EXPECT_EQ(Download(), kTimedOut);
+  EXPECT_THAT(report.Lines(), ElementsAre(TimeoutLine(), Line(kHopeless)));
+  EXPECT_GT(clock.now, 120000U);
+  EXPECT_LE(clock.now, 150000U);
+}
+
 // A block that is accepted begins the time anew.
 TEST_F(QuorinHopelessUsb, ABlockGivesItTheWholeTimeAgain) {
   const std::string wrong = BlockStream::Make(0x02, 7, "", 0);
