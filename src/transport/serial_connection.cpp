@@ -211,6 +211,7 @@ void CSerialConnection::WaitUntilSent() {
       last_queued = status.cbOutQue;
       last_progress = now;
     } else if (now - last_progress > kDrainLimitMs) {
+      Trace(L"CSerialConnection::Flush - output queue does not move [%s]\r\n", name_.get());
       return;
     }
   }

@@ -253,6 +253,7 @@ TEST_F(SerialConnection, FlushGivesUpWhenTheQueueDoesNotMove) {
   EXPECT_EQ(connection.Flush(), S_OK);
   EXPECT_EQ(device.calls.back(), "PurgeComm");
   EXPECT_GT(clock.now, 3000u);
+  EXPECT_TRUE(report.Has("CSerialConnection::Flush - output queue does not move [COM12]"));
 }
 
 TEST_F(SerialConnection, FlushWaitsWhileTheQueueMoves) {
