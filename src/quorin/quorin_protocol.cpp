@@ -15,6 +15,7 @@
 using rcvlink::CatchResult;
 using rcvlink::CopyBstr;
 using rcvlink::HResultError;
+using rcvlink::IsReportOpen;
 using rcvlink::IsSignalled;
 using rcvlink::kCommandFlags;
 using rcvlink::kNotConnected;
@@ -54,7 +55,7 @@ constexpr DWORD kVariantOfNewModels = 2;
 // Writes the reply of a command that failed to the report.
 void DumpInvalidResponse(CIConnection* connection, const CQuorinCommand& command) {
   const HRESULT result = command.Result();
-  if (SUCCEEDED(result)) return;
+  if (SUCCEEDED(result) || !IsReportOpen()) return;
   const std::string name = NarrowNameOf(connection);
   const uint8_t* const reply = command.GetReply();
   if (reply && command.GetReplyLength() != 0) {

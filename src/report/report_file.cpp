@@ -176,6 +176,8 @@ void CloseReportFile() { TheReport().Close(); }
 
 }  // namespace dump_hlp
 
+bool rcvlink::IsReportOpen() { return TheReport().IsOpen(); }
+
 namespace {
 
 // An operation does not fail because it cannot be traced: when there is no memory for a line, the
@@ -183,7 +185,7 @@ namespace {
 // only the look for one.
 template <typename Character>
 void WriteOrSkip(const Character* format, va_list arguments) noexcept {
-  if (!TheReport().IsOpen()) return;
+  if (!rcvlink::IsReportOpen()) return;
   try {
     dump_hlp::DumpReportString(format, arguments);
   } catch (const HResultError&) {

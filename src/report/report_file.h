@@ -17,6 +17,9 @@ namespace rcvlink {
 void Trace(const wchar_t* format, ...) noexcept;
 void Trace(const char* format, ...) noexcept;
 
+// Whether entries are written, for callers whose texts take more than a format.
+bool IsReportOpen();
+
 // Creates the report's object, and with it its lock. Called at load, before there can be a second
 // thread that needs the lock.
 void PrepareReport();

@@ -15,6 +15,7 @@ using rcvlink::CatchResult;
 using rcvlink::CopyBstr;
 using rcvlink::CurrentClock;
 using rcvlink::HResultError;
+using rcvlink::IsReportOpen;
 using rcvlink::IsSignalled;
 using rcvlink::kNotConnected;
 using rcvlink::MutexGuard;
@@ -47,9 +48,10 @@ constexpr DWORD kVariant = 2;
 // Writes the kept reply of a command that failed to the report.
 void DumpInvalidResponse(HRESULT result, CIConnection* connection, const CVelmarCommand& command) {
   if (SUCCEEDED(result)) return;
-  const std::string name = connection ? NarrowNameOf(connection) : std::string();
   const uint8_t* const reply = command.GetReply();
   if (!reply && command.GetReplyLength() != 0) throw HResultError(E_INVALIDARG);
+  if (!IsReportOpen()) return;
+  const std::string name = connection ? NarrowNameOf(connection) : std::string();
   const std::string text(reply, reply + command.GetReplyLength());
   Trace("CVelmarProtocol::DumpInvalidResponse - [0x%08X] [%s] [%s]\r\n",
         result,
