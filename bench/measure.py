@@ -6,6 +6,7 @@ Each part keeps its figures in build/bench/PART.json, and the page is written fr
 
 import contextlib
 import hashlib
+import itertools
 import json
 import os
 import random
@@ -30,13 +31,19 @@ LINE_FILE = "LINE.DAT"
 LINE_BYTES = 128 * KIB
 DELAYS_MS = (0, 1, 5, 16)
 REPEATS = 3
-# Of a file of fewer than 4 bytes the library does not see the end of a Velmar receiver's log.
-GET_FILES = {"TINY.DAT": 4, "SMALL.DAT": 200 * KIB, "LARGE.DAT": 1024 * KIB}
+FAMILIES = ("quorin", "velmar")
+# Of a Velmar file of fewer than 4 bytes the library does not see the end.
+GET_FILES = (
+    ("ONE.DAT", 1, ("quorin",)),
+    ("FOUR.DAT", 4, ("velmar",)),
+    ("SMALL.DAT", 200 * KIB, FAMILIES),
+    ("LARGE.DAT", 1024 * KIB, FAMILIES),
+)
 CALL_FILES = {"SMALL.DAT": 100 * KIB, "LARGE.DAT": 200 * KIB}
 # So large that the time of the processor, which is counted in steps of 10 ms, is that of many steps.
 MANY_FILE, MANY_BYTES = "MANY.DAT", 512 * KIB
 MANY = (1, 8, 64)
-ABORTS = 50  # of each operation of each family
+ABORTS = 200  # of each operation of each family
 ABORT_FILE, ABORT_BYTES = "LONG.DAT", 1024 * KIB  # takes a minute and a half
 ABORT_OPERATIONS = ("list", "check", "download")
 FIRST_PORT = 140  # of those that this makes; the tests have others
@@ -48,7 +55,6 @@ SENDERS = {
     "YMODEM": (["sb", "-k", "-q"], ["rb", "-q"]),
     "ZMODEM": (["sz", "-q"], ["rz", "-q"]),
 }
-FAMILIES = ("quorin", "velmar")
 
 
 def make_file(path, size):
@@ -165,19 +171,16 @@ def again(carry, *arguments):
         return carry(*arguments)
 
 
-def carry_rcvlink(family, delay_ms, source, lane):
-    """Downloads the file with rcvlink-cli over the relay."""
+def run_program(family, delay_ms, files, lane, command, *arguments):
+    """Runs a command of rcvlink-cli over the relay."""
     number = FIRST_PORT + lane
-    place = folder(f"lane{lane}", {})
-    device, name = os.path.join(place, "device"), os.path.basename(source)
-    with simulator(family, os.path.dirname(source), device, speed=115200):
+    device = os.path.join(folder(f"lane{lane}", {}), "device")
+    with simulator(family, files, device, speed=115200):
         relay = Relay(delay_ms, port_link(number), "open", device)
         try:
-            copy = os.path.join(place, name)
             start = time.monotonic()
             status = subprocess.run(
-                ["wine", os.path.join(WINDOWS, "rcvlink-cli.exe"), "get", f"COM{number}", name, *MODE]
-                + ["-o", os.path.relpath(copy, ROOT)],
+                ["wine", os.path.join(WINDOWS, "rcvlink-cli.exe"), command, f"COM{number}", *arguments, *MODE],
                 cwd=ROOT,
                 env=host_environment(),
                 stdin=subprocess.DEVNULL,
@@ -189,9 +192,21 @@ def carry_rcvlink(family, delay_ms, source, lane):
             seconds = time.monotonic() - start
         finally:
             figures = relay.end()
-    if status != 0 or digest(copy, -1) != digest(source, -1):
-        raise RuntimeError(f"{family} failed: {status}")
+    if status != 0:
+        raise RuntimeError(f"{command}: {family} failed: {status}")
     return figures | {"total_s": seconds}
+
+
+def carry_rcvlink(family, delay_ms, source, lane):
+    """Downloads the file with rcvlink-cli over the relay."""
+    name = os.path.basename(source)
+    copy = os.path.join(WORK, f"lane{lane}", name)
+    figures = run_program(
+        family, delay_ms, os.path.dirname(source), lane, "get", name, "-o", os.path.relpath(copy, ROOT)
+    )
+    if digest(copy, -1) != digest(source, -1):
+        raise RuntimeError(f"{family}: {name} is not the same")
+    return figures
 
 
 def at_once(jobs):
@@ -246,18 +261,19 @@ def measure_line():
 
 
 def measure_get():
-    files = folder("get", GET_FILES)
+    files = folder("get", {name: size for name, size, _ in GET_FILES})
+    rows = [("find", 0, FAMILIES, lambda family, lane: run_program(family, 0, files, lane, "find"))]
+    for name, size, families in GET_FILES:
+        rows.append((name, size, families, lambda family, lane, source=os.path.join(files, name): carry_rcvlink(
+            family, 0, source, lane)))
     table = []
-    for name, size in GET_FILES.items():
-        repeats = REPEATS if size < GET_FILES["SMALL.DAT"] else 1
-        runs = {family: [] for family in FAMILIES}
+    for name, size, families, measure in rows:
+        repeats = REPEATS if size < 200 * KIB else 1
+        runs = {family: [] for family in families}
         for repeat in range(repeats):
             print(f"get: {name}, turn {repeat + 1} of {repeats} ...", flush=True)
-            jobs = [
-                lambda f=family, lane=lane: carry_rcvlink(f, 0, os.path.join(files, name), lane)
-                for lane, family in enumerate(FAMILIES)
-            ]
-            for family, figures in zip(FAMILIES, at_once(jobs)):
+            jobs = [lambda f=family, lane=lane: measure(f, lane) for lane, family in enumerate(families)]
+            for family, figures in zip(families, at_once(jobs)):
                 runs[family].append(figures)
         for family, figures in runs.items():
             middle = sorted(figures, key=lambda run: run["total_s"])[len(figures) // 2]
@@ -325,8 +341,9 @@ def measure_many():
                 ports = [f"COM{number}" for number in numbers]
                 runs[count].append(run_windows("bench-host.exe", "many", path, *ports))
     table = [sorted(figures, key=lambda run: run["processor_s"])[len(figures) // 2] for figures in runs.values()]
-    if any(row["failures"] or row["bytes"] != row["receivers"] * MANY_BYTES for row in table):
-        raise RuntimeError(f"downloads failed: {table}")
+    for run in itertools.chain.from_iterable(runs.values()):
+        if run["failures"] or run["bytes"] != run["receivers"] * MANY_BYTES:
+            raise RuntimeError(f"downloads failed: {run}")
     return {"table": table}
 
 

@@ -3,6 +3,8 @@
 import math
 
 LIMIT = 11520  # bytes a second at 115200 bit/s, 10 bits a byte
+# The share of the file in the bytes on the line: a block of 512 in 518, and a chunk of 1024 in a log of 1064.
+LAYOUTS = {"quorin": 512 / 518, "velmar": 1024 / 1064}
 NAMES = {"quorin": "Quorin", "velmar": "Velmar"}
 
 
@@ -24,6 +26,12 @@ def line_table(figures):
     return table(["Protocol", *(f"{delay} ms" for delay in delays)], rows)
 
 
+def line_share(figures, protocol):
+    """What of its layout's limit the protocol has without a delay."""
+    rates = figures["line"]["rates"][protocol]
+    return rates[next(iter(rates))] / LIMIT / LAYOUTS[protocol]
+
+
 def get_table(figures):
     rows = []
     for row in figures["table"]:
@@ -31,7 +39,7 @@ def get_table(figures):
         rest = row["used_s"] - row["silent_s"] - carried
         rows.append(
             [
-                f"{NAMES[row['family']]}, {number(row['size'])}",
+                f"{NAMES[row['family']]}, {number(row['size']) if row['size'] else '`find`'}",
                 f"{row['total_s']:.2f}",
                 f"{carried:.2f}",
                 f"{row['silent_s']:.2f} ({row['silences']})",
@@ -75,7 +83,7 @@ def memory_table(figures):
         ["bytes of these, all together", *(figures[f"{f}_entry_bytes"] for f in NAMES)],
         ["allocations for each block or chunk", *(f"{figures[f'{f}_piece_allocations']:.2f}" for f in NAMES)],
         ["bytes that a found receiver holds", *(number(figures[f"{f}_receiver_bytes"]) for f in NAMES)],
-        ["most bytes that a download holds besides", *(number(figures[f"{f}_download_bytes"]) for f in NAMES)],
+        ["most bytes that a download holds in addition", *(number(figures[f"{f}_download_bytes"]) for f in NAMES)],
         ["pauses in a search at the right speed, ms", *(figures[f"{f}_search_pauses_ms"] for f in NAMES)],
         ["pauses in a file list, ms", *(figures[f"{f}_list_pauses_ms"] for f in NAMES)],
         ["pauses in a download that raises the speed, ms", *(figures[f"{f}_download_pauses_ms"] for f in NAMES)],
@@ -148,7 +156,7 @@ def text(figures, processor):
 run fails because it was slow.
 
 - The machine has {cores}{speed}, and builds of other programs ran on it at the same time. So absolute times are
-  noisy, and ratios are what counts: their sides were measured in turns or side by side in one run. Each figure is
+  noisy, and ratios are what counts: both sides were measured in turns or side by side in one run. Each figure is
   the median of all turns, unless it says something else.
 - The library and its programs ran under Wine 8 on Linux, not on Windows, and lrzsz as a program of Linux. So the
   time that a block of Quorin takes beyond the line's has Wine's in it, and lrzsz has no such part.
@@ -168,17 +176,18 @@ A transfer of lrzsz that failed was repeated once.
 {line_table(figures['line'])}
 
 Quorin sends a block of 512 bytes and waits for the answer, so a late answer costs it twice as much as XMODEM-1K and
-YMODEM with blocks of 1024. Of 518 bytes on the line 512 are the file's, so 98.8 % is the most that it can have.
-ZMODEM and Velmar do not wait for answers. The library asks for blocks of 512 bytes, the only ones
-that it takes.
+YMODEM with blocks of 1024. The library asks for blocks of 512 bytes, the only ones that it takes. Of 518 bytes on the
+line 512 are the file's, so {LAYOUTS['quorin']:.1%} is the most that it can have, and it has
+{line_share(figures, 'quorin'):.1%} of that without a delay. ZMODEM and Velmar do not wait for answers. Of 1064 bytes of a
+Velmar log 1024 are the file's, at most {LAYOUTS['velmar']:.1%}; it has {line_share(figures, 'velmar'):.1%} of that.
 
 ## Whole downloads
 
 `bench/run get`
 
 `rcvlink-cli get PORT NAME --speed 115200 --no-memory` on that line without a delay, once for each of the
-larger files. A silence is a time of 0.4 s or more in which neither side sends, with their number in brackets. "The line
-carries" is the time of the bytes alone, "program" what is before the first byte and after the last one: the start of
+larger files, and `rcvlink-cli find`. A silence is a time of 0.4 s or more in which neither side sends, with their number
+in brackets. "The line carries" is the time of the bytes alone, "program" what is before the first byte and after the last one: the start of
 Wine's process and its end.
 
 {get_table(figures['get'])}
@@ -189,8 +198,8 @@ receiver costs 1 s: two of the search, one of the list, three before the first b
 each reply, since its receivers need a moment before they take the next command, and the silences of its search, which
 asks for a Quorin receiver first. The end of a Velmar file waits in the same way, and counts as "program" here. The
 blocks of Quorin have a known length, and no such wait; "other exchange" is what passes between them. Before a download,
-`get` asks for the list of files. Nothing smaller than 4 bytes is here: the library waits for more of a Velmar file
-of fewer, until it is aborted.
+`get` asks for the list of files. The smallest Velmar file here has 4 bytes: fewer do not arrive
+([known behaviour](known-behaviour.md)).
 
 ## What the library costs
 
@@ -204,14 +213,16 @@ allocations.
 
 {registry_table(library)}
 
-Names are compared one by one by Windows' own function, which is what hosts' names need; a host opens a receiver by
-name once, and every call finds it by its handle.
+Every call finds its receiver by its handle, in a hash table. Names are compared one by one by Windows' own function,
+which knows that "com7" is COM7, so the time grows with their number; a host opens a receiver by name once.
 
 {memory_table(library)}
 
 The receivers are in memory, and allocations are those of C++'s `new`. The most bytes of a Quorin
-download are those of a command before it: each has a buffer of 64 KiB for its reply. A Velmar command has 8 KiB more on its stack. The
-pauses are those that the library makes by its clock, without the ends of reads.
+download are those of a command before it: each has a buffer of 64 KiB for its reply. A Velmar command has 8 KiB more
+on its stack. A port keeps a buffer of its largest read, which is not in the table: up to 64 KiB after a search for a Quorin
+receiver. An entry of a Velmar directory costs more than a Quorin one, since its fields are texts that are taken apart one by one.
+The pauses are those that the library makes by its clock, without the ends of reads.
 
 ## Win32 calls for each 512 bytes
 
@@ -224,22 +235,24 @@ not takes a `GetLastError`, a `WaitForMultipleObjects` and a `GetOverlappedResul
 {calls_table(figures['calls'])}
 
 A block takes two reads and a write. Each needs its `ReadFile` or `WriteFile`, and each read that is not over at once
-`GetLastError`, a wait and the result. Of the rest, the `ResetEvent` is a rule of connections: each transfer begins with
-its event cleared. A block takes no lock and no allocation. Velmar reads up to 8 KiB at once.
+`GetLastError`, a wait and the result: nine with one read for a block. The second read is that of the header, which says
+whether the rest is worth waiting for; and each transfer first clears its event (`ResetEvent`). A block takes no
+allocation, and a lock only when the percent changes. Velmar reads up to 8 KiB at once.
 
 ## From an abort to the return
 
 `bench/run aborts`
 
 The time from `Abort` on one thread to the return of the operation on another, at random moments of its first three
-seconds. The receivers are at 115200 bit/s, so a download raises nothing, and their lines are paced. All six rows ran
-at the same time. Of so few aborts the 99th percentile is the longest time.
+seconds. The receivers are at 115200 bit/s, so a download does not raise the speed, and their lines are paced. All six rows ran
+at the same time. The goal is 50 ms for the median and 250 ms for the 99th percentile.
 
 {aborts_table(figures['aborts'])}
 
-An abort ends the wait of an operation, and so each operation of a Quorin receiver. Half a second of pause follows each
-answer of a Velmar receiver, and an abort does not end it. After an abort in the middle of a Velmar file the
-receiver is told to stop: half a second for a late answer, a second until the answer has ended, and the pause.
+An abort ends the wait of an operation, and so each operation of a Quorin receiver. A Velmar receiver misses the second
+goal: half a second of pause follows each of its answers, and an abort does not end it. After an abort in the middle of a Velmar file the
+receiver is told to stop, so that the next operation finds it silent: half a second for a late answer, a second until the
+answer has ended, and the pause.
 
 ## Many receivers at once
 
@@ -250,7 +263,8 @@ bytes from it. The speed is raised for the transfer and set back, and the silenc
 time; the lines are not paced. Processor time is that of the host's process alone,
 without Wine's server and the receivers. The working set is what a search of all receivers added to it, for each
 receiver; what is loaded once is in it, so it falls with their number. The ratio is that of the processor times of a
-MiB, to one receiver's.
+MiB, to one receiver's. Nearly all of it is Wine's: the library's own share of a MiB is that of {1024 * 1024 // 512} blocks,
+{library['block_ns'] * 2048 / 1e6:.1f} ms.
 
 All receivers are then downloaded from once more while four threads open and close them by name: the bytes are those of
 the file, and each receiver has one user left, or the part fails.
