@@ -92,10 +92,7 @@ def results_of(entry, has_passed):
 
 def hash_of_dll():
     """The released DLL is this file (check_release.py)."""
-    path = os.path.join(BUILD, "release", "bin", "rcvlink.dll")
-    if not os.path.exists(path):
-        return "none: it was not built"
-    with open(path, "rb") as file:
+    with open(os.path.join(BUILD, "release", "bin", "rcvlink.dll"), "rb") as file:
         return hashlib.sha256(file.read()).hexdigest()
 
 
@@ -129,7 +126,8 @@ def main(arguments):
     skipped = sum(counts[2] for counts in totals.values())
     for failure in failed:
         print(f"FAILED {failure}")
-    print(f"rcvlink.dll that was tested: SHA-256 {hash_of_dll()}")
+    if "host_tests" in totals:  # they load it
+        print(f"rcvlink.dll that was tested: SHA-256 {hash_of_dll()}")
     print(f"after {time.monotonic() - start:.0f} s")
     print(in_words(passed, failed, skipped), flush=True)
     return 0 if passed > 0 and not failed else 1
