@@ -276,7 +276,8 @@ the file, and each receiver has one user left, or the part fails.
 `bench/run size`
 
 The bytes of the DLL, by the linker's map of a second link with the same objects. A layer's row is its code; its
-constants, such as the texts of the report and the tables of checksums, are one row of all.
+constants, such as the texts of the report and the tables of checksums, are one row of all. Sections that nothing
+uses are left out; identical functions are not folded, which GNU's linker cannot do for Windows.
 
 {size_table(size)}
 
