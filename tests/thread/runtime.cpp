@@ -31,7 +31,9 @@ std::basic_string<Character> Print(const Character* format, const char* argument
     }
     format = letter;
     const char conversion = static_cast<char>(*letter);
-    if (conversion == 's') {
+    if (conversion == '%') {
+      text += '%';
+    } else if (conversion == 's') {
       const Character* value = nullptr;
       take(value);
       static constexpr Character kNull[] = {'(', 'n', 'u', 'l', 'l', ')', 0};
