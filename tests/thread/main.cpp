@@ -1,6 +1,11 @@
+// Runs the tests. The first report of ThreadSanitizer ends the program.
 #include "tests/support/allocations.h"
 
-// Nothing counts allocations here.
+extern "C" const char* __tsan_default_options() {
+  return "halt_on_error=1:second_deadlock_stack=1:history_size=7";
+}
+
+// Nothing is counted here.
 UncountedAllocations::UncountedAllocations() = default;
 UncountedAllocations::~UncountedAllocations() = default;
 
