@@ -1,4 +1,4 @@
-// Included before every source that is compiled for Linux on Wine's functions. The headers of the C++
+// Included before every source that is compiled for Linux with Wine's headers. The headers of the C++
 // library and of GoogleTest come first: they are to see Linux, all that follows sees Windows.
 #ifndef RCVLINK_TESTS_NATIVE_PREFIX_H_
 #define RCVLINK_TESTS_NATIVE_PREFIX_H_
