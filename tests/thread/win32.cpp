@@ -136,11 +136,11 @@ LSTATUS WINAPI RegOpenKeyExW(HKEY, const wchar_t*, DWORD, REGSAM, HKEY*) {
 
 // --- What is linked, but no test reaches
 
-#define NOT_REACHED(name)                           \
-  void NotReached_##name() asm(#name);              \
-  void NotReached_##name() {                        \
-    std::printf("not made for Linux: " #name "\n"); \
-    std::abort();                                   \
+#define NOT_REACHED(name)                      \
+  void NotReached_##name() asm(#name);         \
+  void NotReached_##name() {                   \
+    std::printf("not made here: " #name "\n"); \
+    std::abort();                              \
   }
 
 NOT_REACHED(CancelIo)
