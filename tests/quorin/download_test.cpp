@@ -162,6 +162,19 @@ TEST_F(QuorinDownload, SlowsTheReceiverDownThoughAnAbortCutsTheFirstTryOff) {
   ExpectSaid({kSpeedUp, question, question, {"set,/par/dev/ser/b/rate,9600\r\n"}});
 }
 
+// A host that aborts again and again wants no third question.
+TEST_F(QuorinDownload, GivesUpToSlowTheReceiverDownAfterTwoAborts) {
+  connection->set_speed_result = E_HANDLE;
+  int asked = 0;
+  receiver.On(kGetPort, [&](const std::string& tag) {
+    if (++asked >= 2) driver.Abort();
+    connection->GiveRead(Message("RE", tag + "/dev/ser/b"));
+  });
+  EXPECT_EQ(Download(), S_FALSE);
+  const std::vector<std::string> question = {"%%print,/cur/term\r\n"};
+  ExpectSaid({kSpeedUp, question, question});
+}
+
 TEST_F(QuorinDownload, TakesAHostThatHadNothingToChange) {
   connection->set_speed_result = S_FALSE;
   EXPECT_EQ(Download(), S_OK);
