@@ -123,8 +123,7 @@ class Bench::Port : public SimulatedComPort {
 
   DWORD WaitForMultipleObjects(DWORD count, const HANDLE* handles, DWORD timeout_ms) override {
     if (before_wait) before_wait();
-    const bool is_other = pending_.block && handles[count - 1] == pending_.block->hEvent;
-    if (is_other) return WAIT_OBJECT_0 + count - 1;
+    if (pending_.block && handles[count - 1] == pending_.event) return WAIT_OBJECT_0 + count - 1;
     return SimulatedComPort::WaitForMultipleObjects(count, handles, timeout_ms);
   }
 
@@ -156,12 +155,17 @@ class Bench::Port : public SimulatedComPort {
     return TRUE;
   }
 
+  BOOL CancelIo(HANDLE device) override {
+    pending_ = {};
+    return SimulatedComPort::CancelIo(device);
+  }
+
  private:
   // Of a write or request of so many bytes.
   BOOL End(DWORD bytes, DWORD* count, OVERLAPPED* block) {
     *count = is_pending ? 0 : bytes;
     if (!is_pending) return TRUE;
-    pending_ = {block, bytes};
+    pending_ = {block, block->hEvent, bytes};
     SetLastError(ERROR_IO_PENDING);
     return FALSE;
   }
@@ -169,6 +173,7 @@ class Bench::Port : public SimulatedComPort {
   // The one that is pending.
   struct Pending {
     OVERLAPPED* block = nullptr;
+    HANDLE event = nullptr;
     DWORD bytes = 0;
   };
   Pending pending_;
