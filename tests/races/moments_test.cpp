@@ -118,6 +118,7 @@ class Progress {
 struct Plan {
   uint64_t round = 0;
   Operation operation{};
+  size_t places = 0;  // of the operation, when nobody disturbs it
   Meeting meeting{};
   std::vector<Moments> threads;
   bool reports = false;
@@ -137,6 +138,18 @@ struct Plan {
   }
   bool HasEnd() const {
     return Count([](const Moment& moment) { return Ends(moment.act); }) != 0;
+  }
+  // The place of an abort that nothing else can end the operation before, while it stands there. At
+  // the last place it may come too late.
+  std::optional<size_t> AbortedAt() const {
+    const auto ends = [](const Moment& moment) { return Ends(moment.act); };
+    if (meeting != Meeting::kWaitedFor || Count(ends) != 1) return std::nullopt;
+    for (const Moments& moments : threads) {
+      const auto end = std::ranges::find_if(moments, ends);
+      if (end == moments.end()) continue;
+      if (end->act == Act::kAbort && end->place + 1 < places) return end->place;
+    }
+    return std::nullopt;
   }
   std::string InWords(const Link& link) const {
     std::string text = "seed " + std::to_string(Seed()) + ", round " + std::to_string(round) +
@@ -195,6 +208,7 @@ class Round {
    public:
     explicit Stream(Round& round) : round_(round) {}
     HRESULT STDMETHODCALLTYPE Write(const void* data, ULONG size, ULONG* written) override {
+      if (round_.was_aborted_) ++round_.writes_after_abort_;
       round_.Pass();
       return MemoryStream::Write(data, size, written);
     }
@@ -225,6 +239,7 @@ class Round {
             !progress_.WaitForMoments(plan_.MomentsTo(place))) {
           Hang("the others did not end");
         }
+        was_aborted_ = was_aborted_ || plan_.AbortedAt() == place;
       }
     }
     is_at_place_ = false;
@@ -381,6 +396,7 @@ class Round {
   void Check() {
     EXPECT_FALSE(met_in_port_) << "two threads in the port";
     CheckResults();
+    CheckAbort();
     CheckUsers();
     EXPECT_TRUE(receiver_.expired()) << "the receiver stays";
     EXPECT_EQ(devapi::Abort(handle_), E_INVALIDARG);
@@ -415,6 +431,35 @@ class Round {
     } else if (!plan_.HasEnd()) {
       EXPECT_EQ(result_, S_OK);
       EXPECT_TRUE(is_complete_);
+    }
+  }
+
+  // The operation stood still while the abort came, so the abort has to end it.
+  void CheckAbort() {
+    const auto aborted_at = plan_.AbortedAt();
+    if (!aborted_at) return;
+    // It may come when the answer to the last command is there.
+    constexpr size_t kPlacesOfAnAnswer = 5;
+    const bool is_late = places_ <= *aborted_at + kPlacesOfAnAnswer;
+    switch (plan_.operation) {
+      case Operation::kLock:
+        return;
+      case Operation::kCheck:
+        EXPECT_TRUE(!is_complete_ || is_late) << "it was aborted";
+        return;
+      case Operation::kPort:
+        EXPECT_TRUE(result_ == S_FALSE || is_late) << "it was aborted";
+        return;
+      case Operation::kDownload:
+        // Bytes that have come already are written.
+        EXPECT_LE(writes_after_abort_, 1);
+        // That of a Velmar receiver may give S_OK after whatever ended it.
+        if (link_.family == eProtocolQuorin) {
+          EXPECT_EQ(result_, S_FALSE);
+        }
+        return;
+      default:
+        EXPECT_EQ(result_, S_FALSE) << "it was aborted";
     }
   }
 
@@ -484,6 +529,8 @@ class Round {
   std::atomic<bool> may_be_abandoned_ = false;  // the lock
   bool is_operating_ = false;                   // of the operation's thread, as the next
   size_t places_ = 0;
+  bool was_aborted_ = false;
+  int writes_after_abort_ = 0;
   int users_ = 0;
   std::vector<long> allowed_ = {S_OK, S_FALSE, E_INVALIDARG};  // results of the operation
   long result_ = 0;
@@ -512,6 +559,7 @@ class Races : public testing::TestWithParam<Link> {
     plan.round = round;
     const size_t operation = below(kOperations.size());
     plan.operation = static_cast<Operation>(operation);
+    plan.places = places.at(operation);
     plan.meeting = static_cast<Meeting>(below(kMeetings.size()));
     plan.reports = round % kReportEvery == 0;
     constexpr size_t kMostThreads = 2;
