@@ -32,7 +32,8 @@ using torture::Link;
 namespace races {
 namespace {
 
-constexpr size_t kMoments = 3334;  // for each link: ten thousand together
+// Moments that meet each operation while it runs, on all links together: ten thousand of all.
+constexpr size_t kMetOfEach = 1112;
 constexpr uint64_t kFirstRounds = 50;
 constexpr uint64_t kReportEvery = 8;  // a round has a report
 constexpr DWORD kHungMs = 60'000;
@@ -47,9 +48,12 @@ constexpr std::array<const char*, 6> kActs = {
     "Abort", "Close", "Destroy", "Unlock", "Info", "Open"};
 
 // How the other threads meet the operation: at each of their places it stands still until they have
-// acted, or it goes on while they act, or they act after a random time without looking at it.
+// acted, or it goes on while they act, or they act after random times from its beginning.
 enum class Meeting { kWaitedFor, kReleased, kFree };
 constexpr std::array<const char*, 3> kMeetings = {"waited for", "released", "free"};
+// One is drawn as often as it is here.
+constexpr std::array kDrawnMeetings = {
+    Meeting::kWaitedFor, Meeting::kWaitedFor, Meeting::kReleased, Meeting::kFree};
 
 struct Moment {
   Act act{};
@@ -57,6 +61,9 @@ struct Moment {
   unsigned pause = 0;  // when it is free, in turns of a loop
 };
 using Moments = std::vector<Moment>;
+
+constexpr std::array kEnds = {Act::kAbort, Act::kClose, Act::kDestroy};
+constexpr std::array kHarmless = {Act::kUnlock, Act::kInfo, Act::kOpen};
 
 bool Ends(Act act) { return act == Act::kAbort || act == Act::kClose || act == Act::kDestroy; }
 
@@ -184,7 +191,9 @@ class Round {
       Other& other = *others_.back();
       other.thread = std::thread([this, &other, &moments] { RunOther(other, moments); });
     }
+    while (ready_ < others_.size()) SwitchToThread();
     is_operating_ = true;
+    has_begun_ = true;
     Operate();
     is_operating_ = false;
     over_.Set();
@@ -193,6 +202,9 @@ class Round {
     Check();
     return places_;
   }
+
+  // The acts that came while the operation ran.
+  size_t met() const { return met_; }
 
  private:
   struct Result {
@@ -325,13 +337,16 @@ class Round {
 
   void RunOther(Other& other, const Moments& moments) {
     bool may_hold = false;
+    ++ready_;
     for (const auto& [act, place, pause] : moments) {
       if (plan_.meeting == Meeting::kFree) {
+        while (!has_begun_) continue;
         // Not a wait: a thread that yields on a busy machine comes back late.
         for (std::atomic<unsigned> n = 0; n < pause;) ++n;
       } else if (!progress_.WaitForPlace(place + 1)) {
         Hang("the operation did not come to its place");
       }
+      if (is_operating_) ++met_;
       const long result = Execute(act);
       if (act == Act::kInfo && result != S_OK) {
         // It may hold the lock, and cannot release that of a receiver that was closed.
@@ -527,8 +542,11 @@ class Round {
   std::atomic<bool> is_at_place_ = false;
   std::atomic<bool> met_in_port_ = false;
   std::atomic<bool> may_be_abandoned_ = false;  // the lock
-  bool is_operating_ = false;                   // of the operation's thread, as the next
-  size_t places_ = 0;
+  std::atomic<size_t> ready_ = 0;               // threads
+  std::atomic<bool> has_begun_ = false;
+  std::atomic<bool> is_operating_ = false;
+  std::atomic<size_t> met_ = 0;
+  size_t places_ = 0;  // of the operation's thread, as the next
   bool was_aborted_ = false;
   int writes_after_abort_ = 0;
   int users_ = 0;
@@ -538,63 +556,130 @@ class Round {
   Stream stream_{*this};
 };
 
+using Counts = std::array<size_t, kOperations.size()>;
+
 class Races : public testing::TestWithParam<Link> {
  protected:
-  // The places of each operation, when nobody disturbs it.
-  static std::array<size_t, kOperations.size()> CountPlaces() {
-    std::array<size_t, kOperations.size()> places{};
+  // The places of each operation, when nobody disturbs it. One has none: a Quorin receiver does not
+  // rename, and the library says so at once.
+  static Counts CountPlaces() {
+    Counts places{};
     for (size_t i = 0; i < places.size(); ++i) {
       Plan alone;
       alone.operation = static_cast<Operation>(i);
-      places.at(i) = std::max<size_t>(1, Round(GetParam(), alone).Run());
+      places.at(i) = Round(GetParam(), alone).Run();
     }
     return places;
   }
 
-  static Plan Draw(uint64_t round, const std::array<size_t, kOperations.size()>& places) {
+  // The moments that are to meet each operation on this link.
+  static Counts Wanted(const Counts& places) {
+    Counts wanted{};
+    for (size_t i = 0; i < wanted.size(); ++i) {
+      const bool is_rename = static_cast<Operation>(i) == Operation::kRename;
+      const size_t links = is_rename ? 1 : std::size(torture::kLinks);
+      if (places.at(i) != 0) wanted.at(i) = (kMetOfEach + links - 1) / links * Times();
+    }
+    return wanted;
+  }
+
+  static Plan Draw(uint64_t round, const Counts& places) {
     std::seed_seq seeds{Seed(), round};
     std::mt19937 random(seeds);
     const auto below = [&random](size_t end) { return static_cast<size_t>(random() % end); };
     Plan plan;
     plan.round = round;
-    const size_t operation = below(kOperations.size());
-    plan.operation = static_cast<Operation>(operation);
-    plan.places = places.at(operation);
-    plan.meeting = static_cast<Meeting>(below(kMeetings.size()));
-    plan.reports = round % kReportEvery == 0;
+    plan.operation = static_cast<Operation>(round % places.size());
+    plan.places = places.at(round % places.size());
+    if (plan.places == 0) return plan;
+    plan.meeting = kDrawnMeetings.at(below(kDrawnMeetings.size()));
+    plan.reports = below(kReportEvery) == 0;
     constexpr size_t kMostThreads = 2;
-    constexpr size_t kMostMoments = 6;
+    constexpr size_t kMostMoments = 16;
+    constexpr size_t kMostEnds = 2;
+    constexpr size_t kLater = 3;              // places
     constexpr size_t kLongestPause = 20'000;  // as long as a short operation
     plan.threads.resize(1 + below(kMostThreads));
     for (Moments& moments : plan.threads) {
       moments.resize(1 + below(kMostMoments));
       for (Moment& moment : moments) {
-        moment = {.act = static_cast<Act>(below(kActs.size())),
-                  .place = below(places.at(operation)),
-                  .pause = static_cast<unsigned>(below(kLongestPause))};
+        moment = {.act = kHarmless.at(below(kHarmless.size())),
+                  .place = below(plan.places),
+                  .pause = static_cast<unsigned>(below(kLongestPause / moments.size()))};
       }
-      std::ranges::sort(moments, {}, &Moment::place);
     }
+    // In half of these rounds an abort alone has to end the operation.
+    const bool aborts = plan.meeting == Meeting::kWaitedFor && below(2) == 0;
+    // Few of the others come later, since the operation would not be there any more.
+    size_t end = plan.places;
+    for (size_t ends = aborts ? 1 : below(kMostEnds + 1); ends > 0; --ends) {
+      Moments& moments = plan.threads.at(below(plan.threads.size()));
+      Moment& moment = moments.at(below(moments.size()));
+      moment.act = aborts ? Act::kAbort : kEnds.at(below(kEnds.size()));
+      end = std::min(end, moment.place + kLater);
+    }
+    for (Moments& moments : plan.threads) {
+      for (Moment& moment : moments) {
+        if (!Ends(moment.act)) moment.place %= end;
+      }
+    }
+    for (Moments& moments : plan.threads) std::ranges::sort(moments, {}, &Moment::place);
     return plan;
+  }
+};
+
+// What was met, by operation.
+struct Tally {
+  Counts planned{};
+  Counts met{};
+  Counts aborts{};  // that had to end it
+
+  bool Has(const Counts& wanted, size_t operation) const {
+    return met.at(operation) >= wanted.at(operation);
+  }
+  bool HasAll(const Counts& wanted) const {
+    return std::ranges::equal(met, wanted, std::ranges::greater_equal());
+  }
+  void Add(const Plan& plan, size_t met_in_round) {
+    const auto operation = static_cast<size_t>(plan.operation);
+    planned.at(operation) += plan.MomentsTo(SIZE_MAX);
+    met.at(operation) += met_in_round;
+    if (plan.AbortedAt()) ++aborts.at(operation);
+  }
+  void Print() const {
+    std::printf("%-14s %10s %10s %10s\n", "operation", "moments", "met it", "aborts");
+    for (size_t i = 0; i < kOperations.size(); ++i) {
+      std::printf(
+          "%-14s %10zu %10zu %10zu\n", kOperations.at(i), planned.at(i), met.at(i), aborts.at(i));
+    }
   }
 };
 
 TEST_P(Races, OperationsMeetOtherThreads) {
   std::printf("seed %llu\n", static_cast<unsigned long long>(Seed()));
-  const auto places = CountPlaces();
+  const Counts places = CountPlaces();
+  const Counts wanted = Wanted(places);
   size_t handles = 0;
-  size_t moments = 0;
-  for (uint64_t round = 0; moments < kMoments * Times() && !HasFailure(); ++round) {
+  Tally tally;
+  for (uint64_t round = 0; !tally.HasAll(wanted) && !HasFailure(); ++round) {
     // The system keeps some handles of the first threads and files.
     if (round == kFirstRounds) handles = HandleCount();
     const Plan plan = Draw(round, places);
+    const auto operation = static_cast<size_t>(plan.operation);
+    if (tally.Has(wanted, operation)) continue;
     SCOPED_TRACE(plan.InWords(GetParam()));
     std::optional<ReportCapture> report;
     if (plan.reports) report.emplace();
-    Round(GetParam(), plan).Run();
-    moments += plan.MomentsTo(SIZE_MAX);
+    Round one(GetParam(), plan);
+    one.Run();
+    tally.Add(plan, one.met());
   }
+  tally.Print();
   if (!HasFailure()) {
+    for (size_t i = 0; i < places.size(); ++i) {
+      // At a single place, the last one, an abort may come too late.
+      EXPECT_TRUE(tally.aborts.at(i) > 0 || places.at(i) <= 1) << kOperations.at(i);
+    }
     EXPECT_EQ(HandleCount(), handles);
   }
 }
