@@ -4,7 +4,8 @@
 #include "tests/fuzz/target.h"
 
 void fuzz::Target(std::span<const uint8_t> bytes) {
-  const std::string text = Input(bytes).Rest();
+  const std::vector<char> rest = Input(bytes).RestAlone();
+  const std::string_view text(rest.data(), rest.size());
   size_t scan_from = 0;
   while (const auto header = QuorinCommands::FindReplyHeader(text, scan_from)) {
     if (header->position + QuorinCommands::kReplyHeaderLength > text.size()) std::abort();

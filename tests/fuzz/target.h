@@ -7,6 +7,8 @@
 #include <cstdint>
 #include <span>
 #include <string>
+#include <utility>
+#include <vector>
 
 namespace fuzz {
 
@@ -36,6 +38,11 @@ class Input {
   }
   std::string Text() { return Text(Byte()); }
   std::string Rest() { return Text(bytes_.size()); }
+  // In memory of their own length, so that the sanitizer sees a read beyond it: a text has its zero there.
+  std::vector<char> RestAlone() {
+    const auto rest = std::exchange(bytes_, {});
+    return {rest.begin(), rest.end()};
+  }
 
  private:
   std::span<const uint8_t> bytes_;

@@ -9,7 +9,8 @@ void fuzz::Target(std::span<const uint8_t> bytes) {
   using namespace VelmarCommands;
   Input input(bytes);
   const uint8_t kind = input.Byte();
-  const std::string text = input.Rest();
+  const std::vector<char> rest = input.RestAlone();
+  const std::string_view text(rest.data(), rest.size());
   VersionLog version;
   FileEntries entries;
   FileHeaderLog header;
