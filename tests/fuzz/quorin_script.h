@@ -1,6 +1,6 @@
 // A Quorin receiver that answers what the input says. The input is a list of steps; each is a byte for its kind
 // and the step's own bytes. Each line and each control byte of the host takes one step, and the next ones as long
-// as the kind has kMore. Tags, lengths and checksums are made here, so that the fuzzer comes behind them.
+// as the kind has kMore. Tags, lengths and checksums are made here, so that the fuzzer gets past them.
 #ifndef RCVLINK_TESTS_FUZZ_QUORIN_SCRIPT_H_
 #define RCVLINK_TESTS_FUZZ_QUORIN_SCRIPT_H_
 
