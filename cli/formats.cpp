@@ -96,7 +96,8 @@ std::string ProgressBar(const TransferState& state, size_t width) {
   constexpr std::string_view kGap = "  ";
   if (line.size() + kGap.size() >= width) return line;
   const size_t room = width - line.size() - kGap.size();
-  return line.append(kGap) + Printable(std::wstring_view(state.name).substr(0, room));
+  // A control character takes several columns.
+  return line.append(kGap) + ToUtf8(ToUtf16(Printable(state.name)).substr(0, room));
 }
 
 std::string ProgressJson(const TransferState& state) {

@@ -78,6 +78,9 @@ TEST(FormatsTest, BarShowsNoControlCharacters) {
   TransferState state = State(1, 2, 1);
   state.name = L"a\x1B[31m";
   EXPECT_NE(ProgressBar(state, 100).find("a\\x1B[31m"), std::string::npos);
+  for (size_t width = 0; width < 100; ++width) {
+    EXPECT_LE(ProgressBar(state, width).size(), width);
+  }
 }
 
 }  // namespace

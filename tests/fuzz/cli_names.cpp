@@ -34,7 +34,7 @@ class Ports : public cli::PortSource {
 void ShowProgress(const std::wstring& name, uint64_t done, uint64_t total) {
   constexpr size_t kWidth = 80;
   const cli::TransferState state{.name = name, .done = done, .total = total, .rate = done};
-  cli::ProgressBar(state, kWidth);
+  if (cli::ToUtf16(cli::ProgressBar(state, kWidth)).size() > kWidth) std::abort();
   cli::ProgressLine(state);
   cli::ProgressJson(state);
   const cli::MirrorState mirror{
