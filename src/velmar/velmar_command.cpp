@@ -11,7 +11,6 @@
 #include "report/report_file.h"
 #include "velmar/block_crc32.h"
 
-using rcvlink::Clock;
 using rcvlink::CurrentClock;
 using rcvlink::kTimedOut;
 using rcvlink::Trace;
@@ -64,7 +63,13 @@ class CVelmarCommand::Receiving {
  public:
   const char* bytes() const { return buffer_.data(); }
   uint32_t held() const { return held_; }
-  bool IsFull() const { return held_ == kBufferLength; }
+  // Whether no more is waited for, although what is held is no whole answer.
+  bool IsOver() const {
+    if (held_ == kBufferLength) return true;
+    if (CurrentClock().Ticks() - piece_began_at_ <= kLongestPieceMs) return false;
+    Trace(L"CVelmarCommand::Execute - the answer does not end\r\n");
+    return true;
+  }
 
   HRESULT Read(CIConnection* connection, DWORD timeout_ms, DWORD* count) {
     return connection->Read(buffer_.data() + held_, kBufferLength - held_, count, timeout_ms);
@@ -81,6 +86,7 @@ class CVelmarCommand::Receiving {
   }
   void Hold(DWORD count) { held_ += count; }
   void Consume(uint32_t count) {
+    if (count != 0) piece_began_at_ = CurrentClock().Ticks();
     count = std::min(count, held_);
     std::copy(buffer_.begin() + count, buffer_.end(), buffer_.begin());
     held_ -= count;
@@ -90,14 +96,13 @@ class CVelmarCommand::Receiving {
  private:
   std::array<char, kBufferLength> buffer_{};
   uint32_t held_ = 0;
+  DWORD piece_began_at_ = CurrentClock().Ticks();
   std::string kept_;
 };
 
 HRESULT CVelmarCommand::ReceiveReply(CIConnection* connection, HANDLE abort_event) {
   const bool keep_reply = (GetFlags() & kStreamed) == 0;
   Receiving receiving;
-  Clock& clock = CurrentClock();
-  DWORD piece_began_at = clock.Ticks();
   bool need_data = true;
   bool done = false;
   while (!done) {
@@ -124,15 +129,10 @@ HRESULT CVelmarCommand::ReceiveReply(CIConnection* connection, HANDLE abort_even
     }
     need_data = consumed == 0;
     receiving.Consume(consumed);
-    if (!need_data) piece_began_at = clock.Ticks();
-    if (need_data && receiving.IsFull()) break;
-    if (!done && clock.Ticks() - piece_began_at > kLongestPieceMs) {
-      Trace(L"CVelmarCommand::Execute - the answer does not end\r\n");
-      break;
-    }
+    if (!done && need_data && receiving.IsOver()) break;
   }
   if (keep_reply) KeepReply(receiving.TakeKept());
-  clock.Pause(kPauseMs);
+  CurrentClock().Pause(kPauseMs);
   return S_OK;
 }
 
