@@ -155,8 +155,7 @@ def run(name, kind, time_limit, command):
     if status == 0 and not crashed:
         return 0
     print(re.sub(r"^\[ RUN .*\r?\n\[       OK .*\r?\n", "", text, flags=re.M).rstrip())
-    if status is None:
-        print(f"ended after {time_limit} s")
+    print(f"ended after {time_limit} s" if status is None else f"exit status {status}")
     return 1
 
 

@@ -90,6 +90,14 @@ TEST_F(VelmarDriver, ALogIsNoAnswerToTheProbe) {
   EXPECT_EQ(answer, 0);
 }
 
+// The flush before the second command may come just when the answer to the first one arrives.
+TEST_F(VelmarDriver, TheRestOfAnAnswerThatAFlushHasCutIsNoAnswerToTheProbe) {
+  answers = {{kUnlogAll, kOkPrompt.substr(2) + kOkPrompt}};
+  short answer = 99;
+  EXPECT_EQ(driver.CheckConnection(nullptr, &answer), S_OK);
+  EXPECT_EQ(answer, 0);
+}
+
 // An answer that comes after the check has timed out is discarded by the next command.
 TEST_F(VelmarDriver, TheCommandAfterAFailedCheckWaitsForALateAnswer) {
   short answer = 99;
