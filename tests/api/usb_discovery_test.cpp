@@ -11,7 +11,7 @@
 #include "platform/handle.h"
 #include "platform/hresult.h"
 #include "simulator/quorin/receiver.h"
-#include "tests/quorin/block_stream.h"
+#include "tests/support/block_stream.h"
 #include "tests/support/content.h"
 #include "tests/support/memory_stream.h"
 #include "tests/support/report_capture.h"

@@ -6,8 +6,8 @@
 
 #include "platform/hresult.h"
 #include "tests/fuzz/target.h"
-#include "tests/quorin/block_stream.h"
 #include "tests/quorin/quorin_responder.h"
+#include "tests/support/block_stream.h"
 #include "tests/support/scripted_connection.h"
 
 namespace fuzz {

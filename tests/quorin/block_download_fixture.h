@@ -12,8 +12,8 @@
 #include <vector>
 
 #include "platform/hresult.h"
-#include "tests/quorin/block_stream.h"
 #include "tests/quorin/quorin_driver.h"
+#include "tests/support/block_stream.h"
 #include "tests/support/content.h"
 #include "tests/support/manual_clock.h"
 #include "tests/support/memory_stream.h"

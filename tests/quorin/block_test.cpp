@@ -5,7 +5,7 @@
 #include <algorithm>
 #include <string>
 
-#include "tests/quorin/block_stream.h"
+#include "tests/support/block_stream.h"
 #include "tests/support/content.h"
 
 using rcvlink::Block;

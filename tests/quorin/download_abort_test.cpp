@@ -8,9 +8,9 @@
 
 #include "platform/hresult.h"
 #include "simulator/quorin/receiver.h"
-#include "tests/quorin/block_stream.h"
 #include "tests/quorin/quorin_driver.h"
 #include "tests/support/aborting_connection.h"
+#include "tests/support/block_stream.h"
 #include "tests/support/content.h"
 #include "tests/support/simulated_driver.h"
 

@@ -9,8 +9,8 @@
 #include <string>
 #include <vector>
 
-#include "tests/quorin/block_stream.h"
 #include "tests/quorin/quorin_driver.h"
+#include "tests/support/block_stream.h"
 #include "tests/support/content.h"
 #include "tests/support/memory_stream.h"
 #include "tests/support/report_capture.h"
