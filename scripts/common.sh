@@ -38,13 +38,21 @@ logged() {
   fi
 }
 
+# configure_preset LOG PRESET WITH_TESTS
+configure_preset() {
+  (
+    cd "$root" || exit
+    logged "$1" cmake --preset "$2" -DBUILD_TESTING="$3"
+  )
+}
+
 # build_preset LOG PRESET WITH_TESTS [TARGET...]: builds all targets if none is named.
 build_preset() {
   local log="$1" preset="$2" with_tests="$3"
+  configure_preset "$log" "$preset" "$with_tests"
   shift 3
   (
     cd "$root" || exit
-    logged "$log" cmake --preset "$preset" -DBUILD_TESTING="$with_tests"
     logged "$log" cmake --build --preset "$preset" -j "$(nproc)" ${1:+--target "$@"}
   )
 }

@@ -58,13 +58,19 @@ set_tests_properties(check_release PROPERTIES PROCESSORS 1 COST 2000 TIMEOUT 120
 
 rcvlink_shards(2 unit_tests wine 300)
 rcvlink_shards(1 cli_unit_tests wine 120)
-# Of the preset sanitize. It is here because this preset starts Wine.
-rcvlink_test(sanitized_tests sanitized 300 ${PROJECT_SOURCE_DIR}/build/sanitize/bin/sanitized_tests.exe.so)
-set_tests_properties(sanitized_tests PROPERTIES LABELS gtest)
-# It computes while other tests wait for a port.
+# Of the preset sanitize, which ./test has configured. They are here because this preset starts Wine. They are compiled
+# while other tests wait for a port, at a low priority, but before check_release gets its turn.
+set(sanitize ${PROJECT_SOURCE_DIR}/build/sanitize)
+rcvlink_test(sanitized_tests sanitized 300 ${sanitize}/bin/sanitized_tests.exe.so)
 add_test(NAME fuzz COMMAND ${Python3_EXECUTABLE} -B ${folder}/run_fuzz.py 60)
-set_tests_properties(fuzz PROPERTIES
-  FIXTURES_REQUIRED wine PROCESSORS ${computing} COST 1000 TIMEOUT 600)
+set_tests_properties(fuzz PROPERTIES PROCESSORS ${computing} COST 1000 TIMEOUT 600)
+foreach(target sanitized_tests fuzz)
+  add_test(NAME build.${target} COMMAND nice -n 10 ${CMAKE_COMMAND} --build ${sanitize} --target ${target})
+  set_tests_properties(build.${target} PROPERTIES FIXTURES_SETUP ${target} COST 3000 TIMEOUT 1200)
+  set_tests_properties(${target} PROPERTIES FIXTURES_REQUIRED "wine;${target}")
+endforeach()
+set_tests_properties(sanitized_tests PROPERTIES LABELS gtest)
+set_tests_properties(build.fuzz PROPERTIES DEPENDS build.sanitized_tests)  # one at a time in a folder
 # Many small shards: the last ones end at about the same time.
 rcvlink_shards(32 host_tests bed 600)
 rcvlink_shards(32 cli_tests bed 300)
