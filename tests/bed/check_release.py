@@ -42,7 +42,7 @@ def build_again():
     shutil.rmtree(COPY, ignore_errors=True)
     shutil.copytree(ROOT, COPY, ignore=shutil.ignore_patterns("build", ".git", "__pycache__"))
     run(COPY, "cmake", "--preset", "release", "-DBUILD_TESTING=OFF")
-    run(COPY, "cmake", "--build", "--preset", "release", "-j", "1", "--target", *INSTALLED)
+    run(COPY, "cmake", "--build", "--preset", "release", "-j", str(os.cpu_count()), "--target", *INSTALLED)
 
 
 def release_of(root):
