@@ -1,8 +1,5 @@
 #include "tests/support/block_stream.h"
 
-namespace {
-
-// Bit by bit: 0x1021, most significant bit first, nothing inverted.
 uint16_t SlowCrc(std::string_view bytes, uint16_t crc) {
   for (const char c : bytes) {
     const auto bits = static_cast<uint8_t>(c);
@@ -14,6 +11,8 @@ uint16_t SlowCrc(std::string_view bytes, uint16_t crc) {
   }
   return crc;
 }
+
+namespace {
 
 void AppendWord(std::string& bytes, uint16_t word) {
   bytes += static_cast<char>(word & 0xFF);

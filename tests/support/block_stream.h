@@ -7,6 +7,9 @@
 #include <string>
 #include <string_view>
 
+// Bit by bit: 0x1021, most significant bit first, nothing inverted.
+uint16_t SlowCrc(std::string_view bytes, uint16_t crc);
+
 class BlockStream {
  public:
   static constexpr size_t kPayload = 512;
