@@ -7,7 +7,7 @@
 // a TLS slot it has a callback, which frees a thread's state when the thread ends, and the states
 // of all threads when the slot is freed.
 //
-// Only the DLL needs this source: in a program the runtime ends with the process.
+// Only the DLL needs this source: in a program the runtime ends with the process. The unit tests have it too.
 #include "api/exception_state.h"
 
 #include <cxxabi.h>

@@ -2,28 +2,20 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include <exception>
 #include <memory>
 #include <string>
 
-#include "api/exception_state.h"
 #include "api/registry.h"
 #include "platform/hresult.h"
 #include "platform/text.h"
 #include "tests/support/report_capture.h"
+#include "tests/support/resources.h"
 #include "tests/support/stub_receiver.h"
 
 using rcvlink::Receivers;
 
 extern "C" BOOL WINAPI DllMain(HINSTANCE module, DWORD reason, void* process_ends);
-
-namespace {
-
-int freed_states = 0;
-
-}  // namespace
-
-// The state itself is that of the DLL's own C++ runtime, which a program does not have.
-void rcvlink::FreeExceptionState() { ++freed_states; }
 
 namespace {
 
@@ -33,11 +25,12 @@ using testing::MatchesRegex;
 
 constexpr HRESULT kInvalid = static_cast<HRESULT>(0x80070057);
 
+int any = 0;
+
 // What Windows passes for a process that ends.
-void* ProcessEnds() {
-  static int any = 0;
-  return &any;
-}
+void* ProcessEnds() { return &any; }
+
+size_t FreeFiberSlots() { return CountResources().free_fls_slots; }
 
 TEST(Module, LoadWritesThePathAndTheProductVersion) {
   const ReportCapture report;
@@ -55,7 +48,7 @@ TEST(Module, LoadOfAModuleWithoutAVersionWritesNothing) {
 
 TEST(Module, LoadOfAModuleWithoutAPathWritesNothing) {
   const ReportCapture report;
-  const auto no_module = reinterpret_cast<HINSTANCE>(&freed_states);
+  const auto no_module = reinterpret_cast<HINSTANCE>(&any);
   EXPECT_TRUE(DllMain(no_module, DLL_PROCESS_ATTACH, nullptr));
   EXPECT_THAT(report.Lines(), IsEmpty());
 }
@@ -79,20 +72,22 @@ TEST(Module, UnloadClosesWhatTheHostLeftOpen) {
 
 // Another thread may have been stopped in the middle of an allocation.
 TEST(Module, UnloadFreesTheExceptionStateUnlessTheProcessEnds) {
-  freed_states = 0;
+  EXPECT_EQ(std::uncaught_exceptions(), 0);  // makes the state
+  const size_t slots = FreeFiberSlots();
   EXPECT_TRUE(DllMain(nullptr, DLL_PROCESS_DETACH, ProcessEnds()));
-  EXPECT_EQ(freed_states, 0);
+  EXPECT_EQ(FreeFiberSlots(), slots);
   EXPECT_TRUE(DllMain(nullptr, DLL_PROCESS_DETACH, nullptr));
-  EXPECT_EQ(freed_states, 1);
+  EXPECT_EQ(FreeFiberSlots(), slots + 1);
 }
 
 TEST(Module, ThreadsOfTheHostChangeNothing) {
   const ReportCapture report;
-  freed_states = 0;
+  EXPECT_EQ(std::uncaught_exceptions(), 0);
+  const size_t slots = FreeFiberSlots();
   EXPECT_TRUE(DllMain(nullptr, DLL_THREAD_ATTACH, nullptr));
   EXPECT_TRUE(DllMain(nullptr, DLL_THREAD_DETACH, nullptr));
   EXPECT_THAT(report.Lines(), IsEmpty());
-  EXPECT_EQ(freed_states, 0);
+  EXPECT_EQ(FreeFiberSlots(), slots);
 }
 
 }  // namespace
