@@ -4,8 +4,8 @@
 usage: run_coverage.py [unit]
 
 Runs the unit tests, then those of the DLL and of the program as well; with "unit" only the first. Prints after each
-a line for each folder, and for each file that is not run whole. The exit status is 0 only if the tests passed and, of
-all tests, the goals are reached.
+a line for each folder, and for each file that is not run whole; under it the numbers of the lines that are not run.
+The exit status is 0 only if the tests passed and, of all tests, the goals are reached.
 
 A branch is a way out of a condition. What the compiler adds for exceptions that leave a call is not counted.
 """
@@ -21,6 +21,7 @@ import run_program
 
 ROOT = run_program.ROOT
 COVERAGE = os.path.join(run_program.BUILD, "coverage")
+LINES = os.path.join(COVERAGE, "lines.json")
 UNIT_TESTS = ("unit_tests", "cli_unit_tests")
 OTHER_TESTS = "^(host_tests|usb_tests|cli_tests)"
 UNIT_TEST_SECONDS = 600
@@ -46,17 +47,26 @@ def run_other_tests():
 
 
 def counts():
-    """By file, what has been run so far."""
+    """By file, what has been run so far, and the numbers of the lines that have not."""
     summary = subprocess.run(
         ["gcovr", "--root", ROOT, "--gcov-executable", "x86_64-w64-mingw32-gcov-posix",
          "--exclude-throw-branches", "--exclude-unreachable-branches",
-         "--filter", "src/", "--filter", "cli/", "--json-summary", "-", COVERAGE],
+         "--filter", "src/", "--filter", "cli/", "--json", LINES, "--json-summary", "-", COVERAGE],
         cwd=ROOT, stdout=subprocess.PIPE, check=True,
     )
-    return {
+    with open(LINES, encoding="utf-8") as file:
+        left_out = {entry["file"]: lines_left_out(entry["lines"]) for entry in json.load(file)["files"]}
+    files = {
         file["filename"]: Count(file["line_total"], file["line_covered"], file["branch_total"], file["branch_covered"])
         for file in json.loads(summary.stdout)["files"]
     }
+    return files, left_out
+
+
+def lines_left_out(lines):
+    """A line of a template or an inline function has an entry for each of its copies."""
+    run = {line["line_number"] for line in lines if line["count"] > 0}
+    return sorted({line["line_number"] for line in lines if not line["gcovr/noncode"]} - run)
 
 
 def total_of(files, prefix):
@@ -76,11 +86,13 @@ def show(name, count):
 
 def report(tests):
     """Prints the figures; gives them by file."""
-    files = counts()
+    files, left_out = counts()
     print(f"\nwith {tests}:")
     for name, count in sorted(files.items()):
         if count.run_lines < count.lines or count.run_branches < count.branches:
             show(name, count)
+            if left_out[name]:
+                print("    not run:", *left_out[name])
     print()
     for folder in sorted({os.path.dirname(name) for name in files} | set(GOALS)):
         show(folder + "/", total_of(files, folder + "/"))
