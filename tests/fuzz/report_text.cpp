@@ -1,15 +1,16 @@
-// The identity of a receiver, with a report: what the device says becomes lines of it.
+// A receiver with a report: what the device says becomes lines of it.
 #include "quorin/quorin_protocol.h"
 #include "tests/fuzz/quorin_script.h"
 #include "tests/fuzz/velmar_script.h"
 #include "tests/support/manual_clock.h"
+#include "tests/support/memory_stream.h"
 #include "tests/support/report_capture.h"
 #include "velmar/velmar_protocol.h"
 
 namespace {
 
 template <typename Driver, typename Script>
-void Identify(fuzz::Input input) {
+void Run(fuzz::Input input) {
   auto owned = std::make_unique<ScriptedConnection>();
   owned->name = rcvlink::ToWide(input.Text());
   const Script receiver(*owned, input);
@@ -19,6 +20,10 @@ void Identify(fuzz::Input input) {
   SysFreeString(info.bstrReceiverId);
   SysFreeString(info.bstrModel);
   driver.DeleteFile(L"A.LOG");
+  CFileList files;
+  driver.GetFiles(&files);
+  MemoryStream stream;
+  driver.DownloadFile(L"A.LOG", &stream, nullptr);
 }
 
 // A new one from time to time keeps the file short.
@@ -35,6 +40,6 @@ void fuzz::Target(std::span<const uint8_t> bytes) {
   UseReport();
   ManualClock clock;
   Input input(bytes);
-  if (input.Byte() % 2 == 0) return Identify<CQuorinProtocol, QuorinScript>(input);
-  Identify<CVelmarProtocol, VelmarScript>(input);
+  if (input.Byte() % 2 == 0) return Run<CQuorinProtocol, QuorinScript>(input);
+  Run<CVelmarProtocol, VelmarScript>(input);
 }
