@@ -5,7 +5,8 @@ usage: run_coverage.py [unit]
 
 Runs the unit tests, then those of the DLL and of the program as well; with "unit" only the first. Prints after each
 a line for each folder, and for each file that is not run whole; under it the numbers of the lines that are not run.
-The exit status is 0 only if the tests passed and, of all tests, the goals are reached.
+The exit status is 0 only if the tests passed and the goals are reached: by the unit tests alone those of src/, and by
+all tests those of cli/ as well.
 
 A branch is a way out of a condition. What the compiler adds for exceptions that leave a call is not counted.
 """
@@ -26,7 +27,8 @@ UNIT_TESTS = ("unit_tests", "cli_unit_tests")
 OTHER_TESTS = "^(host_tests|usb_tests|cli_tests)"
 UNIT_TEST_SECONDS = 600
 # Percent of lines and of branches.
-GOALS = {"src": (99.0, 95.0), "cli": (90.0, 0.0)}
+UNIT_GOALS = {"src": (99.0, 95.0)}
+GOALS = UNIT_GOALS | {"cli": (90.0, 0.0)}
 
 Count = collections.namedtuple("Count", "lines run_lines branches run_branches")
 
@@ -99,9 +101,9 @@ def report(tests):
     return files
 
 
-def reaches_goals(files):
+def reaches_goals(files, goals):
     reached = True
-    for folder, (lines, branches) in GOALS.items():
+    for folder, (lines, branches) in goals.items():
         count = total_of(files, folder + "/")
         if percent(count.run_lines, count.lines) < lines or percent(count.run_branches, count.branches) < branches:
             print(f"BELOW THE GOAL: {folder}/ has a goal of {lines} % of lines and {branches} % of branches")
@@ -116,11 +118,10 @@ def main(arguments):
     for old in glob.glob(os.path.join(COVERAGE, "**", "*.gcda"), recursive=True):
         os.remove(old)
     passed = run_unit_tests()
-    files = report("the unit tests")
+    passed = reaches_goals(report("the unit tests"), UNIT_GOALS) and passed
     if not arguments:
         passed = run_other_tests() and passed
-        files = report("all tests")
-        passed = reaches_goals(files) and passed
+        passed = reaches_goals(report("all tests"), GOALS) and passed
     return 0 if passed else 1
 
 
