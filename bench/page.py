@@ -155,10 +155,10 @@ def text(figures, processor):
 `bench/run` measured all of this and wrote this page; `bench/run PART` repeats one part. Nothing here is a test: no
 run fails because it was slow.
 
-- The machine has {cores}{speed}, and builds of other programs ran on it at the same time. So absolute times are
-  noisy, and ratios are what counts: both sides were measured in turns or side by side in one run. Each figure is
-  the median of all turns, unless it says something else.
-- The library and its programs ran under Wine 8 on Linux, not on Windows, and lrzsz as a program of Linux. So the
+- The machine has {cores}{speed}, and is not this program's alone. So absolute times are noisy, and ratios are what
+  counts: both sides were measured in turns or side by side in one run. Each figure is the median of all turns,
+  unless it says something else.
+- The library and its programs ran under Wine on Linux, not on Windows, and lrzsz as a program of Linux. So the
   time that a block of Quorin takes beyond the line's has Wine's in it, and lrzsz has no such part.
 - The receivers are simulated. A real one takes time to read its storage, which none of these figures contain.
 
@@ -249,8 +249,8 @@ at the same time. The goal is 50 ms for the median and 250 ms for the 99th perce
 
 {aborts_table(figures['aborts'])}
 
-An abort ends the wait of an operation, and so each operation of a Quorin receiver. A Velmar receiver misses the second
-goal: half a second of pause follows each of its answers, and an abort does not end it. After an abort in the middle of a Velmar file the
+An abort ends the wait of an operation. It does not end the half second of pause that follows each answer of a Velmar
+receiver, so the 99th percentile of its operations lies above the goal. After an abort in the middle of a Velmar file the
 receiver is told to stop, so that the next operation finds it silent: half a second for a late answer, a second until the
 answer has ended, and the pause.
 
@@ -263,8 +263,8 @@ bytes from it. The speed is raised for the transfer and set back, and the silenc
 time; the lines are not paced. Processor time is that of the host's process alone,
 without Wine's server and the receivers. The working set is what a search of all receivers added to it, for each
 receiver; what is loaded once is in it, so it falls with their number. The ratio is that of the processor times of a
-MiB, to one receiver's. Nearly all of it is Wine's: the library's own share of a MiB is that of {1024 * 1024 // 512} blocks,
-{library['block_ns'] * 2048 / 1e6:.1f} ms.
+MiB, to one receiver's. The library's own share of a MiB is that of {1024 * 1024 // 512} blocks, {library['block_ns'] * 2048 / 1e6:.1f} ms;
+the rest is that of Windows' functions.
 
 All receivers are then downloaded from once more while four threads open and close them by name: the bytes are those of
 the file, and each receiver has one user left, or the part fails.
