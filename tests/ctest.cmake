@@ -53,7 +53,7 @@ foreach(check IN LISTS checks)
   add_test(NAME ${name} COMMAND ${Python3_EXECUTABLE} -B ${check})
   set_tests_properties(${name} PROPERTIES PROCESSORS ${computing} COST 1000)
 endforeach()
-# It compiles for minutes at a low priority, so it begins first and leaves the processor to the others.
+# It compiles for minutes at a low priority, so it begins early and leaves the processor to the others.
 set_tests_properties(check_release PROPERTIES PROCESSORS 1 COST 2000 TIMEOUT 1200)
 
 rcvlink_shards(2 unit_tests wine 300)

@@ -78,7 +78,7 @@ def end_wine():
 
 
 def own_ports():
-    """The ports of the set that ctest has reserved, "COM10 COM11 COM12"; the first set without ctest."""
+    """The ports of the set that ctest has reserved, "COM10 COM11 COM12 COM13"; the first set without ctest."""
     with open(os.path.join(ROOT, "tests", "bed", "ports.conf"), encoding="utf-8") as file:
         numbers = {name: int(value) for name, value in re.findall(r"^(\w+)=(\d+)$", file.read(), re.M)}
     reserved = re.match(r"id:(\d+),", os.environ.get("CTEST_RESOURCE_GROUP_0_PORTS", ""))

@@ -1,5 +1,5 @@
-// The calls of a serial port, and those of a driver, as Windows has them. What they do with a port, the tests of the
-// DLL show; here each has to reach Windows, which knows that the handle is no device's.
+// The calls of a serial port, and those of a driver, as Windows has them. Here each only has to reach Windows, which
+// knows that the handle is no device's. That it is the right one, and what it does, the tests of the DLL show.
 #include "transport/device_calls.h"
 
 #include <gtest/gtest.h>
