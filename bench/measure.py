@@ -43,7 +43,7 @@ CALL_FILES = {"SMALL.DAT": 100 * KIB, "LARGE.DAT": 200 * KIB}
 # So large that the time of the processor, which is counted in steps of 10 ms, is that of many steps.
 MANY_FILE, MANY_BYTES = "MANY.DAT", 512 * KIB
 MANY = (1, 8, 64)
-ABORTS = 200  # of each operation of each family
+ABORTS = 100  # of each operation of each family
 ABORT_FILE, ABORT_BYTES = "LONG.DAT", 1024 * KIB  # takes a minute and a half
 ABORT_OPERATIONS = ("list", "check", "download")
 FIRST_PORT = 140  # of those that this makes; the tests have others
