@@ -144,6 +144,12 @@ void Collect(void* context, unsigned char percent) {
   static_cast<std::vector<int>*>(context)->push_back(percent);
 }
 
+TEST_F(Receiver, SettingTheProgressFunctionSucceedsWithoutALine) {
+  EXPECT_EQ(receiver->SetProgressCallback(Collect, nullptr), S_OK);
+  EXPECT_EQ(receiver->SetProgressCallback(nullptr, nullptr), S_OK);
+  EXPECT_TRUE(report.Lines().empty());
+}
+
 TEST_F(Receiver, ProgressReachesTheHostDuringATransferOnly) {
   std::vector<int> percents;
   CProgressCallback progress = {Collect, &percents};
