@@ -3,8 +3,8 @@
 
 usage: run_fuzz.py [SECONDS] [TARGET]
 
-All targets together run SECONDS (60), one on each processor at a time. An input that fails is kept in
-build/test-logs. The results are in build/test-logs/fuzz.json, in the form of GoogleTest.
+First the committed corpus alone must reach the edges of LEAST_EDGES. Then all targets together run SECONDS (60), one
+on each processor at a time. An input that fails is kept in build/test-logs. The results are in build/test-logs/fuzz.json, in the form of GoogleTest.
 """
 
 import concurrent.futures
@@ -22,6 +22,25 @@ FUZZ = os.path.join(ROOT, "tests", "fuzz")
 PROGRAMS = os.path.join(run_program.BUILD, "sanitize", "bin")
 # Beside its fuzzing a target starts, and reads its corpus.
 START_SECONDS = 60
+# About 95 % of the edges that the committed corpus reached when this was written. Fewer say that its inputs no longer
+# get past the first commands, because the library now sends others, say.
+LEAST_EDGES = {
+    "cli_names": 1310,
+    "quorin_download_serial": 930,
+    "quorin_download_usb": 880,
+    "quorin_file_list": 745,
+    "quorin_parsers": 155,
+    "quorin_reply": 745,
+    "report_text": 1600,
+    "simulator_faults": 230,
+    "simulator_script": 1290,
+    "usb_descriptors": 35,
+    "usb_open": 715,
+    "velmar_download": 995,
+    "velmar_file_list": 735,
+    "velmar_logs": 305,
+    "velmar_reply": 850,
+}
 
 
 def targets():
@@ -29,42 +48,48 @@ def targets():
     return [name for name in (os.path.splitext(os.path.basename(path))[0] for path in sources) if name != "main"]
 
 
-def options(target, seconds):
+def options(target):
     artifacts = os.path.join(run_program.LOGS, f"fuzz-{target}-")
-    listed = [f"-max_total_time={seconds}", "-handle_segv=0", "-timeout=20", "-max_len=4096", "-print_final_stats=1",
-              f"-artifact_prefix={artifacts}"]
+    listed = ["-handle_segv=0", "-timeout=20", "-max_len=4096", "-print_final_stats=1", f"-artifact_prefix={artifacts}"]
     dictionary = os.path.join(FUZZ, target.split("_")[0] + ".dict")
     if os.path.exists(dictionary):
         listed.append(f"-dict={dictionary}")
     return listed
 
 
+def fuzz(target, limit, seconds, log, *corpora):
+    """The exit status and the text of a run."""
+    command = [run_program.SANITIZED_LOADER, os.path.join(PROGRAMS, f"fuzz_{target}.exe.so"), *options(target), limit,
+               *corpora]
+    status = run_program.run_limited(command, run_program.sanitized_environment(), log, seconds + START_SECONDS)
+    with open(log, encoding="utf-8", errors="replace") as file:
+        return status, file.read()
+
+
+def edges_of(text):
+    reached = re.findall(r" cov: (\d+)", text)
+    return int(reached[-1]) if reached else 0
+
+
 def run(target, seconds):
     """Whether the target found nothing, and its executions a second and edges."""
+    committed = os.path.join(FUZZ, "corpus", target)
     grown = os.path.join(run_program.BUILD, "fuzz-corpus", target)  # what it found in earlier runs
     os.makedirs(grown, exist_ok=True)
-    command = [
-        run_program.SANITIZED_LOADER,
-        os.path.join(PROGRAMS, f"fuzz_{target}.exe.so"),
-        *options(target, seconds),
-        grown,
-        os.path.join(FUZZ, "corpus", target),
-    ]
-    log = os.path.join(run_program.LOGS, f"fuzz-{target}.log")
-    status = run_program.run_limited(
-        command, run_program.sanitized_environment(), log, seconds + START_SECONDS
-    )
-    with open(log, encoding="utf-8", errors="replace") as file:
-        text = file.read()
+    log = os.path.join(run_program.LOGS, f"fuzz-{target}")
+    status, text = fuzz(target, "-runs=0", 0, f"{log}-corpus.log", committed)
+    edges = edges_of(text)
+    if status == 0 and edges < LEAST_EDGES[target]:
+        print(f"{target}: the committed corpus reaches {edges} edges, fewer than {LEAST_EDGES[target]}", flush=True)
+        return False
+    status, text = fuzz(target, f"-max_total_time={seconds}", seconds, f"{log}.log", grown, committed)
     executions = re.findall(r"stat::number_of_executed_units: (\d+)", text)
-    edges = re.findall(r" cov: (\d+)", text)
     # Without the counts the fuzzer did not come to its end.
     passed = status == 0 and bool(executions)
     if not passed:
         print(text[-8000:])
     rate = int(executions[-1]) // seconds if executions else 0
-    print(f"{target:24} {rate:7} executions/s {edges[-1] if edges else '?':>6} edges  {'ok' if passed else 'FAILED'}",
-          flush=True)
+    print(f"{target:24} {rate:7} executions/s {edges_of(text):6} edges  {'ok' if passed else 'FAILED'}", flush=True)
     return passed
 
 
