@@ -39,6 +39,8 @@ struct Side {
   const char* name;
   int count;  // of runs in a turn
   std::function<void()> run;
+  std::function<void()> begin_turn = [] {};  // these two are not measured
+  std::function<void()> end_turn = [] {};
 };
 
 // Prints the nanoseconds of a run of each side, the median of all turns.
@@ -46,10 +48,12 @@ void Compare(const std::vector<Side>& sides) {
   std::vector<std::vector<double>> times(sides.size());
   for (int turn = 0; turn < kTurns; ++turn) {
     for (size_t i = 0; i < sides.size(); ++i) {
+      sides[i].begin_turn();
       const auto start = std::chrono::steady_clock::now();
       for (int run = 0; run < sides[i].count; ++run) sides[i].run();
       const std::chrono::duration<double, std::nano> passed =
           std::chrono::steady_clock::now() - start;
+      sides[i].end_turn();
       times[i].push_back(passed.count() / sides[i].count);
     }
   }
@@ -110,13 +114,16 @@ std::wstring FormatLine(const wchar_t* format, ...) {
 }
 
 void CompareTraces() {
-  Compare({{"trace_closed", 20'000, TraceOne},
-           {"trace_formatted", 20'000, [] {
-              FormatLine(L"CSerialConnection::Connect - try speed [%u] [%s]\r\n", 115200U, port);
-            }}});
-  dump_hlp::CreateReportFile(L"rcvlink-bench.txt");
-  Compare({{"trace_open", 2'000, TraceOne}});
-  dump_hlp::CloseReportFile();
+  Compare(
+      {{"trace_closed", 20'000, TraceOne},
+       {"trace_formatted",
+        20'000,
+        [] { FormatLine(L"CSerialConnection::Connect - try speed [%u] [%s]\r\n", 115200U, port); }},
+       {"trace_open",
+        2'000,
+        TraceOne,
+        [] { dump_hlp::CreateReportFile(L"rcvlink-bench.txt"); },
+        [] { dump_hlp::CloseReportFile(); }}});
   const Allocations allocations;
   for (int i = 0; i < 100; ++i) TraceOne();
   std::printf("\"trace_closed_allocations\": %zu,\n", Allocations::Count() / 100);
