@@ -133,6 +133,15 @@ TEST(VelmarCommandParse, BinaryLogsAreWaitedForByTheirLengths) {
   }
 }
 
+TEST(VelmarCommandParse, ACommandWithoutABodyOfItsOwnEndsWithAnyLog) {
+  CVelmarCommand command("x", 0);
+  bool done = false;
+  uint32_t consumed = 0;
+  EXPECT_EQ(command.ParseLogBody("abc", 3, &done, &consumed), S_OK);
+  EXPECT_TRUE(done);
+  EXPECT_EQ(consumed, 0u);
+}
+
 TEST(VelmarCommandParse, AcknowledgementsAreParsedAsText) {
   const auto parse = [](const char* text) {
     CVelmarCommand command("x", 0);
