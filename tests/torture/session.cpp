@@ -223,7 +223,8 @@ Listing Listing::Of(void* receiver) {
   devapi::GetFilesCount(files, &listing.count);
   for (long i = 0; i < listing.count; ++i) {
     CFileInfo file{};
-    devapi::GetFileInfo(files, i, &file);
+    const long result = devapi::GetFileInfo(files, i, &file);
+    if (FAILED(result)) listing.result = result;
     listing.are_files = listing.are_files && IsOneOfTheFiles(file);
     SysFreeString(file.bstrName);
   }

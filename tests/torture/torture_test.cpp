@@ -1,5 +1,5 @@
-// The n-th allocation, call to the port's driver or write to the host's stream fails, for every n of
-// a whole session. Whatever fails: the results say so, nothing stays behind, the lock is free, and
+// The n-th allocation, call to the port's driver, object of Windows or write to the host's stream fails,
+// for every n of a whole session. Whatever fails: the results say so, nothing stays behind, the lock is free, and
 // both the next operation and the next session work.
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -14,6 +14,7 @@
 #include "tests/support/report_capture.h"
 #include "tests/support/resources.h"
 #include "tests/torture/session.h"
+#include "tests/torture/system_objects.h"
 
 namespace torture {
 namespace {
@@ -28,9 +29,9 @@ class HostStream : public MemoryStream {
 };
 
 // What fails.
-enum class Event { kAllocation, kCall, kCallOfPending, kWrite };
-constexpr std::array<const char*, 4> kEvents = {
-    "allocation ", "call ", "call of pending ", "write "};
+enum class Event { kAllocation, kCall, kCallOfPending, kWrite, kObject };
+constexpr std::array<const char*, 5> kEvents = {
+    "allocation ", "call ", "call of pending ", "write ", "object "};
 
 #if __has_feature(address_sanitizer)
 constexpr bool kCountsAllocations = false;  // libstdc++.so makes a part of them
@@ -49,6 +50,7 @@ struct Trial {
     if (event == Event::kWrite) stream.fail_at_write = n;
     const Watch watch{locks, [this] { return HasFailed(); }};
     const Allocations allocations(event == Event::kAllocation ? n : Allocations::kNone);
+    const SystemObjects objects(event == Event::kObject ? n : SystemObjects::kNone);
     session.Run(link, &stream, /*removes=*/true, &watch);
     live = Allocations::Live();
     has_failed = HasFailed();
@@ -56,6 +58,7 @@ struct Trial {
 
   bool HasFailed() const {
     if (event == Event::kAllocation) return Allocations::HasFailed();
+    if (event == Event::kObject) return SystemObjects::HasFailed();
     return event == Event::kWrite ? stream.writes > n : bench.calls().count > n;
   }
 
@@ -65,7 +68,7 @@ struct Trial {
 
   std::string InWords() const {
     return session.InWords() + ", " + kEvents.at(static_cast<size_t>(event)) + std::to_string(n) +
-           " failed " + bench.calls().failed;
+           " failed " + bench.calls().failed + SystemObjects::Failed();
   }
 
   Bench bench;
@@ -220,6 +223,16 @@ TEST_P(Torture, EveryWriteToTheStreamMayFail) {
   EXPECT_EQ(counts.cut, 0U);
 }
 
+class TortureOfObjects : public Torture {};
+
+// Events, mutexes and texts.
+TEST_P(TortureOfObjects, EveryObjectMayFail) {
+  const Counts counts =
+      FailEach(Event::kObject, {E_OUTOFMEMORY, rcvlink::HResultFromError(ERROR_NOT_ENOUGH_MEMORY)});
+  EXPECT_GT(counts.trials, 10U);
+  EXPECT_EQ(counts.cut, 0U);
+}
+
 class TortureOfMemory : public Torture {
  protected:
   void FailEveryAllocation() {
@@ -241,6 +254,7 @@ std::string NameOf(const testing::TestParamInfo<Link>& info) { return info.param
 
 INSTANTIATE_TEST_SUITE_P(Links, Torture, testing::ValuesIn(kLinks), NameOf);
 INSTANTIATE_TEST_SUITE_P(Links, TortureOfCalls, testing::ValuesIn(kLinks), NameOf);
+INSTANTIATE_TEST_SUITE_P(Links, TortureOfObjects, testing::ValuesIn(kLinks), NameOf);
 INSTANTIATE_TEST_SUITE_P(Links, TortureOfMemory, testing::ValuesIn(kLinks), NameOf);
 
 }  // namespace
