@@ -133,6 +133,15 @@ TEST(VelmarCommandParse, BinaryLogsAreWaitedForByTheirLengths) {
   }
 }
 
+TEST(VelmarCommandParse, TheHeaderIsEmptyBeforeALog) {
+  const CVelmarCommand command("x", 0);
+  EXPECT_EQ(command.Header().message_name, L"");
+  EXPECT_EQ(command.Header().port, L"");
+  EXPECT_EQ(command.Header().sequence, 0);
+  EXPECT_EQ(command.Header().gps_week, 0);
+  EXPECT_EQ(command.Header().gps_seconds, 0);
+}
+
 TEST(VelmarCommandParse, ACommandWithoutABodyOfItsOwnEndsWithAnyLog) {
   CVelmarCommand command("x", 0);
   bool done = false;
