@@ -92,7 +92,8 @@ def run(command, seconds, output=subprocess.DEVNULL):
 
 
 def copy_sources():
-    """Makes the copy equal to the sources. A file that is equal keeps its time, so it is not compiled again."""
+    """Makes the copy equal to the sources. A file that is equal keeps its time, so it is not compiled again. One that is
+    gone would still be found by CMake."""
     listed = subprocess.run(["git", "ls-files", "-co", "--exclude-standard"], cwd=ROOT, stdout=subprocess.PIPE,
                             check=True, text=True).stdout.splitlines()
     for name in listed:
@@ -108,6 +109,11 @@ def copy_sources():
         os.makedirs(os.path.dirname(copy), exist_ok=True)
         shutil.copyfile(source, copy)
         shutil.copymode(source, copy)
+    for top in {name.split("/")[0] for name in listed if "/" in name}:
+        for folder, _, names in os.walk(os.path.join(WORK, top)):
+            for path in (os.path.join(folder, name) for name in names):
+                if not os.path.isfile(os.path.join(ROOT, os.path.relpath(path, WORK))):
+                    os.remove(path)
 
 
 def build(*targets):
