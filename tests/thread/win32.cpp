@@ -1,5 +1,6 @@
 // The rest of Win32 that the tests with several threads need: locks, threads, time, texts.
 #include <pthread.h>
+#include <sched.h>
 #include <unistd.h>
 
 namespace {
@@ -84,6 +85,7 @@ DWORD WINAPI GetTickCount() {
 void WINAPI Sleep(DWORD milliseconds) {
   std::this_thread::sleep_for(std::chrono::milliseconds(milliseconds));
 }
+BOOL WINAPI SwitchToThread() { return sched_yield() == 0; }
 
 void WINAPI GetLocalTime(SYSTEMTIME* time) {
   const time_t now = std::time(nullptr);
