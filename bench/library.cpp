@@ -8,6 +8,7 @@
 #include <cstring>
 #include <functional>
 #include <memory>
+#include <optional>
 #include <string>
 #include <vector>
 
@@ -294,25 +295,30 @@ void MeasureReceiver(const char* name, EProtocol family) {
   // The registry's own table is there from now on.
   { const Found receiver; }
 
-  const Allocations allocations;
   clock.paused = 0;
-  const Found receiver;
-  std::printf("\"%s_receiver_bytes\": %zu, \"%s_search_pauses_ms\": %lu,\n",
-              name,
-              Allocations::LiveBytes(),
-              name,
-              clock.paused);
+  std::optional<Found> receiver;
+  {
+    const Allocations search;
+    receiver.emplace();
+    std::printf("\"%s_receiver_bytes\": %zu, \"%s_search_pauses_ms\": %lu,\n",
+                name,
+                Allocations::LiveBytes(),
+                name,
+                clock.paused);
+  }
   clock.paused = 0;
-  const size_t before = Allocations::LiveBytes();
-  if (devapi::DownloadFile(receiver.handle(), file_name, &sink, nullptr) != S_OK) std::exit(1);
-  std::printf("\"%s_download_bytes\": %zu, \"%s_download_pauses_ms\": %lu,\n",
-              name,
-              Allocations::MostBytes() - before,
-              name,
-              clock.paused);
+  {
+    const Allocations download;
+    if (devapi::DownloadFile(receiver->handle(), file_name, &sink, nullptr) != S_OK) std::exit(1);
+    std::printf("\"%s_download_bytes\": %zu, \"%s_download_pauses_ms\": %lu,\n",
+                name,
+                Allocations::MostBytes(),
+                name,
+                clock.paused);
+  }
   clock.paused = 0;
   void* list = nullptr;
-  if (devapi::OpenFileList(receiver.handle(), &list) != S_OK) std::exit(1);
+  if (devapi::OpenFileList(receiver->handle(), &list) != S_OK) std::exit(1);
   devapi::CloseFileList(list);
   std::printf("\"%s_list_pauses_ms\": %lu,\n", name, clock.paused);
 }

@@ -13,6 +13,10 @@ def number(value):
     return f"{value:,.0f}"
 
 
+def percent(share):
+    return f"{100 * share:.1f} %"
+
+
 def table(head, rows):
     lines = ["| " + " | ".join(head) + " |", "|---|" + "---:|" * (len(head) - 1)]
     return "\n".join([*lines, *("| " + " | ".join(map(str, row)) + " |" for row in rows)])
@@ -32,7 +36,7 @@ def line_table(figures):
     delays = list(next(iter(figures["rates"].values())))
     rows = []
     for protocol, rates in figures["rates"].items():
-        cells = [f"{number(rates[delay])} ({rates[delay] / LIMIT:.1%})" for delay in delays]
+        cells = [f"{number(rates[delay])} ({percent(rates[delay] / LIMIT)})" for delay in delays]
         rows.append([NAMES.get(protocol, protocol), *cells])
     return table(["Protocol", *(f"{delay} ms" for delay in delays)], rows)
 
@@ -145,9 +149,9 @@ def many_table(figures):
 
 def size_table(figures):
     total = figures["dll"]
-    rows = [[name, number(size), f"{size / total:.1%}"] for name, size in sorted(
+    rows = [[name, number(size), percent(size / total)] for name, size in sorted(
         figures["parts"].items(), key=lambda part: -part[1])]
-    rows.append(["all", number(total), "100.0%"])
+    rows.append(["all", number(total), percent(1)])
     return table(["`rcvlink.dll`", "Bytes", "Share"], rows)
 
 
@@ -167,9 +171,9 @@ def text(figures, processor):
 `bench/run` measured all of this and wrote this page; `bench/run PART` repeats one part. Nothing here is a test: no
 run fails because it was slow.
 
-- The machine has {cores}{speed}, and is not this program's alone. So absolute times are noisy, and ratios are what
-  counts: both sides were measured in turns or side by side in one run. Each figure is the median of all turns,
-  unless it says something else.
+- The machine has {cores}{speed}, and is not this program's alone. So absolute times are noisy, and ratios are
+  what counts: the sides of a ratio were measured in turns or side by side in one run. Each figure is the median of
+  all turns, unless it says something else.
 - The library and its programs ran under Wine on Linux, not on Windows, and lrzsz as a program of Linux. So the
   time that a block of Quorin takes beyond the line's has Wine's in it, and lrzsz has no such part.
 - The receivers are simulated. A real one takes time to read its storage, which none of these figures contain.
@@ -189,16 +193,16 @@ A transfer of lrzsz that failed was repeated once.
 
 Quorin sends a block of 512 bytes and waits for the answer, so a late answer costs it twice as much as XMODEM-1K and
 YMODEM with blocks of 1024. The library asks for blocks of 512 bytes, the only ones that it takes. Of 518 bytes on the
-line 512 are the file's, so {LAYOUTS['quorin']:.1%} is the most that it can have, and it has
-{line_share(figures, 'quorin'):.1%} of that without a delay. ZMODEM and Velmar do not wait for answers. Of 1064 bytes of a
-Velmar log 1024 are the file's, at most {LAYOUTS['velmar']:.1%}; it has {line_share(figures, 'velmar'):.1%} of that.
+line 512 are the file's, so {percent(LAYOUTS['quorin'])} is the most that it can have, and it has
+{percent(line_share(figures, 'quorin'))} of that without a delay. ZMODEM and Velmar do not wait for answers. Of 1064 bytes of a
+Velmar log 1024 are the file's, at most {percent(LAYOUTS['velmar'])}; it has {percent(line_share(figures, 'velmar'))} of that.
 
 ## Whole downloads
 
 `bench/run get`
 
-`rcvlink-cli get PORT NAME --speed 115200 --no-memory` on that line without a delay, once for each of the
-larger files, and `rcvlink-cli find`. A silence is a time of 0.4 s or more in which neither side sends, with their number
+`rcvlink-cli find` and `rcvlink-cli get`, with `PORT NAME --speed 115200 --no-memory`, on that line without a delay. Each
+was run three times, but the larger files once. A silence is a time of 0.4 s or more in which neither side sends, with their number
 in brackets. "The line carries" is the time of the bytes alone, "program" what is before the first byte and after the last one: the start of
 Wine's process and its end.
 
@@ -210,7 +214,8 @@ receiver costs 1 s: two of the search, one of the list, three before the first b
 each reply, since its receivers need a moment before they take the next command, and the silences of its search, which
 asks for a Quorin receiver first. The end of a Velmar file waits in the same way, and counts as "program" here. The
 blocks of Quorin have a known length, and no such wait; "other exchange" is what passes between them. Before a download,
-`get` asks for the list of files. The smallest Velmar file here has 4 bytes: fewer do not arrive
+`get` asks for the list of files. `find` also reads the identity, and the wait after its last reply counts as "program".
+The smallest Velmar file here has 4 bytes: fewer do not arrive
 ([known behaviour](known-behaviour.md)).
 
 ## What the library costs
@@ -240,16 +245,17 @@ The pauses are those that the library makes by its clock, without the ends of re
 
 `bench/run calls`
 
-Calls of `rcvlink.dll` to Windows' DLLs, but the C runtime's, counted at its import table: what a download of 200 KiB has more than one of
-100 KiB, for each 512 bytes. The port is a COM port of Wine, on which a write of one byte ends at once; one that does
+Calls of `rcvlink.dll` to Windows' DLLs, except the C runtime, counted at its import table: what a download of 200 KiB has more than one of
+100 KiB, for each 512 bytes. A function with less than 0.05 is left out. The port is a COM port of Wine, on which a write of one byte ends at once; one that does
 not takes a `GetLastError`, a `WaitForMultipleObjects` and a `GetOverlappedResult` more.
 
 {calls_table(figures['calls'])}
 
 A block takes two reads and a write. Each needs its `ReadFile` or `WriteFile`, and each read that is not over at once
-`GetLastError`, a wait and the result: nine, where a loop with one read for a block has five. The second read is that of
-the header, which says whether the rest is worth waiting for. Each transfer first clears its event (`ResetEvent`), and a
-look at the clock (`GetTickCount`) is the bound for a header that comes byte by byte. A block takes no allocation, and a
+`GetLastError`, a wait and the result. That makes nine calls; with one read for a block it would be five. The second read
+is that of the header, which says whether the rest is worth waiting for. Each transfer first clears its event
+(`ResetEvent`). The time at which a block came is noted (`GetTickCount`), since over USB a receiver may not stay without one
+for too long; so is the time at which a log of Velmar came. A block takes no allocation, and a
 lock only when the percent changes. Velmar reads up to 8 KiB at once.
 
 ## From an abort to the return
@@ -277,7 +283,7 @@ time; the lines are not paced. Processor time is that of the host's process alon
 without Wine's server and the receivers. The working set is what a search of all receivers added to it, for each
 receiver; what is loaded once is in it, so it falls with their number. The ratio is that of the processor times of a
 MiB, to one receiver's. The library's own share of a MiB is that of {1024 * 1024 // 512} blocks, {library['block_ns'] * 2048 / 1e6:.1f} ms;
-the rest is that of Windows' functions.
+the rest is that of Wine's functions.
 
 All receivers are then downloaded from once more while four threads open and close them by name: the bytes are those of
 the file, and each receiver has one user left, or the part fails.
@@ -296,6 +302,6 @@ uses are left out; identical functions are not folded, which GNU's linker cannot
 
 {program_table(size)}
 
-The program has {number(size['program'])} bytes. CLI11 reads and writes by streams, and they bring libstdc++'s
+The program has {number(size['program'])} bytes; the goal is a million. CLI11 reads and writes by streams, and they bring libstdc++'s
 streams and locales into a program that is linked statically. The DLL has none of them. `rcvlink-sim` has
 {number(size['simulator'])} bytes, with symbols.""")
