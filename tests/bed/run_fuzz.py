@@ -4,7 +4,8 @@
 usage: run_fuzz.py [SECONDS] [TARGET]
 
 First the committed corpus alone must reach the edges of LEAST_EDGES. Then all targets together run SECONDS (60), one
-on each processor at a time. An input that fails is kept in build/test-logs. The results are in build/test-logs/fuzz.json, in the form of GoogleTest.
+on each processor at a time. An input that fails is kept in build/test-logs. The results are in
+build/test-logs/fuzz.json, in the form of GoogleTest.
 """
 
 import concurrent.futures
@@ -22,8 +23,8 @@ FUZZ = os.path.join(ROOT, "tests", "fuzz")
 PROGRAMS = os.path.join(run_program.BUILD, "sanitize", "bin")
 # Beside its fuzzing a target starts, and reads its corpus.
 START_SECONDS = 60
-# About 95 % of the edges that the committed corpus reached when this was written. Fewer say that its inputs no longer
-# get past the first commands, because the library now sends others, say.
+# About 95 % of the edges that the committed corpus reaches. Fewer mean that an input ends at an early command, for
+# example because the library now sends another one.
 LEAST_EDGES = {
     "cli_names": 1310,
     "quorin_download_serial": 930,
@@ -79,7 +80,11 @@ def run(target, seconds):
     log = os.path.join(run_program.LOGS, f"fuzz-{target}")
     status, text = fuzz(target, "-runs=0", 0, f"{log}-corpus.log", committed)
     edges = edges_of(text)
-    if status == 0 and edges < LEAST_EDGES[target]:
+    if status != 0:
+        print(text[-8000:])
+        print(f"{target}: the committed corpus did not run to its end", flush=True)
+        return False
+    if edges < LEAST_EDGES[target]:
         print(f"{target}: the committed corpus reaches {edges} edges, fewer than {LEAST_EDGES[target]}", flush=True)
         return False
     status, text = fuzz(target, f"-max_total_time={seconds}", seconds, f"{log}.log", grown, committed)
