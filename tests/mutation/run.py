@@ -92,8 +92,8 @@ def run(command, seconds, output=subprocess.DEVNULL):
 
 
 def copy_sources():
-    """Makes the copy equal to the sources. A file that is equal keeps its time, so it is not compiled again. One that is
-    gone would still be found by CMake."""
+    """Makes the copy equal to the sources. A file that is equal keeps its time, so it is not compiled again. A file
+    that is gone is removed: CMake would still find it."""
     listed = subprocess.run(["git", "ls-files", "-co", "--exclude-standard"], cwd=ROOT, stdout=subprocess.PIPE,
                             check=True, text=True).stdout.splitlines()
     for name in listed:

@@ -11,7 +11,8 @@ DWORD WINAPI RunTests(void*) {
 
 int main(int argc, char** argv) {
   testing::InitGoogleMock(&argc, argv);
-  // They count allocations, of which libstdc++.so makes a part here; they replace imports, which Linux does not have.
+  // TortureOfMemory counts allocations, of which libstdc++.so makes a part here. TortureOfObjects
+  // replaces imports, which Linux code does not have.
   std::string& filter = testing::GTEST_FLAG(filter);
   filter += std::string(filter.find('-') == std::string::npos ? "-" : ":") +
             "*TortureOfMemory.*:*TortureOfObjects.*";

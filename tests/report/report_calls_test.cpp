@@ -7,27 +7,24 @@
 #include "platform/win32.h"
 #include "report/report_file.h"
 #include "tests/support/report_capture.h"
+#include "tests/support/system_call.h"
 
 namespace {
 
-std::atomic<size_t> writes = 0;
+// The thread whose writes are counted; 0 for none. Only that thread uses the count.
+std::atomic<DWORD> counted_thread = 0;
+size_t writes = 0;
 std::atomic<bool> has_temp_folder = true;
-
-template <typename Function>
-Function* SystemCall(const char* name) {
-  return reinterpret_cast<Function*>(
-      reinterpret_cast<void*>(GetProcAddress(GetModuleHandleW(L"kernel32"), name)));
-}
 
 BOOL WINAPI
 CountWrite(HANDLE file, const void* bytes, DWORD size, DWORD* written, OVERLAPPED* block) {
-  static const auto write = SystemCall<decltype(CountWrite)>("WriteFile");
-  ++writes;
+  static const auto write = SystemCall<decltype(CountWrite)>(L"kernel32", "WriteFile");
+  if (counted_thread == GetCurrentThreadId()) ++writes;
   return write(file, bytes, size, written, block);
 }
 
 DWORD WINAPI FindTempFolder(DWORD size, wchar_t* path) {
-  static const auto find = SystemCall<decltype(FindTempFolder)>("GetTempPathW");
+  static const auto find = SystemCall<decltype(FindTempFolder)>(L"kernel32", "GetTempPathW");
   return has_temp_folder ? find(size, path) : 0;
 }
 
@@ -47,7 +44,9 @@ namespace {
 template <typename Act>
 size_t CountWrites(Act act) {
   writes = 0;
+  counted_thread = GetCurrentThreadId();
   act();
+  counted_thread = 0;
   return writes;
 }
 

@@ -4,9 +4,11 @@
 
 #include <atomic>
 
+#include "tests/support/system_call.h"
+
 namespace {
 
-// The thread whose objects are counted; 0 for none. Only that thread uses the rest.
+// The thread whose calls are counted; 0 for none. Only that thread uses the rest.
 std::atomic<DWORD> counted_thread = 0;
 size_t count = 0;
 size_t failing = torture::SystemObjects::kNone;
@@ -17,12 +19,6 @@ bool Fails(const char* name) {
   failed = name;
   SetLastError(ERROR_NOT_ENOUGH_MEMORY);
   return true;
-}
-
-template <typename Function>
-Function* SystemCall(const wchar_t* library, const char* name) {
-  return reinterpret_cast<Function*>(
-      reinterpret_cast<void*>(GetProcAddress(GetModuleHandleW(library), name)));
 }
 
 [[maybe_unused]] HANDLE WINAPI MakeEvent(SECURITY_ATTRIBUTES* security,

@@ -1,5 +1,5 @@
-// Windows' calls that make an event, a mutex or a text of the host's: one of them may fail. They replace the imports of
-// the whole program; Linux code has none, so in the sanitized tests nothing fails.
+// Lets one of Windows' calls fail that make an event, a mutex or a text. The imports of the whole
+// program are replaced. Linux code has none, so there nothing fails.
 #ifndef RCVLINK_TESTS_TORTURE_SYSTEM_OBJECTS_H_
 #define RCVLINK_TESTS_TORTURE_SYSTEM_OBJECTS_H_
 
@@ -8,12 +8,12 @@
 
 namespace torture {
 
-// Counts those of the thread that made it, while this lives. One at a time.
+// Counts the calls of the thread that made it, while this lives. One at a time.
 class SystemObjects {
  public:
   static constexpr size_t kNone = SIZE_MAX;
 
-  // The one of this number, from 0, fails. The others are made.
+  // The call of this number, from 0, fails.
   explicit SystemObjects(size_t failing);
   SystemObjects(const SystemObjects&) = delete;
   SystemObjects& operator=(const SystemObjects&) = delete;

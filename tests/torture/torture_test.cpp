@@ -1,4 +1,4 @@
-// The n-th allocation, call to the port's driver, object of Windows or write to the host's stream fails,
+// The n-th allocation, call to the port's driver, call that makes an event, a mutex or a text, or write to the host's stream fails,
 // for every n of a whole session. Whatever fails: the results say so, nothing stays behind, the lock is free, and
 // both the next operation and the next session work.
 #include <gmock/gmock.h>

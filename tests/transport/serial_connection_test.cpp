@@ -107,7 +107,7 @@ TEST_F(SerialConnection, FailingSettingsAreReportedAndIgnored) {
 TEST_F(SerialConnection, AStateThatCannotBeReadHasItsLength) {
   device.failing_call = "GetCommState";
   Open(9600);
-  EXPECT_EQ(device.set_states.back().DCBlength, 28u);
+  EXPECT_EQ(device.set_states.back().DCBlength, sizeof(DCB));
 }
 
 TEST_F(SerialConnection, SpeedZeroKeepsThePorts) {
@@ -258,7 +258,7 @@ TEST_F(SerialConnection, FlushGivesUpWhenTheQueueDoesNotMove) {
   };
   EXPECT_EQ(connection.Flush(), S_OK);
   EXPECT_EQ(device.calls.back(), "PurgeComm");
-  // The first look, at 500, finds bytes in the queue. That of 3500 is not later than the limit.
+  // The queue stands still since 500. At 3500 the limit is reached and not passed.
   EXPECT_EQ(clock.now, 4000u);
   EXPECT_TRUE(report.Has("CSerialConnection::Flush - output queue does not move [COM12]"));
 }
