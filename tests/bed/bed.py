@@ -8,7 +8,8 @@ removed, so a test that crashed leaves nothing behind.
 
 Simulated receivers, by port name ("COM12"):
   {"do": "start", "port": P, "arguments": [...]}     starts rcvlink-sim; answers when P can be opened
-  {"do": "stop", "port": P}                          ends it with SIGTERM -> {"status": exit status}
+  {"do": "stop", "port": P}                          ends it with SIGTERM -> {"status": exit status,
+                                                     "has_ended": whether it had ended before, "errors": TEXT}
   {"do": "kill", "port": P}                          ends it with SIGKILL; its port disappears
   {"do": "pause", "port": P}, {"do": "resume", "port": P}     SIGSTOP, SIGCONT
   {"do": "status", "port": P}                        -> {"status": exit status, null while it runs}
@@ -129,9 +130,11 @@ class Connection(socketserver.StreamRequestHandler):
         self._simulators[port] = Simulator(program, link, request["arguments"])
 
     def _stop(self, request):
-        status = self._simulator(request).stop()
+        simulator = self._simulator(request)
+        has_ended = simulator.status() is not None
+        status = simulator.stop()
         del self._simulators[request["port"]]
-        return {"status": status}
+        return {"status": status, "has_ended": has_ended, "errors": simulator.errors()}
 
     def _kill(self, request):
         self._simulator(request).kill()

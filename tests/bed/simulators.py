@@ -61,6 +61,9 @@ class Simulator:
     def resume(self):
         self._process.send_signal(signal.SIGCONT)
 
+    def errors(self):
+        return "".join(self._errors).strip()
+
     def status(self):
         return self._process.poll()
 

@@ -1,6 +1,7 @@
 #include "tests/host/support/simulated_port.h"
 
 #include <algorithm>
+#include <cstdio>
 #include <cstdlib>
 #include <deque>
 #include <mutex>
@@ -70,7 +71,15 @@ std::wstring SimulatedPort::path() const { return L"\\\\.\\" + name(); }
 int SimulatedPort::Stop() {
   const nlohmann::json answer = Ask("stop");
   plugged_ = false;
-  return answer.at("status").get<int>();
+  const int status = answer.at("status").get<int>();
+  // A test that fails because its receiver ended shows this as the cause.
+  if (status != 0 || answer.at("has_ended").get<bool>()) {
+    std::printf("%s: the receiver had ended, or failed: %d %s\n",
+                lease_.name().c_str(),
+                status,
+                answer.at("errors").get<std::string>().c_str());
+  }
+  return status;
 }
 
 void SimulatedPort::Kill() {
